@@ -1,0 +1,79 @@
+// Column tables and the lines that are printed from them.
+//
+// A table is an array of ColumnDesc that ends with a null name. Its widths and its selection are
+// settled once, by ApplyColumnSelection, before anything is printed.
+#ifndef FRAMEWORK_COLUMN_TABLE_H_
+#define FRAMEWORK_COLUMN_TABLE_H_
+
+#include <concepts>
+#include <cstdint>
+#include <span>
+#include <string_view>
+
+#include "framework/name_list.h"
+
+namespace tally {
+
+// One column of a report.
+struct ColumnDesc {
+  const char* name;         // label in the header; the word that -s selects it by
+  const char* description;  // label printed by -v
+  uint8_t width;            // characters in a table; at least the name's length once selected
+  const char* conversion;   // the value's kind: "Lu", "Ld" (64 bits), "u", "d" (32 bits), "c", "s"
+  uint8_t summable;         // has a cell in a Total row
+  uint8_t fixed;            // -s cannot hide it
+  uint8_t selected;         // is shown
+};
+
+// One value of a row: a number, signed ones widened with their sign, or a text. The column's
+// conversion says how much of a number is shown.
+class Cell {
+ public:
+  Cell() = default;
+  template <std::integral T>
+  constexpr Cell(T number) : number_(Widen(number)) {}  // NOLINT(google-explicit-constructor)
+  constexpr Cell(std::string_view text) : text_(text) {}
+  constexpr Cell(const char* text) : text_(text) {}
+
+  constexpr uint64_t number() const { return number_; }
+  constexpr std::string_view text() const { return text_; }
+
+ private:
+  template <std::integral T>
+  static constexpr uint64_t Widen(T number) {
+    if constexpr (std::signed_integral<T>) return static_cast<uint64_t>(int64_t{number});
+    return number;
+  }
+
+  uint64_t number_ = 0;
+  std::string_view text_;
+};
+
+// Hides the selectable columns that `mask`, a ':'-separated list of names, does not hold (null:
+// hides none) and raises every width to the length of its name.
+void ApplyColumnSelection(ColumnDesc* table, const char* mask);
+
+// Whether `name` is one of the ':'-separated words of `mask`, whatever the case. Only the first
+// 128 characters of the mask count.
+bool MaskContains(std::string_view mask, std::string_view name);
+
+// The names of the shown columns, "(all)" or "(none)".
+NameWriter FormatSelectedColumns(const ColumnDesc* table);
+
+// A line of dashes as wide as the table; nothing in CSV.
+void PrintDashes(const ColumnDesc* table, bool csvMode);
+
+// The line of labels.
+void PrintHeader(const ColumnDesc* table, bool csvMode);
+
+// One line of values: one cell for each column of the table, hidden ones too. In a Total row
+// (`totalRow`) the columns that are not summable are left blank. A table's value that is wider than
+// its column takes the room from the next ones, so that later columns stand under their labels.
+void PrintRow(const ColumnDesc* table, bool csvMode, bool totalRow, std::span<const Cell> cells);
+
+// One line for each shown column with its description.
+void PrintColumnDescriptions(const ColumnDesc* table);
+
+}  // namespace tally
+
+#endif  // FRAMEWORK_COLUMN_TABLE_H_

@@ -1,0 +1,56 @@
+#include "framework/display_unit.h"
+
+#include "framework/name_list.h"
+#include "knvlibs/include/knvlibs/ksi.h"
+
+namespace tally {
+
+Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit) {
+  if (text == nullptr || SameName(text, "kb")) {
+    unit = DisplayUnit::kb;
+  } else if (SameName(text, "mb")) {
+    unit = DisplayUnit::mb;
+  } else if (SameName(text, "pg")) {
+    unit = DisplayUnit::pg;
+  } else if (allowBytes && SameName(text, "b")) {
+    unit = DisplayUnit::b;
+  } else {
+    Warning("Invalid unit specified. Choose from {mb, kb, pg%s}\n", allowBytes ? ", b" : "");
+    return kBadParameter;
+  }
+  return kSuccess;
+}
+
+const char* UnitTitle(DisplayUnit unit) {
+  switch (unit) {
+    case DisplayUnit::mb:
+      return "MB";
+    case DisplayUnit::kb:
+      return "KB";
+    case DisplayUnit::pg:
+      return "Page (4K)";
+    case DisplayUnit::b:
+      return "Bytes";
+  }
+  return "";
+}
+
+uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit) {
+  switch (unit) {
+    case DisplayUnit::mb:
+      return kilobytes >> 10;
+    case DisplayUnit::kb:
+      return kilobytes;
+    case DisplayUnit::pg:
+      return kilobytes >> 2;
+    case DisplayUnit::b:
+      return kilobytes << 10;
+  }
+  return 0;
+}
+
+uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit) {
+  return kilobytes == kNoValue ? kNoValue : ShiftKilobytes(kilobytes, unit);
+}
+
+}  // namespace tally

@@ -1,0 +1,37 @@
+// The unit that memory figures are shown in.
+#ifndef FRAMEWORK_DISPLAY_UNIT_H_
+#define FRAMEWORK_DISPLAY_UNIT_H_
+
+#include <cstdint>
+
+#include "framework/status.h"
+
+namespace tally {
+
+enum class DisplayUnit : uint8_t { mb = 3, kb = 4, pg = 5, b = 6 };
+
+// The kernel's word for "no value" or "unlimited". Shown as it is in every unit.
+constexpr uint64_t kNoValue = UINT64_MAX;
+
+// Reads the word of -u, in any case; no text means kb. `allowBytes`: "b" is a word too. An unknown
+// word is kBadParameter, after its message.
+Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit);
+
+// The unit's name for the title block.
+const char* UnitTitle(DisplayUnit unit);
+
+// Turns a memory figure of one kind into `unit`. Fractions are dropped.
+using Conversion = uint64_t (*)(uint64_t value, DisplayUnit unit);
+
+// From kilobytes, shifting only.
+uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit);
+
+// From kilobytes; kNoValue stays.
+uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit);
+
+// The kilobytes of a count of 4 KB pages; the two top bits are lost.
+constexpr uint64_t PagesToKilobytes(uint64_t pages) { return pages * 4; }
+
+}  // namespace tally
+
+#endif  // FRAMEWORK_DISPLAY_UNIT_H_

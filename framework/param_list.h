@@ -1,0 +1,87 @@
+// Parameter lists, and reads with keys.
+#ifndef FRAMEWORK_PARAM_LIST_H_
+#define FRAMEWORK_PARAM_LIST_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <initializer_list>
+#include <memory>
+
+#include "framework/status.h"
+#include "knvlibs/include/knvlibs/ksi.h"
+
+namespace tally {
+
+struct ParamListDestroyer {
+  void operator()(KSI_ParamList* list) const { KSI_ParamListDestroy(list); }
+};
+
+// Owns a parameter or instance list and destroys it once. Null when it could not be made.
+using ParamList = std::unique_ptr<KSI_ParamList, ParamListDestroyer>;
+
+// A key that selects one instance on one level of the tree.
+class Key {
+ public:
+  Key(uint64_t number) : number_(number) {}  // NOLINT(google-explicit-constructor)
+  Key(const char* text) : text_(text) {}     // NOLINT(google-explicit-constructor)
+
+  Status AddTo(KSI_ParamList* list) const {
+    return text_ != nullptr ? KSI_ParamListAddString(list, text_)
+                            : KSI_ParamListAddInt(list, number_);
+  }
+
+ private:
+  uint64_t number_ = 0;
+  const char* text_ = nullptr;
+};
+
+// Where a keyed read stopped; each reader has its own words for each.
+enum class ReadStep : uint8_t { create, addFirstKey, addSecondKey, read, done };
+
+struct ReadResult {
+  Status status;
+  ReadStep step;
+};
+
+// The keys of one read, and what becomes of them.
+struct KeyList {
+  int capacity;
+  std::initializer_list<Key> keys = {};
+  bool removeKeys = false;  // take the keys out again before the list is destroyed
+};
+
+// Calls `read` with a list made of the keys and destroys the list, whatever the status.
+template <class Read>
+ReadResult KeyedRead(const KeyList& keyList, Read read) {
+  const ParamList list(KSI_ParamListCreate(1, keyList.capacity));
+  if (!list) return {kFailure, ReadStep::create};
+  ReadStep step = ReadStep::addFirstKey;
+  for (const Key& key : keyList.keys) {
+    if (Status status = key.AddTo(list.get())) return {status, step};
+    step = ReadStep::addSecondKey;
+  }
+  const Status status = read(list.get());
+  if (keyList.removeKeys) {
+    for (size_t i = 0; i < keyList.keys.size(); ++i) KSI_ParamListRemoveLastParam(list.get());
+  }
+  return {status, status == kSuccess ? ReadStep::done : ReadStep::read};
+}
+
+// Reads one record of `node`.
+inline ReadResult KeyedGet(uint16_t node, const KeyList& keys, void* record, size_t size) {
+  return KeyedRead(keys, [&](KSI_ParamList* list) { return KSI_Get(node, list, record, size); });
+}
+
+// Lists the instances of `node`.
+inline ReadResult KeyedList(uint16_t node, const KeyList& keys, ParamList& instances) {
+  return KeyedRead(keys, [&](KSI_ParamList* list) {
+    KSI_ParamList* made = nullptr;
+    const Status status = KSI_GetInstanceListAlloc(node, list, &made);
+    if (status == kSuccess) instances.reset(made);
+    return status;
+  });
+}
+
+}  // namespace tally
+
+#endif  // FRAMEWORK_PARAM_LIST_H_

@@ -1,0 +1,98 @@
+#include "framework/report_options.h"
+
+#include <getopt.h>
+
+#include <cstdlib>
+#include <cstring>
+
+#include "knvlibs/include/knvlibs/ksi.h"
+
+namespace tally {
+namespace {
+
+constexpr uint32_t kMaxLevels = 12;
+
+// The long options of all reports; a report has those whose letter is among its short ones.
+constexpr option kLongOptions[] = {
+    {"gid", required_argument, nullptr, 'g'},     {"level", required_argument, nullptr, 'l'},
+    {"unit", required_argument, nullptr, 'u'},    {"iFilter", required_argument, nullptr, 'i'},
+    {"eFilter", required_argument, nullptr, 'e'}, {"verbose", no_argument, nullptr, 'v'},
+    {"cSelect", required_argument, nullptr, 's'}, {"csvMode", no_argument, nullptr, 'q'},
+    {"tags", no_argument, nullptr, 't'},
+};
+
+// Room for all of them and the end of the array.
+using LongOptions = option[sizeof kLongOptions / sizeof *kLongOptions + 1];
+
+void SelectLongOptions(const ReportFrame& frame, LongOptions& selected) {
+  option* next = selected;
+  for (const option& known : kLongOptions) {
+    if (!frame.Takes(static_cast<char>(known.val))) continue;
+    *next = known;
+    if (known.val == 'v') next->val = frame.longVerbose;
+    ++next;
+  }
+  *next = {};
+}
+
+Status ParseLevels(LevelCheck check, const char* text, uint32_t& levels) {
+  levels = static_cast<uint32_t>(std::strtol(text, nullptr, 10));
+  if (levels == 0) {
+    Warning("Invalid level %s, must be > 0\n", text);
+    return kBadParameter;
+  }
+  const bool belowZero = check == LevelCheck::asSigned && static_cast<int32_t>(levels) < 0;
+  if (levels > kMaxLevels && !belowZero) {
+    Warning("Specified level %s too high, reseting to %d\n", text, static_cast<int>(kMaxLevels));
+    levels = kMaxLevels;
+  }
+  return kSuccess;
+}
+
+}  // namespace
+
+bool ReportFrame::Takes(char letter) const { return std::strchr(options, letter) != nullptr; }
+
+Status ParseReportOptions(const ReportFrame& frame, int argc, char** argv, ReportOptions& options) {
+  options = {};
+  options.levels = frame.defaultLevels;
+  LongOptions longOptions;
+  SelectLongOptions(frame, longOptions);
+  for (;;) {
+    switch (getopt_long(argc, argv, frame.options, longOptions, nullptr)) {
+      case 'g':
+        options.startGid = std::strtol(optarg, nullptr, 10);
+        break;
+      case 'l':
+        if (Status status = ParseLevels(frame.levelCheck, optarg, options.levels)) return status;
+        break;
+      case 'u':
+        options.unitText = optarg;
+        break;
+      case 'i':
+        options.inclusionText = optarg;
+        break;
+      case 'e':
+        options.exclusionText = optarg;
+        break;
+      case 's':
+        options.columnMask = optarg;
+        break;
+      case 'v':
+        options.verbose = true;
+        break;
+      case 'q':
+        options.csvMode = true;
+        break;
+      case 't':
+        options.tags = true;
+        break;
+      case -1:
+        return kSuccess;
+      default:
+        break;
+    }
+  }
+}
+
+}  // namespace tally

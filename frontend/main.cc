@@ -1,0 +1,133 @@
+// tally: reads the options up to the report's name, settles where the kernel's figures come from
+// and that they are understood, and hands the command line to the report.
+
+#include <getopt.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+#include "frontend/report_names.h"
+#include "frontend/usage.h"
+#include "knvlibs/include/knvlibs/ksi.h"
+
+namespace tally {
+namespace {
+
+// The short -f takes a word and ignores it, the long --force takes none: scripts depend on both.
+constexpr char kShortOptions[] = "f:c:r:h";
+constexpr option kLongOptions[] = {
+    {"force", no_argument, nullptr, 'f'},
+    {"cache", required_argument, nullptr, 'c'},
+    {"report", required_argument, nullptr, 'r'},
+    {"help", no_argument, nullptr, 'h'},
+    {nullptr, 0, nullptr, 0},
+};
+
+struct Options {
+  const ReportName* report = nullptr;
+  const char* cacheFile = nullptr;
+  bool checkVersion = true;
+};
+
+enum class Next { run, exitSuccess, exitFailure };
+
+Next PrintUsageAndExit(const char* programName, Next next) {
+  PrintUsage(programName);
+  return next;
+}
+
+// Reads up to the first report: all words after it are the report's.
+Next ParseOptions(int argc, char** argv, Options& options) {
+  opterr = 0;
+  while (options.report == nullptr) {
+    switch (getopt_long(argc, argv, kShortOptions, kLongOptions, nullptr)) {
+      case 'f':
+        options.checkVersion = false;
+        break;
+      case 'c':
+        options.cacheFile = optarg;
+        break;
+      case 'h':
+        return PrintUsageAndExit(argv[0], Next::exitSuccess);
+      case 'r':
+        options.report = FindReport(optarg);
+        if (options.report == nullptr) {
+          Warning("Invalid report %s\n", optarg);
+          return PrintUsageAndExit(argv[0], Next::exitFailure);
+        }
+        break;
+      case '?':
+        Warning("Unexpected or out-of-sequence argument detected\n");
+        return PrintUsageAndExit(argv[0], Next::exitFailure);
+      case -1:
+        return Next::run;
+      default:
+        break;
+    }
+  }
+  return Next::run;
+}
+
+bool OpenCache(const char* cacheFile) {
+  const Status status = KSI_UseCache(cacheFile, 0);
+  if (status != kSuccess) {
+    Warning("Couldn't open cache file %s, error code: %u\n", cacheFile, status);
+  }
+  return status == kSuccess;
+}
+
+// Whether the library's definitions are the kernel's.
+bool CheckVersion() {
+  char buildBuffer[21] = {};
+  const char* appBuild = nullptr;
+  const Status status = KSI_CheckSig(buildBuffer, sizeof buildBuffer, &appBuild);
+  if (status != kSuccess) {
+    buildBuffer[sizeof buildBuffer - 1] = '\0';
+    Warning(
+        "%#x: md5 signature mismatch with running kernova built on %s. (vs %s for app sysinfo)\n",
+        status, buildBuffer, appBuild);
+  }
+  return status == kSuccess;
+}
+
+int Run(int argc, char** argv) {
+  Options options;
+  switch (ParseOptions(argc, argv, options)) {
+    case Next::run:
+      break;
+    case Next::exitSuccess:
+      return EXIT_SUCCESS;
+    case Next::exitFailure:
+      return EXIT_FAILURE;
+  }
+  if (options.cacheFile != nullptr && !OpenCache(options.cacheFile)) return EXIT_FAILURE;
+  if (!CheckVersion() && options.checkVersion) {
+    Warning("Version check failed\n");
+    return EXIT_FAILURE;
+  }
+  if (options.report == nullptr) {
+    PrintUsage(argv[0]);
+    return EXIT_SUCCESS;
+  }
+  return options.report->entry(argc, argv) == kSuccess ? EXIT_SUCCESS : EXIT_FAILURE;
+}
+
+// Rows that could not be written must not pass for written.
+bool CloseStandardOutput() {
+  const bool lostRows = std::ferror(stdout) != 0;
+  const int closed = std::fclose(stdout);
+  if (closed == 0 && !lostRows) return true;
+  Warning("tally: cannot write standard output: %s\n",
+          closed != 0 ? std::strerror(errno) : "output was lost");
+  return false;
+}
+
+}  // namespace
+}  // namespace tally
+
+int main(int argc, char** argv) {
+  const int exitStatus = tally::Run(argc, argv);
+  return tally::CloseStandardOutput() ? exitStatus : EXIT_FAILURE;
+}
