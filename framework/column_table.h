@@ -31,7 +31,7 @@ class Cell {
  public:
   Cell() = default;
   template <std::integral T>
-  constexpr Cell(T number) : number_(Widen(number)) {}  // NOLINT(google-explicit-constructor)
+  constexpr Cell(T number) : number_(static_cast<uint64_t>(number)) {}
   constexpr Cell(std::string_view text) : text_(text) {}
   constexpr Cell(const char* text) : text_(text) {}
 
@@ -39,12 +39,6 @@ class Cell {
   constexpr std::string_view text() const { return text_; }
 
  private:
-  template <std::integral T>
-  static constexpr uint64_t Widen(T number) {
-    if constexpr (std::signed_integral<T>) return static_cast<uint64_t>(int64_t{number});
-    return number;
-  }
-
   uint64_t number_ = 0;
   std::string_view text_;
 };

@@ -4,8 +4,8 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <initializer_list>
 #include <memory>
+#include <utility>
 
 #include "framework/status.h"
 #include "knvlibs/include/knvlibs/ksi.h"
@@ -22,17 +22,22 @@ using ParamList = std::unique_ptr<KSI_ParamList, ParamListDestroyer>;
 // A key that selects one instance on one level of the tree.
 class Key {
  public:
-  Key(uint64_t number) : number_(number) {}  // NOLINT(google-explicit-constructor)
-  Key(const char* text) : text_(text) {}     // NOLINT(google-explicit-constructor)
+  Key() = default;
+  Key(uint64_t number) : number_(number), kind_(Kind::number) {}
+  Key(const char* text) : text_(text), kind_(Kind::text) {}
 
+  bool given() const { return kind_ != Kind::none; }
   Status AddTo(KSI_ParamList* list) const {
-    return text_ != nullptr ? KSI_ParamListAddString(list, text_)
-                            : KSI_ParamListAddInt(list, number_);
+    return kind_ == Kind::text ? KSI_ParamListAddString(list, text_)
+                               : KSI_ParamListAddInt(list, number_);
   }
 
  private:
+  enum class Kind : uint8_t { none, number, text };
+
   uint64_t number_ = 0;
   const char* text_ = nullptr;
+  Kind kind_ = Kind::none;
 };
 
 // Where a keyed read stopped; each reader has its own words for each.
@@ -43,26 +48,29 @@ struct ReadResult {
   ReadStep step;
 };
 
-// The keys of one read, and what becomes of them.
+// The parameter list of one read, and what becomes of its keys.
 struct KeyList {
   int capacity;
-  std::initializer_list<Key> keys = {};
+  Key first = {};
+  Key second = {};
   bool removeKeys = false;  // take the keys out again before the list is destroyed
 };
 
 // Calls `read` with a list made of the keys and destroys the list, whatever the status.
 template <class Read>
-ReadResult KeyedRead(const KeyList& keyList, Read read) {
-  const ParamList list(KSI_ParamListCreate(1, keyList.capacity));
+ReadResult KeyedRead(const KeyList& keys, Read read) {
+  const ParamList list(KSI_ParamListCreate(1, keys.capacity));
   if (!list) return {kFailure, ReadStep::create};
-  ReadStep step = ReadStep::addFirstKey;
-  for (const Key& key : keyList.keys) {
+  int added = 0;
+  for (const auto& [key, step] : {std::pair{keys.first, ReadStep::addFirstKey},
+                                  std::pair{keys.second, ReadStep::addSecondKey}}) {
+    if (!key.given()) continue;
     if (Status status = key.AddTo(list.get())) return {status, step};
-    step = ReadStep::addSecondKey;
+    ++added;
   }
   const Status status = read(list.get());
-  if (keyList.removeKeys) {
-    for (size_t i = 0; i < keyList.keys.size(); ++i) KSI_ParamListRemoveLastParam(list.get());
+  if (keys.removeKeys) {
+    for (; added > 0; --added) KSI_ParamListRemoveLastParam(list.get());
   }
   return {status, status == kSuccess ? ReadStep::done : ReadStep::read};
 }

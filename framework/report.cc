@@ -77,7 +77,8 @@ void ReportContextBase::PrintHead() const {
 
 void ReportContextBase::PrintTotal() {
   for (size_t i = 0; i < cells_.size(); ++i) {
-    cells_[i] = IsText(table_[i]) ? Cell("Total") : Cell(treatments_[i].total);
+    const uint64_t divisor = treatments_[i].inTotal == InTotal::mean && rows_ > 0 ? rows_ : 1;
+    cells_[i] = IsText(table_[i]) ? Cell("Total") : Cell(treatments_[i].total / divisor);
   }
   PrintDashes();
   PrintCells(true);
@@ -101,6 +102,7 @@ void ReportContextBase::AddColumn(const ColumnDesc& desc, InTotal inTotal, Conve
 }
 
 void ReportContextBase::AddUpCells() {
+  ++rows_;
   for (size_t i = 0; i < cells_.size(); ++i) {
     const uint64_t value = cells_[i].number();
     const bool known = treatments_[i].inTotal != InTotal::knownSum || value != kNoValue;

@@ -25,6 +25,7 @@ enum class InTotal : uint8_t {
   blank,
   sum,       // of the rows' figures, 64 bits wrapping; in a text column the label "Total"
   knownSum,  // of those figures that are not kNoValue
+  mean,      // the sum divided by the number of rows
 };
 
 // Whether -s can hide a column.
@@ -108,14 +109,16 @@ class ReportContextBase {
   std::vector<ColumnDesc> table_{ColumnDesc{}};  // with the null name at its end
   std::vector<Treatment> treatments_;
   std::vector<Cell> cells_;
+  uint64_t rows_ = 0;  // added up so far
 };
 
-// One run of a report on `Row`s.
-template <class Row>
+// One run of a report on `Row`s. A report that says more of a column than others do has a
+// `ColumnOfRow` of its own, derived from Column.
+template <class Row, class ColumnOfRow = Column<Row>>
 class ReportContext : public ReportContextBase {
  public:
   // `frame` and `columns` outlive the context.
-  ReportContext(const ReportFrame& frame, std::span<const Column<Row>> columns)
+  ReportContext(const ReportFrame& frame, std::span<const ColumnOfRow> columns)
       : ReportContextBase(frame), columns_(columns) {
     for (const Column<Row>& column : columns_) {
       AddColumn({.name = column.name,
@@ -147,7 +150,7 @@ class ReportContext : public ReportContextBase {
     for (size_t i = 0; i < columns_.size(); ++i) cells()[i] = columns_[i].value(row);
   }
 
-  std::span<const Column<Row>> columns_;
+  std::span<const ColumnOfRow> columns_;
 };
 
 }  // namespace tally

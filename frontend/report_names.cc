@@ -6,7 +6,21 @@ namespace tally {
 namespace {
 
 constexpr ReportName reportNames[] = {
+    {"group-stats", TallyGroupStats},
+    {"vm-stats", TallyVMStats},
+    {"uw-stats", TallyUWStats},
+    {"pshare-stats", TallyPShareStats},
+    {"pshareHint-stats", TallyPShareHintStats},
+    {"swap-stats", TallySwapStats},
+    {"buddy-stats", TallyBuddyStats},
     {"comp-stats", TallyCompStats},
+    {"lpool-stats", TallyLPoolStats},
+    {"heap-stats", TallyHeapStats},
+    {"guest-stats", TallyGuestStats},
+    {"zip-stats", TallyZipStats},
+    {"lpage-stats", TallyLPageStats},
+    {"asyncremap-stats", TallyAsyncRemapStats},
+    {"pmem-stats", TallyPMemStats},
 };
 
 }  // namespace

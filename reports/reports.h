@@ -9,7 +9,21 @@ namespace tally {
 
 using ReportEntry = Status (*)(int argc, char** argv);
 
+Status TallyGroupStats(int argc, char** argv);
+Status TallyVMStats(int argc, char** argv);
+Status TallyUWStats(int argc, char** argv);
+Status TallyPShareStats(int argc, char** argv);
+Status TallyPShareHintStats(int argc, char** argv);
+Status TallySwapStats(int argc, char** argv);
+Status TallyBuddyStats(int argc, char** argv);
 Status TallyCompStats(int argc, char** argv);
+Status TallyLPoolStats(int argc, char** argv);
+Status TallyHeapStats(int argc, char** argv);
+Status TallyGuestStats(int argc, char** argv);
+Status TallyZipStats(int argc, char** argv);
+Status TallyLPageStats(int argc, char** argv);
+Status TallyAsyncRemapStats(int argc, char** argv);
+Status TallyPMemStats(int argc, char** argv);
 
 }  // namespace tally
 

@@ -5,10 +5,10 @@
 // keeps and the state are sched/globalStats/memory/tally; the entries into a state are counted from
 // sched/globalStats/memory/stateTransitions, which tells for each state how often it was left.
 
-#include "framework/param_list.h"
 #include "framework/report.h"
 #include "knvlibs/include/knvlibs/ksi_nodes.h"
 #include "knvlibs/include/knvlibs/ksi_records.h"
+#include "reports/host/host_record.h"
 #include "reports/reports.h"
 
 namespace tally {
@@ -87,31 +87,21 @@ constexpr Column<CompRow> kColumns[] = {
      }},
 };
 
-Status WarnOfCreate(const char* step, const ReadResult& result) {
-  if (result.step == ReadStep::create) {
-    Warning("%s: KSI_ParamListCreate() failure\n", step);
-  }
-  return result.status;
-}
-
 Status TallyCompGetMemMapStats(CompRow& row) {
-  return WarnOfCreate(
-      "TallyCompGetMemMapStats",
-      KeyedGet(KSI_NODE_memory_comprehensive, {.capacity = 1}, &row.memory, sizeof row.memory));
+  return ReadHostRecord("TallyCompGetMemMapStats", KSI_NODE_memory_comprehensive, {.capacity = 1},
+                        row.memory);
 }
 
 Status TallyCompGetGlobalTally(CompRow& row) {
   constexpr const char* kStep = "TallyCompGetGlobalTally";
-  if (Status status =
-          WarnOfCreate(kStep, KeyedGet(KSI_NODE_sched_globalStats_memory_tally, {.capacity = 1},
-                                       &row.tally, sizeof row.tally))) {
+  if (Status status = ReadHostRecord(kStep, KSI_NODE_sched_globalStats_memory_tally,
+                                     {.capacity = 1}, row.tally)) {
     return status;
   }
   for (uint32_t state = kHigh; state < kUnknown; ++state) {
-    if (Status status =
-            WarnOfCreate(kStep, KeyedGet(KSI_NODE_sched_globalStats_memory_stateTransitions,
-                                         {.capacity = 2, .keys = {memStateNames[state]}},
-                                         &row.transitions[state], sizeof row.transitions[state]))) {
+    if (Status status = ReadHostRecord(kStep, KSI_NODE_sched_globalStats_memory_stateTransitions,
+                                       {.capacity = 2, .first = memStateNames[state]},
+                                       row.transitions[state])) {
       return status;
     }
   }

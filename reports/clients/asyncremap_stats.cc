@@ -1,0 +1,148 @@
+// asyncremap-stats: one row for each remap type of each memory client of the user worlds, on the
+// pages that the kernel remaps in the background (memClients/remapTypes, by client and type). The
+// counts arrive in pages. The walk is always as deep as it can be.
+
+#include <string_view>
+
+#include "framework/param_list.h"
+#include "framework/return_status.h"
+#include "knvlibs/include/knvlibs/ksi_nodes.h"
+#include "knvlibs/include/knvlibs/ksi_records.h"
+#include "reports/clients/client_report.h"
+#include "reports/reports.h"
+
+namespace tally {
+namespace {
+
+constexpr ReportFrame kFrame = {
+    .title = "ASYNC_REMAP STATS",
+    .ruleLength = 43,
+    .options = "g:s:u:vq",
+};
+
+struct RemapRow {
+  std::string_view name;  // of the group
+  int32_t grpLeader;      // the memory client
+  const char* type;
+  KSI_RemapType pages;
+};
+
+constexpr InTotal kSum = InTotal::sum;
+constexpr InTotal kBlank = InTotal::blank;
+
+// No identity column has a cell in the Total row: it bears no label.
+constexpr Column<RemapRow> kColumns[] = {
+    {"name", "Group name", 27, "s", kBlank, nullptr,
+     [](const RemapRow& row) -> Cell { return row.name; }},
+    {"grpLeader", "Group leader ID", 10, "d", kBlank, nullptr,
+     [](const RemapRow& row) -> Cell { return row.grpLeader; }},
+    {"type", "Type of remap", 28, "s", kBlank, nullptr,
+     [](const RemapRow& row) -> Cell { return row.type; }, Fixed::yes},
+    {"added", "Total number of pages ever added", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.added); }},
+    {"prepared", "Number of pages ever prepared", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.prepared); }},
+    {"filtered", "Number of pages ever filtered", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.filtered); }},
+    {"staged", "Number of pages ever staged", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.staged); }},
+    {"remapped", "Total number of pages ever remapped", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.remapped); }},
+    {"canceled", "Total number of pages ever canceled", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.canceled); }},
+    {"cUnprepared", "Number of pages currently unprepared", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cUnprepared); }},
+    {"cPrepared", "Number of pages currently prepared", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cPrepared); }},
+    {"cStaged", "Number of pages currently staged", 10, "Lu", kSum, FromKilobytes,
+     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cStaged); }},
+};
+
+// Failures carry a number that support staff look up; it does not move with the source.
+Status WarnAt(const char* function, unsigned number, Status status) {
+  Warning("%s:%u failure: %s\n", function, number, KNV_ReturnStatusToString(status));
+  return status;
+}
+
+// A memory client's id is signed and widened with its sign.
+Key ClientKey(int32_t client) { return static_cast<uint64_t>(int64_t{client}); }
+
+Status TallyAsyncRemapGetStats(int32_t client, const char* type, KSI_RemapType& pages) {
+  constexpr const char* kFunction = "TallyAsyncRemapGetStats";
+  const ReadResult result =
+      KeyedGet(KSI_NODE_sched_memClients_remapTypes,
+               {.capacity = 2, .first = ClientKey(client), .second = type}, &pages, sizeof pages);
+  if (result.step == ReadStep::addFirstKey) WarnAt(kFunction, 137, result.status);
+  if (result.step == ReadStep::addSecondKey) WarnAt(kFunction, 138, result.status);
+  if (result.step == ReadStep::read) WarnAt(kFunction, 140, result.status);
+  return result.status;
+}
+
+// Prints the rows of one memory client.
+Status TallyAsyncRemapReportCallbackInt(ReportContext<RemapRow>& context, RemapRow& row) {
+  constexpr const char* kFunction = "TallyAsyncRemapReportCallbackInt";
+  ParamList types;
+  const ReadResult result = KeyedList(KSI_NODE_sched_memClients_remapTypes,
+                                      {.capacity = 1, .first = ClientKey(row.grpLeader)}, types);
+  if (result.step == ReadStep::addFirstKey) WarnAt(kFunction, 303, result.status);
+  if (result.step == ReadStep::read) WarnAt(kFunction, 305, result.status);
+  if (result.status != kSuccess) return result.status;
+
+  const uint32_t count = KSI_ParamListUsedCount(types.get());
+  for (uint32_t i = 0; i < count; ++i) {
+    if (Status status = KSI_ParamListGetString(types.get(), i, &row.type)) {
+      return WarnAt(kFunction, 308, status);
+    }
+    if (Status status = TallyAsyncRemapGetStats(row.grpLeader, row.type, row.pages)) {
+      return WarnAt(kFunction, 310, status);
+    }
+    context.PrintRow(row);
+  }
+  return kSuccess;
+}
+
+// Prints the rows of one user world's memory clients.
+Status TallyAsyncRemapReportCallback(uint64_t gid, uint32_t /*childCount*/, int /*csvMode*/,
+                                     void* opaque) {
+  constexpr const char* kFunction = "TallyAsyncRemapReportCallback";
+  uint32_t flags = 0;
+  KSI_GroupName name;
+  Status status = kSuccess;
+  if ((status = Tally_GroupGetFlags(gid, flags)) || (flags & KSI_GROUP_USER_WORLD) == 0) {
+    return status;
+  }
+  if ((status = Tally_GroupGetName(gid, name))) return status;
+
+  ParamList clients;
+  const ReadResult result =
+      KeyedList(KSI_NODE_sched_groups_members_memClients, {.capacity = 1, .first = gid}, clients);
+  if (result.step == ReadStep::addFirstKey) WarnAt(kFunction, 394, result.status);
+  if (result.step == ReadStep::read) WarnAt(kFunction, 396, result.status);
+  if (result.status != kSuccess) return result.status;
+
+  RemapRow row;
+  // One character less than the field: the row's name was made for a terminator.
+  row.name = FixedText(name.text).substr(0, sizeof name.text - 1);
+  const uint32_t count = KSI_ParamListUsedCount(clients.get());
+  for (uint32_t i = 0; i < count; ++i) {
+    uint32_t client = 0;
+    if ((status = KSI_ParamListGetUInt32(clients.get(), i, &client))) {
+      return WarnAt(kFunction, 401, status);
+    }
+    row.grpLeader = static_cast<int32_t>(client);
+    if ((status = TallyAsyncRemapReportCallbackInt(*static_cast<ReportContext<RemapRow>*>(opaque),
+                                                   row))) {
+      return WarnAt(kFunction, 403, status);
+    }
+  }
+  return kSuccess;
+}
+
+}  // namespace
+
+Status TallyAsyncRemapStats(int argc, char** argv) {
+  ReportContext<RemapRow> context(kFrame, kColumns);
+  return RunClientReport(context, TallyAsyncRemapReportCallback, argc, argv);
+}
+
+}  // namespace tally

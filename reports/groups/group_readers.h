@@ -1,0 +1,58 @@
+// The readers of one group's and one memory client's data. Each returns the status of what failed,
+// after its message.
+#ifndef REPORTS_GROUPS_GROUP_READERS_H_
+#define REPORTS_GROUPS_GROUP_READERS_H_
+
+#include <cstddef>
+#include <cstdint>
+
+#include "framework/param_list.h"
+#include "framework/status.h"
+#include "knvlibs/include/knvlibs/ksi_records.h"
+
+namespace tally {
+
+// Reads a record of a group. The status of the read itself is the caller's to word.
+Status TallyGroupKsiGet(uint64_t groupId, uint16_t node, void* buffer, size_t size);
+
+// Reads a record of a memory client; ids are widened with their sign. The status of the read itself
+// is the caller's to word.
+Status Tally_MemClientKsiGet(int32_t clientId, uint16_t node, void* buffer, size_t size);
+
+Status Tally_GroupGetName(uint64_t groupId, KSI_GroupName& name);
+Status Tally_GroupGetTag(uint64_t groupId, KSI_GroupTag& tag);
+Status Tally_GroupGetParentID(uint64_t groupId, int64_t& parentId);
+Status Tally_GroupGetFlags(uint64_t groupId, uint32_t& flags);
+Status Tally_GroupGetAlloc(uint64_t groupId, KSI_GroupAllocation& allocation);
+Status TallyGroupGetCapacity(uint64_t groupId, KSI_GroupCapacity& capacity);
+Status TallyGroupGetMemoryStats(uint64_t groupId, KSI_GroupMemoryStats& stats);
+
+// The world group that leads a virtual machine's or user world's group; kBadParameter, without a
+// message, for any other group.
+Status Tally_GroupGetGroupLeaderID(uint64_t groupId, int32_t& leader);
+
+// A virtual machine's allocation in kilobytes: reservation and limit are those of its VMM.
+struct VmmAlloc {
+  int64_t min;
+  int64_t max;
+  int32_t shares;
+  int64_t minLimit;
+};
+
+// Puts a virtual machine's allocation together from its group and the group's first child flagged
+// "vmm"; kNotFound, without a message, when there is no such child.
+Status Tally_GroupGetVMMAlloc(uint64_t groupId, VmmAlloc& record);
+
+Status Tally_MemClientGetTotalCommonStats(int32_t clientId, KSI_CommonTally& stats);
+
+// The leader of the VMM of a virtual machine's world group.
+Status Tally_GetVmmLeaderID(int32_t clientId, int32_t& vmmLeader);
+
+// Lists a group's child groups. Messages begin with the `caller`; one of a list that cannot be read
+// names the `listCall`.
+Status ListChildGroups(const char* caller, const char* listCall, uint64_t groupId,
+                       ParamList& children);
+
+}  // namespace tally
+
+#endif  // REPORTS_GROUPS_GROUP_READERS_H_

@@ -1,0 +1,28 @@
+#include "reports/groups/group_walk.h"
+
+#include "framework/param_list.h"
+#include "reports/groups/group_readers.h"
+
+namespace tally {
+Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
+                           GroupVisitor visitor, void* context) {
+  ParamList children;
+  if (Status status = ListChildGroups("TallyTraverseGroups", "KSI_GetInstanceListAlloc",
+                                      startGroupId, children)) {
+    return status;
+  }
+  const uint32_t childCount = KSI_ParamListUsedCount(children.get());
+  const Status visited = visitor(startGroupId, childCount, mode, context);
+  if (visited != kSuccess || levels == 1) return visited;
+
+  Status listed = kSuccess;
+  for (uint32_t i = 0; i < childCount; ++i) {
+    int64_t child = 0;
+    listed = KSI_ParamListGetInt64(children.get(), i, &child);
+    if (listed != kSuccess) continue;
+    TallyTraverseGroups(static_cast<uint64_t>(child), levels - 1, mode, visitor, context);
+  }
+  return listed;
+}
+
+}  // namespace tally

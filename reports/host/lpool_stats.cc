@@ -1,0 +1,183 @@
+// lpool-stats: one row for each pool of large pages, memory node by memory node: first the node's
+// page sharing pool (memory/lpage/nodeList/psharePool), then the pool of each virtual machine on it
+// (memory/lpage/nodeList/vmPools). Figures are counts of 4 KB and 2 MB pages.
+
+#include <cstdio>
+#include <string_view>
+
+#include "framework/param_list.h"
+#include "framework/report.h"
+#include "knvlibs/include/knvlibs/ksi_nodes.h"
+#include "knvlibs/include/knvlibs/ksi_records.h"
+#include "reports/reports.h"
+
+namespace tally {
+namespace {
+
+constexpr ReportFrame kFrame = {
+    .title = "LPAGE POOL STATS",
+    .ruleLength = 43,
+    .options = "s:vq",
+};
+
+struct LPoolRow {
+  std::string_view name;
+  uint32_t nodeID;
+  KSI_LargePagePool pool;
+};
+
+constexpr InTotal kSum = InTotal::sum;
+constexpr InTotal kBlank = InTotal::blank;
+
+// The peaks are added up like the counters.
+constexpr Column<LPoolRow> kColumns[] = {
+    {"name", "Large page pool name", 15, "s", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.name; }, Fixed::yes},
+    {"nodeID", "Home memory node the pool", 7, "u", kBlank, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.nodeID; }},
+    {"nrLPages", "# of large pages in the pool", 16, "u", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrLPages; }},
+    {"nrFreeSPages", "# of small pages free", 16, "u", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrFreeSPages; }},
+    {"nrSPageAllocs", "Total small page alloc count", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrSPageAllocs; }},
+    {"nrSPageFrees", "Total small page free count", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrSPageFrees; }},
+    {"nrReapAttempts", "Total reap attemts", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrReapAttempts; }},
+    {"nrSPagesReaped", "Total number of small pages reaped", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrSPagesReaped; }},
+    {"nrDefragAttempts", "Total large page defrag attempts", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrDefragAttempts; }},
+    {"nrDefragCancelled", "Total defrag attempts cancelled", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrDefragCancelled; }},
+    {"nrDefragReaped", "Total defrag attempts reaped", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrDefragReaped; }},
+    {"nrLPagesDefragged", "Total number of large pages defragged", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrLPagesDefragged; }},
+    {"peakDefragAttempts", "Peak defrag attempts for any large page", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.peakDefragAttempts; }},
+    {"nrCachehit", "Hit count in lpage victim cache", 16, "Lu", kSum, nullptr,
+     [](const LPoolRow& row) -> Cell { return row.pool.nrCachehit; }},
+};
+
+using LPoolContext = ReportContext<LPoolRow>;
+
+// Reads a pool; failures are worded with the reader's name, but a failed read always with the
+// virtual machines' one.
+Status ReadPool(const char* reader, uint16_t node, const KeyList& keys, KSI_LargePagePool& pool) {
+  const ReadResult result = KeyedGet(node, keys, &pool, sizeof pool);
+  switch (result.step) {
+    case ReadStep::create:
+      Warning("%s: KSI_ParamListCreate() failure\n", reader);
+      break;
+    case ReadStep::addFirstKey:
+      Warning("%s: KSI_ParamListAddInt() failure, error code: %u\n", reader, result.status);
+      break;
+    case ReadStep::addSecondKey:
+      Warning("%s: KSI_ParamListAddString() failure, error code: %u\n", reader, result.status);
+      break;
+    case ReadStep::read:
+      Warning("TallyGetVmPoolStats() failure, error code: %u\n", result.status);
+      break;
+    default:
+      break;
+  }
+  return result.status;
+}
+
+Status TallyGetPSharePoolStats(uint32_t node, KSI_LargePagePool& pool) {
+  return ReadPool("TallyGetPSharePoolStats", KSI_NODE_memory_lpage_nodeList_psharePool,
+                  {.capacity = 1, .first = node}, pool);
+}
+
+Status TallyGetVmPoolStats(uint32_t node, const char* vmName, KSI_LargePagePool& pool) {
+  return ReadPool("TallyGetVmPoolStats", KSI_NODE_memory_lpage_nodeList_vmPools,
+                  {.capacity = 2, .first = node, .second = vmName}, pool);
+}
+
+Status ListVmPools(uint32_t node, uint32_t hint, ParamList& names) {
+  const ReadResult result = KeyedRead({.capacity = 2, .first = node}, [&](KSI_ParamList* list) {
+    KSI_ParamList* made = nullptr;
+    const Status status =
+        KSI_GetInstanceListAllocHint(KSI_NODE_memory_lpage_nodeList_vmPools, list, hint, &made);
+    if (status == kSuccess) names.reset(made);
+    return status;
+  });
+  switch (result.step) {
+    case ReadStep::create:
+      Warning("TallyTraverseLPools: KSI_ParamListCreate() failure\n");
+      break;
+    case ReadStep::addFirstKey:
+      Warning("TallyTraverseLPools: KSI_ParamListAddInt() failure, error code: %u\n",
+              result.status);
+      break;
+    case ReadStep::read:
+      Warning("TallyTraverseLPools: KSI_GetInstanceListAllocHint() failure\n");
+      break;
+    default:
+      break;
+  }
+  return result.status == kSuccess ? kSuccess : kFailure;
+}
+
+// Prints the pools of one memory node. A pool that cannot be read has no row.
+Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
+  LPoolRow row = {};
+  row.nodeID = node;
+  char psharePool[32];
+  std::snprintf(psharePool, sizeof psharePool, "%s%u", "pshare-", node);
+  row.name = psharePool;
+  if (TallyGetPSharePoolStats(node, row.pool) == kSuccess) context.PrintRow(row);
+
+  ParamList names;
+  if (Status status = ListVmPools(node, numVMs, names)) return status;
+  const uint32_t count = KSI_ParamListUsedCount(names.get());
+  for (uint32_t i = 0; i < count; ++i) {
+    const char* name = nullptr;
+    if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) {
+      Warning("TallyTraverseLPools: KSI_ParamListGetString() failure\n");
+      // A list that cannot be read any more is not handed back to the library.
+      static_cast<void>(names.release());
+      return kFailure;
+    }
+    row.name = name;
+    if (TallyGetVmPoolStats(node, name, row.pool) == kSuccess) context.PrintRow(row);
+  }
+  return kSuccess;
+}
+
+Status TallyTraverseLPools(LPoolContext& context) {
+  KSI_MemInfo memInfo;
+  if (KSI_Get(KSI_NODE_memory_memInfo, nullptr, &memInfo, sizeof memInfo) != kSuccess) {
+    Warning("TallyTraversLPools: KSI_Get hardwareInfo failure\n");
+    return kFailure;
+  }
+  uint32_t numVMs = 0;
+  if (KSI_Get(KSI_NODE_sched_globalStats_numVMs, nullptr, &numVMs, sizeof numVMs) != kSuccess) {
+    Warning("TallyTraversLPools: KSI_Get numVMs failure\n");
+    return kFailure;
+  }
+  for (uint32_t node = 0; node < memInfo.numNodes; ++node) {
+    if (Status status = PrintPools(node, numVMs, context)) return status;
+  }
+  return kSuccess;
+}
+
+}  // namespace
+
+Status TallyLPoolStats(int argc, char** argv) {
+  LPoolContext context(kFrame, kColumns);
+  if (Status status = context.Begin(argc, argv)) return status;
+  context.PrintTitleBlock();
+  context.PrintHead();
+  if (Status status = TallyTraverseLPools(context)) return status;
+  context.PrintTotal();
+  context.PrintDescriptions();
+  if (context.options().verbose) {
+    std::puts("Displayed stats are either in small 4K page (SPage) or large 2M page (LPage) units");
+  }
+  return kSuccess;
+}
+
+}  // namespace tally
