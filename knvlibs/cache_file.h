@@ -1,0 +1,70 @@
+// An open cache file, of which nothing is trusted.
+#ifndef KNVLIBS_CACHE_FILE_H_
+#define KNVLIBS_CACHE_FILE_H_
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "knvlibs/catalogue.h"
+#include "knvlibs/sqlite.h"
+#include "knvlibs/status.h"
+
+namespace ksi {
+
+enum class Kind : uint8_t { kValue, kList };
+
+class CacheFile {
+ public:
+  // What the file says of itself.
+  struct Capture {
+    std::string signature;  // of the kernel's definitions
+    std::string built;      // when they were built
+    std::string host;
+    std::string taken;  // "2026-11-21T10:00:00Z"
+  };
+
+  // A row of the table of nodes; `node` is null for one that the catalogue does not know.
+  struct NodeRow {
+    int64_t id;
+    const Node* node;
+    Kind kind;
+    std::string path;
+  };
+
+  // Opens a file. Its cost does not depend on the file's size. The status is
+  //   KSI_STATUS_NOT_FOUND, KSI_STATUS_PERMISSION_DENIED, KSI_STATUS_IS_A_DIRECTORY,
+  //   KSI_STATUS_INVALID_METADATA: not a cache file,
+  //   KSI_STATUS_MAJOR_VERSION_MISMATCH: of a newer schema,
+  //   KSI_STATUS_METADATA_READ_ERROR: damaged.
+  static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file);
+
+  const Capture& GetCapture() const { return capture_; }
+  const std::vector<NodeRow>& NodeRows() const { return nodes_; }
+
+  // The file's row for a node, null if it has none.
+  const NodeRow* FindRow(const Node& node, Kind kind) const;
+  const NodeRow* FindRow(int64_t id) const;
+
+  sqlite3* Handle() const { return database_.get(); }
+
+ private:
+  CacheFile() = default;
+
+  Status Configure();
+  Status CheckSchema();
+  Status ReadCapture();
+  Status ReadNodes();
+
+  Database database_;
+  Capture capture_;
+  std::vector<NodeRow> nodes_;  // in the order of their identifiers
+};
+
+// The status for a failed call of SQLite on a cache file.
+Status StatusOfSqlite(int code);
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_CACHE_FILE_H_

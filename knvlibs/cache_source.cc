@@ -1,0 +1,216 @@
+#include "knvlibs/cache_source.h"
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+
+#include "knvlibs/cache_format.h"
+
+namespace ksi {
+namespace {
+
+enum ReadingColumn { kKey1, kKey2, kNode, kStatus, kAnswer };
+
+// More readings than a catalogue has nodes are damage.
+constexpr size_t kMostReadings = 256;
+
+constexpr Key kAbsent{KeyKind::kText, 0, {}};
+
+// The keys of an object as the file has them.
+const Key& KeyAt(const Keys& keys, size_t i) { return i < keys.count ? keys[i] : kAbsent; }
+
+int BindKeys(Statement& statement, const Keys& keys) {
+  int code = SQLITE_OK;
+  for (size_t i = 0; i < kMaxKeys && code == SQLITE_OK; ++i) {
+    const Key& key = KeyAt(keys, i);
+    const int parameter = static_cast<int>(i) + 1;
+    code = key.kind == KeyKind::kNumber ? statement.Bind(parameter, key.number)
+                                        : statement.Bind(parameter, key.text);
+  }
+  return code;
+}
+
+bool ColumnIs(const Statement& row, int column, const Key& key) {
+  return key.kind == KeyKind::kNumber
+             ? row.Type(column) == SQLITE_INTEGER && row.Number(column) == key.number
+             : row.Type(column) == SQLITE_TEXT && row.Text(column) == key.text;
+}
+
+}  // namespace
+
+bool CacheSource::OwnKey::Is(const Key& key) const {
+  return kind == key.kind && (kind == KeyKind::kNumber ? number == key.number : text == key.text);
+}
+
+void CacheSource::OwnKey::Take(const Key& key) {
+  kind = key.kind;
+  number = key.number;
+  text = key.text;
+}
+
+Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* out) {
+  std::unique_ptr<CacheSource> source(new CacheSource);
+  const Status status = CacheFile::Open(fileName, &source->file_);
+  if (status != kOk) return status;
+
+  for (auto& ids : source->ids_) ids.assign(Catalogue().size(), -1);
+  for (const CacheFile::NodeRow& row : source->file_->NodeRows()) {
+    if (row.node == nullptr) continue;
+    source->ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
+  }
+
+  sqlite3* database = source->file_->Handle();
+  int code = source->cursor_.Prepare(
+      database,
+      "SELECT key1, key2, node, status, answer FROM reading WHERE (key1, key2) >= (?1, ?2) "
+      "ORDER BY key1, key2, node");
+  if (code == SQLITE_OK) {
+    code = source->entries_.Prepare(
+        database,
+        "SELECT position, entry FROM instance WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 "
+        "ORDER BY position");
+  }
+  if (code != SQLITE_OK) return StatusOfSqlite(code);
+  *out = std::move(source);
+  return kOk;
+}
+
+Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
+  const Object* object = nullptr;
+  const Reading* reading = nullptr;
+  const Status status = Find(node, Kind::kValue, keys, &object, &reading);
+  if (status != kOk) return status;
+  if (reading->type != SQLITE_BLOB || reading->size != record.size()) {
+    return KSI_STATUS_LENGTH_MISMATCH;
+  }
+  std::memcpy(record.data(), object->bytes.data() + reading->offset, record.size());
+  return kOk;
+}
+
+Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
+  const Object* object = nullptr;
+  const Reading* reading = nullptr;
+  Status status = Find(node, Kind::kList, keys, &object, &reading);
+  if (status != kOk) return status;
+  if (reading->type != SQLITE_INTEGER) return KSI_STATUS_METADATA_READ_ERROR;
+  const int64_t count = reading->number;
+  if (count == 0) return kOk;
+
+  const bool numbers = KindOf(node.entries) == KeyKind::kNumber;
+  int64_t position = 0;
+  int code = BindKeys(entries_, keys);
+  if (code == SQLITE_OK) code = entries_.Bind(3, reading->node);
+  if (code == SQLITE_OK) {
+    while (status == kOk && (code = entries_.Step()) == SQLITE_ROW) {
+      if (position == count || entries_.Number(0) != position++) {
+        status = KSI_STATUS_METADATA_READ_ERROR;
+      } else if (numbers && entries_.Type(1) == SQLITE_INTEGER) {
+        status = instances.AddNumber(static_cast<uint64_t>(entries_.Number(1)));
+      } else if (!numbers && entries_.Type(1) == SQLITE_TEXT &&
+                 entries_.Text(1).find('\0') == std::string_view::npos) {
+        status = instances.AddText(entries_.Text(1));
+      } else {
+        status = KSI_STATUS_METADATA_READ_ERROR;
+      }
+    }
+  }
+  entries_.Reset();
+  if (status == kOk) status = StatusOfSqlite(code);
+  if (status == kOk && position != count) status = KSI_STATUS_METADATA_READ_ERROR;
+  return status;
+}
+
+Definitions CacheSource::KernelDefinitions() const {
+  const CacheFile::Capture& capture = file_->GetCapture();
+  return {capture.signature, capture.built};
+}
+
+// The reading of a node's value or list; one that failed when it was captured fails again.
+Status CacheSource::Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
+                         const Reading** reading) {
+  const int64_t id = ids_[static_cast<size_t>(kind)][IdOf(node) - 1u];
+  if (id < 0) return KSI_STATUS_NOT_FOUND;
+  const Status status = FindObject(keys, object);
+  if (status != kOk) return status;
+  const std::vector<Reading>& readings = (*object)->readings;
+  const auto found = std::ranges::find(readings, id, &Reading::node);
+  if (found == readings.end()) return KSI_STATUS_NOT_FOUND;
+  *reading = &*found;
+  return found->status;
+}
+
+Status CacheSource::FindObject(const Keys& keys, const Object** out) {
+  for (Object& object : objects_) {
+    if (object.valid && object.keys[0].Is(KeyAt(keys, 0)) && object.keys[1].Is(KeyAt(keys, 1))) {
+      *out = &object;
+      return kOk;
+    }
+  }
+  Object& object = objects_[oldest_];
+  object.valid = false;
+  const Status status = Load(keys, object);
+  if (status != kOk) {
+    cursor_.Reset();
+    onRow_ = false;
+    return status;
+  }
+  for (size_t i = 0; i < kMaxKeys; ++i) object.keys[i].Take(KeyAt(keys, i));
+  object.valid = true;
+  oldest_ = (oldest_ + 1) % objects_.size();
+  *out = &object;
+  return kOk;
+}
+
+Status CacheSource::Load(const Keys& keys, Object& object) {
+  object.readings.clear();
+  object.bytes.clear();
+  Status status = CursorAt(keys) ? kOk : SeekCursor(keys);
+  for (; status == kOk && CursorAt(keys); status = StepCursor()) {
+    Reading reading{};
+    reading.node = cursor_.Number(kNode);
+    // Rows in order end: a damaged tree that leads back to itself does not.
+    if (!object.readings.empty() &&
+        (reading.node <= object.readings.back().node || object.readings.size() == kMostReadings)) {
+      return KSI_STATUS_METADATA_READ_ERROR;
+    }
+    const int64_t recorded = cursor_.Number(kStatus);
+    if (cursor_.Type(kStatus) != SQLITE_INTEGER || recorded < 0 ||
+        recorded > std::numeric_limits<Status>::max()) {
+      return KSI_STATUS_METADATA_READ_ERROR;
+    }
+    reading.status = static_cast<Status>(recorded);
+    reading.type = cursor_.Type(kAnswer);
+    if (reading.type == SQLITE_INTEGER) {
+      reading.number = cursor_.Number(kAnswer);
+    } else if (reading.type == SQLITE_BLOB) {
+      const std::span<const std::byte> blob = cursor_.Blob(kAnswer);
+      reading.offset = object.bytes.size();
+      reading.size = blob.size();
+      if (blob.size() <= kMaxRecordSize) {  // a larger one is no node's
+        object.bytes.insert(object.bytes.end(), blob.begin(), blob.end());
+      }
+    }
+    object.readings.push_back(reading);
+  }
+  return status;
+}
+
+Status CacheSource::StepCursor() {
+  const int code = cursor_.Step();
+  onRow_ = code == SQLITE_ROW;
+  return StatusOfSqlite(code);
+}
+
+// To the first row that is not before `keys`.
+Status CacheSource::SeekCursor(const Keys& keys) {
+  cursor_.Reset();
+  const int code = BindKeys(cursor_, keys);
+  return code == SQLITE_OK ? StepCursor() : StatusOfSqlite(code);
+}
+
+bool CacheSource::CursorAt(const Keys& keys) const {
+  return onRow_ && ColumnIs(cursor_, kKey1, KeyAt(keys, 0)) &&
+         ColumnIs(cursor_, kKey2, KeyAt(keys, 1));
+}
+
+}  // namespace ksi

@@ -1,0 +1,84 @@
+// Answers from a cache file.
+//
+// A report asks for many nodes of one object (a group, a client, a heap) before it goes on to the
+// next, and the file keeps an object's readings side by side. So the first read of an object takes
+// them all, and the reads after it are answered from memory; an object that follows the last one
+// in the file is read on without a search. The cost of a read depends on neither the number of
+// objects nor, much, on their order, and the memory is that of a few objects.
+#ifndef KNVLIBS_CACHE_SOURCE_H_
+#define KNVLIBS_CACHE_SOURCE_H_
+
+#include <array>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "knvlibs/cache_file.h"
+#include "knvlibs/source.h"
+
+namespace ksi {
+
+class CacheSource : public Source {
+ public:
+  // The statuses of CacheFile::Open.
+  static Status Open(const char* fileName, std::unique_ptr<CacheSource>* source);
+
+  // A key that the file does not have is KSI_STATUS_NOT_FOUND; a read that failed when it was
+  // captured fails with its status again.
+  Status Value(const Node& node, const Keys& keys, Buffer record) override;
+  Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
+  Definitions KernelDefinitions() const override;
+
+ private:
+  struct Reading {
+    int64_t node;  // its identifier in the file
+    Status status;
+    int type;        // SQLite's, of the answer
+    int64_t number;  // of an integer
+    size_t offset;   // of a blob, in Object::bytes
+    size_t size;
+  };
+
+  // A key as the file has it; an absent one is the empty text.
+  struct OwnKey {
+    KeyKind kind = KeyKind::kText;
+    int64_t number = 0;
+    std::string text;
+
+    bool Is(const Key& key) const;
+    void Take(const Key& key);
+  };
+
+  struct Object {
+    bool valid = false;
+    OwnKey keys[kMaxKeys];
+    std::vector<Reading> readings;
+    std::vector<std::byte> bytes;
+  };
+
+  CacheSource() = default;
+
+  Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
+              const Reading** reading);
+  Status FindObject(const Keys& keys, const Object** object);
+  Status Load(const Keys& keys, Object& object);
+  Status StepCursor();
+  Status SeekCursor(const Keys& keys);
+  bool CursorAt(const Keys& keys) const;
+
+  std::unique_ptr<CacheFile> file_;
+  // The identifiers that the nodes of the catalogue have in the file, -1: not in it.
+  std::array<std::vector<int64_t>, 2> ids_;
+
+  Statement cursor_;  // over all readings; on a row if onRow_
+  bool onRow_ = false;
+  Statement entries_;  // of one list
+
+  // The objects read last: a report alternates between a group, its client and its leader.
+  std::array<Object, 4> objects_;
+  size_t oldest_ = 0;
+};
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_CACHE_SOURCE_H_

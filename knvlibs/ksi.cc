@@ -1,0 +1,209 @@
+// The interface: checks what comes from outside, asks the source, and lets no exception out.
+#pragma GCC visibility push(default)
+#include "knvlibs/include/knvlibs/ksi.h"
+#pragma GCC visibility pop
+
+#include <algorithm>
+#include <array>
+#include <cstring>
+#include <memory>
+#include <new>
+
+#include "knvlibs/cache_source.h"
+#include "knvlibs/linux/linux_source.h"
+#include "knvlibs/param_list.h"
+#include "knvlibs/source.h"
+
+namespace ksi {
+namespace {
+
+// The source in use, made on first use and never destroyed: what the process ends with.
+constinit Source* currentSource = nullptr;
+
+Source& CurrentSource() {
+  if (currentSource == nullptr) currentSource = new LinuxSource("/");
+  return *currentSource;
+}
+
+// Runs one operation at the boundary.
+template <class Operation>
+Status Guarded(Operation&& operation) {
+  try {
+    return operation();
+  } catch (const std::bad_alloc&) {
+    return KSI_STATUS_NO_MEMORY;
+  } catch (...) {
+    return KSI_STATUS_FAILURE;
+  }
+}
+
+Status TakeKeys(const ParamList* list, const Keying& keying, Keys* keys) {
+  const size_t count = list == nullptr ? 0 : list->Count();
+  if (count != keying.Count()) return KSI_STATUS_BAD_PARAM_COUNT;
+  for (size_t i = 0; i < count; ++i) {
+    Key& key = keys->at[i];
+    key.kind = list->Kind(i);
+    if (key.kind != KindOf(keying.at[i])) return KSI_STATUS_BAD_PARAM_TYPE;
+    if (key.kind == KeyKind::kNumber) {
+      key.number = static_cast<int64_t>(list->Number(i));
+    } else {
+      key.text = list->Text(i);
+    }
+  }
+  keys->count = count;
+  return kOk;
+}
+
+Status Get(uint16_t id, const ParamList* list, void* buffer, size_t size) {
+  const Node* node = FindNode(id);
+  if (node == nullptr) return KSI_STATUS_INVALID_NODE;
+  if (!node->HasValue()) return KSI_STATUS_NO_HANDLER;
+  if (buffer == nullptr) return KSI_STATUS_BAD_PARAM;
+  if (size != node->recordSize) return KSI_STATUS_LENGTH_MISMATCH;
+  Keys keys;
+  Status status = TakeKeys(list, node->valueKeys, &keys);
+  if (status != kOk) return status;
+
+  std::array<std::byte, kMaxRecordSize> record;
+  std::memset(record.data(), 0, size);
+  status = CurrentSource().Value(*node, keys, Buffer(record).first(size));
+  if (status == kOk) std::memcpy(buffer, record.data(), size);
+  return status;
+}
+
+Status GetInstances(uint16_t id, const ParamList* list, ParamList& instances) {
+  const Node* node = FindNode(id);
+  if (node == nullptr) return KSI_STATUS_INVALID_NODE;
+  if (!node->HasList()) return KSI_STATUS_NO_HANDLER;
+  Keys keys;
+  const Status status = TakeKeys(list, node->listKeys, &keys);
+  return status == kOk ? CurrentSource().Instances(*node, keys, instances) : status;
+}
+
+Status GetInstanceListAlloc(uint16_t id, const ParamList* keys, uint32_t hint, ParamList** out) {
+  if (out == nullptr) return KSI_STATUS_BAD_PARAM;
+  // A hint is worth an allocation less, not the trust that so many will come.
+  constexpr uint32_t kLargestHint = 4096;
+  auto instances = std::make_unique<ParamList>(ParamList::kNoLimit);
+  instances->Reserve(std::min(hint, kLargestHint));
+  const Status status = GetInstances(id, keys, *instances);
+  if (status == kOk) *out = instances.release();
+  return status;
+}
+
+constexpr int kParamListVersion = 1;
+
+template <class Make>
+ParamList* CreateList(int version, int capacity, Make&& make) {
+  if (version != kParamListVersion || capacity < 0) return nullptr;
+  try {
+    return make(static_cast<size_t>(capacity));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
+// Reads entry `index` of `list` with `read` if it is there and of this kind.
+template <class Out, class Read>
+Status ReadEntry(const ParamList* list, uint32_t index, KeyKind kind, Out* out, Read&& read) {
+  if (list == nullptr || out == nullptr) return KSI_STATUS_BAD_PARAM;
+  if (index >= list->Count()) return KSI_STATUS_NOT_FOUND;
+  if (list->Kind(index) != kind) return KSI_STATUS_BAD_PARAM_TYPE;
+  *out = read();
+  return kOk;
+}
+
+}  // namespace
+}  // namespace ksi
+
+uint32_t KSI_UseCache(const char* fileName, int flags) {
+  return ksi::Guarded([&]() -> ksi::Status {
+    if (fileName == nullptr || flags != 0) return KSI_STATUS_BAD_PARAM;
+    std::unique_ptr<ksi::CacheSource> source;
+    const ksi::Status status = ksi::CacheSource::Open(fileName, &source);
+    if (status != ksi::kOk) return status;
+    delete ksi::currentSource;
+    ksi::currentSource = source.release();
+    return ksi::kOk;
+  });
+}
+
+uint32_t KSI_CheckSig(char* buildBuffer, size_t size, const char** appBuild) {
+  if (appBuild != nullptr) *appBuild = ksi::kDefinitions.built.data();
+  return ksi::Guarded([&]() -> ksi::Status {
+    const ksi::Definitions kernel = ksi::CurrentSource().KernelDefinitions();
+    Str_Strcpy(buildBuffer, kernel.built.data(), size);
+    if (buildBuffer == nullptr || size == 0 || appBuild == nullptr) return KSI_STATUS_BAD_PARAM;
+    return kernel.signature == ksi::kDefinitions.signature ? ksi::kOk
+                                                           : KSI_STATUS_CHECKSUM_MISMATCH;
+  });
+}
+
+uint32_t KSI_Get(uint16_t node, struct KSI_ParamList* keys, void* buffer, size_t size) {
+  return ksi::Guarded([&] { return ksi::Get(node, keys, buffer, size); });
+}
+
+uint32_t KSI_GetInstanceList(uint16_t node, struct KSI_ParamList* keys,
+                             struct KSI_ParamList* list) {
+  return ksi::Guarded([&]() -> ksi::Status {
+    if (list == nullptr) return KSI_STATUS_BAD_PARAM;
+    ksi::ParamList instances(ksi::ParamList::kNoLimit);
+    const ksi::Status status = ksi::GetInstances(node, keys, instances);
+    return status == ksi::kOk ? list->Append(instances) : status;
+  });
+}
+
+uint32_t KSI_GetInstanceListAlloc(uint16_t node, struct KSI_ParamList* keys,
+                                  struct KSI_ParamList** list) {
+  return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(node, keys, 0, list); });
+}
+
+uint32_t KSI_GetInstanceListAllocHint(uint16_t node, struct KSI_ParamList* keys, uint32_t hint,
+                                      struct KSI_ParamList** list) {
+  return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(node, keys, hint, list); });
+}
+
+struct KSI_ParamList* KSI_ParamListCreate(int version, int capacity) {
+  return ksi::CreateList(version, capacity, [](size_t room) { return new ksi::ParamList(room); });
+}
+
+struct KSI_ParamList* KSI_ParamListCreateAndAllocateParams(int version, int capacity,
+                                                           size_t bytes) {
+  return ksi::CreateList(version, capacity,
+                         [&](size_t room) { return new ksi::ParamList(room, bytes); });
+}
+
+uint32_t KSI_ParamListAddInt(struct KSI_ParamList* list, uint64_t value) {
+  if (list == nullptr) return KSI_STATUS_BAD_PARAM;
+  return ksi::Guarded([&] { return list->AddNumber(value); });
+}
+
+uint32_t KSI_ParamListAddString(struct KSI_ParamList* list, const char* text) {
+  if (list == nullptr || text == nullptr) return KSI_STATUS_BAD_PARAM;
+  return ksi::Guarded([&] { return list->AddText(text); });
+}
+
+void KSI_ParamListRemoveLastParam(struct KSI_ParamList* list) {
+  if (list != nullptr) list->RemoveLast();
+}
+
+uint32_t KSI_ParamListUsedCount(struct KSI_ParamList* list) {
+  return list == nullptr ? 0 : static_cast<uint32_t>(list->Count());
+}
+
+uint32_t KSI_ParamListGetInt64(struct KSI_ParamList* list, uint32_t index, int64_t* out) {
+  return ksi::ReadEntry(list, index, ksi::KeyKind::kNumber, out,
+                        [&] { return static_cast<int64_t>(list->Number(index)); });
+}
+
+uint32_t KSI_ParamListGetUInt32(struct KSI_ParamList* list, uint32_t index, uint32_t* out) {
+  return ksi::ReadEntry(list, index, ksi::KeyKind::kNumber, out,
+                        [&] { return static_cast<uint32_t>(list->Number(index)); });
+}
+
+uint32_t KSI_ParamListGetString(struct KSI_ParamList* list, uint32_t index, const char** out) {
+  return ksi::ReadEntry(list, index, ksi::KeyKind::kText, out,
+                        [&] { return list->Text(index).data(); });
+}
+
+void KSI_ParamListDestroy(struct KSI_ParamList* list) { delete list; }

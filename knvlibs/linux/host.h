@@ -1,0 +1,49 @@
+// A Linux host: its kernel's files, below a root directory.
+#ifndef KNVLIBS_LINUX_HOST_H_
+#define KNVLIBS_LINUX_HOST_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <string>
+#include <string_view>
+
+#include "knvlibs/source.h"
+#include "knvlibs/status.h"
+
+namespace ksi {
+
+// What a figure is when the mechanism exists and its figure cannot be told.
+constexpr uint64_t kNoValue = ~uint64_t{0};
+
+class LinuxHost {
+ public:
+  // `root` is "/" for the machine itself, or the directory of a recorded tree.
+  explicit LinuxHost(std::string root);
+
+  // The whole of a file, named from the root ("/proc/meminfo").
+  Status Read(std::string_view file, std::string* content) const;
+
+  // The size of a page in KB. Recorded trees are taken to come from a machine with pages of the
+  // same size.
+  uint64_t PageKB() const { return pageKB_; }
+
+ private:
+  std::string root_;  // without its last '/'
+  uint64_t pageKB_;
+};
+
+// Warns that a line of a file (the first is 1) is not understood; returns the status for it.
+Status NotUnderstood(std::string_view file, size_t line);
+
+// Hands over a record as the bytes it is.
+template <class Record>
+Status Answer(Buffer buffer, const Record& record) {
+  if (buffer.size() != sizeof record) return KSI_STATUS_LENGTH_MISMATCH;
+  std::memcpy(buffer.data(), &record, sizeof record);
+  return kOk;
+}
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_LINUX_HOST_H_

@@ -1,0 +1,9 @@
+// The exported objects that hold the nodes' identifiers.
+#pragma GCC visibility push(default)
+#include "knvlibs/include/knvlibs/ksi_nodes.h"
+#pragma GCC visibility pop
+
+#include "knvlibs/node_table.h"
+
+#define OBJECT(name, value, list) const uint16_t KSI_NODE_##name = ksi::node::name;
+KSI_NODE_TABLE(OBJECT)

@@ -1,0 +1,76 @@
+// What is needed of SQLite, with owners for its handles.
+#ifndef KNVLIBS_SQLITE_H_
+#define KNVLIBS_SQLITE_H_
+
+#include <sqlite3.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <string_view>
+#include <utility>
+
+namespace ksi {
+
+struct CloseDatabase {
+  void operator()(sqlite3* database) const { sqlite3_close(database); }
+};
+using Database = std::unique_ptr<sqlite3, CloseDatabase>;
+
+// A prepared statement. Calls give SQLite's result codes.
+class Statement {
+ public:
+  Statement() = default;
+  Statement(Statement&& other) noexcept : handle_(std::exchange(other.handle_, nullptr)) {}
+  Statement& operator=(Statement&& other) noexcept {
+    std::swap(handle_, other.handle_);
+    return *this;
+  }
+  ~Statement() { sqlite3_finalize(handle_); }
+
+  int Prepare(sqlite3* database, const char* sql) {
+    sqlite3_finalize(std::exchange(handle_, nullptr));
+    return sqlite3_prepare_v3(database, sql, -1, SQLITE_PREPARE_PERSISTENT, &handle_, nullptr);
+  }
+
+  // Parameters count from 1. A text is copied; a blob must live until the statement is stepped for
+  // the last time or bound anew.
+  int Bind(int parameter, int64_t number) { return sqlite3_bind_int64(handle_, parameter, number); }
+  int Bind(int parameter, std::string_view text) {
+    return sqlite3_bind_text(handle_, parameter, text.data() == nullptr ? "" : text.data(),
+                             static_cast<int>(text.size()), SQLITE_TRANSIENT);
+  }
+  int Bind(int parameter, std::span<const std::byte> blob) {
+    return sqlite3_bind_blob(handle_, parameter, blob.data(), static_cast<int>(blob.size()),
+                             SQLITE_STATIC);
+  }
+  int BindNull(int parameter) { return sqlite3_bind_null(handle_, parameter); }
+
+  // SQLITE_ROW, SQLITE_DONE or an error.
+  int Step() { return sqlite3_step(handle_); }
+  void Reset() { sqlite3_reset(handle_); }
+
+  // Columns of the row count from 0; views are good until the next step.
+  int Type(int column) const { return sqlite3_column_type(handle_, column); }
+  int64_t Number(int column) const { return sqlite3_column_int64(handle_, column); }
+  std::string_view Text(int column) const {
+    const auto* text = reinterpret_cast<const char*>(sqlite3_column_text(handle_, column));
+    return text == nullptr ? std::string_view() : std::string_view(text, Size(column));
+  }
+  std::span<const std::byte> Blob(int column) const {
+    const auto* blob = static_cast<const std::byte*>(sqlite3_column_blob(handle_, column));
+    return blob == nullptr ? std::span<const std::byte>() : std::span(blob, Size(column));
+  }
+
+ private:
+  size_t Size(int column) const {
+    return static_cast<size_t>(sqlite3_column_bytes(handle_, column));
+  }
+
+  sqlite3_stmt* handle_ = nullptr;
+};
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_SQLITE_H_
