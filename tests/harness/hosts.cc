@@ -9,6 +9,9 @@ namespace {
 
 constexpr uint64_t kStep = 1024;  // so that figures differ in every unit
 
+// What "mapped" has more than its number: reports subtract other figures from it.
+constexpr uint64_t kMoreMapped = 1000000;
+
 // Puts the next number of the row into the fields at these offsets.
 template <class Field, class Record>
 void Number(Record& record, uint64_t& next, std::initializer_list<size_t> offsets) {
@@ -50,6 +53,7 @@ KSI_VmmTally NumberedVmmTally(uint64_t first) {
       {AT(memSizeLimit), AT(memSize), AT(touched), AT(allocTgt), AT(vpmemRO), AT(vpmemUC),
        AT(llswapped), AT(zipSaved), AT(shared), AT(zero), AT(llswapUsed), AT(mapped), AT(zipped),
        AT(vpmemRW), AT(sharedSaved), AT(swapTgt), AT(ballooned), AT(balloonTgt)});
+  record.mapped += kMoreMapped;
   record.swapScope = 2;
   record.useReliableMem = 1;
   record.balloonActive = 1;
@@ -67,6 +71,7 @@ KSI_UwTally NumberedUwTally(uint64_t first) {
        AT(vpmemRW),   AT(sharedSaved),    AT(swapTgt),   AT(totalResv),  AT(pinnedResv),
        AT(memBStore), AT(swapBStore),     AT(swappable), AT(pinned),     AT(cow),
        AT(pageable),  AT(pageableUnacct), AT(swapped),   AT(prealloced), AT(shm)});
+  record.mapped += kMoreMapped;
   record.swapScope = 2;
   record.useReliableMem = 1;
   return record;

@@ -12,7 +12,8 @@
 namespace harness {
 
 // Records whose memory figures, in the order of the record, are `first` KB and each next one
-// 1024 KB more; counts go on in the same row. What is no amount and no count is 0.
+// 1024 KB more; counts go on in the same row. `mapped` has another 1000000 KB, since reports
+// subtract from it. Flags are set.
 KSI_GroupMemoryStats NumberedMemoryStats(uint64_t first);
 KSI_GroupCapacity NumberedCapacity(uint64_t first);
 KSI_VmmTally NumberedVmmTally(uint64_t first);
