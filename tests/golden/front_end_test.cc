@@ -1,6 +1,8 @@
 // The front end: its options, the cache file, the signature check and the exit status.
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <cctype>
 #include <fstream>
 #include <sstream>
 #include <string>
@@ -100,6 +102,46 @@ TEST(FrontEnd, FindsAReportInAnyCase) {
   }
   Expect(Host(), Short({"--report", "comp-stats"}), {kShortOutput, "", 0, "CheckSig()"});
   Expect(Host(), Short({"-rcomp-stats"}), {kShortOutput, "", 0, "CheckSig()"});
+}
+
+TEST(FrontEnd, RunsTheReportOfEachName) {
+  Scenario host = Host();
+  host.Fails("sched_groups_members_groups", {0}, 0xbad0003)
+      .Fails("memory_memInfo", {}, 0xbad0003)
+      .Fails("memory_pmem_volumes", {}, 0xbad0003)
+      .Value("memory_pshare_stats", {}, NumberedPshareStats(1))
+      .List("system_buddy", {}, {})
+      .List("system_heaps", {}, {});
+  const struct {
+    const char* name;
+    const char* title;
+  } reports[] = {
+      {"group-stats", "GROUP STATS"},
+      {"vm-stats", "VIRTUAL MACHINE STATS"},
+      {"uw-stats", "USER-WORLD STATS"},
+      {"pshare-stats", "PSHARE STATS"},
+      {"pshareHint-stats", "PSHARE HINT STATS"},
+      {"swap-stats", "VIRTUAL MACHINE SWAP STATS"},
+      {"buddy-stats", "MEMMAP BUDDY STATS"},
+      {"comp-stats", "COMPREHENSIVE STATS"},
+      {"lpool-stats", "LPAGE POOL STATS"},
+      {"heap-stats", "HEAP STATS"},
+      {"guest-stats", "GUEST STATS"},
+      {"zip-stats", "VIRTUAL MACHINE COMPRESSION STATS"},
+      {"lpage-stats", "VIRTUAL MACHINE LARGE PAGE STATS"},
+      {"asyncremap-stats", "ASYNC_REMAP STATS"},
+      {"pmem-stats", "PERSISTENT MEMORY STATS"},
+  };
+  for (const auto& [name, title] : reports) {
+    std::string upper = name;
+    std::transform(upper.begin(), upper.end(), upper.begin(), toupper);
+    for (const std::string& word : {std::string(name), upper}) {
+      const TallyRun run = RunTally(host, {"-r", word});
+      EXPECT_TRUE(run.out.starts_with("\n " + std::string(title) + ": Sat Nov 21 10:00:00 2026\n"))
+          << word << "\n"
+          << run.out << run.err;
+    }
+  }
 }
 
 TEST(FrontEnd, LeavesWhatFollowsTheReportToTheReport) {
