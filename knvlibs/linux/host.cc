@@ -1,11 +1,13 @@
 #include "knvlibs/linux/host.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
 
 #include "knvlibs/include/knvlibs/ksi.h"
+#include "knvlibs/linux/text.h"
 
 namespace ksi {
 namespace {
@@ -25,6 +27,20 @@ class FileDescriptor {
 
  private:
   int fd_;
+};
+
+class Directory {
+ public:
+  explicit Directory(DIR* stream) : stream_(stream) {}
+  Directory(const Directory&) = delete;
+  Directory& operator=(const Directory&) = delete;
+  ~Directory() {
+    if (stream_ != nullptr) closedir(stream_);
+  }
+  DIR* get() const { return stream_; }
+
+ private:
+  DIR* stream_;
 };
 
 std::string WithoutLastSlash(std::string path) {
@@ -61,6 +77,33 @@ Status LinuxHost::Read(std::string_view file, std::string* content) const {
   }
   content->resize(length);
   return kOk;
+}
+
+Status LinuxHost::ReadNumber(std::string_view file, uint64_t* number) const {
+  std::string content;
+  const Status status = Read(file, &content);
+  if (status != kOk) return status;
+  Lines lines(content);
+  std::string_view line;
+  if (!lines.Next(&line) || !ParseNumber(line, number) || lines.Next(&line)) {
+    return NotUnderstood(file, 1);
+  }
+  return kOk;
+}
+
+Status LinuxHost::List(std::string_view directory, std::vector<std::string>* names) const {
+  std::string path = root_;
+  path += directory;
+  const Directory stream(opendir(path.c_str()));
+  if (stream.get() == nullptr) return StatusOfErrno(errno);
+
+  names->clear();
+  for (;;) {
+    errno = 0;
+    const dirent* entry = readdir(stream.get());
+    if (entry == nullptr) return errno == 0 ? kOk : StatusOfErrno(errno);
+    if (entry->d_name[0] != '.') names->emplace_back(entry->d_name);
+  }
 }
 
 Status NotUnderstood(std::string_view file, size_t line) {

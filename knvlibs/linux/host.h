@@ -5,8 +5,12 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <map>
+#include <memory>
 #include <string>
 #include <string_view>
+#include <typeindex>
+#include <vector>
 
 #include "knvlibs/source.h"
 #include "knvlibs/status.h"
@@ -24,6 +28,20 @@ class LinuxHost {
   // The whole of a file, named from the root ("/proc/meminfo").
   Status Read(std::string_view file, std::string* content) const;
 
+  // A file that is one number.
+  Status ReadNumber(std::string_view file, uint64_t* number) const;
+
+  // The names of what lies in a directory, but for those that start with '.', in no order.
+  Status List(std::string_view directory, std::vector<std::string>* names) const;
+
+  // Where a reader keeps what it need not read again; made on first use, one for each type.
+  template <class T>
+  T& Keep() const {
+    std::shared_ptr<void>& kept = kept_[typeid(T)];
+    if (kept == nullptr) kept = std::make_shared<T>();
+    return *static_cast<T*>(kept.get());
+  }
+
   // The size of a page in KB. Recorded trees are taken to come from a machine with pages of the
   // same size.
   uint64_t PageKB() const { return pageKB_; }
@@ -31,6 +49,7 @@ class LinuxHost {
  private:
   std::string root_;  // without its last '/'
   uint64_t pageKB_;
+  mutable std::map<std::type_index, std::shared_ptr<void>> kept_;
 };
 
 // Warns that a line of a file (the first is 1) is not understood; returns the status for it.
