@@ -92,18 +92,28 @@ std::string UriOf(std::string_view fileName) {
   return uri + "?immutable=1";
 }
 
-// Text of a column as the writer puts it: of bounded length and without a NUL.
-bool TakeText(const Statement& row, int column, std::string* text) {
-  if (row.Type(column) != SQLITE_TEXT) return false;
-  *text = row.Text(column);
-  return text->size() <= cache::kLongestText && text->find('\0') == text->npos;
+bool IsDate(std::string_view text) {
+  return text.size() == 20 &&
+         std::ranges::all_of(text, [](char c) { return c >= ' ' && c <= '~'; });
 }
 
-bool IsPrintable(std::string_view text) {
-  return std::ranges::all_of(text, [](char c) { return c >= ' ' && c <= '~'; });
+bool IsSignature(std::string_view text) {
+  return text.size() == 32 && text.find_first_not_of("0123456789abcdef") == std::string_view::npos;
+}
+
+bool IsPlain(std::string_view text) {
+  return text.size() <= cache::kLongestText && text.find('\0') == std::string_view::npos;
 }
 
 }  // namespace
+
+const char* BadMember(const CacheFile::Capture& capture) {
+  if (!IsSignature(capture.signature)) return "signature";
+  if (!IsDate(capture.built)) return "built";
+  if (!IsDate(capture.taken)) return "taken";
+  if (!IsPlain(capture.host)) return "host";
+  return nullptr;
+}
 
 Status StatusOfSqlite(int code) {
   switch (code & 0xff) {
@@ -124,7 +134,7 @@ Status StatusOfSqlite(int code) {
   }
 }
 
-Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* out) {
+Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* out, std::string* why) {
   Status status = CheckFile(fileName);
   if (status != kOk) return status;
 
@@ -134,16 +144,27 @@ Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* out) {
       sqlite3_open_v2(UriOf(fileName).c_str(), &handle,
                       SQLITE_OPEN_READONLY | SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX, nullptr);
   file->database_.reset(handle);
-  if (code != SQLITE_OK) return StatusOfSqlite(code);
-
-  status = file->Configure();
+  status = code == SQLITE_OK ? file->Configure() : file->Failed(code);
   if (status == kOk) status = file->CheckSchema();
   if (status == kOk) status = file->ReadCapture();
   if (status == kOk) status = file->ReadNodes();
-  if (status != kOk) return status;
+  if (status != kOk) {
+    if (why != nullptr) *why = file->why_;
+    return status;
+  }
   sqlite3_progress_handler(handle, 0, nullptr, nullptr);
   *out = std::move(file);
   return kOk;
+}
+
+Status CacheFile::Failed(int code) {
+  why_ = sqlite3_errmsg(database_.get());
+  return StatusOfSqlite(code);
+}
+
+Status CacheFile::Damaged(const char* why) {
+  why_ = why;
+  return KSI_STATUS_METADATA_READ_ERROR;
 }
 
 Status CacheFile::Configure() {
@@ -156,58 +177,59 @@ Status CacheFile::Configure() {
   sqlite3_db_config(database, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
   sqlite3_progress_handler(
       database, kMostOpeningSteps, [](void*) { return 1; }, nullptr);
-  return StatusOfSqlite(
-      sqlite3_exec(database, "PRAGMA cell_size_check=ON", nullptr, nullptr, nullptr));
+  const int code = sqlite3_exec(database, "PRAGMA cell_size_check=ON", nullptr, nullptr, nullptr);
+  return code == SQLITE_OK ? kOk : Failed(code);
 }
 
 Status CacheFile::CheckSchema() {
   Statement rows;
   int code = rows.Prepare(database_.get(), "SELECT type, name, sql FROM sqlite_schema");
-  if (code != SQLITE_OK) return StatusOfSqlite(code);
+  if (code != SQLITE_OK) return Failed(code);
   for (const cache::Table& table : cache::kTables) {
     code = rows.Step();
-    if (code != SQLITE_ROW && code != SQLITE_DONE) return StatusOfSqlite(code);
+    if (code != SQLITE_ROW && code != SQLITE_DONE) return Failed(code);
     if (code == SQLITE_DONE || rows.Text(0) != "table" || rows.Text(1) != table.name ||
         rows.Text(2) != table.sql) {
-      return KSI_STATUS_METADATA_READ_ERROR;
+      return Damaged("its tables are not those of a cache file");
     }
   }
   code = rows.Step();
-  return code == SQLITE_ROW ? KSI_STATUS_METADATA_READ_ERROR : StatusOfSqlite(code);
+  if (code == SQLITE_ROW) return Damaged("it has more than the tables of a cache file");
+  return code == SQLITE_DONE ? kOk : Failed(code);
 }
 
 Status CacheFile::ReadCapture() {
   Statement rows;
   int code = rows.Prepare(database_.get(), "SELECT signature, built, host, taken FROM capture");
   if (code == SQLITE_OK) code = rows.Step();
-  if (code != SQLITE_ROW) {
-    return code == SQLITE_DONE ? KSI_STATUS_METADATA_READ_ERROR : StatusOfSqlite(code);
-  }
-  // The dates and the signature go into diagnostics as they are.
-  const bool good = TakeText(rows, 0, &capture_.signature) && TakeText(rows, 1, &capture_.built) &&
-                    TakeText(rows, 2, &capture_.host) && TakeText(rows, 3, &capture_.taken) &&
-                    IsPrintable(capture_.signature) && IsPrintable(capture_.built) &&
-                    IsPrintable(capture_.taken);
-  return good ? kOk : KSI_STATUS_METADATA_READ_ERROR;
+  if (code == SQLITE_DONE) return Damaged("the table capture is empty");
+  if (code != SQLITE_ROW) return Failed(code);
+  capture_.signature = rows.Text(0);
+  capture_.built = rows.Text(1);
+  capture_.host = rows.Text(2);
+  capture_.taken = rows.Text(3);
+  return BadMember(capture_) == nullptr ? kOk : Damaged("the table capture is not understood");
 }
 
 Status CacheFile::ReadNodes() {
   Statement rows;
   int code = rows.Prepare(database_.get(), "SELECT id, path, kind FROM node ORDER BY id");
-  if (code != SQLITE_OK) return StatusOfSqlite(code);
+  if (code != SQLITE_OK) return Failed(code);
   while ((code = rows.Step()) == SQLITE_ROW) {
-    NodeRow row{rows.Number(0), nullptr, Kind::kValue, {}};
-    const bool list = rows.Text(2) == cache::kList;
-    if (!TakeText(rows, 1, &row.path) || (!list && rows.Text(2) != cache::kValue) ||
+    const std::string_view kind = rows.Text(2);
+    NodeRow row{rows.Number(0), nullptr, kind == cache::kList ? Kind::kList : Kind::kValue,
+                std::string(rows.Text(1))};
+    if (!IsPlain(row.path) || (kind != cache::kList && kind != cache::kValue) ||
         (!nodes_.empty() && nodes_.back().id >= row.id) || nodes_.size() == kMostNodeRows) {
-      return KSI_STATUS_METADATA_READ_ERROR;
+      return Damaged("the table node is not understood");
     }
-    row.kind = list ? Kind::kList : Kind::kValue;
     const Node* node = FindNode(row.path);
-    if (node != nullptr && (list ? node->HasList() : node->HasValue())) row.node = node;
+    if (node != nullptr && (row.kind == Kind::kList ? node->HasList() : node->HasValue())) {
+      row.node = node;
+    }
     nodes_.push_back(std::move(row));
   }
-  return StatusOfSqlite(code);
+  return code == SQLITE_DONE ? kOk : Failed(code);
 }
 
 const CacheFile::NodeRow* CacheFile::FindRow(const Node& node, Kind kind) const {

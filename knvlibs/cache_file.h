@@ -38,7 +38,9 @@ class CacheFile {
   //   KSI_STATUS_INVALID_METADATA: not a cache file,
   //   KSI_STATUS_MAJOR_VERSION_MISMATCH: of a newer schema,
   //   KSI_STATUS_METADATA_READ_ERROR: damaged.
-  static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file);
+  // `why`, if not null, receives what is wrong with a damaged file.
+  static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file,
+                     std::string* why = nullptr);
 
   const Capture& GetCapture() const { return capture_; }
   const std::vector<NodeRow>& NodeRows() const { return nodes_; }
@@ -56,11 +58,18 @@ class CacheFile {
   Status CheckSchema();
   Status ReadCapture();
   Status ReadNodes();
+  Status Failed(int code);
+  Status Damaged(const char* why);
 
   Database database_;
+  std::string why_;
   Capture capture_;
   std::vector<NodeRow> nodes_;  // in the order of their identifiers
 };
+
+// The member of a capture that is not as it has to be, null if all are: a signature has 32
+// hexadecimal digits, dates have their 20 characters, and no text a NUL or more than kLongestText.
+const char* BadMember(const CacheFile::Capture& capture);
 
 // The status for a failed call of SQLite on a cache file.
 Status StatusOfSqlite(int code);

@@ -36,6 +36,9 @@ constexpr KeyKind KindOf(Instance instance) {
 
 const char* NameOf(Instance instance);
 
+// The memory states of a host, best first; a state's index is its number.
+constexpr std::string_view kMemoryStates[] = {"high", "clear", "soft", "hard", "low"};
+
 // The longest path of keys that selects an instance.
 constexpr size_t kMaxKeys = 2;
 

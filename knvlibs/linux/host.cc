@@ -111,4 +111,10 @@ Status NotUnderstood(std::string_view file, size_t line) {
   return KSI_STATUS_INVALID_METADATA;
 }
 
+Status NameNotUnderstood(std::string_view directory, std::string_view name) {
+  Warning("%.*s: the name %.*s is not understood\n", static_cast<int>(directory.size()),
+          directory.data(), static_cast<int>(name.size()), name.data());
+  return KSI_STATUS_INVALID_METADATA;
+}
+
 }  // namespace ksi

@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <limits>
 #include <map>
 #include <memory>
 #include <string>
@@ -19,6 +20,13 @@ namespace ksi {
 
 // What a figure is when the mechanism exists and its figure cannot be told.
 constexpr uint64_t kNoValue = ~uint64_t{0};
+
+// The same figure in a narrower field; one that does not fit cannot be told.
+template <class Field>
+constexpr Field FigureOf(uint64_t figure) {
+  constexpr Field kNarrowNoValue = std::numeric_limits<Field>::max();
+  return figure < kNarrowNoValue ? static_cast<Field>(figure) : kNarrowNoValue;
+}
 
 class LinuxHost {
  public:
@@ -54,6 +62,9 @@ class LinuxHost {
 
 // Warns that a line of a file (the first is 1) is not understood; returns the status for it.
 Status NotUnderstood(std::string_view file, size_t line);
+
+// The same of what a directory has in it.
+Status NameNotUnderstood(std::string_view directory, std::string_view name);
 
 // Hands over a record as the bytes it is.
 template <class Record>

@@ -13,8 +13,6 @@
 namespace ksi {
 namespace {
 
-constexpr std::string_view kStates[] = {"high", "clear", "soft", "hard", "low"};
-
 // All zones together, in pages.
 Zone SumOf(const std::vector<Zone>& zones) {
   Zone sum;
@@ -29,9 +27,9 @@ Zone SumOf(const std::vector<Zone>& zones) {
   return sum;
 }
 
-// The index in kStates of a host with these sums: "high" while page reclaim has nothing to do,
-// "clear" while it works up to the high watermark, "soft" and "hard" in the upper and lower half
-// of what is left to it before allocations stall, "low" once they do.
+// The number of the memory state of a host with these sums: "high" while page reclaim has nothing
+// to do, "clear" while it works up to the high watermark, "soft" and "hard" in the upper and lower
+// half of what is left to it before allocations stall, "low" once they do.
 uint32_t StateOf(const Zone& sum) {
   const uint64_t floors[] = {sum.high, sum.low, sum.min + (sum.low - sum.min) / 2, sum.min};
   uint32_t state = 0;
@@ -140,7 +138,9 @@ Status ReadGlobalTally(const LinuxHost& host, const Keys& /*keys*/, Buffer buffe
 }
 
 Status ReadStateTransitions(const LinuxHost& /*host*/, const Keys& keys, Buffer buffer) {
-  if (std::ranges::find(kStates, keys[0].text) == std::end(kStates)) return KSI_STATUS_NOT_FOUND;
+  if (std::ranges::find(kMemoryStates, keys[0].text) == std::end(kMemoryStates)) {
+    return KSI_STATUS_NOT_FOUND;
+  }
   // Linux has no memory states and so never left one.
   return Answer(buffer, KSI_StateTransitions{});
 }

@@ -1,0 +1,46 @@
+// How a command fails.
+#ifndef TOOLS_KSICACHE_ERROR_H_
+#define TOOLS_KSICACHE_ERROR_H_
+
+#include <stdexcept>
+#include <string>
+
+#include "knvlibs/catalogue.h"
+#include "knvlibs/source.h"
+#include "knvlibs/status.h"
+
+namespace ksicache {
+
+// Ends the command with its message and exit status 1.
+class Error : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// The same for what a command was given to read; whoever knows where it stood adds that.
+class DataError : public Error {
+ public:
+  using Error::Error;
+};
+
+// Ends the command with its message, a word on how to get help, and exit status 2.
+class UsageError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// The error for a system call on `fileName` that failed with this errno.
+Error SystemError(const std::string& fileName, int error);
+
+// "0xbad0003"
+std::string Hex(ksi::Status status);
+
+// "sched/groups/groupName [5]"
+std::string NameOf(std::string_view path, const ksi::Keys& keys);
+
+// The text with what a terminal might take for a command written as "\x1b".
+std::string Printable(std::string_view text);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_ERROR_H_

@@ -1,0 +1,32 @@
+// A bar on standard error for work that takes longer than a second.
+#ifndef TOOLS_KSICACHE_PROGRESS_H_
+#define TOOLS_KSICACHE_PROGRESS_H_
+
+#include <chrono>
+#include <cstddef>
+
+namespace ksicache {
+
+// Shows nothing unless standard error is a terminal.
+class Progress {
+ public:
+  explicit Progress(const char* title);
+  Progress(const Progress&) = delete;
+  Progress& operator=(const Progress&) = delete;
+  ~Progress();
+
+  // `total` may grow.
+  void Show(size_t done, size_t total);
+
+ private:
+  using Clock = std::chrono::steady_clock;
+
+  const char* title_;
+  bool terminal_;
+  bool shown_ = false;
+  Clock::time_point next_;
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_PROGRESS_H_

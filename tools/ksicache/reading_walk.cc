@@ -1,0 +1,136 @@
+#include "tools/ksicache/reading_walk.h"
+
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+[[noreturn]] void ThrowDamaged(const ksi::CacheFile& file) {
+  throw Error(std::string("damaged: ") + sqlite3_errmsg(file.Handle()));
+}
+
+const char* MeaningOf(ksi::Status status) {
+  switch (status) {
+    case KSI_STATUS_NOT_FOUND:
+      return "no such file";
+    case KSI_STATUS_PERMISSION_DENIED:
+      return "permission denied";
+    case KSI_STATUS_IS_A_DIRECTORY:
+      return "is a directory";
+    case KSI_STATUS_INVALID_METADATA:
+      return "not a cache file";
+    case KSI_STATUS_MAJOR_VERSION_MISMATCH:
+      return "made by a newer version";
+    case KSI_STATUS_METADATA_READ_ERROR:
+      return "damaged";
+    case KSI_STATUS_NO_MEMORY:
+      return "out of memory";
+    default:
+      return "cannot be read";
+  }
+}
+
+// Takes a key column; false if it is no key at all.
+bool TakeKey(const ksi::Statement& row, int column, ksi::Key* key) {
+  switch (row.Type(column)) {
+    case SQLITE_INTEGER:
+      *key = {ksi::KeyKind::kNumber, row.Number(column), {}};
+      return true;
+    case SQLITE_TEXT:
+      *key = {ksi::KeyKind::kText, 0, row.Text(column)};
+      return true;
+    default:
+      return false;
+  }
+}
+
+bool IsAbsent(const ksi::Key& key) { return key.kind == ksi::KeyKind::kText && key.text.empty(); }
+
+// Takes the keys of a row, as many as its node has, or else as many as there are.
+bool TakeKeys(const ksi::Statement& row, const ksi::CacheFile::NodeRow* nodeRow, ksi::Keys* keys) {
+  for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
+    if (!TakeKey(row, static_cast<int>(i), &keys->at[i])) return false;
+  }
+  if (nodeRow == nullptr || nodeRow->node == nullptr) {
+    keys->count = IsAbsent(keys->at[0]) ? 0 : IsAbsent(keys->at[1]) ? 1 : 2;
+    return true;
+  }
+  const ksi::Keying& keying =
+      nodeRow->kind == ksi::Kind::kValue ? nodeRow->node->valueKeys : nodeRow->node->listKeys;
+  keys->count = keying.Count();
+  for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
+    const bool good =
+        i < keys->count ? keys->at[i].kind == ksi::KindOf(keying.at[i]) : IsAbsent(keys->at[i]);
+    if (!good) return false;
+  }
+  return true;
+}
+
+}  // namespace
+
+std::string Reading::Name() const {
+  return NameOf(row == nullptr ? "node " + std::to_string(node) : row->path, keys);
+}
+
+std::unique_ptr<ksi::CacheFile> OpenCacheFile(const std::string& fileName) {
+  std::unique_ptr<ksi::CacheFile> file;
+  std::string why;
+  const ksi::Status status = ksi::CacheFile::Open(fileName.c_str(), &file, &why);
+  if (status != ksi::kOk) {
+    throw Error(fileName + ": " + MeaningOf(status) + (why.empty() ? "" : ": " + Printable(why)));
+  }
+  return file;
+}
+
+void ForEachReading(const ksi::CacheFile& file, const std::function<void(const Reading&)>& visit) {
+  ksi::Statement rows;
+  int code = rows.Prepare(file.Handle(),
+                          "SELECT key1, key2, node, status, answer FROM reading "
+                          "ORDER BY key1, key2, node");
+  if (code != SQLITE_OK) ThrowDamaged(file);
+  while ((code = rows.Step()) == SQLITE_ROW) {
+    Reading reading{};
+    reading.node = rows.Number(2);
+    reading.row = file.FindRow(reading.node);
+    reading.goodKeys = TakeKeys(rows, reading.row, &reading.keys);
+    reading.status = rows.Type(3) == SQLITE_INTEGER ? rows.Number(3) : -1;
+    reading.type = rows.Type(4);
+    if (reading.type == SQLITE_BLOB) reading.value = rows.Blob(4);
+    if (reading.type == SQLITE_INTEGER) reading.count = rows.Number(4);
+    visit(reading);
+  }
+  if (code != SQLITE_DONE) ThrowDamaged(file);
+}
+
+InstanceWalk::InstanceWalk(const ksi::CacheFile& file) : file_(file) {
+  if (rows_.Prepare(file.Handle(),
+                    "SELECT position, entry FROM instance "
+                    "WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 ORDER BY position") != SQLITE_OK) {
+    ThrowDamaged(file);
+  }
+}
+
+void InstanceWalk::ForEach(
+    const Reading& list,
+    const std::function<void(int64_t position, const ksi::Statement&)>& visit) {
+  for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
+    const int parameter = static_cast<int>(i) + 1;
+    const ksi::Key& key = list.keys[i];
+    if (i >= list.keys.count) {
+      rows_.Bind(parameter, std::string_view());
+    } else if (key.kind == ksi::KeyKind::kNumber) {
+      rows_.Bind(parameter, key.number);
+    } else {
+      rows_.Bind(parameter, key.text);
+    }
+  }
+  rows_.Bind(3, list.node);
+  int code = SQLITE_OK;
+  while ((code = rows_.Step()) == SQLITE_ROW) {
+    visit(rows_.Type(0) == SQLITE_INTEGER ? rows_.Number(0) : -1, rows_);
+  }
+  rows_.Reset();
+  if (code != SQLITE_DONE) ThrowDamaged(file_);
+}
+
+}  // namespace ksicache

@@ -1,0 +1,208 @@
+#include "tools/ksicache/record_json.h"
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+#include <optional>
+
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+std::string ToHex(std::span<const std::byte> bytes) {
+  constexpr char kDigits[] = "0123456789abcdef";
+  std::string hex;
+  for (const std::byte byte : bytes) {
+    hex += kDigits[std::to_integer<unsigned>(byte) >> 4];
+    hex += kDigits[std::to_integer<unsigned>(byte) & 15];
+  }
+  return hex;
+}
+
+std::optional<unsigned> DigitOf(char c) {
+  if (c >= '0' && c <= '9') return c - '0';
+  if (c >= 'a' && c <= 'f') return c - 'a' + 10;
+  return std::nullopt;
+}
+
+std::string FromHex(const Json& json, const std::string& where) {
+  std::string bytes;
+  const auto* hex = json.get_ptr<const std::string*>();
+  bool good = hex != nullptr && hex->size() % 2 == 0;
+  for (size_t i = 0; good && i < hex->size(); i += 2) {
+    const auto high = DigitOf((*hex)[i]);
+    const auto low = DigitOf((*hex)[i + 1]);
+    good = high && low;
+    if (good) bytes += static_cast<char>(*high << 4 | *low);
+  }
+  if (!good) throw DataError(where + ": is not a string of hexadecimal digits (0-9, a-f)");
+  return bytes;
+}
+
+uint64_t UnsignedAt(const ksi::Field& field, std::span<const std::byte> record) {
+  uint64_t number = 0;
+  std::memcpy(&number, record.data() + field.offset, field.width);  // little-endian
+  return number;
+}
+
+int64_t SignedAt(const ksi::Field& field, std::span<const std::byte> record) {
+  const int shift = 64 - 8 * field.width;
+  return static_cast<int64_t>(UnsignedAt(field, record) << shift) >> shift;
+}
+
+bool IsZero(std::span<const std::byte> bytes) {
+  return std::ranges::all_of(bytes, [](std::byte byte) { return byte == std::byte{0}; });
+}
+
+Json FieldToJson(const ksi::Field& field, std::span<const std::byte> record) {
+  switch (field.type) {
+    case ksi::FieldType::kUnsigned:
+    case ksi::FieldType::kBits:
+      return UnsignedAt(field, record);
+    case ksi::FieldType::kSigned:
+      return SignedAt(field, record);
+    case ksi::FieldType::kText:
+      break;
+  }
+  const std::span<const std::byte> bytes = record.subspan(field.offset, field.width);
+  const std::string_view text = TextOf(field, record);
+  if (!IsZero(bytes.subspan(text.size()))) return {{"hex", ToHex(bytes)}};
+  Json json = TextToJson(text);
+  // Inside a record the hexadecimal form stands for the whole field.
+  if (json.is_object()) return {{"hex", ToHex(bytes)}};
+  return json;
+}
+
+void NumberFromJson(const ksi::Field& field, const Json& json, const std::string& where,
+                    std::byte* at) {
+  const int bits = 8 * field.width;
+  uint64_t number = 0;
+  bool good = false;
+  if (json.is_number_unsigned()) {
+    number = json.get<uint64_t>();
+    const int room = field.type == ksi::FieldType::kSigned ? bits - 1 : bits;
+    good = room == 64 || number >> room == 0;
+  } else if (json.is_number_integer() && field.type == ksi::FieldType::kSigned) {
+    const auto negative = json.get<int64_t>();
+    number = static_cast<uint64_t>(negative);
+    good = negative >> (bits - 1) == -1;
+  }
+  if (!good) {
+    throw DataError(where + ": is not a" +
+                    (field.type == ksi::FieldType::kSigned ? " signed" : "n unsigned") +
+                    " whole number of " + std::to_string(bits) + " bits");
+  }
+  std::memcpy(at, &number, field.width);
+}
+
+void PutText(const std::string& text, const std::string& where, std::span<std::byte> at) {
+  if (text.size() > at.size()) {
+    throw DataError(where + ": is longer than " + std::to_string(at.size()) + " bytes");
+  }
+  std::ranges::transform(text, at.begin(), [](char c) { return static_cast<std::byte>(c); });
+}
+
+// Calls for every run of bytes of a record that no field names.
+template <class Visit>
+void ForEachGap(const ksi::Node& node, Visit&& visit) {
+  size_t end = 0;
+  const auto gap = [&](size_t next) {
+    if (next > end) visit("unused" + std::to_string(end), end, next - end);
+  };
+  for (const ksi::Field& field : node.fields) {
+    gap(field.offset);
+    end = size_t{field.offset} + field.width;
+  }
+  gap(node.recordSize);
+}
+
+}  // namespace
+
+Json TextToJson(std::string_view text) {
+  Json json = text;
+  try {
+    static_cast<void>(json.dump());  // checks that it is UTF-8
+  } catch (const Json::type_error&) {
+    return {{"hex", ToHex(std::as_bytes(std::span(text)))}};
+  }
+  return json;
+}
+
+std::string TextFromJson(const Json& json, const std::string& where) {
+  std::string text;
+  if (json.is_string()) {
+    text = json.get<std::string>();
+  } else if (json.is_object() && json.size() == 1 && json.contains("hex")) {
+    text = FromHex(json["hex"], where + ".hex");
+  } else {
+    throw DataError(where + ": is neither a string nor {\"hex\": \"...\"}");
+  }
+  return text;
+}
+
+Json RecordToJson(const ksi::Node& node, std::span<const std::byte> record) {
+  Json json = Json::object();
+  for (const ksi::Field& field : node.fields) json[field.name] = FieldToJson(field, record);
+  ForEachUnused(node, record,
+                [&](const std::string& name, const std::string& hex) { json[name] = hex; });
+  return json;
+}
+
+std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json) {
+  if (!json.is_object()) throw DataError("value: is not an object");
+  std::vector<std::byte> record(node.recordSize);
+  for (const auto& [name, value] : json.items()) {
+    const std::string where = "value." + name;
+    const auto field = std::ranges::find_if(
+        node.fields, [&](const ksi::Field& each) { return each.name == name; });
+    if (field != node.fields.end() && field->type == ksi::FieldType::kText) {
+      PutText(TextFromJson(value, where), where,
+              std::span(record).subspan(field->offset, field->width));
+      continue;
+    }
+    if (field != node.fields.end()) {
+      NumberFromJson(*field, value, where, record.data() + field->offset);
+      continue;
+    }
+    bool found = false;
+    ForEachGap(node, [&](const std::string& gap, size_t offset, size_t size) {
+      if (gap != name) return;
+      found = true;
+      PutText(FromHex(value, where), where, std::span(record).subspan(offset, size));
+    });
+    if (!found) throw DataError(where + ": the record has no such field");
+  }
+  return record;
+}
+
+std::string NumberToText(const ksi::Field& field, std::span<const std::byte> record) {
+  const uint64_t number = UnsignedAt(field, record);
+  switch (field.type) {
+    case ksi::FieldType::kSigned:
+      return std::to_string(SignedAt(field, record));
+    case ksi::FieldType::kBits:
+      return Hex(static_cast<ksi::Status>(number));
+    default:
+      break;
+  }
+  const uint64_t allOnes = std::numeric_limits<uint64_t>::max() >> (64 - 8 * field.width);
+  if (field.width >= 4 && number == allOnes) return "no value";
+  return std::to_string(number);
+}
+
+std::string_view TextOf(const ksi::Field& field, std::span<const std::byte> record) {
+  const char* text = reinterpret_cast<const char*>(record.data()) + field.offset;
+  return {text, strnlen(text, field.width)};
+}
+
+void ForEachUnused(
+    const ksi::Node& node, std::span<const std::byte> record,
+    const std::function<void(const std::string& name, const std::string& hex)>& visit) {
+  ForEachGap(node, [&](const std::string& name, size_t offset, size_t size) {
+    const std::span<const std::byte> bytes = record.subspan(offset, size);
+    if (!IsZero(bytes)) visit(name, ToHex(bytes));
+  });
+}
+
+}  // namespace ksicache
