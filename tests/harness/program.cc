@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -29,6 +30,7 @@ int Must(int result, const char* what) {
 
 std::vector<char*> Pointers(const std::vector<std::string>& texts) {
   std::vector<char*> pointers;
+  pointers.reserve(texts.size() + 1);
   for (const std::string& text : texts) pointers.push_back(const_cast<char*>(text.c_str()));
   pointers.push_back(nullptr);
   return pointers;
@@ -111,7 +113,8 @@ Result RunProgram(const Program& program) {
   posix_spawn_file_actions_destroy(&actions);
   if (brokenPipe[1] >= 0) close(brokenPipe[1]);
   if (error != 0) {
-    std::fprintf(stderr, "%s does not start: error %d\n", program.path.c_str(), error);
+    errno = error;
+    std::perror(program.path.c_str());
     std::abort();
   }
 
