@@ -12,6 +12,36 @@ Handlers HandlersOf(uint16_t node) {
       return {.value = ReadGlobalTally};
     case node::sched_globalStats_memory_stateTransitions:
       return {.value = ReadStateTransitions};
+    case node::memory_memInfo:
+      return {.value = ReadMemInfo};
+    case node::memory_memNodes:
+      return {.value = ReadMemNode};
+    case node::memory_pshare_stats:
+      return {.value = ReadPshareStats};
+    case node::memory_lpage_nodeList_psharePool:
+      return {.value = ReadPsharePool};
+    case node::memory_lpage_nodeList_vmPools:
+      return {.value = ReadPool, .list = ListPools};
+    case node::system_buddy:
+      return {.list = ListBuddies};
+    case node::system_buddy_comprehensive:
+      return {.value = ReadBuddy};
+    case node::system_heaps:
+      return {.list = ListHeaps};
+    case node::system_heaps_stats:
+      return {.value = ReadHeapStats};
+    case node::memory_pmem_volumes:
+      return {.list = ListVolumes};
+    case node::memory_pmem_volumes_info:
+      return {.value = ReadVolume};
+    case node::memory_pmem_volumes_regionStore_info:
+      return {.value = ReadRegionStore};
+    case node::memory_pmem_volumes_regionStore_isClean:
+      return {.value = ReadIsClean};
+    case node::memory_pmem_volumes_regionStore_regions:
+      return {.list = ListRegions};
+    case node::memory_pmem_volumes_regionStore_regions_info:
+      return {.value = ReadRegion};
     default:
       return {};
   }

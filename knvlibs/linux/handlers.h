@@ -22,10 +22,38 @@ struct Handlers {
 
 Handlers HandlersOf(uint16_t node);
 
+// buddyinfo.cc
+Status ListBuddies(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ReadBuddy(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
+// heaps.cc
+Status ListHeaps(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ReadHeapStats(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
+// hugepages.cc
+Status ReadPsharePool(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ListPools(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ReadPool(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
+// ksm.cc
+Status ReadPshareStats(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
 // memory.cc
 Status ReadComprehensive(const LinuxHost& host, const Keys& keys, Buffer buffer);
 Status ReadGlobalTally(const LinuxHost& host, const Keys& keys, Buffer buffer);
 Status ReadStateTransitions(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
+// memory_nodes.cc
+Status ReadMemInfo(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadMemNode(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
+// nvdimm.cc
+Status ListVolumes(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ReadVolume(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadRegionStore(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadIsClean(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ListRegions(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ReadRegion(const LinuxHost& host, const Keys& keys, Buffer buffer);
 
 }  // namespace ksi
 

@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -42,6 +43,13 @@ class Directory {
  private:
   DIR* stream_;
 };
+
+bool IsDirectory(DIR* stream, const dirent& entry) {
+  if (entry.d_type != DT_UNKNOWN) return entry.d_type == DT_DIR;
+  struct stat status = {};
+  return fstatat(dirfd(stream), entry.d_name, &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+         S_ISDIR(status.st_mode);
+}
 
 std::string WithoutLastSlash(std::string path) {
   while (!path.empty() && path.back() == '/') path.pop_back();
@@ -91,7 +99,8 @@ Status LinuxHost::ReadNumber(std::string_view file, uint64_t* number) const {
   return kOk;
 }
 
-Status LinuxHost::List(std::string_view directory, std::vector<std::string>* names) const {
+Status LinuxHost::List(std::string_view directory, Entries entries,
+                       std::vector<std::string>* names) const {
   std::string path = root_;
   path += directory;
   const Directory stream(opendir(path.c_str()));
@@ -102,7 +111,9 @@ Status LinuxHost::List(std::string_view directory, std::vector<std::string>* nam
     errno = 0;
     const dirent* entry = readdir(stream.get());
     if (entry == nullptr) return errno == 0 ? kOk : StatusOfErrno(errno);
-    if (entry->d_name[0] != '.') names->emplace_back(entry->d_name);
+    if (entry->d_name[0] == '.') continue;
+    if (entries == Entries::kDirectories && !IsDirectory(stream.get(), *entry)) continue;
+    names->emplace_back(entry->d_name);
   }
 }
 

@@ -39,8 +39,10 @@ class LinuxHost {
   // A file that is one number.
   Status ReadNumber(std::string_view file, uint64_t* number) const;
 
-  // The names of what lies in a directory, but for those that start with '.', in no order.
-  Status List(std::string_view directory, std::vector<std::string>* names) const;
+  // The names of what lies in a directory, but for those that start with '.', in no order. Links
+  // are no directories.
+  enum class Entries { kAll, kDirectories };
+  Status List(std::string_view directory, Entries entries, std::vector<std::string>* names) const;
 
   // Where a reader keeps what it need not read again; made on first use, one for each type.
   template <class T>

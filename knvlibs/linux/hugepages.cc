@@ -52,7 +52,7 @@ Status ListPools(const LinuxHost& host, const Keys& keys, ParamList& instances) 
   std::vector<std::string> names;
   Status status = FindPools(host, keys[0].number, &directory);
   if (status != kOk) return status;
-  status = host.List(directory, &names);
+  status = host.List(directory, LinuxHost::Entries::kDirectories, &names);
   // A kernel without huge pages has no pool of them.
   if (status == KSI_STATUS_NOT_FOUND) return kOk;
   if (status != kOk) return status;

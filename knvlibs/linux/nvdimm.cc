@@ -55,7 +55,7 @@ bool ParseNamespace(std::string_view name, Namespace* result) {
 
 Status ReadDevices(const LinuxHost& host, Devices* devices) {
   std::vector<std::string> names;
-  const Status status = host.List(kDevices, &names);
+  const Status status = host.List(kDevices, LinuxHost::Entries::kAll, &names);
   // A kernel that knows no persistent memory has none.
   if (status == KSI_STATUS_NOT_FOUND) return kOk;
   if (status != kOk) return status;
@@ -97,15 +97,15 @@ Status FindVolume(const LinuxHost& host, const Keys& keys, const Devices** devic
                   uint64_t* region) {
   const Status status = host.Keep<Recent<Devices>>().Get(host, ReadDevices, devices);
   if (status != kOk) return status;
-  const bool found = ParseRegion(keys[0].text, region) &&
-                     std::ranges::binary_search((*devices)->regions, *region);
+  const bool found =
+      ParseRegion(keys[0].text, region) && std::ranges::binary_search((*devices)->regions, *region);
   return found ? kOk : KSI_STATUS_NOT_FOUND;
 }
 
 // Whether a directory is there with something in it.
 bool HasEntries(const LinuxHost& host, const std::string& directory) {
   std::vector<std::string> names;
-  return host.List(directory, &names) == kOk && !names.empty();
+  return host.List(directory, LinuxHost::Entries::kAll, &names) == kOk && !names.empty();
 }
 
 // Whether the namespace, or what holds it, is a block device.
@@ -116,7 +116,7 @@ bool HasBlockDevice(const LinuxHost& host, std::string_view space, std::string_v
 
 bool IsSystemRam(const LinuxHost& host, const Namespace& space) {
   std::vector<std::string> names;
-  return host.List(kSystemRam, &names) == kOk &&
+  return host.List(kSystemRam, LinuxHost::Entries::kAll, &names) == kOk &&
          std::ranges::find(names, "dax" + space.Number()) != names.end();
 }
 
@@ -222,6 +222,7 @@ Status ReadRegion(const LinuxHost& host, const Keys& keys, Buffer buffer) {
   const std::string name = space.Name();
   status = host.ReadNumber(FileOf(name, "size"), &size);
   if (status == kOk) status = ReadTextIfAny(host, FileOf(name, "holder"), &holder);
+  if (holder.find('/') != holder.npos) return NotUnderstood(FileOf(name, "holder"), 1);
   if (status == kOk) status = ReadTextIfAny(host, FileOf(name, "uuid"), &uuid);
   if (status == kOk) {
     status = ReadNumberIfAny(host, FileOf(keys[0].text, "read_only"), &readOnly);

@@ -41,7 +41,7 @@ Status ReadCache(const LinuxHost& host, SlabCache* cache) {
 Status ReadSlabDirectory(const LinuxHost& host, std::vector<SlabCache>* caches) {
   std::vector<std::string> names;
   // A cache that others share has their names as links to its directory.
-  Status status = host.List(kDirectory, &names, LinuxHost::Links::kLeaveOut);
+  Status status = host.List(kDirectory, LinuxHost::Entries::kDirectories, &names);
   if (status != kOk) return status;
 
   std::ranges::sort(names);
