@@ -11,6 +11,10 @@ namespace {
 
 enum ReadingColumn { kKey1, kKey2, kNode, kStatus, kAnswer };
 
+constexpr const char* kEntriesOfList =
+    "SELECT position, entry FROM instance WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 "
+    "ORDER BY position";
+
 // More readings than a catalogue has nodes are damage.
 constexpr size_t kMostReadings = 256;
 
@@ -59,17 +63,10 @@ Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* out
     source->ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
   }
 
-  sqlite3* database = source->file_->Handle();
-  int code = source->cursor_.Prepare(
-      database,
+  const int code = source->cursor_.Prepare(
+      source->file_->Handle(),
       "SELECT key1, key2, node, status, answer FROM reading WHERE (key1, key2) >= (?1, ?2) "
       "ORDER BY key1, key2, node");
-  if (code == SQLITE_OK) {
-    code = source->entries_.Prepare(
-        database,
-        "SELECT position, entry FROM instance WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 "
-        "ORDER BY position");
-  }
   if (code != SQLITE_OK) return StatusOfSqlite(code);
   *out = std::move(source);
   return kOk;
@@ -98,7 +95,9 @@ Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& ins
 
   const bool numbers = KindOf(node.entries) == KeyKind::kNumber;
   int64_t position = 0;
-  int code = BindKeys(entries_, keys);
+  // Many a report lists nothing, so this waits for the first list.
+  int code = entries_ ? SQLITE_OK : entries_.Prepare(file_->Handle(), kEntriesOfList);
+  if (code == SQLITE_OK) code = BindKeys(entries_, keys);
   if (code == SQLITE_OK) code = entries_.Bind(3, reading->node);
   if (code == SQLITE_OK) {
     while (status == kOk && (code = entries_.Step()) == SQLITE_ROW) {

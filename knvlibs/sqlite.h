@@ -34,6 +34,8 @@ class Statement {
     return sqlite3_prepare_v3(database, sql, -1, SQLITE_PREPARE_PERSISTENT, &handle_, nullptr);
   }
 
+  explicit operator bool() const { return handle_ != nullptr; }
+
   // Parameters count from 1. A text is copied; a blob must live until the statement is stepped for
   // the last time or bound anew.
   int Bind(int parameter, int64_t number) { return sqlite3_bind_int64(handle_, parameter, number); }
