@@ -36,7 +36,9 @@ class Line {
   void Write() {
     Reserve(0);
     *end_++ = '\n';
-    std::fwrite(lineBuffer.data(), 1, static_cast<size_t>(end_ - lineBuffer.data()), stdout);
+    // An error stays with the stream until the program closes it.
+    const auto size = static_cast<size_t>(end_ - lineBuffer.data());
+    static_cast<void>(std::fwrite(lineBuffer.data(), 1, size, stdout));
   }
 
  private:
@@ -45,7 +47,7 @@ class Line {
 
   // Makes room for a separator and a cell of `size` characters, padded.
   void Reserve(size_t size) {
-    constexpr size_t kWidest = 2 * UINT8_MAX;
+    constexpr size_t kWidest = size_t{2} * UINT8_MAX;
     const auto used = static_cast<size_t>(end_ - lineBuffer.data());
     const size_t needed = used + 1 + size + kWidest + 2 * kBlock;
     if (needed <= lineBuffer.size()) return;

@@ -18,10 +18,10 @@ enum class SelectColumnsAt : uint8_t { beforeUnit, afterUnit, afterFilters };
 // What frames a report: its title, its options and how they are settled. The options decide the
 // lines of the title block, too: each setting that can be given has one.
 struct ReportFrame {
-  const char* title;       // of the title block, such as "GROUP STATS"
-  int ruleLength;          // dashes below the title
-  const char* options;     // short options, for getopt; the long ones follow from them
-  char longVerbose = 'v';  // what --verbose is taken for
+  const char* title;      // of the title block, such as "GROUP STATS"
+  int ruleLength;         // dashes below the title
+  const char* options;    // short options, for getopt; the long ones follow from them
+  int longVerbose = 'v';  // what --verbose is taken for
   uint32_t defaultLevels = 12;
   LevelCheck levelCheck = LevelCheck::asUnsigned;
   bool allowBytes = false;  // "b" is a display unit, and the default one

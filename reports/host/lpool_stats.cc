@@ -3,6 +3,7 @@
 // (memory/lpage/nodeList/vmPools). Figures are counts of 4 KB and 2 MB pages.
 
 #include <cstdio>
+#include <string>
 #include <string_view>
 
 #include "framework/param_list.h"
@@ -125,8 +126,7 @@ Status ListVmPools(uint32_t node, uint32_t hint, ParamList& names) {
 Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
   LPoolRow row = {};
   row.nodeID = node;
-  char psharePool[32];
-  std::snprintf(psharePool, sizeof psharePool, "%s%u", "pshare-", node);
+  const std::string psharePool = "pshare-" + std::to_string(node);
   row.name = psharePool;
   if (TallyGetPSharePoolStats(node, row.pool) == kSuccess) context.PrintRow(row);
 
