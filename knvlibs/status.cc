@@ -8,7 +8,8 @@ Status StatusOfErrno(int error) {
   switch (error) {
     case ENOENT:
     case ENOTDIR:
-    case ESRCH:  // a process that ended between the opening and the reading of its file
+    case ESRCH:   // a process that ended between the opening and the reading of its file
+    case ENODEV:  // the same of a cgroup
       return KSI_STATUS_NOT_FOUND;
     case EACCES:
     case EPERM:

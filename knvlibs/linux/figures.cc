@@ -30,8 +30,10 @@ Status Figures::ReadMeminfo(const LinuxHost& host) {
   return kOk;
 }
 
-Status Figures::ReadVmstat(const LinuxHost& host) {
-  file_ = "/proc/vmstat";
+Status Figures::ReadVmstat(const LinuxHost& host) { return ReadPairs(host, "/proc/vmstat"); }
+
+Status Figures::ReadPairs(const LinuxHost& host, std::string_view file) {
+  file_ = file;
   const Status status = host.Read(file_, &content_);
   if (status != kOk) return status;
 
@@ -41,7 +43,7 @@ Status Figures::ReadVmstat(const LinuxHost& host) {
   while (lines.Next(&line)) {
     Figure figure{TakeWord(&line), 0};
     if (!ParseNumber(TakeWord(&line), &figure.value) || !TakeWord(&line).empty()) {
-      return NotUnderstood(file_, lines.Number());
+      return host.NotUnderstoodOnce(file.substr(file.rfind('/') + 1), file_, lines.Number());
     }
     figures_.push_back(figure);
   }
@@ -57,12 +59,23 @@ std::optional<uint64_t> Figures::Find(std::string_view name) const {
 Status Figures::Require(std::string_view name, uint64_t* value) const {
   const std::optional<uint64_t> found = Find(name);
   if (!found) {
-    Warning("%.*s: %.*s is missing\n", static_cast<int>(file_.size()), file_.data(),
-            static_cast<int>(name.size()), name.data());
+    Warning("%s: %.*s is missing\n", file_.c_str(), static_cast<int>(name.size()), name.data());
     return KSI_STATUS_INVALID_METADATA;
   }
   *value = *found;
   return kOk;
+}
+
+Status ReadKernelHeap(const Figures& meminfo, uint64_t* heap) {
+  uint64_t slab = 0;
+  uint64_t pageTables = 0;
+  uint64_t vmalloc = 0;
+  Status status = meminfo.Require("Slab", &slab);
+  if (status == kOk) status = meminfo.Require("PageTables", &pageTables);
+  if (status == kOk) status = meminfo.Require("VmallocUsed", &vmalloc);
+  *heap = slab + pageTables + vmalloc + meminfo.FindOr("SecPageTables", 0) +
+          meminfo.FindOr("Percpu", 0);
+  return status;
 }
 
 }  // namespace ksi

@@ -21,6 +21,9 @@ class Figures {
   // /proc/vmstat, in pages or events.
   Status ReadVmstat(const LinuxHost& host);
 
+  // Any file of names and values.
+  Status ReadPairs(const LinuxHost& host, std::string_view file);
+
   // A figure that not every kernel has.
   std::optional<uint64_t> Find(std::string_view name) const;
 
@@ -38,10 +41,13 @@ class Figures {
     uint64_t value;
   };
 
-  std::string_view file_;
+  std::string file_;
   std::string content_;
   std::vector<Figure> figures_;
 };
+
+// What the kernel keeps for itself, in KB. The kernel's stacks are in vmalloc's figure.
+Status ReadKernelHeap(const Figures& meminfo, uint64_t* heap);
 
 }  // namespace ksi
 

@@ -6,6 +6,46 @@ namespace ksi {
 
 Handlers HandlersOf(uint16_t node) {
   switch (node) {
+    case node::sched_groups_groupName:
+      return {.value = ReadGroupName};
+    case node::sched_groups_groupTag:
+      return {.value = ReadGroupTag};
+    case node::sched_groups_parentGroupID:
+      return {.value = ReadParentGroupID};
+    case node::sched_groups_groupFlags:
+      return {.value = ReadGroupFlags};
+    case node::sched_groups_groupLeaderID:
+      return {.value = ReadGroupLeaderID};
+    case node::sched_groups_memAllocationInKB:
+      return {.value = ReadGroupAllocation};
+    case node::sched_groups_stats_capacity:
+      return {.value = ReadGroupCapacity};
+    case node::sched_groups_stats_memoryStats:
+      return {.value = ReadGroupMemoryStats};
+    case node::sched_groups_members_groups:
+      return {.list = ListChildGroups};
+    case node::sched_groups_members_memClients:
+      return {.list = ListGroupClients};
+    case node::sched_memClients_tally_totalCommon:
+      return {.value = ReadCommonTally};
+    case node::sched_memClients_tally_vmm:
+      return {.value = ReadVmmTally};
+    case node::sched_memClients_tally_uw:
+      return {.value = ReadUwTally};
+    case node::sched_memClients_tally_guest:
+      return {.value = ReadGuestTally};
+    case node::sched_memClients_swapInfo:
+      return {.value = ReadSwapInfo};
+    case node::sched_memClients_memzipInfo:
+      return {.value = ReadMemzipInfo};
+    case node::sched_memClients_remapTypes:
+      return {.value = ReadRemapType, .list = ListRemapTypes};
+    case node::worldGroups_vmmLeaderID:
+      return {.value = ReadVmmLeaderID};
+    case node::sched_globalStats_numVMs:
+      return {.value = ReadNumVMs};
+    case node::memory_lpage_vmLPage:
+      return {.value = ReadVmLargePages};
     case node::memory_comprehensive:
       return {.value = ReadComprehensive};
     case node::sched_globalStats_memory_tally:

@@ -55,6 +55,33 @@ Status ReadIsClean(const LinuxHost& host, const Keys& keys, Buffer buffer);
 Status ListRegions(const LinuxHost& host, const Keys& keys, ParamList& instances);
 Status ReadRegion(const LinuxHost& host, const Keys& keys, Buffer buffer);
 
+// group_records.cc
+Status ReadGroupName(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGroupTag(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadParentGroupID(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGroupFlags(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGroupLeaderID(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGroupAllocation(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGroupCapacity(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGroupMemoryStats(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ListChildGroups(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ListGroupClients(const LinuxHost& host, const Keys& keys, ParamList& instances);
+
+// user_world.cc
+Status ReadCommonTally(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadUwTally(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ListRemapTypes(const LinuxHost& host, const Keys& keys, ParamList& instances);
+Status ReadRemapType(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
+// virtual_machine.cc
+Status ReadVmmTally(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadGuestTally(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadSwapInfo(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadMemzipInfo(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadVmLargePages(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadVmmLeaderID(const LinuxHost& host, const Keys& keys, Buffer buffer);
+Status ReadNumVMs(const LinuxHost& host, const Keys& keys, Buffer buffer);
+
 }  // namespace ksi
 
 #endif  // KNVLIBS_LINUX_HANDLERS_H_

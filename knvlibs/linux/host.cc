@@ -99,22 +99,41 @@ Status LinuxHost::ReadNumber(std::string_view file, uint64_t* number) const {
   return kOk;
 }
 
-Status LinuxHost::List(std::string_view directory, Entries entries,
-                       std::vector<std::string>* names) const {
+Status LinuxHost::List(std::string_view directory, std::vector<Entry>* entries) const {
   std::string path = root_;
   path += directory;
   const Directory stream(opendir(path.c_str()));
   if (stream.get() == nullptr) return StatusOfErrno(errno);
 
-  names->clear();
+  entries->clear();
   for (;;) {
     errno = 0;
     const dirent* entry = readdir(stream.get());
     if (entry == nullptr) return errno == 0 ? kOk : StatusOfErrno(errno);
-    if (entry->d_name[0] == '.') continue;
-    if (entries == Entries::kDirectories && !IsDirectory(stream.get(), *entry)) continue;
-    names->emplace_back(entry->d_name);
+    const std::string_view name = entry->d_name;
+    if (name == "." || name == "..") continue;
+    entries->push_back({std::string(name), entry->d_ino, IsDirectory(stream.get(), *entry)});
   }
+}
+
+Status LinuxHost::List(std::string_view directory, Entries wanted,
+                       std::vector<std::string>* names) const {
+  std::vector<Entry> entries;
+  const Status status = List(directory, &entries);
+  if (status != kOk) return status;
+
+  names->clear();
+  for (Entry& entry : entries) {
+    if (entry.name.starts_with('.')) continue;
+    if (wanted == Entries::kDirectories && !entry.isDirectory) continue;
+    names->push_back(std::move(entry.name));
+  }
+  return kOk;
+}
+
+Status LinuxHost::NotUnderstoodOnce(std::string_view kind, std::string_view file,
+                                    size_t line) const {
+  return First(kind) ? NotUnderstood(file, line) : KSI_STATUS_INVALID_METADATA;
 }
 
 Status NotUnderstood(std::string_view file, size_t line) {

@@ -8,6 +8,7 @@
 #include <limits>
 #include <map>
 #include <memory>
+#include <set>
 #include <string>
 #include <string_view>
 #include <typeindex>
@@ -28,6 +29,14 @@ constexpr Field FigureOf(uint64_t figure) {
   return figure < kNarrowNoValue ? static_cast<Field>(figure) : kNarrowNoValue;
 }
 
+// Sum and difference; the latter is 0 at least. They cannot be told if a part cannot.
+constexpr uint64_t SumOf(uint64_t a, uint64_t b) {
+  return a == kNoValue || b == kNoValue ? kNoValue : a + b;
+}
+constexpr uint64_t DifferenceOf(uint64_t a, uint64_t b) {
+  return a == kNoValue || b == kNoValue ? kNoValue : a - (a < b ? a : b);
+}
+
 class LinuxHost {
  public:
   // `root` is "/" for the machine itself, or the directory of a recorded tree.
@@ -42,7 +51,25 @@ class LinuxHost {
   // The names of what lies in a directory, but for those that start with '.', in no order. Links
   // are no directories.
   enum class Entries { kAll, kDirectories };
-  Status List(std::string_view directory, Entries entries, std::vector<std::string>* names) const;
+  Status List(std::string_view directory, Entries wanted, std::vector<std::string>* names) const;
+
+  // All that lies in a directory but for itself and the one above, in no order.
+  struct Entry {
+    std::string name;
+    uint64_t inode = 0;
+    bool isDirectory = false;
+  };
+  Status List(std::string_view directory, std::vector<Entry>* entries) const;
+
+  // Whether it is the first time that `what` is asked for: what is wrong with many files alike is
+  // told once.
+  bool First(std::string_view what) const { return told_.emplace(what).second; }
+
+  // NotUnderstood, told once for all files of a kind.
+  Status NotUnderstoodOnce(std::string_view kind, std::string_view file, size_t line) const;
+
+  // Whether this is the machine itself and not a recorded tree.
+  bool IsThisMachine() const { return root_.empty(); }
 
   // Where a reader keeps what it need not read again; made on first use, one for each type.
   template <class T>
@@ -60,6 +87,7 @@ class LinuxHost {
   std::string root_;  // without its last '/'
   uint64_t pageKB_;
   mutable std::map<std::type_index, std::shared_ptr<void>> kept_;
+  mutable std::set<std::string, std::less<>> told_;
 };
 
 // Warns that a line of a file (the first is 1) is not understood; returns the status for it.

@@ -39,19 +39,6 @@ uint32_t StateOf(const Zone& sum) {
 
 uint64_t Less(uint64_t value, uint64_t part) { return value - std::min(value, part); }
 
-// What the kernel keeps for itself, in KB. The kernel's stacks are in vmalloc's figure.
-Status ReadKernelHeap(const Figures& meminfo, uint64_t* heap) {
-  uint64_t slab = 0;
-  uint64_t pageTables = 0;
-  uint64_t vmalloc = 0;
-  Status status = meminfo.Require("Slab", &slab);
-  if (status == kOk) status = meminfo.Require("PageTables", &pageTables);
-  if (status == kOk) status = meminfo.Require("VmallocUsed", &vmalloc);
-  *heap = slab + pageTables + vmalloc + meminfo.FindOr("SecPageTables", 0) +
-          meminfo.FindOr("Percpu", 0);
-  return status;
-}
-
 // What the kernel uses on behalf of files (`cache`) and what processes use (`processes`), in KB.
 Status ReadConsumed(const Figures& meminfo, uint64_t* cache, uint64_t* processes) {
   uint64_t buffers = 0;

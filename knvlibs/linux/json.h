@@ -1,0 +1,46 @@
+// Strict reading of the JSON texts that QEMU takes and gives.
+#ifndef KNVLIBS_LINUX_JSON_H_
+#define KNVLIBS_LINUX_JSON_H_
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+namespace ksi {
+
+struct JsonMember;
+
+struct Json {
+  using Members = std::vector<JsonMember>;
+  using Elements = std::vector<Json>;
+
+  // Numbers are kept as they are written.
+  struct Number {
+    std::string text;
+  };
+
+  std::variant<std::nullptr_t, bool, Number, std::string, Members, Elements> value = nullptr;
+
+  // The member of this name; null if this is no object or has none.
+  const Json* Find(std::string_view name) const;
+
+  const std::string* Text() const { return std::get_if<std::string>(&value); }
+
+  // A whole number that is not negative and fits.
+  std::optional<uint64_t> Unsigned() const;
+};
+
+struct JsonMember {
+  std::string name;
+  Json value;
+};
+
+// The whole of `text` as one value; none if it is anything else.
+std::optional<Json> ParseJson(std::string_view text);
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_LINUX_JSON_H_
