@@ -138,7 +138,8 @@ Status GroupTree::AddCgroups(const LinuxHost& host) {
       group.flags = CgroupFlags(groups_[self], child.name);
       group.name = WithoutEscapes(child.name);
       paths.push_back(group.path);
-      byPath_.emplace(group.path, Add(self, std::move(group)));
+      const size_t index = Add(self, std::move(group));
+      byPath_.emplace(paths.back(), index);
     }
 
     std::vector<int32_t> pids;
