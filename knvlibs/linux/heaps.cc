@@ -1,4 +1,4 @@
-// The kernel's heaps: its slab caches and vmalloc.
+// The kernel's heaps: its slab caches and vmalloc, which is a single range of addresses.
 #include <algorithm>
 #include <cstring>
 #include <string>
@@ -12,7 +12,6 @@
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/recent.h"
 #include "knvlibs/linux/slab_cache.h"
-#include "knvlibs/linux/text.h"
 
 namespace ksi {
 namespace {
@@ -76,19 +75,6 @@ KSI_HeapStats RecordOf(const SlabCache& cache, uint64_t pageKB) {
   return record;
 }
 
-// The areas of /proc/vmallocinfo that have pages of their own, the others map what is elsewhere.
-uint64_t CountVmallocAreas(const LinuxHost& host) {
-  std::string content;
-  if (host.Read("/proc/vmallocinfo", &content) != kOk) return kNoValue;
-  uint64_t count = 0;
-  Lines lines(content);
-  std::string_view line;
-  while (lines.Next(&line)) {
-    if (line.find(" pages=") != line.npos) ++count;
-  }
-  return count;
-}
-
 Status AddVmalloc(const LinuxHost& host, Heaps* heaps) {
   Figures meminfo;
   uint64_t used = 0;
@@ -97,7 +83,7 @@ Status AddVmalloc(const LinuxHost& host, Heaps* heaps) {
   if (status != kOk) return status;
 
   KSI_HeapStats record = NewRecord();
-  record.numRanges = FigureOf<uint32_t>(CountVmallocAreas(host));
+  record.numRanges = 1;
   record.size = FigureOf<uint32_t>(used * 1024);
   record.avgAllocSize = FigureOf<uint32_t>(kNoValue);
   heaps->Add("vmalloc", record);

@@ -1,0 +1,48 @@
+#!/usr/bin/env bash
+# Times the live reports beside the programs that show the same of this machine, in turn, in one run.
+#
+# Usage: bench/live/live.sh [TALLY [RUNS]]     (build/tally, 51 runs of each)
+#
+# Prints the median time of each in milliseconds, and how many lines it printed.
+set -euo pipefail
+
+tally=${1:-build/tally}
+runs=${2:-51}
+
+# report options | the other program
+pairs=(
+  "heap-stats | slabtop -o"
+)
+
+# Prints the median of the numbers on standard input.
+median() { sort -n | awk '{ at[NR] = $1 } END { print at[int((NR + 1) / 2)] }'; }
+
+# Runs a command and prints how long it took, in microseconds.
+time_of() {
+  local start=${EPOCHREALTIME/./}
+  "$@" >/dev/null 2>&1
+  echo $((${EPOCHREALTIME/./} - start))
+}
+
+milliseconds() { awk -v us="$1" 'BEGIN { printf "%.2f", us / 1000 }'; }
+
+printf '%-36s %10s %8s\n' command 'median/ms' lines
+for pair in "${pairs[@]}"; do
+  read -ra ours <<<"$tally -r ${pair%%|*}"
+  read -ra other <<<"${pair#*|}"
+  if ! command -v "${other[0]}" >/dev/null; then
+    echo "${other[0]} is not installed: left out" >&2
+    continue
+  fi
+  ours_times=() other_times=()
+  for ((i = 0; i < runs; ++i)); do
+    ours_times+=("$(time_of "${ours[@]}")")
+    other_times+=("$(time_of "${other[@]}")")
+  done
+  printf '%-36s %10s %8d\n' "tally ${ours[*]:1}" \
+    "$(milliseconds "$(printf '%s\n' "${ours_times[@]}" | median)")" \
+    "$("${ours[@]}" 2>/dev/null | wc -l)"
+  printf '%-36s %10s %8d\n' "${other[*]}" \
+    "$(milliseconds "$(printf '%s\n' "${other_times[@]}" | median)")" \
+    "$("${other[@]}" 2>/dev/null | wc -l)"
+done
