@@ -1,0 +1,64 @@
+// Cache files that tests make, read and damage.
+#ifndef TESTS_KNVLIBS_CACHE_FIXTURE_H_
+#define TESTS_KNVLIBS_CACHE_FIXTURE_H_
+
+#include <cstddef>
+#include <initializer_list>
+#include <span>
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+#include "knvlibs/cache_file.h"
+#include "knvlibs/source.h"
+#include "tools/ksicache/cache_writer.h"
+
+namespace ksi {
+
+// A directory that is removed with all in it when its owner goes.
+class TestDirectory {
+ public:
+  TestDirectory();
+  ~TestDirectory();
+  TestDirectory(const TestDirectory&) = delete;
+  TestDirectory& operator=(const TestDirectory&) = delete;
+
+  std::string Path(std::string_view name) const { return path_ + "/" + std::string(name); }
+  // The names of what is in it, sorted.
+  std::vector<std::string> Names() const;
+
+ private:
+  std::string path_;
+};
+
+std::string FileContent(const std::string& fileName);
+void WriteContent(const std::string& fileName, std::string_view content);
+
+// A key is a number or a text, which has to live as long as the keys.
+using TestKey = std::variant<int64_t, std::string_view>;
+Keys MakeKeys(std::initializer_list<TestKey> keys);
+
+const Node& NodeAt(std::string_view path);
+
+template <class Record>
+std::span<const std::byte> BytesOf(const Record& record) {
+  return std::as_bytes(std::span(&record, 1));
+}
+
+ParamList NumberList(std::initializer_list<uint64_t> numbers);
+ParamList TextList(std::initializer_list<std::string_view> texts);
+
+// What a file of this library would say of itself.
+CacheFile::Capture TestCapture();
+
+// A small host: group 0 "host" with the groups 7 and 9, of which 7 is "web" and 9 cannot be read;
+// client 30 with the remap types "large" and "small"; two heaps, no volumes.
+void WriteSmallHost(const std::string& fileName);
+
+// Runs SQL on a file as its owner could.
+void RunSql(const std::string& fileName, const std::string& sql);
+
+}  // namespace ksi
+
+#endif  // TESTS_KNVLIBS_CACHE_FIXTURE_H_
