@@ -36,6 +36,7 @@
 #include <memory>
 #include <string>
 #include <unordered_map>
+#include <unordered_set>
 #include <utility>
 #include <vector>
 
@@ -149,9 +150,7 @@ class Double {
 
   // `list` if it can be used, otherwise nullptr and a misuse.
   KSI_ParamList* Usable(KSI_ParamList* list, const char* operation) const {
-    const auto known = std::find_if(lists_.begin(), lists_.end(),
-                                    [list](const auto& other) { return other.get() == list; });
-    if (known == lists_.end()) {
+    if (!known_.contains(list)) {
       Misuse(std::string(operation) + " of what is no list");
       return nullptr;
     }
@@ -165,6 +164,7 @@ class Double {
   KSI_ParamList* Make(size_t capacity, size_t textRoom, std::string madeBy) {
     lists_.push_back(std::make_unique<KSI_ParamList>());
     KSI_ParamList* list = lists_.back().get();
+    known_.insert(list);
     list->capacity = capacity;
     list->textRoom = textRoom;
     list->madeBy = std::move(madeBy);
@@ -292,7 +292,8 @@ class Double {
   std::map<std::pair<std::string, int>, uint32_t> failures_;
   std::map<std::string, int> callsOf_;
   int calls_ = 0;
-  std::vector<std::unique_ptr<KSI_ParamList>> lists_;
+  std::vector<std::unique_ptr<KSI_ParamList>> lists_;  // in the order they were made
+  std::unordered_set<const KSI_ParamList*> known_;
 };
 
 // Never destroyed: the program may use lists until its very end.
