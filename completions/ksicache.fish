@@ -1,0 +1,100 @@
+# Completion of ksicache(8) for fish. docs/refresh makes the list of nodes.
+
+# BEGIN fish_nodes
+function __ksicache_nodes
+    printf "%s\n" \
+       sched/groups/groupName \
+       sched/groups/groupTag \
+       sched/groups/parentGroupID \
+       sched/groups/groupFlags \
+       sched/groups/groupLeaderID \
+       sched/groups/memAllocationInKB \
+       sched/groups/stats/capacity \
+       sched/groups/stats/memoryStats \
+       sched/groups/members/groups \
+       sched/groups/members/memClients \
+       sched/memClients/tally/totalCommon \
+       sched/memClients/tally/vmm \
+       sched/memClients/tally/uw \
+       sched/memClients/tally/guest \
+       sched/memClients/swapInfo \
+       sched/memClients/memzipInfo \
+       sched/memClients/remapTypes \
+       worldGroups/vmmLeaderID \
+       sched/globalStats/numVMs \
+       sched/globalStats/memory/tally \
+       sched/globalStats/memory/stateTransitions \
+       memory/comprehensive \
+       memory/memInfo \
+       memory/memNodes \
+       memory/pshare/stats \
+       system/buddy \
+       system/buddy/comprehensive \
+       system/heaps \
+       system/heaps/stats \
+       memory/lpage/vmLPage \
+       memory/lpage/nodeList/psharePool \
+       memory/lpage/nodeList/vmPools \
+       memory/pmem/volumes \
+       memory/pmem/volumes/info \
+       memory/pmem/volumes/regionStore/info \
+       memory/pmem/volumes/regionStore/isClean \
+       memory/pmem/volumes/regionStore/regions \
+       memory/pmem/volumes/regionStore/regions/info
+end
+# END
+
+# The command and its arguments so far, one a line.
+function __ksicache_words
+    set -l words (commandline -opc)
+    set -e words[1]
+    while set -q words[1]
+        switch $words[1]
+            case --root
+                set -e words[1]
+            case '-*'
+            case '*'
+                echo -- $words[1]
+        end
+        set -e words[1]
+    end
+end
+
+# Whether the command is one of the arguments.
+function __ksicache_command
+    set -l words (__ksicache_words)
+    set -q words[1]; and contains -- $words[1] $argv
+end
+
+# Whether the next argument of dump is a node.
+function __ksicache_wants_node
+    set -l words (__ksicache_words)
+    test "$words[1]" = dump; and set -q words[2]
+end
+
+function __ksicache_wants_file
+    set -l words (__ksicache_words)
+    switch "$words[1]"
+        case capture info dump check
+            not set -q words[2]
+        case load
+            not set -q words[3]
+        case '*'
+            false
+    end
+end
+
+set -l no_command 'test -z "$(__ksicache_words)"'
+complete -c ksicache -f
+complete -c ksicache -n $no_command -a capture -d 'Record this host'
+complete -c ksicache -n $no_command -a info -d 'Say which host a file is of'
+complete -c ksicache -n $no_command -a dump -d 'Show what a file holds'
+complete -c ksicache -n $no_command -a load -d 'Make a file from JSON'
+complete -c ksicache -n $no_command -a check -d 'Say what is wrong with a file'
+complete -c ksicache -n $no_command -s h -l help -d 'Print a summary'
+complete -c ksicache -n $no_command -l version -d 'Print the version'
+complete -c ksicache -n __ksicache_wants_file -F
+complete -c ksicache -n __ksicache_wants_node -a '(__ksicache_nodes)'
+complete -c ksicache -n '__ksicache_command capture load' -l force -d 'Replace the file'
+complete -c ksicache -n '__ksicache_command capture' -l root -x -a '(__fish_complete_directories)' -d 'Capture the host recorded there'
+complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'
