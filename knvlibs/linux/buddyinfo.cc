@@ -108,7 +108,7 @@ Status ReadBuddies(const LinuxHost& host, Buddies* buddies) {
     if (!node || zone == zones.end()) continue;
 
     std::array<char, 40> name;
-    std::snprintf(name.data(), name.size(), "memmap-%02zu-%s", *node, suffix);
+    (void)std::snprintf(name.data(), name.size(), "memmap-%02zu-%s", *node, suffix);
     buddies->push_back({name.data(), StatsOf(free, zone->managed, host.PageKB())});
   }
   return lines.Number() > 0 ? kOk : NotUnderstood(kFile, 1);

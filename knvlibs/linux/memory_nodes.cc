@@ -25,7 +25,7 @@ bool ParseNodeList(std::string_view text, std::vector<uint64_t>* nodes) {
     uint64_t first = 0;
     if (!ParseNumber(range.substr(0, dash), &first)) return false;
     uint64_t last = first;
-    if (dash != range.npos && !ParseNumber(range.substr(dash + 1), &last)) return false;
+    if (dash != std::string_view::npos && !ParseNumber(range.substr(dash + 1), &last)) return false;
     if (last < first || last >= kMaxNodes || (!nodes->empty() && first <= nodes->back())) {
       return false;
     }

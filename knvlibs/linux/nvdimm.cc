@@ -33,8 +33,6 @@ struct Namespace {
   // As the device and those made of it are numbered: "1.0"
   std::string Number() const { return std::to_string(region) + '.' + std::to_string(number); }
   std::string Name() const { return std::string(kNamespacePrefix) + Number(); }
-
-  friend auto operator<=>(const Namespace&, const Namespace&) = default;
 };
 
 struct Devices {
@@ -49,7 +47,7 @@ bool ParseRegion(std::string_view name, uint64_t* region) {
 bool ParseNamespace(std::string_view name, Namespace* result) {
   if (!TakePrefix(&name, kNamespacePrefix)) return false;
   const size_t dot = name.find('.');
-  return dot != name.npos && ParseNumber(name.substr(0, dot), &result->region) &&
+  return dot != std::string_view::npos && ParseNumber(name.substr(0, dot), &result->region) &&
          ParseNumber(name.substr(dot + 1), &result->number);
 }
 
@@ -69,7 +67,8 @@ Status ReadDevices(const LinuxHost& host, Devices* devices) {
     }
   }
   std::ranges::sort(devices->regions);
-  std::ranges::sort(devices->namespaces);
+  std::ranges::sort(devices->namespaces, {},
+                    [](const Namespace& space) { return std::pair(space.region, space.number); });
   return kOk;
 }
 
@@ -222,7 +221,7 @@ Status ReadRegion(const LinuxHost& host, const Keys& keys, Buffer buffer) {
   const std::string name = space.Name();
   status = host.ReadNumber(FileOf(name, "size"), &size);
   if (status == kOk) status = ReadTextIfAny(host, FileOf(name, "holder"), &holder);
-  if (holder.find('/') != holder.npos) return NotUnderstood(FileOf(name, "holder"), 1);
+  if (holder.find('/') != std::string::npos) return NotUnderstood(FileOf(name, "holder"), 1);
   if (status == kOk) status = ReadTextIfAny(host, FileOf(name, "uuid"), &uuid);
   if (status == kOk) {
     status = ReadNumberIfAny(host, FileOf(keys[0].text, "read_only"), &readOnly);

@@ -53,7 +53,7 @@ void AppendValue(Source& source, std::string_view path, KeyList keys, std::strin
   const Status status = GetValue(source, path, keys, std::span(record).first(node->recordSize));
   if (status != kOk) {
     std::array<char, 32> line;
-    std::snprintf(line.data(), line.size(), "  status %#x\n", status);
+    (void)std::snprintf(line.data(), line.size(), "  status %#x\n", status);
     *text += line.data();
     return;
   }

@@ -202,7 +202,14 @@ TEST(LiveHostTest, SlabCachesAreThoseOfSlabtop) {
   const std::map<std::string, KSI_HeapStats> heaps = HeapsOfThisMachine();
   std::istringstream rows(Shell("slabtop -o -s c | awk '$7 ~ /^[0-9]+K$/'"));
   size_t compared = 0;
-  std::string objects, active, use, objectSize, slabs, perSlab, cacheSize, name;
+  std::string objects;
+  std::string active;
+  std::string use;
+  std::string objectSize;
+  std::string slabs;
+  std::string perSlab;
+  std::string cacheSize;
+  std::string name;
   while (rows >> objects >> active >> use >> objectSize >> slabs >> perSlab >> cacheSize >> name) {
     const auto heap = heaps.find(name);
     ASSERT_NE(heap, heaps.end()) << name;
