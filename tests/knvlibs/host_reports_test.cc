@@ -25,6 +25,7 @@ const Report kReports[] = {
     {"pshareHint-stats", {}},
     {"buddy-stats", {}},
     {"comp-stats", {}},
+    {"lpool-stats", {}},
     {"heap-stats", {}},
     {"pmem-stats", {}},
     {"pmem-stats", {"-l", "2", "-u", "mb"}},
