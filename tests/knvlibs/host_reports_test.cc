@@ -21,6 +21,15 @@ struct Report {
 
 // Comma-separated, for there is no title with the time of day in it.
 const Report kReports[] = {
+    {"group-stats", {}},
+    {"group-stats", {"-t", "-i", "sys", "-u", "mb", "-s", "name:min:max:consumed:flags:tag"}},
+    {"vm-stats", {}},
+    {"uw-stats", {}},
+    {"swap-stats", {}},
+    {"guest-stats", {}},
+    {"zip-stats", {}},
+    {"lpage-stats", {}},
+    {"asyncremap-stats", {}},
     {"pshare-stats", {}},
     {"pshareHint-stats", {}},
     {"buddy-stats", {}},

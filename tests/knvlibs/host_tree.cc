@@ -68,6 +68,54 @@ std::vector<std::string> Listed(Source& source, std::string_view path, KeyList k
   return names;
 }
 
+// Appends a record in one line without its zeros; nothing for one that is not there.
+void AppendShort(Source& source, std::string_view path, KeyList keys, std::string_view indent,
+                 std::string* text) {
+  const Node* node = FindNode(path);
+  std::array<std::byte, kMaxRecordSize> record = {};
+  const Status status = GetValue(source, path, keys, std::span(record).first(node->recordSize));
+  if (status == KSI_STATUS_NOT_FOUND) return;
+  *text += indent;
+  *text += "  " + std::string(path.substr(path.rfind('/') + 1)) + ":";
+  if (status != kOk) {
+    std::array<char, 32> words;
+    std::snprintf(words.data(), words.size(), " status %#x", status);
+    *text += words.data();
+  }
+  for (const Field& field : node->fields) {
+    const std::string figure = TextOf(field, &record[field.offset]);
+    if (figure != "0") *text += std::string(" ") + field.name + " " + figure;
+  }
+  *text += "\n";
+}
+
+void AppendClient(Source& source, int64_t client, const std::string& indent, std::string* text) {
+  *text += indent + "  client " + std::to_string(client) + "\n";
+  for (const std::string_view path :
+       {"worldGroups/vmmLeaderID", "sched/memClients/tally/totalCommon",
+        "sched/memClients/tally/uw", "sched/memClients/tally/vmm", "sched/memClients/tally/guest",
+        "sched/memClients/swapInfo", "sched/memClients/memzipInfo", "memory/lpage/vmLPage"}) {
+    AppendShort(source, path, {client}, indent + "  ", text);
+  }
+  EXPECT_EQ(Listed(source, "sched/memClients/remapTypes", {client}), std::vector<std::string>());
+}
+
+void AppendGroup(Source& source, int64_t group, const std::string& indent, std::string* text) {
+  *text += indent + "group " + std::to_string(group) + "\n";
+  for (const std::string_view path :
+       {"sched/groups/groupName", "sched/groups/groupTag", "sched/groups/parentGroupID",
+        "sched/groups/groupFlags", "sched/groups/groupLeaderID", "sched/groups/memAllocationInKB",
+        "sched/groups/stats/capacity", "sched/groups/stats/memoryStats"}) {
+    AppendShort(source, path, {group}, indent, text);
+  }
+  for (const int64_t client : GetIds(source, "sched/groups/members/memClients", {group})) {
+    AppendClient(source, client, indent, text);
+  }
+  for (const int64_t child : GetIds(source, "sched/groups/members/groups", {group})) {
+    AppendGroup(source, child, indent + "  ", text);
+  }
+}
+
 }  // namespace
 
 HostTree::HostTree() : root_((std::filesystem::temp_directory_path() / "hostXXXXXX").string()) {
@@ -136,6 +184,21 @@ std::string HostText(Source& source) {
       AppendValue(source, "memory/pmem/volumes/regionStore/regions/info", {volume, region}, &text);
     }
   }
+  return text;
+}
+
+std::vector<int64_t> GetIds(Source& source, std::string_view path, KeyList keys) {
+  ParamList list(ParamList::kNoLimit);
+  EXPECT_EQ(source.Instances(*FindNode(path), KeysOf(keys), list), kOk) << path;
+  std::vector<int64_t> ids;
+  for (size_t i = 0; i < list.Count(); ++i) ids.push_back(static_cast<int64_t>(list.Number(i)));
+  return ids;
+}
+
+std::string GroupsText(Source& source) {
+  std::string text;
+  AppendShort(source, "sched/globalStats/numVMs", {}, "", &text);
+  AppendGroup(source, 0, "", &text);
   return text;
 }
 

@@ -55,6 +55,13 @@ Status GetNames(Source& source, std::string_view path, KeyList keys,
 // All that the source tells of the host as a whole, a line for each figure.
 std::string HostText(Source& source);
 
+// All that it tells of groups and their clients, as the walk meets them: a line for each record
+// with the figures that are not 0.
+std::string GroupsText(Source& source);
+
+// The ids that the node at `path` lists; none, and a failed test, if it cannot be read.
+std::vector<int64_t> GetIds(Source& source, std::string_view path, KeyList keys);
+
 }  // namespace ksi
 
 #endif  // TESTS_KNVLIBS_HOST_TREE_H_

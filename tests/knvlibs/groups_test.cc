@@ -1,0 +1,337 @@
+// Groups and user worlds, from recorded hosts and from files that are out of the ordinary. What
+// each figure is to be is in docs/linux-host.md.
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstring>
+#include <filesystem>
+#include <string>
+
+#include "knvlibs/include/knvlibs/ksi_records.h"
+#include "knvlibs/linux/groups.h"
+#include "knvlibs/linux/linux_source.h"
+#include "tests/harness/golden.h"
+#include "tests/knvlibs/host_tree.h"
+
+namespace ksi {
+namespace {
+
+class RecordedGroupsTest : public testing::TestWithParam<const char*> {};
+
+TEST_P(RecordedGroupsTest, TellsTheFiguresOfTheGroups) {
+  LinuxSource source(RecordedHost(GetParam()));
+  harness::ExpectGolden(std::string("knvlibs/hosts/") + GetParam() + ".groups.txt",
+                        GroupsText(source));
+}
+
+INSTANTIATE_TEST_SUITE_P(Hosts, RecordedGroupsTest,
+                         testing::Values("cgroup-v1-vm", "systemd-server", "kvm-two-nodes"),
+                         [](const auto& host) {
+                           std::string name = host.param;
+                           std::erase(name, '-');
+                           return name;
+                         });
+
+// A host of cgroup version 2 with one cgroup, "work" (id 7), and one process in it, 100.
+class GroupsTest : public testing::Test {
+ protected:
+  static constexpr int64_t kWork = 7;
+  static constexpr int32_t kPid = 100;
+
+  GroupsTest() {
+    tree_.Write("/proc/meminfo",
+                "MemTotal: 1024 kB\nMemFree: 24 kB\nSlab: 8 kB\nPageTables: 4 kB\n"
+                "VmallocUsed: 4 kB\nSwapTotal: 0 kB\nSwapFree: 0 kB\n");
+    tree_.Write("/sys/fs/cgroup/cgroup.controllers", "cpu memory\n");
+    tree_.Write("/sys/fs/cgroup/cgroup.procs", "");
+    WriteCgroup("/work", kWork, "100\n");
+    WriteProcess(kPid, "worker");
+  }
+
+  void WriteCgroup(const std::string& path, int64_t id, const std::string& processes) {
+    const std::string directory = "/sys/fs/cgroup" + path + "/";
+    tree_.Write(directory + "cgroup.id", std::to_string(id) + "\n");
+    tree_.Write(directory + "cgroup.procs", processes);
+    tree_.Write(directory + "memory.current", "1048576\n");
+    tree_.Write(directory + "memory.stat", "kernel 4096\nactive_anon 8192\nactive_file 4096\n");
+    tree_.Write(directory + "memory.min", "0\n");
+    tree_.Write(directory + "memory.max", "max\n");
+  }
+
+  void WriteProcess(int32_t pid, const std::string& name, const std::string& more = "") {
+    tree_.Write(ProcessFile(pid, "status"),
+                "Name:\t" + name + "\nState:\tS (sleeping)\nPPid:\t1\n" + more +
+                    "VmPeak:\t 900 kB\nVmSize:\t 800 kB\n"
+                    "VmHWM:\t 500 kB\nVmRSS:\t 400 kB\nRssAnon:\t 100 kB\n"
+                    "RssFile:\t 290 kB\nRssShmem:\t 10 kB\n"
+                    "VmPTE:\t 12 kB\nVmSwap:\t 20 kB\nThreads:\t1\n");
+    tree_.Write(ProcessFile(pid, "limits"),
+                "Max address space         unlimited            unlimited            bytes     \n");
+    tree_.Write(ProcessFile(pid, "smaps_rollup"),
+                "0-1000 ---p 00000000 00:00 0          [rollup]\nRss: 400 kB\nReferenced: 300 kB\n"
+                "Private_Clean: 60 kB\nPrivate_Dirty: 100 kB\nLocked: 0 kB\n");
+  }
+
+  template <class Record>
+  Record Get(std::string_view path, int64_t key) {
+    LinuxSource source(tree_.Root());
+    Record record = {};
+    EXPECT_EQ(GetValue(source, path, {key}, &record), kOk) << path;
+    return record;
+  }
+
+  template <class Record>
+  Status StatusOf(std::string_view path, int64_t key) {
+    LinuxSource source(tree_.Root());
+    Record record = {};
+    return GetValue(source, path, {key}, &record);
+  }
+
+  std::string NameOf(int64_t group) {
+    const auto name = Get<KSI_GroupName>("sched/groups/groupName", group);
+    return {name.text, strnlen(name.text, sizeof name.text)};
+  }
+
+  uint32_t FlagsOf(int64_t group) { return Get<uint32_t>("sched/groups/groupFlags", group); }
+
+  HostTree tree_;
+};
+
+TEST_F(GroupsTest, AProcessStandsBelowItsCgroup) {
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
+            (std::vector<int64_t>{kKernelGroup, kWork}));
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kWork}),
+            (std::vector<int64_t>{kProcessGroup + kPid}));
+  EXPECT_EQ(GetIds(source, "sched/groups/members/memClients", {kProcessGroup + kPid}),
+            (std::vector<int64_t>{kPid}));
+  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + kPid), kWork);
+  EXPECT_EQ(Get<int32_t>("sched/groups/groupLeaderID", kProcessGroup + kPid), kPid);
+  EXPECT_EQ(FlagsOf(kProcessGroup + kPid), uint32_t{KSI_GROUP_USER_WORLD | KSI_GROUP_LEAF});
+}
+
+TEST_F(GroupsTest, WithoutARecordedIdACgroupHasThatOfItsDirectory) {
+  const std::string directory = tree_.Root() + "/sys/fs/cgroup/work";
+  std::filesystem::remove(directory + "/cgroup.id");
+  struct stat status = {};
+  ASSERT_EQ(stat(directory.c_str(), &status), 0);
+  EXPECT_EQ(NameOf(static_cast<int64_t>(status.st_ino)), "work");
+}
+
+TEST_F(GroupsTest, WithoutCgroupsProcessesStandBelowTheRoot) {
+  std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup");
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
+            (std::vector<int64_t>{kKernelGroup, kProcessGroup + kPid}));
+}
+
+TEST_F(GroupsTest, AProcessThatNoCgroupListsTellsWhereItIs) {
+  WriteProcess(101, "moved");
+  tree_.Write("/proc/101/cgroup", "1:cpu,cpuacct:/\n0::/work\n");
+  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + 101), kWork);
+  WriteProcess(102, "outside");
+  tree_.Write("/proc/102/cgroup", "0::/../..\n");
+  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + 102), kRootGroup);
+}
+
+TEST_F(GroupsTest, WhatDoesNotExistIsNotFound) {
+  for (const int64_t id : {int64_t{-1}, int64_t{8}, kProcessGroup + 101, kVmmGroup + kPid}) {
+    EXPECT_EQ(StatusOf<KSI_GroupName>("sched/groups/groupName", id), KSI_STATUS_NOT_FOUND) << id;
+  }
+  EXPECT_EQ(StatusOf<int32_t>("sched/groups/groupLeaderID", kWork), KSI_STATUS_NOT_FOUND);
+  for (const int64_t id : {int64_t{-1}, int64_t{0}, int64_t{101}, kProcessGroup}) {
+    EXPECT_EQ(StatusOf<KSI_UwTally>("sched/memClients/tally/uw", id), KSI_STATUS_NOT_FOUND) << id;
+  }
+  EXPECT_EQ(StatusOf<KSI_VmmTally>("sched/memClients/tally/vmm", kPid), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(StatusOf<int32_t>("worldGroups/vmmLeaderID", kPid), KSI_STATUS_NOT_FOUND);
+}
+
+TEST_F(GroupsTest, NamesAreDecodedAndHarmless) {
+  WriteCgroup("/a\\x2db\\x0ac.slice", 8, "");
+  EXPECT_EQ(NameOf(8), "a-b?c.slice");
+  WriteProcess(kPid, "(a) b: \x1b[2Jc\\n");
+  EXPECT_EQ(NameOf(kProcessGroup + kPid), "(a) b: ?[2Jc\\n");
+  const std::string longName(70, 'n');
+  WriteCgroup("/" + longName, 9, "");
+  EXPECT_EQ(NameOf(9), longName.substr(0, 64));
+}
+
+TEST_F(GroupsTest, FlagsTellWhatACgroupIs) {
+  int64_t id = 20;
+  const auto flags = [&](const std::string& path) {
+    WriteCgroup(path, ++id, "");
+    return FlagsOf(id) & ~uint32_t{KSI_GROUP_LEAF};
+  };
+  EXPECT_EQ(FlagsOf(kRootGroup), uint32_t{KSI_GROUP_PREDEFINED});
+  EXPECT_EQ(flags("/system.slice"), uint32_t{KSI_GROUP_PREDEFINED | KSI_GROUP_SYSTEM_WORLD});
+  EXPECT_EQ(flags("/init.scope"),
+            uint32_t{KSI_GROUP_PREDEFINED | KSI_GROUP_SYSTEM_WORLD | KSI_GROUP_NON_PERSISTENT});
+  EXPECT_EQ(flags("/system.slice/x.service"), uint32_t{KSI_GROUP_SYSTEM_WORLD});
+  EXPECT_EQ(flags("/user.slice"), uint32_t{KSI_GROUP_PREDEFINED | KSI_GROUP_USER_CREATED});
+  EXPECT_EQ(flags("/user.slice/system.slice"), uint32_t{KSI_GROUP_USER_CREATED});
+  EXPECT_EQ(flags("/machine.slice"), uint32_t{KSI_GROUP_PREDEFINED | KSI_GROUP_USER_CREATED});
+  EXPECT_EQ(flags("/machine.slice/libpod-1.scope"),
+            uint32_t{KSI_GROUP_USER_CREATED | KSI_GROUP_NON_PERSISTENT | KSI_GROUP_CONTAINER});
+  EXPECT_EQ(flags("/machine.slice/libpod-1.scope/container"),
+            uint32_t{KSI_GROUP_USER_CREATED | KSI_GROUP_SUB_CONTAINER});
+  EXPECT_EQ(flags("/machine.slice/libpod-conmon-1.scope"),
+            uint32_t{KSI_GROUP_USER_CREATED | KSI_GROUP_NON_PERSISTENT});
+  EXPECT_EQ(flags("/kubepods"), uint32_t{KSI_GROUP_PREDEFINED | KSI_GROUP_USER_CREATED});
+  EXPECT_EQ(flags("/kubepods/" + std::string(64, 'a')),
+            uint32_t{KSI_GROUP_USER_CREATED | KSI_GROUP_CONTAINER});
+}
+
+TEST_F(GroupsTest, KernelThreadsAndTheDeadAreNoUserWorlds) {
+  tree_.Write("/proc/2/status", "Name:\tkthreadd\nState:\tS (sleeping)\nPPid:\t0\nThreads:\t1\n");
+  tree_.Write("/proc/3/status", "Name:\tksmd\nState:\tS (sleeping)\nPPid:\t2\nThreads:\t1\n");
+  tree_.Write("/proc/4/status", "Name:\tnew\nState:\tS (sleeping)\nPPid:\t9\nKthread:\t1\n");
+  tree_.Write("/proc/5/status", "Name:\tdead\nState:\tZ (zombie)\nPPid:\t9\nThreads:\t1\n");
+  tree_.Write("/proc/6/status", "Name:\tending\nState:\tR (running)\nPPid:\t9\nThreads:\t1\n");
+  std::filesystem::create_directories(tree_.Root() + "/proc/8");
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
+            (std::vector<int64_t>{kKernelGroup, kWork}));
+}
+
+TEST_F(GroupsTest, ReservationsAddUpAndLimitsMayBeMissing) {
+  tree_.Write("/sys/fs/cgroup/work/memory.min", "65536\n");
+  tree_.Write("/sys/fs/cgroup/work/memory.max", "1048576\n");
+  const auto allocation = Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kWork);
+  EXPECT_EQ(int64_t{allocation.min}, 64);
+  EXPECT_EQ(int64_t{allocation.max}, 1024);
+  const auto root = Get<KSI_GroupCapacity>("sched/groups/stats/capacity", kRootGroup);
+  EXPECT_EQ(uint64_t{root.conResv}, 64u);
+  EXPECT_EQ(uint64_t{root.availResv}, 960u);
+  const auto work = Get<KSI_GroupCapacity>("sched/groups/stats/capacity", kWork);
+  EXPECT_EQ(uint64_t{work.availResv}, 64u);
+  const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kWork);
+  EXPECT_EQ(uint64_t{stats.eMin}, kNoValue);
+
+  tree_.Write("/sys/fs/cgroup/work/memory.min", "max\n");
+  std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/work/memory.max");
+  const auto without = Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kWork);
+  EXPECT_EQ(int64_t{without.max}, -1);
+}
+
+TEST_F(GroupsTest, ACgroupWithoutTheControllerHasNoFigures) {
+  for (const char* file : {"memory.current", "memory.stat", "memory.min", "memory.max"}) {
+    std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/work/" + file);
+  }
+  const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kWork);
+  EXPECT_EQ(uint64_t{stats.consumed}, kNoValue);
+  EXPECT_EQ(uint64_t{stats.memSize}, kNoValue);
+  EXPECT_EQ(uint64_t{stats.bMin}, 0u);
+}
+
+TEST_F(GroupsTest, WhatVanishesAfterTheScanIsNotFound) {
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kWork}).size(), 1u);
+  std::filesystem::remove_all(tree_.Root() + "/proc/100");
+  std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup/work");
+  KSI_UwTally tally = {};
+  EXPECT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
+            KSI_STATUS_NOT_FOUND);
+  KSI_GroupMemoryStats stats = {};
+  EXPECT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kWork}, &stats),
+            KSI_STATUS_NOT_FOUND);
+}
+
+TEST_F(GroupsTest, AnEndedProcessIsNotFoundThoughItWaits) {
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kWork}).size(), 1u);
+  std::filesystem::remove(tree_.Root() + "/proc/100/smaps_rollup");
+  tree_.Write("/proc/100/status", "Name:\tworker\nState:\tZ (zombie)\nPPid:\t1\n");
+  KSI_UwTally tally = {};
+  EXPECT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
+            KSI_STATUS_NOT_FOUND);
+}
+
+TEST_F(GroupsTest, WhatIsNotUnderstoodIsToldOnceAndLeftOut) {
+  for (int32_t pid = 201; pid < 204; ++pid) {
+    tree_.Write(ProcessFile(pid, "status"), "Name:\tx\nVmSize:\tmuch\n");
+  }
+  testing::internal::CaptureStderr();
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "/proc/201/status: line 2 is not understood\n");
+
+  tree_.Write("/sys/fs/cgroup/work/memory.current", "plenty\n");
+  tree_.Write("/proc/100/limits", "Max address space         vast\n");
+  testing::internal::CaptureStderr();
+  LinuxSource again(tree_.Root());
+  KSI_GroupMemoryStats stats = {};
+  KSI_UwTally tally = {};
+  for (int i = 0; i < 2; ++i) {
+    EXPECT_EQ(GetValue(again, "sched/groups/stats/memoryStats", {kWork}, &stats),
+              KSI_STATUS_INVALID_METADATA);
+    EXPECT_EQ(GetValue(again, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
+              KSI_STATUS_INVALID_METADATA);
+  }
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "/proc/201/status: line 2 is not understood\n"
+            "/sys/fs/cgroup/work/memory.current: line 1 is not understood\n"
+            "/proc/100/limits: line 1 is not understood\n");
+}
+
+TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
+  WriteProcess(101, "other");
+  WriteProcess(102, "hidden");
+  tree_.Lock("/proc/100/smaps_rollup");
+  tree_.Lock("/proc/101/smaps_rollup");
+  tree_.Lock("/proc/102/status");
+  const auto asNobody = [&] {
+    constexpr uid_t kNobody = 65534;
+    if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
+    LinuxSource source(tree_.Root());
+    bool isRight = true;
+    for (const int64_t pid : {100, 101}) {
+      KSI_UwTally tally = {};
+      isRight = isRight && GetValue(source, "sched/memClients/tally/uw", {pid}, &tally) == kOk;
+      isRight = isRight && tally.mapped == 400 && tally.touched == kNoValue &&
+                tally.swappable == kNoValue && tally.pinned == kNoValue;
+    }
+    KSI_GroupName name = {};
+    isRight = isRight && GetValue(source, "sched/groups/groupName", {kProcessGroup + 102}, &name) ==
+                             KSI_STATUS_NOT_FOUND;
+    _exit(isRight ? 0 : 1);
+  };
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0),
+              "^/proc/PID/status: not permitted for some processes: they are left out\n"
+              "/proc/100/smaps_rollup: not permitted, as for other processes: figures that take a "
+              "walk of their memory have no value\n$");
+}
+
+TEST_F(GroupsTest, ALockedCgroupIsDeniedAndNoZero) {
+  tree_.Lock("/sys/fs/cgroup/work/memory.current");
+  const auto asNobody = [&] {
+    constexpr uid_t kNobody = 65534;
+    if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
+    _exit(StatusOf<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kWork) ==
+                  KSI_STATUS_PERMISSION_DENIED
+              ? 0
+              : 1);
+  };
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0), "^$");
+}
+
+TEST_F(GroupsTest, AKernelThatDoesNotWalkMemoryHasNoValueForIt) {
+  std::filesystem::remove(tree_.Root() + "/proc/100/smaps_rollup");
+  const auto tally = Get<KSI_UwTally>("sched/memClients/tally/uw", kPid);
+  EXPECT_EQ(uint64_t{tally.mapped}, 400u);
+  EXPECT_EQ(uint64_t{tally.touched}, kNoValue);
+}
+
+TEST_F(GroupsTest, AddressSpacesHaveLimits) {
+  const auto limit = [&](const std::string& soft) {
+    tree_.Write("/proc/100/limits", "Limit    Soft Limit\nMax address space         " + soft +
+                                        "   unlimited     bytes\n");
+    return int32_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).memSizeLimit};
+  };
+  EXPECT_EQ(limit("1048576"), 1024);
+  EXPECT_EQ(limit("unlimited"), -1);
+  EXPECT_EQ(limit("8796093022208"), -1) << "too large for the field";
+}
+
+}  // namespace
+}  // namespace ksi

@@ -1,0 +1,198 @@
+// Groups and their processes on the machine itself, compared with what other programs make of the
+// same files. Where figures move, the tolerance is named.
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <array>
+#include <chrono>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <sstream>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "knvlibs/include/knvlibs/ksi_records.h"
+#include "knvlibs/linux/groups.h"
+#include "knvlibs/linux/linux_source.h"
+#include "tests/harness/program.h"
+#include "tests/harness/tally.h"
+#include "tests/knvlibs/host_tree.h"
+
+namespace ksi {
+namespace {
+
+std::string Shell(const std::string& command) {
+  std::string text;
+  const std::unique_ptr<FILE, int (*)(FILE*)> pipe(popen(command.c_str(), "r"), pclose);
+  std::array<char, 4096> part;
+  while (const size_t size = fread(part.data(), 1, part.size(), pipe.get())) {
+    text.append(part.data(), size);
+  }
+  return text;
+}
+
+// A child that runs a program until its owner goes.
+class Child {
+ public:
+  explicit Child(const std::vector<std::string>& words) {
+    std::vector<char*> arguments;
+    for (const std::string& word : words) arguments.push_back(const_cast<char*>(word.c_str()));
+    arguments.push_back(nullptr);
+    pid_ = fork();
+    if (pid_ == 0) {
+      execvp(arguments[0], arguments.data());
+      _exit(127);
+    }
+  }
+  Child(Child&& other) noexcept : pid_(std::exchange(other.pid_, -1)) {}
+  Child(const Child&) = delete;
+  Child& operator=(const Child&) = delete;
+  ~Child() {
+    if (pid_ < 0) return;
+    kill(pid_, SIGKILL);
+    waitpid(pid_, nullptr, 0);
+  }
+
+  pid_t Pid() const { return pid_; }
+
+ private:
+  pid_t pid_;
+};
+
+// What tally says without a cache, that is of this machine.
+harness::Result TallyLive(const std::vector<std::string>& args) {
+  return harness::RunProgram(harness::BuiltTally(args));
+}
+
+TEST(LiveGroupsTest, AChildIsAUserWorldWithTheFiguresOfPs) {
+  const Child child({"sleep", "60"});
+  std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  const std::string pid = std::to_string(child.Pid());
+  LinuxSource source("/");
+  KSI_UwTally tally = {};
+  ASSERT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{child.Pid()}}, &tally), kOk);
+  // Asleep, it does not move.
+  EXPECT_EQ(std::to_string(tally.memSize),
+            std::to_string(std::stoul(Shell("ps -o vsz= -p " + pid))));
+  EXPECT_NEAR(static_cast<double>(tally.mapped), std::stod(Shell("ps -o rss= -p " + pid)), 256);
+  const std::string rollup = "/proc/" + pid + "/smaps_rollup";
+  if (access(rollup.c_str(), R_OK) == 0) {
+    EXPECT_NEAR(static_cast<double>(tally.touched),
+                std::stod(Shell("awk '$1 == \"Referenced:\" { print $2 }' " + rollup)), 64);
+  }
+  KSI_GroupName name = {};
+  ASSERT_EQ(GetValue(source, "sched/groups/groupName", {kProcessGroup + child.Pid()}, &name), kOk);
+  EXPECT_STREQ(name.text, "sleep");
+}
+
+// Counts the groups of each kind as the walk meets them.
+void Count(Source& source, int64_t group, size_t* cgroups, size_t* userWorlds) {
+  for (const int64_t child : GetIds(source, "sched/groups/members/groups", {group})) {
+    uint32_t flags = 0;
+    if (GetValue(source, "sched/groups/groupFlags", {child}, &flags) != kOk) continue;
+    if ((flags & KSI_GROUP_USER_WORLD) != 0) {
+      ++*userWorlds;
+    } else if (child < kProcessGroup) {
+      ++*cgroups;
+      Count(source, child, cgroups, userWorlds);
+    }
+  }
+}
+
+TEST(LiveGroupsTest, GroupsAreTheCgroupsAndProcessesThatOthersCount) {
+  size_t cgroups = 0;
+  size_t userWorlds = 0;
+  LinuxSource source("/");
+  Count(source, 0, &cgroups, &userWorlds);
+  const std::string directory =
+      access("/sys/fs/cgroup/memory/cgroup.procs", F_OK) == 0 ? "memory" : "";
+  const double found =
+      std::stod(Shell("find /sys/fs/cgroup/" + directory + " -mindepth 1 -type d | wc -l"));
+  // Other programs come and go meanwhile.
+  EXPECT_NEAR(static_cast<double>(cgroups), found, 3);
+  const double counted = std::stod(Shell("ps -eo stat=,vsz= | awk '$1 !~ /^Z/ && $2 > 0' | wc -l"));
+  EXPECT_NEAR(static_cast<double>(userWorlds), counted, 0.2 * counted + 10);
+}
+
+TEST(LiveGroupsTest, ACgroupHasTheFiguresOfItsFiles) {
+  LinuxHost host("/");
+  const GroupTree* tree = nullptr;
+  ASSERT_EQ(GroupTree::Get(host, &tree), kOk);
+  if (!tree->Cgroups().Exists()) GTEST_SKIP() << "this machine has no cgroups";
+  LinuxSource source("/");
+  for (const int64_t id : GetIds(source, "sched/groups/members/groups", {int64_t{0}})) {
+    const Group* group = tree->Find(id);
+    if (group == nullptr || group->kind != Group::Kind::kCgroup) continue;
+    const std::string file = Shell("ls /sys/fs/cgroup" + group->path +
+                                   "/memory.current "
+                                   "/sys/fs/cgroup/memory" +
+                                   group->path + "/memory.usage_in_bytes 2>/dev/null");
+    if (file.empty()) continue;
+    const double before = std::stod(Shell("cat " + file));
+    KSI_GroupMemoryStats stats = {};
+    ASSERT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {id}, &stats), kOk);
+    // A tenth and 64 MB for a machine at work.
+    EXPECT_NEAR(static_cast<double>(stats.consumed), before / 1024, before / 10240 + 65536)
+        << group->path;
+  }
+}
+
+TEST(LiveGroupsTest, ReportsStandAStormOfProcesses) {
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(4);
+  std::thread storm([&] {
+    std::vector<Child> children;
+    while (std::chrono::steady_clock::now() < end) {
+      for (int i = 0; i < 200; ++i) children.emplace_back(std::vector<std::string>{"sleep", "60"});
+      children.clear();
+    }
+  });
+  while (std::chrono::steady_clock::now() < end) {
+    for (const char* report : {"group-stats", "uw-stats", "vm-stats", "asyncremap-stats"}) {
+      const harness::Result run = TallyLive({"-r", report, "-q"});
+      EXPECT_EQ(run.status, 0) << report << "\n" << run.err;
+      EXPECT_NE(run.out, "");
+    }
+  }
+  storm.join();
+}
+
+TEST(LiveGroupsTest, AGuestIsAVirtualMachine) {
+  if (std::system("command -v qemu-system-x86_64 >/dev/null") != 0) {
+    GTEST_SKIP() << "this machine has no QEMU";
+  }
+  const HostTree directory;
+  const std::string socket = directory.Root() + "/monitor";
+  const Child guest({"qemu-system-x86_64", "-name", "guest=tally-test", "-accel", "tcg", "-M", "pc",
+                     "-m", "64", "-display", "none", "-serial", "none", "-monitor", "none",
+                     "-device", "virtio-balloon-pci,id=balloon0", "-qmp",
+                     "unix:" + socket + ",server=on,wait=off"});
+  // Until its firmware has run for a while.
+  for (int i = 0; i < 100 && access(socket.c_str(), F_OK) != 0; ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  }
+  std::this_thread::sleep_for(std::chrono::seconds(1));
+
+  const harness::Result run = TallyLive(
+      {"-r", "vm-stats", "-q", "-s", "name:b:worldGrp:memSizeLimit:memSize:ballooned:mapped"});
+  EXPECT_EQ(run.status, 0) << run.err;
+  const std::string start = "tally-test,y," + std::to_string(guest.Pid()) + ",65536,65536,0,";
+  const size_t row = run.out.find(start);
+  ASSERT_NE(row, std::string::npos) << run.out;
+  const double mapped = std::stod(run.out.substr(row + start.size()));
+  EXPECT_GT(mapped, 256) << "the firmware has touched some of it";
+  EXPECT_LE(mapped, 65536);
+  for (const char* report : {"swap-stats", "guest-stats", "zip-stats", "lpage-stats"}) {
+    const harness::Result other = TallyLive({"-r", report, "-q", "-s", "name:worldGrp"});
+    EXPECT_NE(other.out.find("tally-test," + std::to_string(guest.Pid())), std::string::npos)
+        << report << "\n"
+        << other.out << other.err;
+  }
+}
+
+}  // namespace
+}  // namespace ksi

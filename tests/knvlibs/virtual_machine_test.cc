@@ -1,0 +1,152 @@
+// What a QEMU command line and its monitor tell of a virtual machine.
+#include <gtest/gtest.h>
+
+#include "knvlibs/linux/json.h"
+#include "knvlibs/linux/qemu_command_line.h"
+#include "knvlibs/linux/qmp.h"
+#include "tests/knvlibs/host_tree.h"
+
+namespace ksi {
+namespace {
+
+constexpr uint64_t kGB = 1 << 20;
+
+QemuCommandLine Parse(std::vector<std::string> words) {
+  words.insert(words.begin(), "/usr/bin/qemu-system-x86_64");
+  return ParseQemuCommandLine(words);
+}
+
+TEST(QemuCommandLineTest, QemuIsKnownByItsProgram) {
+  EXPECT_TRUE(IsQemu({"/usr/bin/qemu-system-x86_64", "-m", "64"}));
+  EXPECT_TRUE(IsQemu({"qemu-system-aarch64"}));
+  EXPECT_TRUE(IsQemu({"/usr/libexec/qemu-kvm"}));
+  EXPECT_TRUE(IsQemu({"/usr/bin/kvm"}));
+  EXPECT_FALSE(IsQemu({"/usr/bin/qemu-img"}));
+  EXPECT_FALSE(IsQemu({"qemu-x86_64", "program"}));
+  EXPECT_FALSE(IsQemu({"vi", "/usr/bin/qemu-system-x86_64"}));
+  EXPECT_FALSE(IsQemu({}));
+  EXPECT_FALSE(IsQemu({""}));
+}
+
+TEST(QemuCommandLineTest, MemoryHasManyForms) {
+  EXPECT_EQ(Parse({"-m", "64"}).memory, 64 * 1024u);
+  EXPECT_EQ(Parse({"-m", "4G"}).memory, 4 * kGB);
+  EXPECT_EQ(Parse({"-m", "4g"}).memory, 4 * kGB);
+  EXPECT_EQ(Parse({"--m", "size=4194304k"}).memory, 4 * kGB);
+  EXPECT_EQ(Parse({"-m", "size=2T,slots=4,maxmem=4T"}).memory, 2048 * kGB);
+  EXPECT_EQ(Parse({"-m", "1G,slots=4,maxmem=4294967296B"}).maxMemory, 4 * kGB);
+  EXPECT_EQ(Parse({"-m", "1G"}).maxMemory, kGB);
+  for (const char* strange : {"", "x", "4X", "-4", "1.5G", "99999999999999999999", "16777216E"}) {
+    EXPECT_EQ(Parse({"-m", strange}).memory, kNoValue) << strange;
+  }
+  EXPECT_EQ(Parse({"-m"}).memory, kNoValue);
+  EXPECT_TRUE(Parse({}).blocks.empty());
+}
+
+TEST(QemuCommandLineTest, BackendsAreNodesOrModules) {
+  const QemuCommandLine nodes =
+      Parse({"-m", "4G", "-object", "memory-backend-ram,id=a,size=1G", "-object",
+             R"({"qom-type":"memory-backend-memfd","id":"b","size":3221225472})"});
+  EXPECT_EQ(nodes.memory, 4 * kGB);
+  EXPECT_EQ(nodes.blocks, (std::vector<uint64_t>{kGB, 3 * kGB}));
+
+  const QemuCommandLine module =
+      Parse({"-m", "4G,maxmem=8G", "-object", "memory-backend-ram,id=a,size=1G", "-device",
+             R"({"driver":"pc-dimm","id":"d","memdev":"a"})"});
+  EXPECT_EQ(module.memory, 5 * kGB);
+  EXPECT_EQ(module.maxMemory, 8 * kGB);
+  EXPECT_EQ(module.blocks, (std::vector<uint64_t>{4 * kGB, kGB}));
+
+  const QemuCommandLine persistent = Parse(
+      {"-m", "4G", "-object", "memory-backend-file,id=n,size=1G", "-device", "nvdimm,memdev=n"});
+  EXPECT_EQ(persistent.memory, 4 * kGB);
+  EXPECT_EQ(persistent.blocks, (std::vector<uint64_t>{4 * kGB}));
+}
+
+TEST(QemuCommandLineTest, NamesMayHaveCommas) {
+  EXPECT_EQ(Parse({"-name", "web"}).name, "web");
+  EXPECT_EQ(Parse({"-name", "guest=a,,b,debug-threads=on"}).name, "a,b");
+  EXPECT_EQ(Parse({"-name", "debug-threads=on"}).name, "");
+}
+
+TEST(QemuCommandLineTest, MonitorsAreNamedInThreeWays) {
+  EXPECT_EQ(Parse({"-qmp", "unix:/run/q,server=on,wait=off"}).monitor, "/run/q");
+  EXPECT_EQ(
+      Parse({"-chardev", "socket,id=m,path=/run/q", "-mon", "chardev=m,mode=control"}).monitor,
+      "/run/q");
+  EXPECT_EQ(Parse({"-chardev", "socket,id=m,path=/run/q", "-mon", "m,mode=readline"}).monitor, "");
+  EXPECT_EQ(Parse({"-chardev", "socket,id=m,fd=33", "-mon", "m,mode=control"}).monitor, "");
+  EXPECT_EQ(Parse({"-qmp", "unix:here,server=on"}).monitor, "");
+  EXPECT_EQ(Parse({"-qmp", "tcp:localhost:4444"}).monitor, "");
+}
+
+TEST(JsonTest, ReadsWhatIsOneValueAndNothingElse) {
+  const auto json =
+      ParseJson(R"( {"a": [1, {"b": "x\"\u0041\n"}], "c": -1, "d": null, "e": true} )");
+  ASSERT_TRUE(json);
+  EXPECT_EQ(json->Find("c")->Unsigned(), std::nullopt);
+  const auto& elements = std::get<Json::Elements>(json->Find("a")->value);
+  EXPECT_EQ(elements[0].Unsigned(), 1u);
+  EXPECT_EQ(*elements[1].Find("b")->Text(), "x\"A\n");
+  EXPECT_EQ(elements[1].Find("missing"), nullptr);
+  for (const char* broken :
+       {"", "{", "{\"a\"}", "[1,]", "{}x", "\"open", "\"\\q\"", "\"\\u12\"", "tru", "{\"a\":1,}"}) {
+    EXPECT_FALSE(ParseJson(broken)) << broken;
+  }
+  EXPECT_FALSE(ParseJson(std::string(100000, '[')));
+}
+
+class QmpTest : public testing::Test {
+ protected:
+  GuestMemory Ask(const std::string& text) {
+    tree_.Write("/run/q", text);
+    QemuCommandLine line;
+    line.monitor = "/run/q";
+    line.hasBalloon = true;
+    line.balloon = "balloon0";
+    return ReadGuestMemory(LinuxHost(tree_.Root()), 100, line);
+  }
+
+  const std::string hello_ = "{\"QMP\": {}}\n{\"return\": {}}\n";
+  HostTree tree_;
+};
+
+TEST_F(QmpTest, TellsTheBalloonAndTheGuest) {
+  const GuestMemory memory =
+      Ask(hello_ +
+          "{\"event\": \"X\"}\n{\"return\": {\"actual\": 1048576}}\n"
+          "{\"return\": {\"stats\": {\"stat-total-memory\": 4096, "
+          "\"stat-available-memory\": 18446744073709551615}, \"last-update\": 5}}\n");
+  EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kActive);
+  EXPECT_EQ(memory.actual, 1024u);
+  EXPECT_EQ(memory.total, 4u);
+  EXPECT_EQ(memory.available, kNoValue);
+}
+
+TEST_F(QmpTest, StatisticsThatWereNeverSentAreNone) {
+  const GuestMemory memory = Ask(hello_ +
+                                 "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": "
+                                 "{\"stat-total-memory\": 4096}, \"last-update\": 0}}\n");
+  EXPECT_EQ(memory.actual, 1024u);
+  EXPECT_EQ(memory.total, kNoValue);
+}
+
+TEST_F(QmpTest, WithoutABalloonDeviceThereIsNone) {
+  const GuestMemory memory =
+      Ask(hello_ + "{\"error\": {\"class\": \"DeviceNotActive\", \"desc\": \"none\"}}\n");
+  EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kNone);
+}
+
+TEST_F(QmpTest, WhatAnswersOtherwiseTellsNothing) {
+  for (const std::string& text :
+       {std::string(), std::string("220 mail\n"), std::string("{}\n"), hello_ + "nonsense\n",
+        hello_ + "{\"error\": {\"class\": \"CommandNotFound\"}}\n",
+        std::string("{\"QMP\": {}}\n")}) {
+    const GuestMemory memory = Ask(text);
+    EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kUnknown) << text;
+    EXPECT_EQ(memory.actual, kNoValue) << text;
+  }
+}
+
+}  // namespace
+}  // namespace ksi
