@@ -10,6 +10,7 @@
 //   cache STATUS                    what KSI_UseCache returns
 //   value NODE KEYS HEX             bytes of a value
 //   list NODE KEYS [ENTRY...]       instances: 5, 'name', or !STATUS for one that cannot be read
+//   count NODE KEYS NUMBER          how many instances their list says it has
 //   status NODE KEYS STATUS         a read that fails
 //   fail NUMBER STATUS              the NUMBER-th (from 1) of all fallible calls fails
 //   fail OPERATION NUMBER STATUS    the NUMBER-th call of one operation fails
@@ -187,6 +188,12 @@ class Double {
     return Answer(instances_, read, entries);
   }
 
+  // How many entries the list says it has.
+  uint32_t Count(const KSI_ParamList* list) const {
+    const auto count = counts_.find(list->instances);
+    return count == counts_.end() ? static_cast<uint32_t>(list->entries.size()) : count->second;
+  }
+
   void Exit() const {
     for (const auto& list : lists_) {
       if (!list->destroyed) {
@@ -256,6 +263,10 @@ class Double {
       statuses_[read] = StatusOf(words[3]);
       return true;
     }
+    if (words[0] == "count" && words.size() == 4) {
+      counts_[read] = static_cast<uint32_t>(Number(words[3]));
+      return true;
+    }
     statuses_.erase(read);
     if (words[0] == "value" && words.size() == 4) {
       values_[read] = script::Unhex(words[3]);
@@ -289,6 +300,7 @@ class Double {
   std::unordered_map<std::string, std::string> values_;
   std::unordered_map<std::string, std::vector<Entry>> instances_;
   std::unordered_map<std::string, uint32_t> statuses_;
+  std::unordered_map<std::string, uint32_t> counts_;
   std::map<std::pair<std::string, int>, uint32_t> failures_;
   std::map<std::string, int> callsOf_;
   int calls_ = 0;
@@ -511,7 +523,7 @@ TALLY_DOUBLE_EXPORT uint32_t KSI_ParamListUsedCount(KSI_ParamList* list) {
   Double& the = TheDouble();
   if (the.Usable(list, "UsedCount") == nullptr) return 0;
   the.Trace(Call("UsedCount", list->instances));
-  return static_cast<uint32_t>(list->entries.size());
+  return the.Count(list);
 }
 
 TALLY_DOUBLE_EXPORT uint32_t KSI_ParamListGetInt64(KSI_ParamList* list, uint32_t index,

@@ -50,7 +50,7 @@ Scenario Host(const std::vector<Name>& names) {
     instances.emplace_back(name.text);
     scenario.Bytes(kMemNodes, {name.memNode},
                    RawRecord(28).U8(0, static_cast<uint8_t>(name.memNode + 100)));
-    scenario.Bytes(kStats, {std::string_view(name.text).substr(0, 15)}, Buffers(first));
+    scenario.Bytes(kStats, {name.text.substr(0, 15)}, Buffers(first));
     first += 1000;
   }
   return scenario.List(kNames, {}, instances);

@@ -250,8 +250,8 @@ TEST(LPoolStats, ShowsLongNamesWhole) {
   const std::string longName(200, 'v');
   const Scenario host = Nodes(1)
                             .Bytes(kPsharePool, {0}, Pool(0))
-                            .List(kVmPools, {0}, {std::string_view(longName), "", "vm,2"})
-                            .Bytes(kVmPools, {0, std::string_view(longName)}, Pool(10))
+                            .List(kVmPools, {0}, {longName, "", "vm,2"})
+                            .Bytes(kVmPools, {0, longName}, Pool(10))
                             .Bytes(kVmPools, {0, ""}, Pool(20))
                             .Bytes(kVmPools, {0, "vm,2"}, Pool(30));
   EXPECT_EQ(Cells(host, "nrLPages"), "pshare-0,1\n" + longName + ",11\n,21\nvm,2,31\nTotal,64\n");

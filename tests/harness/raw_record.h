@@ -26,6 +26,12 @@ class RawRecord {
   RawRecord& U32(size_t offset, uint32_t value) { return Put(offset, value); }
   RawRecord& U64(size_t offset, uint64_t value) { return Put(offset, value); }
 
+  // The bytes of `text` and no NUL.
+  RawRecord& Text(size_t offset, std::string_view text) {
+    bytes_.replace(offset, text.size(), text);
+    return *this;
+  }
+
   // 64-bit fields at these offsets: Kb(first), Kb(first + 1) and so on.
   RawRecord& Amounts(uint64_t first, std::initializer_list<size_t> offsets) {
     for (const size_t offset : offsets) U64(offset, Kb(first++));

@@ -53,6 +53,10 @@ Scenario& Scenario::List(std::string_view node, const Items& keys, const Items& 
   return Statement(statement);
 }
 
+Scenario& Scenario::Count(std::string_view node, const Items& keys, uint32_t count) {
+  return Statement("count " + Read(node, keys) + " " + std::to_string(count));
+}
+
 Scenario& Scenario::Fails(std::string_view node, const Items& keys, uint32_t status) {
   return Statement("status " + Read(node, keys) + " " + script::Status(status));
 }

@@ -19,6 +19,7 @@ class Item {
   template <std::integral Integer>
   Item(Integer number) : text_(std::to_string(static_cast<int64_t>(number))) {}  // NOLINT: implicit
   Item(const char* text) : Item(std::string_view(text)) {}                       // NOLINT: implicit
+  Item(const std::string& text) : Item(std::string_view(text)) {}                // NOLINT: implicit
   Item(std::string_view text);                                                   // NOLINT: implicit
 
   // An entry that fails with `status` when it is read.
@@ -55,6 +56,9 @@ class Scenario {
 
   // The instances of a node.
   Scenario& List(std::string_view node, const Items& keys, const Items& entries);
+
+  // How many instances a node's list says it has, whatever it has.
+  Scenario& Count(std::string_view node, const Items& keys, uint32_t count);
 
   // A read of a value or of instances that fails.
   Scenario& Fails(std::string_view node, const Items& keys, uint32_t status);
