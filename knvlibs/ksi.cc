@@ -169,6 +169,9 @@ struct KSI_ParamList* KSI_ParamListCreate(int version, int capacity) {
 
 struct KSI_ParamList* KSI_ParamListCreateAndAllocateParams(int version, int capacity,
                                                            size_t bytes) {
+  // More than any host's names take, and little enough to ask for.
+  constexpr size_t kMostBytes = size_t{1} << 30;
+  if (bytes > kMostBytes) return nullptr;
   return ksi::CreateList(version, capacity,
                          [&](size_t room) { return new ksi::ParamList(room, bytes); });
 }

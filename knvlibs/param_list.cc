@@ -12,7 +12,7 @@ constexpr size_t kLargestBlock = size_t{64} << 10;
 
 KSI_ParamList::KSI_ParamList(size_t capacity, size_t textRoom)
     : capacity_(capacity), fixedTextRoom_(true) {
-  blocks_.push_back({std::make_unique<char[]>(textRoom), textRoom, 0});
+  blocks_.push_back({std::make_unique_for_overwrite<char[]>(textRoom), textRoom, 0});
 }
 
 ksi::Status KSI_ParamList::AddNumber(uint64_t value) {
@@ -45,7 +45,7 @@ char* KSI_ParamList::TakeText(size_t size) {
     const size_t next =
         blocks_.empty() ? kFirstBlock : std::min(2 * blocks_.back().size, kLargestBlock);
     const size_t room = std::max(next, size);
-    blocks_.push_back({std::make_unique<char[]>(room), room, 0});
+    blocks_.push_back({std::make_unique_for_overwrite<char[]>(room), room, 0});
   }
   Block& block = blocks_.back();
   char* text = block.text.get() + block.used;

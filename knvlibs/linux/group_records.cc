@@ -28,7 +28,7 @@ Status OfGroup(const LinuxHost& host, const Keys& keys, Reader&& read) {
 // A text that is cut where the field ends.
 template <size_t size>
 void CopyText(std::string_view text, char (&field)[size]) {
-  std::memcpy(field, text.data(), std::min(text.size(), size));
+  text.copy(field, size);
 }
 
 int64_t SignedLimit(uint64_t limit) {

@@ -77,8 +77,8 @@ Status AnswerVmmTally(const LinuxHost& host, const GroupTree& tree, const Virtua
 
   KSI_VmmTally record = {};
   record.memSize = MemoryOf(machine, *mapping);
-  record.memSizeLimit =
-      machine.commandLine.maxMemory == kNoValue ? record.memSize : machine.commandLine.maxMemory;
+  record.memSizeLimit = machine.commandLine.maxMemory == kNoValue ? uint64_t{record.memSize}
+                                                                  : machine.commandLine.maxMemory;
   record.touched = mapping->memory.referenced;
   // The kernel's zero page backs guest memory too, but does not count as resident.
   record.mapped = SumOf(SumOf(mapping->memory.resident, mapping->memory.poolHuge), ksm.zeroPages);

@@ -198,6 +198,7 @@ TEST_F(Cache, NamesThatMeanSomethingInAUri) {
   ASSERT_EQ(chdir(directory_.Path("").c_str()), 0);
   EXPECT_EQ(Open("host.ksi"), kOk);
   EXPECT_EQ(Open("./host.ksi"), kOk);
+  ASSERT_EQ(chdir("/"), 0);
 }
 
 TEST_F(Cache, IsNotWrittenTo) {
