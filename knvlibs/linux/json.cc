@@ -33,8 +33,8 @@ class Parser {
 
   bool Value(Json* json, int depth) {
     if (depth > kDeepest) return false;
-    if (Take("{")) return Object(json, depth);
-    if (Take("[")) return Array(json, depth);
+    if (Take("{")) return Object(&json->value.emplace<Json::Object>(), depth);
+    if (Take("[")) return Array(&json->value.emplace<Json::Elements>(), depth);
     if (Take("\"")) return String(&json->value.emplace<std::string>());
     if (Take("true")) return json->value.emplace<bool>(true);
     if (Take("null")) return true;
@@ -45,23 +45,21 @@ class Parser {
     return Number(&json->value.emplace<Json::Number>().text);
   }
 
-  bool Object(Json* json, int depth) {
-    Json::Members& members = json->value.emplace<Json::Members>();
+  bool Object(Json::Object* object, int depth) {
     if (Take("}")) return true;
     do {
-      JsonMember& member = members.emplace_back();
-      if (!Take("\"") || !String(&member.name) || !Take(":") || !Value(&member.value, depth + 1)) {
+      if (!Take("\"") || !String(&object->names.emplace_back()) || !Take(":") ||
+          !Value(&object->values.emplace_back(), depth + 1)) {
         return false;
       }
     } while (Take(","));
     return Take("}");
   }
 
-  bool Array(Json* json, int depth) {
-    Json::Elements& elements = json->value.emplace<Json::Elements>();
+  bool Array(Json::Elements* elements, int depth) {
     if (Take("]")) return true;
     do {
-      if (!Value(&elements.emplace_back(), depth + 1)) return false;
+      if (!Value(&elements->emplace_back(), depth + 1)) return false;
     } while (Take(","));
     return Take("]");
   }
@@ -114,10 +112,11 @@ class Parser {
 }  // namespace
 
 const Json* Json::Find(std::string_view name) const {
-  const auto* members = std::get_if<Members>(&value);
-  if (members == nullptr) return nullptr;
-  const auto found = std::ranges::find(*members, name, &JsonMember::name);
-  return found == members->end() ? nullptr : &found->value;
+  const auto* object = std::get_if<Object>(&value);
+  if (object == nullptr) return nullptr;
+  const auto found = std::ranges::find(object->names, name);
+  if (found == object->names.end()) return nullptr;
+  return &object->values[static_cast<size_t>(found - object->names.begin())];
 }
 
 std::optional<uint64_t> Json::Unsigned() const {

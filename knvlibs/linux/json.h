@@ -11,18 +11,21 @@
 
 namespace ksi {
 
-struct JsonMember;
-
 struct Json {
-  using Members = std::vector<JsonMember>;
   using Elements = std::vector<Json>;
+
+  // The members of an object: the value at an index is that of the name there.
+  struct Object {
+    std::vector<std::string> names;
+    Elements values;
+  };
 
   // Numbers are kept as they are written.
   struct Number {
     std::string text;
   };
 
-  std::variant<std::nullptr_t, bool, Number, std::string, Members, Elements> value = nullptr;
+  std::variant<std::nullptr_t, bool, Number, std::string, Object, Elements> value = nullptr;
 
   // The member of this name; null if this is no object or has none.
   const Json* Find(std::string_view name) const;
@@ -31,11 +34,6 @@ struct Json {
 
   // A whole number that is not negative and fits.
   std::optional<uint64_t> Unsigned() const;
-};
-
-struct JsonMember {
-  std::string name;
-  Json value;
 };
 
 // The whole of `text` as one value; none if it is anything else.

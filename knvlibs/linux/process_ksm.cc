@@ -59,12 +59,16 @@ Status ReadProcessKsm(const LinuxHost& host, int32_t pid, ProcessKsm* ksm) {
   }
   if (status != kOk && status != KSI_STATUS_NOT_FOUND) return status;
 
+  if (ksm->merged != kNoValue) return kOk;
+
   // Kernels before 6.5 have this figure in a file of its own, and none before 5.19.
-  if (ksm->merged == kNoValue) {
-    uint64_t pages = 0;
-    status = host.ReadNumber(ProcessFile(pid, "ksm_merging_pages"), &pages);
-    if (status == KSI_STATUS_PERMISSION_DENIED) WarnDenied(host);
-    if (status == kOk) ksm->merged = pages * host.PageKB();
+  uint64_t pages = 0;
+  status = host.ReadNumber(ProcessFile(pid, "ksm_merging_pages"), &pages);
+  if (status == kOk) ksm->merged = pages * host.PageKB();
+  if (status == KSI_STATUS_PERMISSION_DENIED) WarnDenied(host);
+  if (status == KSI_STATUS_NOT_FOUND) {
+    Process process;
+    if (ReadProcess(host, pid, &process) == KSI_STATUS_NOT_FOUND) return KSI_STATUS_NOT_FOUND;
   }
   return kOk;
 }

@@ -18,7 +18,8 @@ struct ProcessKsm {
   uint64_t Saved() const { return SumOf(merged, zeroPages); }
 };
 
-// Where nothing is shared on the whole host this reads no file of the process.
+// Where nothing is shared on the whole host this reads no file of the process; else it fails with
+// KSI_STATUS_NOT_FOUND if the process is gone.
 Status ReadProcessKsm(const LinuxHost& host, int32_t pid, ProcessKsm* ksm);
 
 }  // namespace ksi

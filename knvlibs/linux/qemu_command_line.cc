@@ -56,12 +56,14 @@ Properties ParseJsonProperties(std::string_view text) {
   Properties properties;
   const std::optional<Json> json = ParseJson(text);
   if (!json) return properties;
-  const auto* members = std::get_if<Json::Members>(&json->value);
-  if (members == nullptr) return properties;
-  for (const JsonMember& member : *members) {
-    if (const std::string* value = member.value.Text()) properties.push_back({member.name, *value});
-    if (const auto* number = std::get_if<Json::Number>(&member.value.value)) {
-      properties.push_back({member.name, number->text});
+  const auto* object = std::get_if<Json::Object>(&json->value);
+  if (object == nullptr) return properties;
+  for (size_t i = 0; i < object->names.size(); ++i) {
+    const Json& member = object->values[i];
+    if (const std::string* text = member.Text()) {
+      properties.push_back({object->names[i], *text});
+    } else if (const auto* number = std::get_if<Json::Number>(&member.value)) {
+      properties.push_back({object->names[i], number->text});
     }
   }
   return properties;

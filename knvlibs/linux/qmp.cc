@@ -24,6 +24,11 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kPatience{250};
 
+// What all monitors together may keep a report waiting for nothing.
+struct PatienceLeft {
+  Clock::duration value = 4 * kPatience;
+};
+
 // The other side of a conversation in lines.
 class Channel {
  public:
@@ -38,7 +43,7 @@ class Channel {
 
 class SocketChannel : public Channel {
  public:
-  SocketChannel() : deadline_(Clock::now() + kPatience) {}
+  explicit SocketChannel(Clock::duration patience) : deadline_(Clock::now() + patience) {}
   ~SocketChannel() override {
     if (fd_ >= 0) close(fd_);
   }
@@ -177,9 +182,24 @@ std::unique_ptr<Channel> Open(const LinuxHost& host, int32_t pid, const std::str
     if (host.Read(path, &text) != kOk) return nullptr;
     return std::make_unique<RecordedChannel>(std::move(text));
   }
-  auto channel = std::make_unique<SocketChannel>();
-  if (!channel->Connect(path, pid)) return nullptr;
+  const Clock::duration patience =
+      std::min<Clock::duration>(kPatience, host.Keep<PatienceLeft>().value);
+  auto channel = std::make_unique<SocketChannel>(patience);
+  if (patience <= Clock::duration::zero() || !channel->Connect(path, pid)) return nullptr;
   return channel;
+}
+
+// Whether a monitor greets and takes questions.
+bool Greet(const LinuxHost& host, Channel& channel) {
+  const Clock::time_point start = Clock::now();
+  std::string greeting;
+  if (!channel.Receive(&greeting)) {
+    host.Keep<PatienceLeft>().value -= Clock::now() - start;
+    return false;
+  }
+  const std::optional<Json> hello = ParseJson(greeting);
+  return hello && hello->Find("QMP") != nullptr &&
+         Ask(channel, R"({"execute":"qmp_capabilities"})").has_value();
 }
 
 }  // namespace
@@ -189,13 +209,7 @@ GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuComman
   if (!line.hasBalloon) memory.balloon = GuestMemory::Balloon::kNone;
   if (line.monitor.empty()) return memory;
   const std::unique_ptr<Channel> channel = Open(host, pid, line.monitor);
-  if (channel == nullptr) return memory;
-
-  std::string greeting;
-  if (!channel->Receive(&greeting)) return memory;
-  const std::optional<Json> hello = ParseJson(greeting);
-  if (!hello || hello->Find("QMP") == nullptr) return memory;
-  if (!Ask(*channel, R"({"execute":"qmp_capabilities"})")) return memory;
+  if (channel == nullptr || !Greet(host, *channel)) return memory;
   AskForBalloon(*channel, &memory);
   AskForStatistics(*channel, line.balloon, &memory);
   return memory;

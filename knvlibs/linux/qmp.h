@@ -23,7 +23,7 @@ struct GuestMemory {
 };
 
 // Asks the monitor that the command line of process `pid` names. Never takes longer than a quarter
-// of a second; what is not answered by then is not told.
+// of a second, and all that do not answer a second together; what is not answered is not told.
 GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuCommandLine& line);
 
 }  // namespace ksi
