@@ -60,8 +60,8 @@ Properties ParseJsonProperties(std::string_view text) {
   if (object == nullptr) return properties;
   for (size_t i = 0; i < object->names.size(); ++i) {
     const Json& member = object->values[i];
-    if (const std::string* text = member.Text()) {
-      properties.push_back({object->names[i], *text});
+    if (const std::string* word = member.Text()) {
+      properties.push_back({object->names[i], *word});
     } else if (const auto* number = std::get_if<Json::Number>(&member.value)) {
       properties.push_back({object->names[i], number->text});
     }
