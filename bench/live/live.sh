@@ -1,18 +1,30 @@
 #!/usr/bin/env bash
 # Times the live reports beside the programs that show the same of this machine, in turn, in one run.
 #
-# Usage: bench/live/live.sh [TALLY [RUNS]]     (build/tally, 51 runs of each)
+# Usage: bench/live/live.sh [TALLY [RUNS [PROCESSES]]]     (build/tally, 51 runs of each)
 #
+# PROCESSES is how many processes are started in addition, which sleep meanwhile.
 # Prints the median time of each in milliseconds, and how many lines it printed.
 set -euo pipefail
 
 tally=${1:-build/tally}
 runs=${2:-51}
+processes=${3:-0}
 
 # report options | the other program
 pairs=(
   "heap-stats | slabtop -o"
+  "group-stats | systemd-cgtop -b -n 1"
+  "group-stats | ps -eo pid,comm,vsz,rss"
+  "uw-stats | ps -eo pid,comm,vsz,rss"
 )
+
+# In a process group of their own, which ends as one.
+if ((processes > 0)); then
+  setsid bash -c 'for ((i = 0; i < $1; ++i)); do sleep 3600 & done; wait' - "$processes" &
+  trap 'kill -- -$!' EXIT
+  sleep 2
+fi
 
 # Prints the median of the numbers on standard input.
 median() { sort -n | awk '{ at[NR] = $1 } END { print at[int((NR + 1) / 2)] }'; }
