@@ -91,7 +91,7 @@ Status ReadProcess(const LinuxHost& host, int32_t pid, Process* process) {
       tellsKernelThreads = true;
       understood = ParseNumber(Trimmed(value), &kernelThread);
     } else {
-      const auto field = std::ranges::find(kFields, name, &StatusField::name);
+      const auto* const field = std::ranges::find(kFields, name, &StatusField::name);
       if (field != std::end(kFields)) understood = ParseKB(value, &(process->*field->figure));
     }
     if (!understood) return host.NotUnderstoodOnce("status", file, lines.Number());

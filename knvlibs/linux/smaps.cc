@@ -32,7 +32,7 @@ constexpr SmapsField kFields[] = {
 bool TakeField(std::string_view line, WalkedMemory* memory) {
   const size_t colon = line.find(':');
   if (colon == std::string_view::npos) return false;
-  const auto field = std::ranges::find(kFields, line.substr(0, colon), &SmapsField::name);
+  const auto* const field = std::ranges::find(kFields, line.substr(0, colon), &SmapsField::name);
   if (field == std::end(kFields)) return true;
   std::string_view value = line.substr(colon + 1);
   uint64_t figure = 0;
