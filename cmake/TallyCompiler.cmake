@@ -18,6 +18,11 @@ target_include_directories(tally_compiler INTERFACE "${PROJECT_SOURCE_DIR}")
 target_compile_options(tally_compiler INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Werror)
 
+if(TALLY_COVERAGE)
+  target_compile_options(tally_compiler INTERFACE --coverage)
+  target_link_options(tally_compiler INTERFACE --coverage)
+endif()
+
 if(TALLY_SANITIZE)
   target_compile_options(tally_compiler INTERFACE
     "-fsanitize=${TALLY_SANITIZE}" -fno-sanitize-recover=all -fno-omit-frame-pointer)

@@ -27,12 +27,11 @@ const char* UnitTitle(DisplayUnit unit) {
       return "MB";
     case DisplayUnit::kb:
       return "KB";
-    case DisplayUnit::pg:
-      return "Page (4K)";
     case DisplayUnit::b:
       return "Bytes";
+    default:
+      return "Page (4K)";
   }
-  return "";
 }
 
 uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit) {

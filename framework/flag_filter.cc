@@ -34,7 +34,7 @@ const FlagName uwTypeNames[] = {
 
 namespace {
 
-// The bit of a flag name, or null for a name that the table does not have.
+// The row of a flag name, or null for a name that the table does not have.
 const FlagName* FindFlag(std::string_view name, const FlagName* table) {
   for (; table->name != nullptr; ++table) {
     if (SameName(name, table->name)) return table;

@@ -40,13 +40,8 @@ class Key {
   Kind kind_ = Kind::none;
 };
 
-// Where a keyed read stopped; each reader has its own words for each.
-enum class ReadStep : uint8_t { create, addFirstKey, addSecondKey, read, done };
-
-struct ReadResult {
-  Status status;
-  ReadStep step;
-};
+// Where a keyed read failed; each reader has its own words for each.
+enum class ReadStep : uint8_t { create, addFirstKey, addSecondKey, read };
 
 // The parameter list of one read, and what becomes of its keys.
 struct KeyList {
@@ -56,38 +51,55 @@ struct KeyList {
   bool removeKeys = false;  // take the keys out again before the list is destroyed
 };
 
-// Calls `read` with a list made of the keys and destroys the list, whatever the status.
-template <class Read>
-ReadResult KeyedRead(const KeyList& keys, Read read) {
-  const ParamList list(KSI_ParamListCreate(1, keys.capacity));
-  if (!list) return {kFailure, ReadStep::create};
+// Calls `read` with a list made of the keys and destroys the list, whatever the status. A failure
+// is worded by `words(step, status)`.
+template <class Read, class Words>
+Status KeyedRead(const KeyList& keys, Read read, Words words) {
+  ParamList list(KSI_ParamListCreate(1, keys.capacity));
+  if (!list) {
+    words(ReadStep::create, kFailure);
+    return kFailure;
+  }
   int added = 0;
   for (const auto& [key, step] : {std::pair{keys.first, ReadStep::addFirstKey},
                                   std::pair{keys.second, ReadStep::addSecondKey}}) {
     if (!key.given()) continue;
-    if (Status status = key.AddTo(list.get())) return {status, step};
+    if (Status status = key.AddTo(list.get())) {
+      words(step, status);
+      return status;
+    }
     ++added;
   }
   const Status status = read(list.get());
   if (keys.removeKeys) {
     for (; added > 0; --added) KSI_ParamListRemoveLastParam(list.get());
   }
-  return {status, status == kSuccess ? ReadStep::done : ReadStep::read};
+  list.reset();
+  if (status != kSuccess) words(ReadStep::read, status);
+  return status;
 }
 
 // Reads one record of `node`.
-inline ReadResult KeyedGet(uint16_t node, const KeyList& keys, void* record, size_t size) {
-  return KeyedRead(keys, [&](KSI_ParamList* list) { return KSI_Get(node, list, record, size); });
+template <class Record, class Words>
+Status KeyedGet(uint16_t node, const KeyList& keys, Record& record, Words words) {
+  return KeyedRead(
+      keys, [&](KSI_ParamList* list) { return KSI_Get(node, list, &record, sizeof record); },
+      words);
 }
 
-// Lists the instances of `node`.
-inline ReadResult KeyedList(uint16_t node, const KeyList& keys, ParamList& instances) {
-  return KeyedRead(keys, [&](KSI_ParamList* list) {
-    KSI_ParamList* made = nullptr;
-    const Status status = KSI_GetInstanceListAlloc(node, list, &made);
-    if (status == kSuccess) instances.reset(made);
-    return status;
-  });
+// Lists the instances of `node` for `keys` (null: no keys).
+inline Status ListInstances(uint16_t node, KSI_ParamList* keys, ParamList& instances) {
+  KSI_ParamList* made = nullptr;
+  const Status status = KSI_GetInstanceListAlloc(node, keys, &made);
+  if (status == kSuccess) instances.reset(made);
+  return status;
+}
+
+// The same for keys of a list of their own.
+template <class Words>
+Status KeyedList(uint16_t node, const KeyList& keys, ParamList& instances, Words words) {
+  return KeyedRead(
+      keys, [&](KSI_ParamList* list) { return ListInstances(node, list, instances); }, words);
 }
 
 }  // namespace tally

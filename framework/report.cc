@@ -1,6 +1,7 @@
 #include "framework/report.h"
 
 #include <algorithm>
+#include <cassert>
 #include <cstdio>
 #include <ctime>
 #include <string>
@@ -92,6 +93,7 @@ void ReportContextBase::PrintDescriptions() const {
 uint64_t& ReportContextBase::total(std::string_view name) {
   const auto column = std::find_if(table_.begin(), table_.end() - 1,
                                    [name](const ColumnDesc& desc) { return name == desc.name; });
+  assert(column != table_.end() - 1);
   return treatments_[static_cast<size_t>(column - table_.begin())].total;
 }
 

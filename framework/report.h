@@ -28,6 +28,9 @@ enum class InTotal : uint8_t {
   mean,      // the sum divided by the number of rows
 };
 
+constexpr InTotal kBlank = InTotal::blank;
+constexpr InTotal kSum = InTotal::sum;
+
 // Whether -s can hide a column.
 enum class Fixed : uint8_t { no, yes };
 
@@ -82,6 +85,7 @@ class ReportContextBase {
   void PrintDescriptions() const;
 
   // The sum of the column called `name` over the rows so far.
+  // REQUIRES: there is such a column.
   uint64_t& total(std::string_view name);
 
  protected:

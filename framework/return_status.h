@@ -1,5 +1,5 @@
-// The messages of kernel return statuses. Both names are exported from the executable: other
-// programs of the host look statuses up in it.
+// The messages of kernel return statuses. Both names are part of the executable's interface and
+// exported from it.
 #ifndef FRAMEWORK_RETURN_STATUS_H_
 #define FRAMEWORK_RETURN_STATUS_H_
 

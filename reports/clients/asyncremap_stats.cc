@@ -27,9 +27,6 @@ struct RemapRow {
   KSI_RemapType pages;
 };
 
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
-
 // No identity column has a cell in the Total row: it bears no label.
 constexpr Column<RemapRow> kColumns[] = {
     {"name", "Group name", 27, "s", kBlank, nullptr,
@@ -58,7 +55,7 @@ constexpr Column<RemapRow> kColumns[] = {
      [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cStaged); }},
 };
 
-// Failures carry a number that support staff look up; it does not move with the source.
+// A failure is known by its function and number; the number does not move with the source.
 Status WarnAt(const char* function, unsigned number, Status status) {
   Warning("%s:%u failure: %s\n", function, number, KNV_ReturnStatusToString(status));
   return status;
@@ -68,25 +65,28 @@ Status WarnAt(const char* function, unsigned number, Status status) {
 Key ClientKey(int32_t client) { return static_cast<uint64_t>(int64_t{client}); }
 
 Status TallyAsyncRemapGetStats(int32_t client, const char* type, KSI_RemapType& pages) {
-  constexpr const char* kFunction = "TallyAsyncRemapGetStats";
-  const ReadResult result =
-      KeyedGet(KSI_NODE_sched_memClients_remapTypes,
-               {.capacity = 2, .first = ClientKey(client), .second = type}, &pages, sizeof pages);
-  if (result.step == ReadStep::addFirstKey) WarnAt(kFunction, 137, result.status);
-  if (result.step == ReadStep::addSecondKey) WarnAt(kFunction, 138, result.status);
-  if (result.step == ReadStep::read) WarnAt(kFunction, 140, result.status);
-  return result.status;
+  return KeyedGet(KSI_NODE_sched_memClients_remapTypes,
+                  {.capacity = 2, .first = ClientKey(client), .second = type}, pages,
+                  [](ReadStep step, Status status) {
+                    constexpr const char* kFunction = "TallyAsyncRemapGetStats";
+                    if (step == ReadStep::addFirstKey) WarnAt(kFunction, 137, status);
+                    if (step == ReadStep::addSecondKey) WarnAt(kFunction, 138, status);
+                    if (step == ReadStep::read) WarnAt(kFunction, 140, status);
+                  });
 }
 
 // Prints the rows of one memory client.
 Status TallyAsyncRemapReportCallbackInt(ReportContext<RemapRow>& context, RemapRow& row) {
   constexpr const char* kFunction = "TallyAsyncRemapReportCallbackInt";
   ParamList types;
-  const ReadResult result = KeyedList(KSI_NODE_sched_memClients_remapTypes,
-                                      {.capacity = 1, .first = ClientKey(row.grpLeader)}, types);
-  if (result.step == ReadStep::addFirstKey) WarnAt(kFunction, 303, result.status);
-  if (result.step == ReadStep::read) WarnAt(kFunction, 305, result.status);
-  if (result.status != kSuccess) return result.status;
+  if (Status failed = KeyedList(KSI_NODE_sched_memClients_remapTypes,
+                                {.capacity = 1, .first = ClientKey(row.grpLeader)}, types,
+                                [](ReadStep step, Status status) {
+                                  if (step == ReadStep::addFirstKey) WarnAt(kFunction, 303, status);
+                                  if (step == ReadStep::read) WarnAt(kFunction, 305, status);
+                                })) {
+    return failed;
+  }
 
   const uint32_t count = KSI_ParamListUsedCount(types.get());
   for (uint32_t i = 0; i < count; ++i) {
@@ -114,11 +114,13 @@ Status TallyAsyncRemapReportCallback(uint64_t gid, uint32_t /*childCount*/, int 
   if ((status = Tally_GroupGetName(gid, name))) return status;
 
   ParamList clients;
-  const ReadResult result =
-      KeyedList(KSI_NODE_sched_groups_members_memClients, {.capacity = 1, .first = gid}, clients);
-  if (result.step == ReadStep::addFirstKey) WarnAt(kFunction, 394, result.status);
-  if (result.step == ReadStep::read) WarnAt(kFunction, 396, result.status);
-  if (result.status != kSuccess) return result.status;
+  if ((status = KeyedList(KSI_NODE_sched_groups_members_memClients, {.capacity = 1, .first = gid},
+                          clients, [](ReadStep step, Status failed) {
+                            if (step == ReadStep::addFirstKey) WarnAt(kFunction, 394, failed);
+                            if (step == ReadStep::read) WarnAt(kFunction, 396, failed);
+                          }))) {
+    return status;
+  }
 
   RemapRow row;
   // One character less than the field: the row's name was made for a terminator.

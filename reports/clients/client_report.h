@@ -33,8 +33,8 @@ Status ReadClientRecord(const char* reader, int32_t clientId, uint16_t node, Rec
   return status;
 }
 
-// The host memory that a virtual machine or user world consumes, in kilobytes: what backs it
-// without what is shared or cached elsewhere. Wraps like the kernel's own sums.
+// The host memory that a virtual machine or user world consumes, in kilobytes. Wraps like the
+// kernel's own sums.
 template <class Tally>
 uint64_t Consumed(const Tally& tally) {
   return tally.vpmemUC + tally.mapped - tally.vpmemRW - tally.sharedSaved;

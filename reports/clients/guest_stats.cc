@@ -22,7 +22,6 @@ struct GuestStatsRow {
   KSI_GuestTally guest;
 };
 
-constexpr InTotal kSum = InTotal::sum;
 constexpr InTotal kKnownSum = InTotal::knownSum;
 
 constexpr Column<GuestStatsRow> kColumns[] = {

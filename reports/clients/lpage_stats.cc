@@ -22,8 +22,6 @@ struct LPageStatsRow {
   KSI_VmLargePages lpage;
 };
 
-constexpr InTotal kSum = InTotal::sum;
-
 constexpr Column<LPageStatsRow> kColumns[] = {
     NameColumn<LPageStatsRow>("Virtual machine name", 20, kSum),
     kSchedGrpColumn<LPageStatsRow>,

@@ -25,9 +25,6 @@ struct SwapStatsRow {
   KSI_VmmTally vmm;
 };
 
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
-
 constexpr Column<SwapStatsRow> kColumns[] = {
     NameColumn<SwapStatsRow>("Virtual machine name", 20, kSum),
     kSchedGrpColumn<SwapStatsRow>,

@@ -25,15 +25,12 @@ struct UWStatsRow {
   KSI_UwTally uw;
 };
 
-// A limit of so many kilobytes, four times the pages that 32 bits can tell, stands for none.
+// A limit of so many kilobytes and more stands for none: it is that of a page count, 0xFFFFFFFC.
 uint64_t LimitOrNone(int64_t kilobytes) {
   constexpr uint64_t kNoLimit = 0x3FFFFFFF0;
   const auto limit = static_cast<uint64_t>(kilobytes);
   return limit >= kNoLimit ? kNoValue : limit;
 }
-
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
 
 // Neither type nor name has a cell in the Total row: it bears no label.
 constexpr Column<UWStatsRow> kColumns[] = {

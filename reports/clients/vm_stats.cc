@@ -44,9 +44,6 @@ int32_t LimitOrNone(int64_t kilobytes) {
   return limit < 0 ? -1 : limit;
 }
 
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
-
 constexpr Column<VMStatsRow> kColumns[] = {
     NameColumn<VMStatsRow>("Virtual machine name", 15, kSum),
     {"b", "Is balloon driver active?", 1, "c", kBlank, nullptr,

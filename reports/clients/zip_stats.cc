@@ -21,7 +21,6 @@ struct ZipStatsRow {
   KSI_MemzipInfo zip;
 };
 
-constexpr InTotal kSum = InTotal::sum;
 constexpr InTotal kMean = InTotal::mean;
 
 constexpr Column<ZipStatsRow> kColumns[] = {

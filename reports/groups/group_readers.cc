@@ -54,37 +54,43 @@ Status FindVmmChild(uint64_t groupId, int64_t& vmmChild) {
 
 Status ListChildGroups(const char* caller, const char* listCall, uint64_t groupId,
                        ParamList& children) {
-  const ReadResult result =
-      KeyedList(KSI_NODE_sched_groups_members_groups, IdList(groupId), children);
-  const char* const message = KNV_ReturnStatusToString(result.status);
-  if (result.step == ReadStep::create) Warning(kGroupListCreateFailure);
-  if (result.step == ReadStep::addFirstKey) {
-    Warning("%s: KSI_ParamListAddInt() failure: %s\n", caller, message);
-  }
-  if (result.step == ReadStep::read) Warning("%s: %s failure: %s\n", caller, listCall, message);
-  return result.status;
+  return KeyedList(KSI_NODE_sched_groups_members_groups, IdList(groupId), children,
+                   [&](ReadStep step, Status status) {
+                     const char* const message = KNV_ReturnStatusToString(status);
+                     if (step == ReadStep::create) {
+                       Warning(kGroupListCreateFailure);
+                     } else if (step == ReadStep::read) {
+                       Warning("%s: %s failure: %s\n", caller, listCall, message);
+                     } else {
+                       Warning("%s: KSI_ParamListAddInt() failure: %s\n", caller, message);
+                     }
+                   });
 }
 
 Status TallyGroupKsiGet(uint64_t groupId, uint16_t node, void* buffer, size_t size) {
-  const ReadResult result = KeyedGet(node, IdList(groupId), buffer, size);
-  if (result.step == ReadStep::create) Warning(kGroupListCreateFailure);
-  if (result.step == ReadStep::addFirstKey) {
-    Warning("TallyGroupKsiGet: KSI_ParamListAddInt() faiure, error code: %u\n", result.status);
-  }
-  return result.status;
+  return KeyedRead(
+      IdList(groupId), [&](KSI_ParamList* list) { return KSI_Get(node, list, buffer, size); },
+      [](ReadStep step, Status status) {
+        if (step == ReadStep::create) Warning(kGroupListCreateFailure);
+        if (step == ReadStep::addFirstKey) {
+          Warning("TallyGroupKsiGet: KSI_ParamListAddInt() faiure, error code: %u\n", status);
+        }
+      });
 }
 
 Status Tally_MemClientKsiGet(int32_t clientId, uint16_t node, void* buffer, size_t size) {
   const auto widened = static_cast<uint64_t>(int64_t{clientId});
-  const ReadResult result = KeyedGet(node, IdList(widened), buffer, size);
-  if (result.step == ReadStep::create) {
-    Warning("Tally_MemClientKsiGet: KSI_ParamListCreate() failure\n");
-  }
-  if (result.step == ReadStep::addFirstKey) {
-    Warning("Tally_MemClientKsiGet: KSI_ParamListAddInt() failure: %s\n",
-            KNV_ReturnStatusToString(result.status));
-  }
-  return result.status;
+  return KeyedRead(
+      IdList(widened), [&](KSI_ParamList* list) { return KSI_Get(node, list, buffer, size); },
+      [](ReadStep step, Status status) {
+        if (step == ReadStep::create) {
+          Warning("Tally_MemClientKsiGet: KSI_ParamListCreate() failure\n");
+        }
+        if (step == ReadStep::addFirstKey) {
+          Warning("Tally_MemClientKsiGet: KSI_ParamListAddInt() failure: %s\n",
+                  KNV_ReturnStatusToString(status));
+        }
+      });
 }
 
 Status Tally_GroupGetName(uint64_t groupId, KSI_GroupName& name) {

@@ -57,14 +57,11 @@ struct GroupColumn : Column<GroupRow> {
   InTag inTag;
 };
 
-// A limit of this many kilobytes and more stands for none.
+// A limit above so many kilobytes stands for none.
 int64_t LimitOrNone(int64_t kilobytes) {
   constexpr int64_t kLargestLimit = 0xFFFFFFFFF0;
   return kilobytes > kLargestLimit ? -1 : kilobytes;
 }
-
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
 
 constexpr GroupColumn kColumns[] = {
     {{"gid", "Group ID", 8, "Lu", kSum, nullptr,

@@ -4,6 +4,7 @@
 #include "reports/groups/group_readers.h"
 
 namespace tally {
+
 Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
                            GroupVisitor visitor, void* context) {
   ParamList children;

@@ -29,6 +29,10 @@ constexpr ReportFrame kFrame = {
 
 constexpr size_t kMaxBuddies = 64;
 
+// Where a name tells the memory node and the type of memory: "memmap-03-lo".
+constexpr size_t kNodeAt = 7;
+constexpr size_t kTypeAt = 10;
+
 struct BuddyRow {
   uint32_t numaNode;
   uint32_t memNode;
@@ -46,9 +50,6 @@ template <size_t kSize>
 Cell Used(const BuddyRow& row) {
   return row.stats.buffers[kSize].used;
 }
-
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
 
 constexpr Column<BuddyRow> kColumns[] = {
     {"name", "Name of the buddy", 20, "s", kSum, nullptr,
@@ -101,44 +102,34 @@ constexpr Column<BuddyRow> kColumns[] = {
 
 // The NUMA node of a memory node.
 Status TallyMemNode2NUMANode(uint32_t memNode, uint32_t& numaNode) {
-  KSI_MemNode record;
-  const ReadResult result =
-      KeyedGet(KSI_NODE_memory_memNodes, {.capacity = 1, .first = memNode}, &record, sizeof record);
-  switch (result.step) {
-    case ReadStep::create:
-      Warning("TallyMemNode2NUMANode: KSI_ParamListCreate() failure\n");
-      break;
-    case ReadStep::addFirstKey:
-      Warning("The param list for memNode %u could not be created: %#x", memNode, result.status);
-      break;
-    case ReadStep::read:
-      Warning("Error %#x while reading /memory/memNodes/%u", result.status, memNode);
-      break;
-    default:
-      numaNode = record.numaNode;
-      break;
-  }
-  return result.status;
+  KSI_MemNode record = {};
+  const Status status = KeyedGet(
+      KSI_NODE_memory_memNodes, {.capacity = 1, .first = memNode}, record,
+      [memNode](ReadStep step, Status failed) {
+        if (step == ReadStep::create) {
+          Warning("TallyMemNode2NUMANode: KSI_ParamListCreate() failure\n");
+        } else if (step == ReadStep::read) {
+          Warning("Error %#x while reading /memory/memNodes/%u", failed, memNode);
+        } else {
+          Warning("The param list for memNode %u could not be created: %#x", memNode, failed);
+        }
+      });
+  numaNode = record.numaNode;
+  return status;
 }
 
 Status TallyBuddyGetStats(BuddyRow& row) {
-  const ReadResult result =
-      KeyedGet(KSI_NODE_system_buddy_comprehensive, {.capacity = 1, .first = row.name}, &row.stats,
-               sizeof row.stats);
-  switch (result.step) {
-    case ReadStep::create:
-      Warning("TallyBuddyGetStats: KSI_ParamListCreate() failure\n");
-      break;
-    case ReadStep::addFirstKey:
-      Warning("The param list for buddy %s could not be created: %#x", row.name, result.status);
-      break;
-    case ReadStep::read:
-      Warning("Error %#x while reading %s/comprehensive", result.status, row.name);
-      break;
-    default:
-      break;
-  }
-  return result.status;
+  return KeyedGet(KSI_NODE_system_buddy_comprehensive, {.capacity = 1, .first = row.name},
+                  row.stats, [&row](ReadStep step, Status failed) {
+                    if (step == ReadStep::create) {
+                      Warning("TallyBuddyGetStats: KSI_ParamListCreate() failure\n");
+                    } else if (step == ReadStep::read) {
+                      Warning("Error %#x while reading %s/comprehensive", failed, row.name);
+                    } else {
+                      Warning("The param list for buddy %s could not be created: %#x", row.name,
+                              failed);
+                    }
+                  });
 }
 
 // Fills a row from an allocator's name, which is cut to the row's field.
@@ -146,7 +137,6 @@ Status ReadBuddyName(const char* name, BuddyRow& row) {
   std::strncpy(row.name, name, sizeof row.name - 1);
   row.name[sizeof row.name - 1] = '\0';
   row.isLow = row.name[std::strlen(row.name) - 1] == 'o';
-  constexpr size_t kNodeAt = 7;  // after "memmap" and a separator
   row.memNode = static_cast<uint32_t>(std::strtol(row.name + kNodeAt, nullptr, 10));
   return TallyMemNode2NUMANode(row.memNode, row.numaNode);
 }
@@ -175,8 +165,6 @@ size_t ReadBuddies(std::span<BuddyRow, kMaxBuddies> rows) {
 
 // By memory node, the low memory of a node first; both as the names tell them.
 bool SortsBefore(const BuddyRow& a, const BuddyRow& b) {
-  constexpr size_t kNodeAt = 7;
-  constexpr size_t kTypeAt = 10;
   if (std::strncmp(a.name, b.name, sizeof a.name) == 0) return false;
   if (std::strncmp(a.name + kNodeAt, b.name + kNodeAt, 2) == 0) {
     return std::strncmp(a.name + kTypeAt, "lo", 2) == 0;

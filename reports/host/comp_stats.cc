@@ -39,8 +39,6 @@ Cell Entries(const CompRow& row, MemState state) {
   return entries;
 }
 
-constexpr InTotal kBlank = InTotal::blank;  // there is no Total row
-
 constexpr Column<CompRow> kColumns[] = {
     {"total", "Total physical memory on host", 10, "Lu", kBlank, FromKilobytes,
      [](const CompRow& row) -> Cell { return row.memory.total; }},

@@ -39,9 +39,6 @@ uint64_t FromBytes(uint64_t bytes, DisplayUnit unit) {
   return 0;
 }
 
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
-
 constexpr Column<KSI_HeapStats> kColumns[] = {
     {"name", "heap name", 35, "s", kSum, nullptr,
      [](const KSI_HeapStats& heap) -> Cell { return FixedText(heap.name); }, Fixed::yes},
@@ -97,12 +94,11 @@ struct Heaps {
 
 // Reads the heaps; false, after its message, when anything but a single heap was missing.
 bool TallyHeapGetMemMapStats(Heaps& heaps) {
-  KSI_ParamList* made = nullptr;
-  if (KSI_GetInstanceListAlloc(KSI_NODE_system_heaps, nullptr, &made) != kSuccess) {
+  ParamList names;
+  if (ListInstances(KSI_NODE_system_heaps, nullptr, names) != kSuccess) {
     Warning("TallyHeapGetMemMapStats: KSI_GetInstanceListAlloc() for heapList failure\n");
     return false;
   }
-  const ParamList names(made);
   const uint32_t count = KSI_ParamListUsedCount(names.get());
   if (count == 0) {
     Warning("TallyHeapGetMemMapStats: KSI_ParamListUsedCount() returned 0\n");

@@ -12,9 +12,9 @@ namespace tally {
 // Reads a record; only a list that cannot be made is worded, with the name of the reading step.
 template <class Record>
 Status ReadHostRecord(const char* step, uint16_t node, const KeyList& keys, Record& record) {
-  const ReadResult result = KeyedGet(node, keys, &record, sizeof record);
-  if (result.step == ReadStep::create) Warning("%s: KSI_ParamListCreate() failure\n", step);
-  return result.status;
+  return KeyedGet(node, keys, record, [step](ReadStep failed, Status) {
+    if (failed == ReadStep::create) Warning("%s: KSI_ParamListCreate() failure\n", step);
+  });
 }
 
 }  // namespace tally

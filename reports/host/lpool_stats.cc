@@ -27,9 +27,6 @@ struct LPoolRow {
   KSI_LargePagePool pool;
 };
 
-constexpr InTotal kSum = InTotal::sum;
-constexpr InTotal kBlank = InTotal::blank;
-
 // The peaks are added up like the counters.
 constexpr Column<LPoolRow> kColumns[] = {
     {"name", "Large page pool name", 15, "s", kSum, nullptr,
@@ -67,24 +64,22 @@ using LPoolContext = ReportContext<LPoolRow>;
 // Reads a pool; failures are worded with the reader's name, but a failed read always with the
 // virtual machines' one.
 Status ReadPool(const char* reader, uint16_t node, const KeyList& keys, KSI_LargePagePool& pool) {
-  const ReadResult result = KeyedGet(node, keys, &pool, sizeof pool);
-  switch (result.step) {
-    case ReadStep::create:
-      Warning("%s: KSI_ParamListCreate() failure\n", reader);
-      break;
-    case ReadStep::addFirstKey:
-      Warning("%s: KSI_ParamListAddInt() failure, error code: %u\n", reader, result.status);
-      break;
-    case ReadStep::addSecondKey:
-      Warning("%s: KSI_ParamListAddString() failure, error code: %u\n", reader, result.status);
-      break;
-    case ReadStep::read:
-      Warning("TallyGetVmPoolStats() failure, error code: %u\n", result.status);
-      break;
-    default:
-      break;
-  }
-  return result.status;
+  return KeyedGet(node, keys, pool, [reader](ReadStep step, Status status) {
+    switch (step) {
+      case ReadStep::create:
+        Warning("%s: KSI_ParamListCreate() failure\n", reader);
+        break;
+      case ReadStep::addFirstKey:
+        Warning("%s: KSI_ParamListAddInt() failure, error code: %u\n", reader, status);
+        break;
+      case ReadStep::addSecondKey:
+        Warning("%s: KSI_ParamListAddString() failure, error code: %u\n", reader, status);
+        break;
+      case ReadStep::read:
+        Warning("TallyGetVmPoolStats() failure, error code: %u\n", status);
+        break;
+    }
+  });
 }
 
 Status TallyGetPSharePoolStats(uint32_t node, KSI_LargePagePool& pool) {
@@ -98,28 +93,24 @@ Status TallyGetVmPoolStats(uint32_t node, const char* vmName, KSI_LargePagePool&
 }
 
 Status ListVmPools(uint32_t node, uint32_t hint, ParamList& names) {
-  const ReadResult result = KeyedRead({.capacity = 2, .first = node}, [&](KSI_ParamList* list) {
+  const auto list = [&](KSI_ParamList* keys) {
     KSI_ParamList* made = nullptr;
     const Status status =
-        KSI_GetInstanceListAllocHint(KSI_NODE_memory_lpage_nodeList_vmPools, list, hint, &made);
+        KSI_GetInstanceListAllocHint(KSI_NODE_memory_lpage_nodeList_vmPools, keys, hint, &made);
     if (status == kSuccess) names.reset(made);
     return status;
-  });
-  switch (result.step) {
-    case ReadStep::create:
+  };
+  const auto words = [](ReadStep step, Status status) {
+    if (step == ReadStep::create) {
       Warning("TallyTraverseLPools: KSI_ParamListCreate() failure\n");
-      break;
-    case ReadStep::addFirstKey:
-      Warning("TallyTraverseLPools: KSI_ParamListAddInt() failure, error code: %u\n",
-              result.status);
-      break;
-    case ReadStep::read:
+    } else if (step == ReadStep::read) {
       Warning("TallyTraverseLPools: KSI_GetInstanceListAllocHint() failure\n");
-      break;
-    default:
-      break;
-  }
-  return result.status == kSuccess ? kSuccess : kFailure;
+    } else {
+      Warning("TallyTraverseLPools: KSI_ParamListAddInt() failure, error code: %u\n", status);
+    }
+  };
+  const Status status = KeyedRead({.capacity = 2, .first = node}, list, words);
+  return status == kSuccess ? kSuccess : kFailure;
 }
 
 // Prints the pools of one memory node. A pool that cannot be read has no row.
@@ -137,7 +128,7 @@ Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
     const char* name = nullptr;
     if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) {
       Warning("TallyTraverseLPools: KSI_ParamListGetString() failure\n");
-      // A list that cannot be read any more is not handed back to the library.
+      // The list is left as it is, the one list that the program does not destroy.
       static_cast<void>(names.release());
       return kFailure;
     }

@@ -57,9 +57,6 @@ uint64_t FromRegionBytes(uint64_t bytes, DisplayUnit unit) {
   return ShiftKilobytes(bytes >> 10, unit);
 }
 
-constexpr InTotal kSum = InTotal::sum;  // there is no Total row
-constexpr InTotal kBlank = InTotal::blank;
-
 constexpr Column<VolumeRow> kVolumeColumns[] = {
     {"uuid", "Volume UUID", 40, "s", kSum, nullptr,
      [](const VolumeRow& row) -> Cell { return row.uuid; }},
@@ -106,43 +103,44 @@ KeyList RegionKeys(const char* volume, const char* region) {
   return {.capacity = 3, .first = volume, .second = region, .removeKeys = true};
 }
 
-// Words what failed before the library was asked to read.
-void WarnOfList(const char* reader, ReadStep step) {
-  if (step == ReadStep::create) Warning("%s: KSI_ParamListCreate failure\n", reader);
-  if (step == ReadStep::addFirstKey || step == ReadStep::addSecondKey) {
-    Warning("%s: KSI_ParamListAddString failure\n", reader);
-  }
+// The words of a reader: for what failed before the library was asked to read and, with
+// `readFailure`, for the read itself.
+auto WordsOf(const char* reader, const char* readFailure = nullptr) {
+  return [reader, readFailure](ReadStep step, Status) {
+    if (step == ReadStep::create) {
+      Warning("%s: KSI_ParamListCreate failure\n", reader);
+    } else if (step != ReadStep::read) {
+      Warning("%s: KSI_ParamListAddString failure\n", reader);
+    } else if (readFailure != nullptr) {
+      Warning("%s: %s\n", reader, readFailure);
+    }
+  };
 }
 
 // A volume's own record only tells that the volume is there.
 Status PMemGetVolumeInfo(const char* volume) {
   KSI_PmemVolume record;
-  const ReadResult result =
-      KeyedGet(KSI_NODE_memory_pmem_volumes_info, VolumeKey(volume), &record, sizeof record);
-  WarnOfList("PMemGetVolumeInfo", result.step);
-  return result.status;
+  return KeyedGet(KSI_NODE_memory_pmem_volumes_info, VolumeKey(volume), record,
+                  WordsOf("PMemGetVolumeInfo"));
 }
 
 Status PMemGetRegionStoreInfo(const char* volume, VolumeRow& row) {
-  const ReadResult result = KeyedRead(VolumeKey(volume), [&](KSI_ParamList* list) {
+  constexpr const char* kReader = "PMemGetRegionStoreInfo";
+  const auto read = [&row](KSI_ParamList* list) {
     if (Status status = KSI_Get(KSI_NODE_memory_pmem_volumes_regionStore_info, list, &row.store,
                                 sizeof row.store)) {
-      Warning("PMemGetRegionStoreInfo: KSI_Get failure\n");
+      Warning("%s: KSI_Get failure\n", kReader);
       return status;
     }
     return KSI_Get(KSI_NODE_memory_pmem_volumes_regionStore_isClean, list, &row.isClean,
                    sizeof row.isClean);
-  });
-  WarnOfList("PMemGetRegionStoreInfo", result.step);
-  return result.status;
+  };
+  return KeyedRead(VolumeKey(volume), read, WordsOf(kReader));
 }
 
 Status GetRegionsInfo(const char* volume, const char* region, KSI_PmemRegion& record) {
-  const ReadResult result = KeyedGet(KSI_NODE_memory_pmem_volumes_regionStore_regions_info,
-                                     RegionKeys(volume, region), &record, sizeof record);
-  WarnOfList("GetRegionsInfo", result.step);
-  if (result.step == ReadStep::read) Warning("GetRegionsInfo: KSI_Get failure\n");
-  return result.status;
+  return KeyedGet(KSI_NODE_memory_pmem_volumes_regionStore_regions_info, RegionKeys(volume, region),
+                  record, WordsOf("GetRegionsInfo", "KSI_Get failure"));
 }
 
 // Calls `print` with each name of a list until it fails; `failure` words a name that cannot be
@@ -164,9 +162,9 @@ bool ForEachName(const ParamList& names, const char* failure, Print print) {
 // The same for the volumes of the host.
 template <class Print>
 void ForEachVolume(const char* failure, Print print) {
-  KSI_ParamList* made = nullptr;
-  if (KSI_GetInstanceListAlloc(KSI_NODE_memory_pmem_volumes, nullptr, &made) != kSuccess) return;
-  ForEachName(ParamList(made), failure, print);
+  ParamList volumes;
+  if (ListInstances(KSI_NODE_memory_pmem_volumes, nullptr, volumes) != kSuccess) return;
+  ForEachName(volumes, failure, print);
 }
 
 void PMemRegionStoreReport(ReportContext<VolumeRow>& context) {
@@ -202,10 +200,10 @@ void PMemRegionsReport(ReportContext<RegionRow>& context) {
   constexpr char kNameFailure[] = "PMemRegionsReport: KSI_ParamListGetString failure\n";
   ForEachVolume(kNameFailure, [&](const char* volume) {
     ParamList regions;
-    const ReadResult result =
-        KeyedList(KSI_NODE_memory_pmem_volumes_regionStore_regions, VolumeKey(volume), regions);
-    WarnOfList("PMemRegionsReport", result.step);
-    if (result.status != kSuccess) return false;
+    if (KeyedList(KSI_NODE_memory_pmem_volumes_regionStore_regions, VolumeKey(volume), regions,
+                  WordsOf("PMemRegionsReport")) != kSuccess) {
+      return false;
+    }
     return ForEachName(regions, kNameFailure,
                        [&](const char* region) { return PrintRegion(volume, region, context); });
   });

@@ -25,16 +25,14 @@ struct HintRow {
   uint64_t active;
 };
 
-constexpr InTotal kSum = InTotal::sum;
-
 constexpr Column<HintRow> kColumns[] = {
     {"type", "Hint type (regular or large page hint)", 10, "s", kSum, nullptr,
      [](const HintRow& row) -> Cell { return row.type; }},
-    {"totAdd", "Total hints added", 15, "Lu", kSum, FromKilobytes,
+    {"totAdd", "Total hints added", 15, "Lu", kSum, ShiftKilobytes,
      [](const HintRow& row) -> Cell { return PagesToKilobytes(row.totAdd); }},
-    {"totRemove", "Total hints removed", 15, "Lu", kSum, FromKilobytes,
+    {"totRemove", "Total hints removed", 15, "Lu", kSum, ShiftKilobytes,
      [](const HintRow& row) -> Cell { return PagesToKilobytes(row.totRemove); }},
-    {"active", "Currently active hints", 15, "Lu", kSum, FromKilobytes,
+    {"active", "Currently active hints", 15, "Lu", kSum, ShiftKilobytes,
      [](const HintRow& row) -> Cell { return PagesToKilobytes(row.active); }},
 };
 

@@ -18,22 +18,20 @@ constexpr ReportFrame kFrame = {
     .labelWidth = 17,
 };
 
-constexpr InTotal kSum = InTotal::sum;
-
 constexpr Column<KSI_PshareStats> kColumns[] = {
-    {"cow", "Client memory marked copy-on-write", 10, "Lu", kSum, FromKilobytes,
+    {"cow", "Client memory marked copy-on-write", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.cow); }},
-    {"cow1", "Client's COWed memory with single ref", 10, "Lu", kSum, FromKilobytes,
+    {"cow1", "Client's COWed memory with single ref", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.cow1); }},
-    {"zero", "Zeroed client memory", 10, "Lu", kSum, FromKilobytes,
+    {"zero", "Zeroed client memory", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.zero); }},
-    {"used", "Machine memory used for backing COWed client memory", 10, "Lu", kSum, FromKilobytes,
+    {"used", "Machine memory used for backing COWed client memory", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.used); }},
-    {"reclaimed", "Machine memory reclaimed via pshare", 10, "Lu", kSum, FromKilobytes,
+    {"reclaimed", "Machine memory reclaimed via pshare", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.reclaimed); }},
-    {"totAdd", "Total client memory added to pshare table", 10, "Lu", kSum, FromKilobytes,
+    {"totAdd", "Total client memory added to pshare table", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.totAdd); }},
-    {"totRemove", "Total client memory removed from pshare table", 10, "Lu", kSum, FromKilobytes,
+    {"totRemove", "Total client memory removed from pshare table", 10, "Lu", kSum, ShiftKilobytes,
      [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.totRemove); }},
 };
 

@@ -327,6 +327,22 @@ struct KSI_PshareStats {
   uint8_t unused192[16];
 };
 
+/* The free and used buffers of one size of a buddy allocator. */
+struct KSI_BuddyBuffers {
+  uint32_t free;
+  uint32_t used;
+  uint8_t unused8[4];
+};
+
+/* Buffer sizes of a buddy allocator: 4 KB, each twice the one before, up to 1 GB. */
+enum { KSI_BUDDY_SIZES = 19 };
+
+/* A buddy allocator. */
+struct KSI_BuddyStats {
+  uint8_t unused0[8];
+  struct KSI_BuddyBuffers buffers[KSI_BUDDY_SIZES];
+};
+
 /* A kernel heap. */
 struct KSI_HeapStats {
   char name[36];
@@ -414,21 +430,6 @@ struct KSI_PmemRegion {
   uint64_t reserved; /* 2 MB blocks */
   uint32_t flags; /* bits, from 0: allocated, deleting, locked, readOnly, blockDev, persistResv, system */
   uint8_t unused57[3];
-};
-/* The free and used buffers of one size of a buddy allocator. */
-struct KSI_BuddyBuffers {
-  uint32_t free;
-  uint32_t used;
-  uint8_t unused8[4];
-};
-
-/* Buffer sizes of a buddy allocator: 4 KB, each twice the one before, up to 1 GB. */
-enum { KSI_BUDDY_SIZES = 19 };
-
-/* A buddy allocator. */
-struct KSI_BuddyStats {
-  uint8_t unused0[8];
-  struct KSI_BuddyBuffers buffers[KSI_BUDDY_SIZES];
 };
 
 #pragma pack(pop)
@@ -673,6 +674,8 @@ KSI_AT(KSI_PmemRegion, size, 37);
 KSI_AT(KSI_PmemRegion, reserved, 45);
 KSI_AT(KSI_PmemRegion, flags, 53);
 KSI_SIZE(KSI_PmemRegion, 60);
+KSI_AT(KSI_BuddyBuffers, free, 0);
+KSI_AT(KSI_BuddyBuffers, used, 4);
 KSI_SIZE(KSI_BuddyBuffers, 12);
 KSI_AT(KSI_BuddyStats, buffers, 8);
 KSI_SIZE(KSI_BuddyStats, 236);
