@@ -134,26 +134,26 @@ Status StatusOfSqlite(int code) {
   }
 }
 
-Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* out, std::string* why) {
+Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, std::string* why) {
   Status status = CheckFile(fileName);
   if (status != kOk) return status;
 
-  std::unique_ptr<CacheFile> file(new CacheFile);
+  std::unique_ptr<CacheFile> made(new CacheFile);
   sqlite3* handle = nullptr;
   const int code =
       sqlite3_open_v2(UriOf(fileName).c_str(), &handle,
                       SQLITE_OPEN_READONLY | SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX, nullptr);
-  file->database_.reset(handle);
-  status = code == SQLITE_OK ? file->Configure() : file->Failed(code);
-  if (status == kOk) status = file->CheckSchema();
-  if (status == kOk) status = file->ReadCapture();
-  if (status == kOk) status = file->ReadNodes();
+  made->database_.reset(handle);
+  status = code == SQLITE_OK ? made->Configure() : made->Failed(code);
+  if (status == kOk) status = made->CheckSchema();
+  if (status == kOk) status = made->ReadCapture();
+  if (status == kOk) status = made->ReadNodes();
   if (status != kOk) {
-    if (why != nullptr) *why = file->why_;
+    if (why != nullptr) *why = made->why_;
     return status;
   }
   sqlite3_progress_handler(handle, 0, nullptr, nullptr);
-  *out = std::move(file);
+  *file = std::move(made);
   return kOk;
 }
 

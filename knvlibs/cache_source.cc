@@ -52,23 +52,23 @@ void CacheSource::OwnKey::Take(const Key& key) {
   text = key.text;
 }
 
-Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* out) {
-  std::unique_ptr<CacheSource> source(new CacheSource);
-  const Status status = CacheFile::Open(fileName, &source->file_);
+Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* source) {
+  std::unique_ptr<CacheSource> made(new CacheSource);
+  const Status status = CacheFile::Open(fileName, &made->file_);
   if (status != kOk) return status;
 
-  for (auto& ids : source->ids_) ids.assign(Catalogue().size(), -1);
-  for (const CacheFile::NodeRow& row : source->file_->NodeRows()) {
+  for (auto& ids : made->ids_) ids.assign(Catalogue().size(), -1);
+  for (const CacheFile::NodeRow& row : made->file_->NodeRows()) {
     if (row.node == nullptr) continue;
-    source->ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
+    made->ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
   }
 
-  const int code = source->cursor_.Prepare(
-      source->file_->Handle(),
+  const int code = made->cursor_.Prepare(
+      made->file_->Handle(),
       "SELECT key1, key2, node, status, answer FROM reading WHERE (key1, key2) >= (?1, ?2) "
       "ORDER BY key1, key2, node");
   if (code != SQLITE_OK) return StatusOfSqlite(code);
-  *out = std::move(source);
+  *source = std::move(made);
   return kOk;
 }
 
@@ -93,7 +93,6 @@ Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& ins
   const int64_t count = reading->number;
   if (count == 0) return kOk;
 
-  const bool numbers = KindOf(node.entries) == KeyKind::kNumber;
   int64_t position = 0;
   // Many a report lists nothing, so this waits for the first list.
   int code = entries_ ? SQLITE_OK : entries_.Prepare(file_->Handle(), kEntriesOfList);
@@ -101,22 +100,28 @@ Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& ins
   if (code == SQLITE_OK) code = entries_.Bind(3, reading->node);
   if (code == SQLITE_OK) {
     while (status == kOk && (code = entries_.Step()) == SQLITE_ROW) {
-      if (position == count || entries_.Number(0) != position++) {
-        status = KSI_STATUS_METADATA_READ_ERROR;
-      } else if (numbers && entries_.Type(1) == SQLITE_INTEGER) {
-        status = instances.AddNumber(static_cast<uint64_t>(entries_.Number(1)));
-      } else if (!numbers && entries_.Type(1) == SQLITE_TEXT &&
-                 entries_.Text(1).find('\0') == std::string_view::npos) {
-        status = instances.AddText(entries_.Text(1));
-      } else {
-        status = KSI_STATUS_METADATA_READ_ERROR;
-      }
+      status = position < count && entries_.Number(0) == position ? TakeEntry(node, instances)
+                                                                  : KSI_STATUS_METADATA_READ_ERROR;
+      ++position;
     }
   }
   entries_.Reset();
   if (status == kOk) status = StatusOfSqlite(code);
   if (status == kOk && position != count) status = KSI_STATUS_METADATA_READ_ERROR;
   return status;
+}
+
+// The entry of the row that entries_ is on.
+Status CacheSource::TakeEntry(const Node& node, ParamList& instances) const {
+  if (KindOf(node.entries) == KeyKind::kNumber) {
+    if (entries_.Type(1) != SQLITE_INTEGER) return KSI_STATUS_METADATA_READ_ERROR;
+    return instances.AddNumber(static_cast<uint64_t>(entries_.Number(1)));
+  }
+  const std::string_view text = entries_.Text(1);
+  if (entries_.Type(1) != SQLITE_TEXT || text.find('\0') != std::string_view::npos) {
+    return KSI_STATUS_METADATA_READ_ERROR;
+  }
+  return instances.AddText(text);
 }
 
 Definitions CacheSource::KernelDefinitions() const {
@@ -138,25 +143,25 @@ Status CacheSource::Find(const Node& node, Kind kind, const Keys& keys, const Ob
   return found->status;
 }
 
-Status CacheSource::FindObject(const Keys& keys, const Object** out) {
-  for (Object& object : objects_) {
-    if (object.valid && object.keys[0].Is(KeyAt(keys, 0)) && object.keys[1].Is(KeyAt(keys, 1))) {
-      *out = &object;
+Status CacheSource::FindObject(const Keys& keys, const Object** object) {
+  for (const Object& each : objects_) {
+    if (each.valid && each.keys[0].Is(KeyAt(keys, 0)) && each.keys[1].Is(KeyAt(keys, 1))) {
+      *object = &each;
       return kOk;
     }
   }
-  Object& object = objects_[oldest_];
-  object.valid = false;
-  const Status status = Load(keys, object);
+  Object& loaded = objects_[oldest_];
+  loaded.valid = false;
+  const Status status = Load(keys, loaded);
   if (status != kOk) {
     cursor_.Reset();
     onRow_ = false;
     return status;
   }
-  for (size_t i = 0; i < kMaxKeys; ++i) object.keys[i].Take(KeyAt(keys, i));
-  object.valid = true;
+  for (size_t i = 0; i < kMaxKeys; ++i) loaded.keys[i].Take(KeyAt(keys, i));
+  loaded.valid = true;
   oldest_ = (oldest_ + 1) % objects_.size();
-  *out = &object;
+  *object = &loaded;
   return kOk;
 }
 

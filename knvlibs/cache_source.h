@@ -60,6 +60,7 @@ class CacheSource : public Source {
 
   Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
               const Reading** reading);
+  Status TakeEntry(const Node& node, ParamList& instances) const;
   Status FindObject(const Keys& keys, const Object** object);
   Status Load(const Keys& keys, Object& object);
   Status StepCursor();

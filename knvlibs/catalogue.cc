@@ -255,7 +255,7 @@ constexpr Field kBuddyStatsFields[] = {
     BUFFERS("16MB", 12),  BUFFERS("32MB", 13),  BUFFERS("64MB", 14), BUFFERS("128MB", 15),
     BUFFERS("256MB", 16), BUFFERS("512MB", 17), BUFFERS("1GB", 18),
 };
-static_assert(std::size(kBuddyStatsFields) == 2 * KSI_BUDDY_SIZES);
+static_assert(std::size(kBuddyStatsFields) == size_t{2} * KSI_BUDDY_SIZES);
 
 // Records of which no field is used yet.
 constexpr std::span<const Field> kCommonTallyFields;

@@ -11,7 +11,7 @@ void Warning(const char* format, ...) {
   if (format == nullptr) return;
   va_list arguments;
   va_start(arguments, format);
-  std::vfprintf(stderr, format, arguments);
+  static_cast<void>(std::vfprintf(stderr, format, arguments));  // nobody to tell of a failure
   va_end(arguments);
 }
 

@@ -67,7 +67,7 @@ void CacheWriter::WriteNodes() {
   }
 }
 
-void CacheWriter::CheckText(std::string_view text) const {
+void CacheWriter::CheckText(std::string_view text) {
   if (text.size() > ksi::cache::kLongestText) {
     throw DataError("a text is longer than " + std::to_string(ksi::cache::kLongestText) + " bytes");
   }
@@ -150,8 +150,7 @@ void CacheWriter::Commit(const ksi::CacheFile::Capture& capture) {
   addReading_ = {};
   addInstance_ = {};
   Execute("COMMIT");
-  Require(sqlite3_close(database_.get()) == SQLITE_OK, "close");
-  database_.release();
+  Require(sqlite3_close(database_.release()) == SQLITE_OK, "close");
   file_.Commit();
 }
 

@@ -35,7 +35,7 @@ class CacheWriter {
   void Execute(const std::string& sql);
   void Require(bool good, const char* action);
   void WriteNodes();
-  void CheckText(std::string_view text) const;
+  static void CheckText(std::string_view text);
   void BindKeys(ksi::Statement& statement, const ksi::Keys& keys);
   // Adds the row of which the answer is bound already.
   void AddReading(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys, ksi::Status status);

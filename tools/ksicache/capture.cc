@@ -4,6 +4,7 @@
 // itself, a group, a client, a remap type of a client. Of each, every node that takes such keys is
 // read and listed, and the instances so found are the objects to come. A read that fails is
 // recorded with its status, so that nothing stops a capture and a captured host answers as it did.
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdlib>
@@ -64,10 +65,9 @@ ksi::Keys KeysOf(const Object& object) {
 
 // Whether some node takes such keys.
 bool IsKeying(const ksi::Keying& keying) {
-  for (const ksi::Node& node : ksi::Catalogue()) {
-    if (node.HasValue() && node.valueKeys == keying) return true;
-  }
-  return false;
+  return std::ranges::any_of(ksi::Catalogue(), [&](const ksi::Node& node) {
+    return node.HasValue() && node.valueKeys == keying;
+  });
 }
 
 class Walk {

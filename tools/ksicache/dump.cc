@@ -53,7 +53,7 @@ class Dumper {
   }
 
   void Complain(const Reading& reading, const std::string& what) {
-    std::fprintf(stderr, "ksicache: %s: %s\n", reading.Name().c_str(), what.c_str());
+    PrintError(reading.Name() + ": " + what);
     ++complaints_;
   }
 

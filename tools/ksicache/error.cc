@@ -1,19 +1,19 @@
 #include "tools/ksicache/error.h"
 
 #include <array>
-#include <cstdio>
+#include <charconv>
 #include <cstring>
 
 namespace ksicache {
 
 Error SystemError(const std::string& fileName, int error) {
-  return Error(fileName + ": " + std::strerror(error));
+  return Error{fileName + ": " + std::strerror(error)};
 }
 
-std::string Hex(ksi::Status status) {
-  std::array<char, 16> text;
-  std::snprintf(text.data(), text.size(), "%#x", status);
-  return text.data();
+std::string Hex(uint64_t number) {
+  std::array<char, 18> text = {'0', 'x'};
+  const auto [end, error] = std::to_chars(text.data() + 2, text.data() + text.size(), number, 16);
+  return {text.data(), end};
 }
 
 std::string NameOf(std::string_view path, const ksi::Keys& keys) {
@@ -30,10 +30,10 @@ std::string NameOf(std::string_view path, const ksi::Keys& keys) {
 std::string Printable(std::string_view text) {
   std::string result;
   for (const char c : text) {
-    if (static_cast<unsigned char>(c) < ' ' || c == '\x7f') {
-      std::array<char, 8> code;
-      std::snprintf(code.data(), code.size(), "\\x%02x", static_cast<unsigned char>(c));
-      result += code.data();
+    const auto byte = static_cast<unsigned char>(c);
+    if (byte < ' ' || byte == 0x7f) {
+      result += byte < 16 ? "\\x0" : "\\x";
+      result += Hex(byte).substr(2);
     } else {
       result += c;
     }

@@ -2,12 +2,11 @@
 #ifndef TOOLS_KSICACHE_ERROR_H_
 #define TOOLS_KSICACHE_ERROR_H_
 
+#include <cstdint>
 #include <stdexcept>
 #include <string>
 
-#include "knvlibs/catalogue.h"
 #include "knvlibs/source.h"
-#include "knvlibs/status.h"
 
 namespace ksicache {
 
@@ -33,7 +32,7 @@ class UsageError : public std::runtime_error {
 Error SystemError(const std::string& fileName, int error);
 
 // "0xbad0003"
-std::string Hex(ksi::Status status);
+std::string Hex(uint64_t number);
 
 // "sched/groups/groupName [5]"
 std::string NameOf(std::string_view path, const ksi::Keys& keys);

@@ -25,7 +25,7 @@ constexpr const char* kReadings = "readings";
 // A text without a NUL.
 std::string PlainText(const Json& json, const std::string& where) {
   std::string text = TextFromJson(json, where);
-  if (text.find('\0') != text.npos) throw DataError(where + ": holds a NUL");
+  if (text.find('\0') != std::string::npos) throw DataError(where + ": holds a NUL");
   return text;
 }
 
@@ -137,8 +137,7 @@ class Loader {
     const ksi::Node* node = ksi::FindNode(path);
     if (node == nullptr) throw DataError("there is no node " + Printable(path));
     if (keys == nullptr || !keys->is_array()) throw DataError(path + ": has no \"keys\"");
-    if (answer == nullptr)
-      throw DataError(path + ": has no \"value\", \"instances\" or \"status\"");
+    if (answer == nullptr) throw DataError(path + R"(: has no "value", "instances" or "status")");
     *where += path + " " + keys->dump() + ": ";
 
     const bool isValue = KindOf(*node, *keys, kind) == ksi::Kind::kValue;

@@ -89,7 +89,7 @@ int Run(int argc, char** argv) {
   }
   if (optind == argc) throw UsageError("which command?");
   const Command& command = FindCommand(argv[optind]);
-  if (given.find_first_not_of(command.options) != given.npos) {
+  if (given.find_first_not_of(command.options) != std::string::npos) {
     throw UsageError(std::string(command.name) + " does not take that option");
   }
   options.arguments.assign(argv + optind + 1, argv + argc);
@@ -105,10 +105,10 @@ int main(int argc, char** argv) {
     ksicache::FinishOutput();
     return status;
   } catch (const ksicache::UsageError& error) {
-    std::fprintf(stderr, "ksicache: %s\nTry 'ksicache --help'.\n", error.what());
+    ksicache::PrintError(std::string(error.what()) + "\nTry 'ksicache --help'.");
     return 2;
   } catch (const std::exception& error) {
-    std::fprintf(stderr, "ksicache: %s\n", error.what());
+    ksicache::PrintError(error.what());
     return 1;
   }
 }

@@ -14,6 +14,11 @@ void Print(std::string_view text) {
   }
 }
 
+void PrintError(const std::string& message) {
+  // When even this fails, there is nobody to tell.
+  static_cast<void>(std::fprintf(stderr, "ksicache: %s\n", message.c_str()));
+}
+
 void FinishOutput() {
   if (std::fflush(stdout) != 0) throw SystemError("standard output", errno);
 }

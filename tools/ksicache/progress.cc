@@ -18,7 +18,7 @@ Progress::Progress(const char* title)
     : title_(title), terminal_(isatty(STDERR_FILENO) == 1), next_(Clock::now() + kFirst) {}
 
 Progress::~Progress() {
-  if (shown_) std::fputs("\r\x1b[K", stderr);
+  if (shown_) static_cast<void>(std::fputs("\r\x1b[K", stderr));
 }
 
 void Progress::Show(size_t done, size_t total) {
@@ -29,7 +29,8 @@ void Progress::Show(size_t done, size_t total) {
   shown_ = true;
   std::string bar(done * kWidth / total, '#');
   bar.resize(kWidth, '.');
-  std::fprintf(stderr, "\r%s [%s] %zu of %zu\x1b[K", title_, bar.c_str(), done, total);
+  static_cast<void>(
+      std::fprintf(stderr, "\r%s [%s] %zu of %zu\x1b[K", title_, bar.c_str(), done, total));
 }
 
 }  // namespace ksicache

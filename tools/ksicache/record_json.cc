@@ -136,7 +136,7 @@ std::string TextFromJson(const Json& json, const std::string& where) {
   } else if (json.is_object() && json.size() == 1 && json.contains("hex")) {
     text = FromHex(json["hex"], where + ".hex");
   } else {
-    throw DataError(where + ": is neither a string nor {\"hex\": \"...\"}");
+    throw DataError(where + R"(: is neither a string nor {"hex": "..."})");
   }
   return text;
 }
@@ -152,7 +152,9 @@ Json RecordToJson(const ksi::Node& node, std::span<const std::byte> record) {
 std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json) {
   if (!json.is_object()) throw DataError("value: is not an object");
   std::vector<std::byte> record(node.recordSize);
-  for (const auto& [name, value] : json.items()) {
+  for (const auto& member : json.items()) {
+    const std::string& name = member.key();
+    const Json& value = member.value();
     const std::string where = "value." + name;
     const auto field = std::ranges::find_if(
         node.fields, [&](const ksi::Field& each) { return each.name == name; });
@@ -182,7 +184,7 @@ std::string NumberToText(const ksi::Field& field, std::span<const std::byte> rec
     case ksi::FieldType::kSigned:
       return std::to_string(SignedAt(field, record));
     case ksi::FieldType::kBits:
-      return Hex(static_cast<ksi::Status>(number));
+      return Hex(number);
     default:
       break;
   }

@@ -22,7 +22,7 @@ constexpr int kSignals[] = {SIGHUP, SIGINT, SIGTERM};
 
 void RemoveAndDie(int signal) {
   unlink(toRemove);
-  raise(signal);  // with its default action, which SA_RESETHAND has brought back
+  static_cast<void>(raise(signal));  // with its default action, which SA_RESETHAND brought back
 }
 
 void SetHandlers(void (*handler)(int)) {
@@ -39,7 +39,7 @@ void SetHandlers(void (*handler)(int)) {
 
 std::string DirectoryOf(const std::string& fileName) {
   const size_t slash = fileName.rfind('/');
-  return slash == fileName.npos ? "." : slash == 0 ? "/" : fileName.substr(0, slash);
+  return slash == std::string::npos ? "." : slash == 0 ? "/" : fileName.substr(0, slash);
 }
 
 mode_t Umask() {
@@ -49,7 +49,7 @@ mode_t Umask() {
 }
 
 Error Exists(const std::string& target) {
-  return Error(target + ": exists already (--force replaces it)");
+  return Error{target + ": exists already (--force replaces it)"};
 }
 
 // rename(2), but only where nothing stands if `replace` is false.
@@ -82,7 +82,7 @@ TemporaryFile::TemporaryFile(std::string target, bool replace)
   fd_ = mkstemp(name_.data());
   const int error = errno;
   if (fd_ >= 0) {
-    std::strcpy(toRemove, name_.c_str());
+    std::memcpy(toRemove, name_.c_str(), name_.size() + 1);
     SetHandlers(RemoveAndDie);
   }
   sigprocmask(SIG_SETMASK, &before, nullptr);
