@@ -247,6 +247,14 @@ TEST(BuddyStats, KeepsBuddiesOfOneNameInTheirOrder) {
   host.Bytes(kStats, {"memmap-00-lo"}, Buffers(70));
   EXPECT_EQ(Cells(host, "name:4KBfree"),
             "memmap-00-lo,0,70\nmemmap-00-lo,0,70\nmemmap-00-hi,0,3000\nTotal,,3140\n");
+  // The first of them is the one that changes places.
+  EXPECT_EQ(Order({{"memmap-00-hi", 0},
+                   {"memmap-00-lo", 0},
+                   {"memmap-00-ab", 0},
+                   {"memmap-00-lo", 0},
+                   {"memmap-00-xy", 0},
+                   {"memmap-00-lo", 0}}),
+            "memmap-00-lo memmap-00-lo memmap-00-lo memmap-00-hi memmap-00-xy memmap-00-ab");
   // The same after they were cut.
   EXPECT_EQ(Order({{"memmap-00-lo---1", 0}, {"memmap-00-lo---2", 0}}),
             "memmap-00-lo--- memmap-00-lo---");

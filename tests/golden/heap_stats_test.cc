@@ -253,11 +253,8 @@ TEST(HeapStats, ConvertsAfterTheSubtraction) {
 }
 
 TEST(HeapStats, ShowsAllOnes) {
-  RawRecord heap = MainHeap().U8(36, 255).U8(49, 255);
-  for (const size_t at :
-       {41, 45, 58, 62, 66, 70, 78, 86, 94, 98, 102, 106, 114, 118, 126, 130, 134, 138}) {
-    heap.U32(at, UINT32_MAX);
-  }
+  const RawRecord heap = MainHeap().U8(36, 255).U8(49, 255).U32(
+      {41, 45, 58, 62, 66, 70, 78, 86, 94, 98, 102, 106, 114, 118, 126, 130, 134, 138}, UINT32_MAX);
   EXPECT_EQ(Rows(HeapStats(Heaps({heap}), {"-q"}).out),
             "mainHeap,255,-1,-1,255,-1,4294967295,0,4294967295,4294967295,4294967295,4294967295,"
             "-1,4294967295,-1,-1,4294967295,4294967295,4294967295,4294967295,4294967295,"
@@ -279,8 +276,11 @@ TEST(HeapStats, WrapsWhatIsUsed) {
 }
 
 TEST(HeapStats, AddsUpSizesIn64BitsAndOperationsIn32) {
-  RawRecord heap = MainHeap().U32(78, 0).U32(134, 4000000000).U32(138, UINT32_MAX);
-  for (const size_t at : {62, 66, 70, 94, 98}) heap.U32(at, 3000000000);
+  const RawRecord heap = MainHeap()
+                             .U32({62, 66, 70, 94, 98}, 3000000000)
+                             .U32(78, 0)
+                             .U32(134, 4000000000)
+                             .U32(138, UINT32_MAX);
   EXPECT_EQ(Cells(Heaps({heap, heap, heap}),
                   "dlMallocOvdh:used:avail:size:initial:max:maxAvail:numGrowthOps:numShrinkOps"),
             "mainHeap,3000000000,3000000000,0,3000000000,3000000000,3000000000,3000000000,"

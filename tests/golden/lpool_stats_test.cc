@@ -179,9 +179,8 @@ TEST(LPoolStats, DoesNotCountOnTheNumberOfVirtualMachines) {
 }
 
 TEST(LPoolStats, ShowsAllOnes) {
-  RawRecord pool(96);
-  pool.U32(0, UINT32_MAX).U32(4, UINT32_MAX);
-  for (const size_t at : {8, 16, 24, 32, 40, 56, 64, 72, 80, 88}) pool.U64(at, kAllOnes);
+  const RawRecord pool =
+      RawRecord(96).U32({0, 4}, UINT32_MAX).U64({8, 16, 24, 32, 40, 56, 64, 72, 80, 88}, kAllOnes);
   std::string wide;
   for (int i = 0; i < 10; ++i) wide += ",18446744073709551615";
   const std::string cells = "4294967295,4294967295" + wide + "\n";

@@ -318,9 +318,7 @@ TEST(PmemStats, TellsCleanStores) {
 }
 
 TEST(PmemStats, ShowsAllOnes) {
-  RawRecord store(40);
-  for (const size_t at : {0, 8, 16, 32}) store.U64(at, kAllOnes);
-  store.U32(24, UINT32_MAX).U32(28, UINT32_MAX);
+  const RawRecord store = RawRecord(40).U64({0, 8, 16, 32}, kAllOnes).U32({24, 28}, UINT32_MAX);
   Scenario host = Scenario().List(kVolumes, {}, {"v"});
   AddVolume(host, "v", store, 1);
   for (const char* unit : {"kb", "pg", "mb"}) {

@@ -26,6 +26,16 @@ class RawRecord {
   RawRecord& U32(size_t offset, uint32_t value) { return Put(offset, value); }
   RawRecord& U64(size_t offset, uint64_t value) { return Put(offset, value); }
 
+  // The same value at each of these offsets.
+  RawRecord& U32(std::initializer_list<size_t> offsets, uint32_t value) {
+    for (const size_t offset : offsets) U32(offset, value);
+    return *this;
+  }
+  RawRecord& U64(std::initializer_list<size_t> offsets, uint64_t value) {
+    for (const size_t offset : offsets) U64(offset, value);
+    return *this;
+  }
+
   // The bytes of `text` and no NUL.
   RawRecord& Text(size_t offset, std::string_view text) {
     bytes_.replace(offset, text.size(), text);
