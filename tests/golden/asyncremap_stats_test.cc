@@ -86,9 +86,9 @@ TEST(AsyncRemapStats, PrintsATableWithDescriptions) {
 }
 
 TEST(AsyncRemapStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kAsyncRemapStats.Run(RawUserWorlds(), {"-g", "4", "-q"}).out, kKilobytes);
-  EXPECT_EQ(kAsyncRemapStats.Rows(RawUserWorlds(), "", {"-g", "4", "-u", "mb"}), kMegabytes);
-  EXPECT_EQ(kAsyncRemapStats.Rows(RawUserWorlds(), "", {"-g", "4", "-u", "pg"}), kPages);
+  EXPECT_EQ(kAsyncRemapStats.Run(RawUserWorlds(), {"-q"}).out, kKilobytes);
+  EXPECT_EQ(kAsyncRemapStats.Rows(RawUserWorlds(), "", {"-u", "mb"}), kMegabytes);
+  EXPECT_EQ(kAsyncRemapStats.Rows(RawUserWorlds(), "", {"-u", "pg"}), kPages);
 }
 
 TEST(AsyncRemapStats, ReadsAUserWorldInOrder) {
@@ -130,7 +130,7 @@ TEST(AsyncRemapStats, ShowsOnlyUserWorlds) {
   AddGroup(host, 4, {.flags = 0xffff & ~0x8, .children = {40, 8}});
   AddVirtualMachine(host, 40, {});
   AddGroup(host, 8, {.flags = 0, .children = {10}});
-  EXPECT_EQ(kAsyncRemapStats.Rows(host, "name", {"-g", "4"}), "both,numa\n,\n");
+  EXPECT_EQ(kAsyncRemapStats.Rows(host, "name"), "both,numa\n,\n");
 }
 
 TEST(AsyncRemapStats, TakesTheLow32BitsOfAClientsId) {
@@ -344,7 +344,7 @@ TEST(AsyncRemapFailure, OfARecord) {
 
 TEST(AsyncRemapFailure, PassesOverTheRestOfTheGroupOnly) {
   const TallyRun run = kAsyncRemapStats.Run(Family().Fails(kTypes, {100, "b"}, 0xbad0014),
-                                            {"-g", "4", "-q", "-s", "grpLeader:added"});
+                                            {"-q", "-s", "grpLeader:added"});
   EXPECT_EQ(run.out, "grpLeader,type,added\n100,a,4\n-300,c,4\n,,8\n");
   EXPECT_EQ(run.err,
             "TallyAsyncRemapGetStats:140 failure: Out of memory\n"

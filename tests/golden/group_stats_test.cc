@@ -7,10 +7,12 @@
 #include "tests/harness/golden.h"
 #include "tests/harness/hosts.h"
 #include "tests/harness/raw_record.h"
-#include "tests/harness/tally.h"
+#include "tests/harness/report.h"
 
 namespace harness {
 namespace {
+
+constexpr Report kGroupStats("group-stats");
 
 constexpr uint32_t kBad = 0xbad0014;
 
@@ -39,19 +41,9 @@ constexpr char kPages[] =
     "1,beta,0,0,2147535359,-1,-1,0,2147536127,2147536383,2147536639,2147536895,2147537151,2147537407,2147537663,2147537919,2147538175,2147538431,0,0,2147539199,2147539455,2147539711,4295079935,2147540223,2147540479,2147540735,2147540991,-1,0,(none),beta\n";
 // clang-format on
 
-TallyRun GroupStats(const Scenario& scenario, Args args = {}) {
-  args.insert(args.begin(), {"-r", "group-stats"});
-  return RunTally(scenario, args);
-}
-
-// The rows of these columns, in CSV. The first is always gid.
+// The rows of these columns, of which gid is always the first.
 std::string Rows(const Scenario& scenario, const std::string& columns, const Args& args = {}) {
-  Args all = {"-q", "-s", columns};
-  all.insert(all.end(), args.begin(), args.end());
-  const TallyRun run = GroupStats(scenario, all);
-  EXPECT_EQ(run.status, 0);
-  EXPECT_EQ(run.err, "");
-  return run.out.substr(run.out.find('\n') + 1);
+  return kGroupStats.Rows(scenario, columns, args);
 }
 
 // Group 4 as the only one.
@@ -62,9 +54,7 @@ Scenario One(const Group& group) {
 }
 
 std::string Row(const Group& group, const std::string& columns, const Args& args = {}) {
-  Args all = {"-g", "4"};
-  all.insert(all.end(), args.begin(), args.end());
-  return Rows(One(group), columns, all);
+  return Rows(One(group), columns, args);
 }
 
 // A group whose amounts, in the order of the columns, are Kb(first), Kb(first + 1) and so on.
@@ -96,26 +86,19 @@ Scenario RawGroups() {
   return scenario;
 }
 
-// What follows the header when all columns are shown.
-std::string AllRows(Args args) {
-  args.insert(args.begin(), {"-g", "4", "-t", "-q"});
-  const TallyRun run = GroupStats(RawGroups(), args);
-  return run.out.substr(run.out.find('\n') + 1);
-}
-
 TEST(GroupStats, PrintsATableWithTagsAndDescriptions) {
   ExpectTallyGolden("golden/group_stats.txt", RawGroups(),
                     {"-r", "group-stats", "-g", "4", "-t", "-v"});
 }
 
 TEST(GroupStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(GroupStats(RawGroups(), {"-g", "4", "-t", "-q"}).out, kKilobytes);
-  EXPECT_EQ(AllRows({"-u", "mb"}), kMegabytes);
-  EXPECT_EQ(AllRows({"-u", "pg"}), kPages);
+  EXPECT_EQ(kGroupStats.Run(RawGroups(), {"-t", "-q"}).out, kKilobytes);
+  EXPECT_EQ(Rows(RawGroups(), "", {"-t", "-u", "mb"}), kMegabytes);
+  EXPECT_EQ(Rows(RawGroups(), "", {"-t", "-u", "pg"}), kPages);
 }
 
 TEST(GroupStats, ReadsAGroupInOrder) {
-  EXPECT_EQ(GroupStats(One({}), {"-g", "4"}).Calls(),
+  EXPECT_EQ(kGroupStats.Run(One({})).Calls(),
             "CheckSig() "
             "Create(1,2) AddInt(4) GetInstanceListAlloc(sched_groups_members_groups,[4]) "
             "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[4]) "
@@ -172,8 +155,7 @@ TEST(GroupStats, KeepsWhatIsNotAvailableInEveryUnit) {
   for (int column = 9; column <= 28; ++column) row += ",18446744073709551615";
   row += ",-1,255,co,tag\n";
   for (const char* unit : {"kb", "mb", "pg"}) {
-    const TallyRun run = GroupStats(One(group), {"-g", "4", "-q", "-u", unit});
-    EXPECT_EQ(run.out.substr(run.out.find('\n') + 1), row);
+    EXPECT_EQ(Row(group, "", {"-u", unit}), row);
   }
 }
 
@@ -226,13 +208,13 @@ TEST(GroupStats, ShowsTextsThatFillTheirFields) {
   // What is after the first NUL is not shown.
   std::string bytes = name;
   bytes[3] = '\0';
-  EXPECT_EQ(Rows(One({}).Bytes("sched_groups_groupName", {4}, bytes), "name", {"-g", "4"}),
-            "4,nnn\n");
+  EXPECT_EQ(Rows(One({}).Bytes("sched_groups_groupName", {4}, bytes), "name"), "4,nnn\n");
 }
 
 TEST(GroupStats, RealignsAfterALongName) {
-  const TallyRun run = GroupStats(One({.name = "a name that needs some 33 letters", .parent = 12}),
-                                  {"-g", "4", "-s", "name:parGid:nChild:tag"});
+  const TallyRun run =
+      kGroupStats.Run(One({.name = "a name that needs some 33 letters", .parent = 12}),
+                      {"-s", "name:parGid:nChild:tag"});
   EXPECT_EQ(
       run.out.substr(run.out.find("gid:name:")),
       "gid:name:parGid:nChild:tag\n\n"
@@ -244,7 +226,7 @@ TEST(GroupStats, RealignsAfterALongName) {
 }
 
 TEST(GroupStats, AlwaysShowsTheId) {
-  EXPECT_EQ(GroupStats(One({}), {"-g", "4", "-s", "name:consumed"}).out,
+  EXPECT_EQ(kGroupStats.Run(One({}), {"-s", "name:consumed"}).out,
             "\n GROUP STATS: Sat Nov 21 10:00:00 2026\n"
             " -------------------------------------\n"
             "   Start Group ID   : 4\n"
@@ -259,7 +241,7 @@ TEST(GroupStats, AlwaysShowsTheId) {
             "       4                        group     104096\n"
             "------------------------------------------------\n");
   EXPECT_EQ(Row({}, "bogus"), "4\n");
-  EXPECT_EQ(Row({}, ""), "4\n");
+  EXPECT_EQ(kGroupStats.Run(One({}), {"-q", "-s", ""}).out, "gid\n4\n");
   EXPECT_EQ(Row({}, "NAME:GID"), "4,group\n");
 }
 
@@ -277,9 +259,7 @@ Scenario Flagged() {
 
 // The ids of the rows as "4 5".
 std::string Ids(const Args& filters) {
-  Args args = {"-g", "4"};
-  args.insert(args.end(), filters.begin(), filters.end());
-  std::string ids = Rows(Flagged(), "gid", args);
+  std::string ids = Rows(Flagged(), "gid", filters);
   for (char& c : ids) {
     if (c == '\n') c = ' ';
   }
@@ -301,7 +281,7 @@ TEST(GroupStats, ShowsGroupsThatPassTheFilters) {
 
 TEST(GroupStats, ShowsNoneForAnEmptyInclusionFilter) {
   for (const char* none : {"", ":", ":::"}) EXPECT_EQ(Ids({"-i", none}), "") << none;
-  const TallyRun run = GroupStats(Flagged(), {"-g", "4", "-i", "", "-s", "gid"});
+  const TallyRun run = kGroupStats.Run(Flagged(), {"-i", "", "-s", "gid"});
   EXPECT_EQ(run.out.substr(run.out.find("   Inclusion")),
             "   Inclusion filter : (none)\n"
             "   Exclusion filter : (none)\n"
@@ -327,9 +307,7 @@ TEST(GroupStats, ShowsTheFiltersInTheTitle) {
       {{"-i", every, "-e", every}, "(all)\n   Exclusion filter : (all)\n"},
   };
   for (const auto& [args, shown] : filters) {
-    Args all = {"-g", "4"};
-    all.insert(all.end(), args.begin(), args.end());
-    const TallyRun run = GroupStats(Flagged(), all);
+    const TallyRun run = kGroupStats.Run(Flagged(), args);
     EXPECT_NE(run.out.find("\n   Inclusion filter : " + shown), std::string::npos) << run.out;
   }
 }
@@ -346,7 +324,7 @@ TEST(GroupStats, RefusesUnknownFlags) {
       {{"-i", "x", "-e", "y", "-u", "z"}, "Invalid unit specified. Choose from {mb, kb, pg}\n"},
   };
   for (const auto& [args, warning] : filters) {
-    const TallyRun run = GroupStats(Flagged(), args);
+    const TallyRun run = kGroupStats.Run(Flagged(), args);
     EXPECT_EQ(run.out, "");
     EXPECT_EQ(run.err, warning);
     EXPECT_EQ(run.status, 1);
@@ -364,11 +342,11 @@ TEST(GroupTags, AddUpKilobytes) {
   group.memory.consumed = 50;
   group.memory.touched = 1;
   AddGroup(scenario, 5, group);
-  EXPECT_EQ(Rows(scenario, "consumed:touched", {"-g", "4", "-t"}),
+  EXPECT_EQ(Rows(scenario, "consumed:touched", {"-t"}),
             "4,100,1023\n5,50,1\nVirtual tags report\n1,300,1024\n");
-  EXPECT_EQ(Rows(scenario, "consumed:touched", {"-g", "4", "--tags", "-u", "mb"}),
+  EXPECT_EQ(Rows(scenario, "consumed:touched", {"--tags", "-u", "mb"}),
             "4,0,0\n5,0,0\nVirtual tags report\n1,0,1\n");
-  EXPECT_EQ(Rows(scenario, "consumed:touched", {"-g", "4", "-t", "-u", "pg"}),
+  EXPECT_EQ(Rows(scenario, "consumed:touched", {"-t", "-u", "pg"}),
             "4,25,255\n5,12,0\nVirtual tags report\n1,75,256\n");
 }
 
@@ -378,7 +356,7 @@ TEST(GroupTags, StandInTheOrderOfTheWalk) {
   AddGroup(scenario, 5, {.tag = ""});
   AddGroup(scenario, 6, {.tag = "B"});
   AddGroup(scenario, 7, {.tag = ""});
-  EXPECT_EQ(Rows(scenario, "name:min:tag", {"-g", "4", "-t"}),
+  EXPECT_EQ(Rows(scenario, "name:min:tag", {"-t"}),
             "4,group,1024,b\n5,group,1024,\n6,group,1024,B\n7,group,1024,\n"
             "Virtual tags report\n"
             "1,b,1024,b\n1,,2048,\n1,B,1024,B\n");
@@ -387,7 +365,7 @@ TEST(GroupTags, StandInTheOrderOfTheWalk) {
 TEST(GroupTags, CountOnlyGroupsWithARow) {
   Scenario scenario = Flagged();
   scenario.Value("sched_groups_groupTag", {5}, TextRecord<KSI_GroupTag>("five"));
-  EXPECT_EQ(Rows(scenario, "nChild:tag", {"-g", "4", "-t", "-e", "co"}),
+  EXPECT_EQ(Rows(scenario, "nChild:tag", {"-t", "-e", "co"}),
             "6,0,tag\n7,0,tag\n9,0,tag\nVirtual tags report\n1,0,tag\n");
 }
 
@@ -395,8 +373,8 @@ TEST(GroupTags, AreNotShownWithoutTheOption) { EXPECT_EQ(Row({}, "tag"), "4,tag\
 
 TEST(GroupTags, AreABareHeadingWhenThereIsNoRow) {
   EXPECT_EQ(Row({.flags = 0}, "tag", {"-t"}), "Virtual tags report\n");
-  const TallyRun run = GroupStats(One({}).Fails("sched_groups_groupFlags", {4}, kBad),
-                                  {"-g", "4", "-t", "-s", "gid", "-v"});
+  const TallyRun run = kGroupStats.Run(One({}).Fails("sched_groups_groupFlags", {4}, kBad),
+                                       {"-t", "-s", "gid", "-v"});
   EXPECT_EQ(run.out.substr(run.out.find("--------\n     gid")),
             "--------\n     gid\n--------\n--------\nVirtual tags report\n--------\n"
             "Description of report header labels:\n"
@@ -411,7 +389,7 @@ TEST(GroupTags, LoseTheirEighthLetter) {
   AddGroup(scenario, 4, {.tag = "ABCDEFGH", .children = {5, 6}});
   AddGroup(scenario, 5, {.tag = "ABCDEFGH"});
   AddGroup(scenario, 6, {.tag = "ABCDEFG"});
-  EXPECT_EQ(Rows(scenario, "name:min:tag", {"-g", "4", "-t"}),
+  EXPECT_EQ(Rows(scenario, "name:min:tag", {"-t"}),
             "4,group,1024,ABCDEFGH\n5,group,1024,ABCDEFGH\n6,group,1024,ABCDEFG\n"
             "Virtual tags report\n"
             "1,ABCDEFGH,2048,ABCDEFG\n1,ABCDEFGH,1024,ABCDEFG\n");
@@ -434,10 +412,10 @@ TEST(GroupTags, SumsWrap) {
   AddGroup(scenario, 5, group);
   // A sum of all ones is no value, too.
   const std::string columns = "min:memSize:bMax:consumed:touched";
-  const std::string kb = Rows(scenario, columns, {"-g", "4", "-t"});
+  const std::string kb = Rows(scenario, columns, {"-t"});
   EXPECT_EQ(kb.substr(kb.find("Virtual")),
             "Virtual tags report\n1,-9223372036854775807,18446744073709551615,8,4,0\n");
-  const std::string pg = Rows(scenario, columns, {"-g", "4", "-t", "-u", "pg"});
+  const std::string pg = Rows(scenario, columns, {"-t", "-u", "pg"});
   EXPECT_EQ(pg.substr(pg.find("Virtual")),
             "Virtual tags report\n1,2305843009213693952,18446744073709551615,2,1,0\n");
 }
@@ -455,7 +433,7 @@ Scenario ManyTags(int count) {
 }
 
 TEST(GroupTags, AreUpTo512) {
-  const TallyRun run = GroupStats(ManyTags(511), {"-t", "-q", "-s", "tag"});
+  const TallyRun run = kGroupStats.Run(ManyTags(511), {"-g", "0", "-t", "-q", "-s", "tag"});
   EXPECT_EQ(run.err, "");
   EXPECT_EQ(run.status, 0);
   std::string expected = "gid,tag\n";
@@ -473,7 +451,7 @@ TEST(GroupTags, BeyondPassOverTheGroupAndItsSubtree) {
   AddGroup(scenario, 512, {.tag = "t512", .children = {600}});
   AddGroup(scenario, 513, {.tag = "t1", .children = {601}});
   AddGroup(scenario, 601, {.tag = "t511"});
-  const TallyRun run = GroupStats(scenario, {"-t", "-q", "-s", "min"});
+  const TallyRun run = kGroupStats.Run(scenario, {"-g", "0", "-t", "-q", "-s", "min"});
   EXPECT_EQ(run.err, "Maximum number of VTag exceeded\n");
   EXPECT_EQ(run.status, 0);
   std::string expected = "gid,min\n";
@@ -486,12 +464,13 @@ TEST(GroupTags, BeyondPassOverTheGroupAndItsSubtree) {
   EXPECT_EQ(run.Calls().find("[600]"), std::string::npos);
   // Without the tags there is no limit.
   AddGroup(scenario, 600, {});
-  EXPECT_NE(GroupStats(scenario, {"-q", "-s", "gid"}).out.find("\n512\n600\n513\n601\n"),
-            std::string::npos);
+  EXPECT_NE(
+      kGroupStats.Run(scenario, {"-g", "0", "-q", "-s", "gid"}).out.find("\n512\n600\n513\n601\n"),
+      std::string::npos);
 }
 
 TEST(GroupTags, BeyondAreReportedForEachGroup) {
-  const TallyRun run = GroupStats(ManyTags(600), {"-t", "-q", "-s", "gid"});
+  const TallyRun run = kGroupStats.Run(ManyTags(600), {"-g", "0", "-t", "-q", "-s", "gid"});
   EXPECT_EQ(run.status, 0);
   std::string warnings;
   for (int id = 512; id <= 600; ++id) warnings += "Maximum number of VTag exceeded\n";
@@ -522,14 +501,14 @@ TEST(GroupStatsFailure, OfAReadHidesTheGroupAndItsSubtree) {
   for (const auto& [node, reader] : reads) {
     const std::string warning = std::string(reader) + "() failure, error code: 195887107\n";
     const TallyRun below =
-        GroupStats(Family().Fails(node, {5}, 0xbad0003), {"-g", "4", "-q", "-s", "nChild", "-t"});
+        kGroupStats.Run(Family().Fails(node, {5}, 0xbad0003), {"-q", "-s", "nChild", "-t"});
     EXPECT_EQ(below.out, "gid,nChild\n4,2\n6,0\nVirtual tags report\n1,2\n");
     EXPECT_EQ(below.err, warning);
     EXPECT_EQ(below.status, 0);
     EXPECT_EQ(below.Calls().find("[51]"), std::string::npos);
 
     const TallyRun start =
-        GroupStats(Family().Fails(node, {4}, 0xbad0003), {"-g", "4", "-q", "-s", "nChild"});
+        kGroupStats.Run(Family().Fails(node, {4}, 0xbad0003), {"-q", "-s", "nChild"});
     EXPECT_EQ(start.out, "gid,nChild\n");
     EXPECT_EQ(start.err, warning);
     EXPECT_EQ(start.status, 1);
@@ -537,8 +516,7 @@ TEST(GroupStatsFailure, OfAReadHidesTheGroupAndItsSubtree) {
 }
 
 TEST(GroupStatsFailure, OfAReadIsTheLastReadOfTheGroup) {
-  const TallyRun run =
-      GroupStats(One({}).Fails("sched_groups_parentGroupID", {4}, kBad), {"-g", "4"});
+  const TallyRun run = kGroupStats.Run(One({}).Fails("sched_groups_parentGroupID", {4}, kBad));
   EXPECT_TRUE(
       run.Calls().ends_with("Get(sched_groups_parentGroupID,[4])=0xbad0014 RemoveLast() Destroy() "
                             "Destroy(sched_groups_members_groups,[4])"))
@@ -547,12 +525,12 @@ TEST(GroupStatsFailure, OfAReadIsTheLastReadOfTheGroup) {
 
 TEST(GroupStatsFailure, OfTheCapacitysListAndKey) {
   // The children's list, flags, name, tag, parent and allocation take the first six.
-  const TallyRun list = GroupStats(One({}).FailCall("Create", 7, kBad), {"-g", "4", "-q"});
+  const TallyRun list = kGroupStats.Run(One({}).FailCall("Create", 7, kBad), {"-q"});
   EXPECT_EQ(list.err,
             "TallyGroupKsiGet: KSI_ParamListCreate() failure\n"
             "TallyGroupGetCapacity() failure, error code: 195887105\n");
   EXPECT_EQ(list.status, 1);
-  const TallyRun key = GroupStats(One({}).FailCall("AddInt", 7, 0xbad00b4), {"-g", "4", "-q"});
+  const TallyRun key = kGroupStats.Run(One({}).FailCall("AddInt", 7, 0xbad00b4), {"-q"});
   EXPECT_EQ(key.err,
             "TallyGroupKsiGet: KSI_ParamListAddInt() faiure, error code: 195887284\n"
             "TallyGroupGetCapacity() failure, error code: 195887284\n");

@@ -46,9 +46,7 @@ Scenario Guests(const KSI_GuestTally& first, const KSI_GuestTally& second) {
 }
 
 std::string Rows(const Scenario& host, const Args& args = {}) {
-  Args all = {"-g", "4"};
-  all.insert(all.end(), args.begin(), args.end());
-  return kGuestStats.Rows(host, "memTotal:lpageTotal:memNeeded", all);
+  return kGuestStats.Rows(host, "memTotal:lpageTotal:memNeeded", args);
 }
 
 TEST(GuestStats, PrintsATableWithDescriptions) {
@@ -57,26 +55,19 @@ TEST(GuestStats, PrintsATableWithDescriptions) {
 }
 
 TEST(GuestStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kGuestStats.Run(RawMachines(), {"-g", "4", "-q"}).out, kKilobytes);
-  EXPECT_EQ(kGuestStats.Rows(RawMachines(), "", {"-g", "4", "-u", "mb"}), kMegabytes);
-  EXPECT_EQ(kGuestStats.Rows(RawMachines(), "", {"-g", "4", "-u", "pg"}), kPages);
+  EXPECT_EQ(kGuestStats.Run(RawMachines(), {"-q"}).out, kKilobytes);
+  EXPECT_EQ(kGuestStats.Rows(RawMachines(), "", {"-u", "mb"}), kMegabytes);
+  EXPECT_EQ(kGuestStats.Rows(RawMachines(), "", {"-u", "pg"}), kPages);
 }
 
 TEST(GuestStats, ReadsAMachineInOrder) {
   Scenario host;
   AddVirtualMachine(host, 20, {.leader = -300});
   EXPECT_EQ(kGuestStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
-            "CheckSig() "
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupName,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_parentGroupID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupLeaderID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-300) Get(sched_memClients_tally_guest,[-300]) RemoveLast() "
-            "Destroy() "
-            "Destroy(sched_groups_members_groups,[20])");
+            ReadsOfClient20() +
+                "Create(1,2) AddInt(-300) Get(sched_memClients_tally_guest,[-300]) RemoveLast() "
+                "Destroy() "
+                "Destroy(sched_groups_members_groups,[20])");
 }
 
 TEST(GuestStats, LeavesWhatIsNotKnownOutOfTheTotals) {
@@ -122,7 +113,7 @@ TEST(GuestStats, SumsWrap) {
 TEST(GuestStats, TotalsAreZeroWithoutMachines) {
   Scenario host;
   AddGroup(host, 4, {});
-  const TallyRun run = kGuestStats.Run(host, {"-g", "4", "-u", "pg"});
+  const TallyRun run = kGuestStats.Run(host, {"-u", "pg"});
   EXPECT_EQ(
       run.out,
       "\n GUEST STATS: Sat Nov 21 10:00:00 2026\n"
@@ -139,23 +130,14 @@ TEST(GuestStats, TotalsAreZeroWithoutMachines) {
       "-----------------------------------------------------------------------------------------"
       "\n");
   EXPECT_EQ(run.status, 0);
-  EXPECT_EQ(kGuestStats.Rows(host, "", {"-g", "4"}), "Total,,,,0,0,0\n");
+  EXPECT_EQ(kGuestStats.Rows(host, ""), "Total,,,,0,0,0\n");
 }
 
 TEST(GuestStatsFailure, HidesTheMachine) {
-  ExpectFailuresHideGroup10(
-      kGuestStats, TwoMachines(),
-      {{"sched_groups_groupFlags", {10}, "Tally_GroupGetFlags() failure, error code: 195887107\n"},
-       {"sched_groups_groupName", {10}, "Tally_GroupGetName() failure, error code: 195887107\n"},
-       {"sched_groups_parentGroupID",
-        {10},
-        "Tally_GroupGetParentID() failure, error code: 195887107\n"},
-       {"sched_groups_groupLeaderID",
-        {10},
-        "Tally_GroupGetGroupLeaderID() failure, error code: 195887107\n"},
-       {"sched_memClients_tally_guest",
-        {100},
-        "TallyGuestGetStats() failure, error code: 195887107\n"}});
+  ExpectFailuresHideGroup10(kGuestStats, TwoMachines(),
+                            {{"sched_memClients_tally_guest",
+                              {100},
+                              "TallyGuestGetStats() failure, error code: 195887107\n"}});
 }
 
 }  // namespace

@@ -51,35 +51,29 @@ TEST(LPageStats, PrintsATableWithDescriptions) {
 }
 
 TEST(LPageStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kLPageStats.Run(RawMachines(), {"-g", "4", "-q"}).out, kAnyUnit);
+  EXPECT_EQ(kLPageStats.Run(RawMachines(), {"-q"}).out, kAnyUnit);
 }
 
 TEST(LPageStats, ShowsTheUnitInTheTitleOnly) {
-  const std::string kilobytes = kLPageStats.Run(RawMachines(), {"-g", "4"}).out;
+  const std::string kilobytes = kLPageStats.Run(RawMachines()).out;
   const std::pair<const char*, std::string> units[] = {{"mb", "MB"}, {"pg", "Page (4K)"}};
   for (const auto& [word, title] : units) {
-    EXPECT_EQ(kLPageStats.Run(RawMachines(), {"-g", "4", "-q", "-u", word}).out, kAnyUnit);
+    EXPECT_EQ(kLPageStats.Run(RawMachines(), {"-q", "-u", word}).out, kAnyUnit);
     std::string expected = kilobytes;
     expected.replace(expected.find(": KB\n"), 5, ": " + title + "\n");
-    EXPECT_EQ(kLPageStats.Run(RawMachines(), {"-g", "4", "-u", word}).out, expected);
+    EXPECT_EQ(kLPageStats.Run(RawMachines(), {"-u", word}).out, expected);
   }
 }
 
 TEST(LPageStats, ReadsAMachineInOrder) {
   Scenario host;
   AddVirtualMachine(host, 20, {.leader = -300});
-  EXPECT_EQ(kLPageStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
-            "CheckSig() "
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupName,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_parentGroupID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupLeaderID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-300) Get(worldGroups_vmmLeaderID,[-300]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-299) Get(memory_lpage_vmLPage,[-299]) RemoveLast() Destroy() "
-            "Destroy(sched_groups_members_groups,[20])");
+  EXPECT_EQ(
+      kLPageStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
+      ReadsOfClient20() +
+          "Create(1,2) AddInt(-300) Get(worldGroups_vmmLeaderID,[-300]) RemoveLast() Destroy() "
+          "Create(1,2) AddInt(-299) Get(memory_lpage_vmLPage,[-299]) RemoveLast() Destroy() "
+          "Destroy(sched_groups_members_groups,[20])");
 }
 
 TEST(LPageStats, AddsUpTheMachines) {
@@ -87,11 +81,11 @@ TEST(LPageStats, AddsUpTheMachines) {
   first.nrBackings = 3;
   KSI_VmLargePages second{};
   second.nrBackings = 4;
-  EXPECT_EQ(kLPageStats.Rows(Pages(first, second),
-                             "name:schedGrp:parSchedGroup:worldGrp:nrBackings", {"-g", "4"}),
-            "web,10,4,100,3\n"
-            "a database in its 28 letters,20,18446744073709551615,4294966996,4\n"
-            "Total,,,,7\n");
+  EXPECT_EQ(
+      kLPageStats.Rows(Pages(first, second), "name:schedGrp:parSchedGroup:worldGrp:nrBackings"),
+      "web,10,4,100,3\n"
+      "a database in its 28 letters,20,18446744073709551615,4294966996,4\n"
+      "Total,,,,7\n");
 }
 
 TEST(LPageStats, AddsBackingsIn32Bits) {
@@ -101,18 +95,17 @@ TEST(LPageStats, AddsBackingsIn32Bits) {
   pages.maxSwapThreshold = UINT32_MAX;
   pages.nrBroken = uint64_t{1} << 63;
   pages.nrFailNoMem = kAllOnes;
-  EXPECT_EQ(
-      kLPageStats.Rows(Pages(pages, pages),
-                       "nrBackings:nrLocked:nrBroken:maxSwapThreshold:nrFailNoMem", {"-g", "4"}),
-      "2147483649,2147483649,9223372036854775808,4294967295,18446744073709551615\n"
-      "2147483649,2147483649,9223372036854775808,4294967295,18446744073709551615\n"
-      "2,4294967298,0,8589934590,18446744073709551614\n");
+  EXPECT_EQ(kLPageStats.Rows(Pages(pages, pages),
+                             "nrBackings:nrLocked:nrBroken:maxSwapThreshold:nrFailNoMem"),
+            "2147483649,2147483649,9223372036854775808,4294967295,18446744073709551615\n"
+            "2147483649,2147483649,9223372036854775808,4294967295,18446744073709551615\n"
+            "2,4294967298,0,8589934590,18446744073709551614\n");
 }
 
 TEST(LPageStats, LeavesOutAMachineWithoutAVmm) {
   Scenario host = TwoMachines();
   host.Fails("worldGroups_vmmLeaderID", {100}, 0xbad0095);
-  const TallyRun run = kLPageStats.Run(host, {"-g", "4", "-q", "-s", "name"});
+  const TallyRun run = kLPageStats.Run(host, {"-q", "-s", "name"});
   EXPECT_EQ(run.out, "name\na database in its 28 letters\nTotal\n");
   EXPECT_EQ(run.err, "Tally_GetVmmLeaderID() failure: Invalid vmm\n");
   EXPECT_EQ(run.status, 0);
@@ -122,7 +115,7 @@ TEST(LPageStats, LeavesOutAMachineWithoutAVmm) {
 TEST(LPageStats, TotalsAreZeroWithoutMachines) {
   Scenario host;
   AddGroup(host, 4, {});
-  const TallyRun run = kLPageStats.Run(host, {"-g", "4", "-s", "name:worldGrp:nrBackings"});
+  const TallyRun run = kLPageStats.Run(host, {"-s", "name:worldGrp:nrBackings"});
   EXPECT_EQ(run.out,
             "\n VIRTUAL MACHINE LARGE PAGE STATS: Sat Nov 21 10:00:00 2026\n"
             " ----------------------------------------------------------\n"
@@ -137,21 +130,13 @@ TEST(LPageStats, TotalsAreZeroWithoutMachines) {
             "               Total                     0\n"
             "------------------------------------------\n");
   EXPECT_EQ(run.status, 0);
-  EXPECT_EQ(kLPageStats.Rows(host, "", {"-g", "4"}), "Total,,,,0,0,0,0,0,0,0,0,0\n");
+  EXPECT_EQ(kLPageStats.Rows(host, ""), "Total,,,,0,0,0,0,0,0,0,0,0\n");
 }
 
 TEST(LPageStatsFailure, HidesTheMachine) {
   ExpectFailuresHideGroup10(
       kLPageStats, TwoMachines(),
-      {{"sched_groups_groupFlags", {10}, "Tally_GroupGetFlags() failure, error code: 195887107\n"},
-       {"sched_groups_groupName", {10}, "Tally_GroupGetName() failure, error code: 195887107\n"},
-       {"sched_groups_parentGroupID",
-        {10},
-        "Tally_GroupGetParentID() failure, error code: 195887107\n"},
-       {"sched_groups_groupLeaderID",
-        {10},
-        "Tally_GroupGetGroupLeaderID() failure, error code: 195887107\n"},
-       {"worldGroups_vmmLeaderID", {100}, "Tally_GetVmmLeaderID() failure: Not found\n"},
+      {{"worldGroups_vmmLeaderID", {100}, "Tally_GetVmmLeaderID() failure: Not found\n"},
        {"memory_lpage_vmLPage",
         {101},
         "TallyLPageGetLPageStats() failure, error code: 195887107\n"}});

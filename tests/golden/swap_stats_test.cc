@@ -68,36 +68,29 @@ TEST(SwapStats, PrintsATableWithDescriptions) {
 }
 
 TEST(SwapStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kSwapStats.Run(RawMachines(), {"-g", "4", "-q"}).out, kKilobytes);
-  EXPECT_EQ(kSwapStats.Rows(RawMachines(), "", {"-g", "4", "-u", "mb"}), kMegabytes);
-  EXPECT_EQ(kSwapStats.Rows(RawMachines(), "", {"-g", "4", "-u", "pg"}), kPages);
+  EXPECT_EQ(kSwapStats.Run(RawMachines(), {"-q"}).out, kKilobytes);
+  EXPECT_EQ(kSwapStats.Rows(RawMachines(), "", {"-u", "mb"}), kMegabytes);
+  EXPECT_EQ(kSwapStats.Rows(RawMachines(), "", {"-u", "pg"}), kPages);
 }
 
 TEST(SwapStats, ReadsAMachineInOrder) {
   Scenario host;
   AddVirtualMachine(host, 20, {.leader = -300});
-  EXPECT_EQ(kSwapStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
-            "CheckSig() "
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupName,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_parentGroupID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupLeaderID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-300) Get(worldGroups_vmmLeaderID,[-300]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-299) Get(sched_memClients_swapInfo,[-299]) RemoveLast() "
-            "Destroy() "
-            "Create(1,2) AddInt(-300) Get(sched_memClients_tally_vmm,[-300]) RemoveLast() "
-            "Destroy() "
-            "Destroy(sched_groups_members_groups,[20])");
+  EXPECT_EQ(
+      kSwapStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
+      ReadsOfClient20() +
+          "Create(1,2) AddInt(-300) Get(worldGroups_vmmLeaderID,[-300]) RemoveLast() Destroy() "
+          "Create(1,2) AddInt(-299) Get(sched_memClients_swapInfo,[-299]) RemoveLast() "
+          "Destroy() "
+          "Create(1,2) AddInt(-300) Get(sched_memClients_tally_vmm,[-300]) RemoveLast() "
+          "Destroy() "
+          "Destroy(sched_groups_members_groups,[20])");
 }
 
 TEST(SwapStats, ShowsMachinesWithoutAVmmGroup) {
   Scenario host = TwoMachines();
   host.List("sched_groups_members_groups", {10}, {});
-  EXPECT_EQ(kSwapStats.Rows(host, "name", {"-g", "4"}),
-            "web\na database in its 28 letters\nTotal\n");
+  EXPECT_EQ(kSwapStats.Rows(host, "name"), "web\na database in its 28 letters\nTotal\n");
 }
 
 TEST(SwapStats, NamesTheSwapper) {
@@ -157,13 +150,13 @@ TEST(SwapStats, TotalsAreConvertedOnceAndWrap) {
   machine.leader = -300;
   machine.swap.swapped = 4097;
   AddVirtualMachine(host, 20, machine);
-  EXPECT_EQ(kSwapStats.Rows(host, "swapped:swapIn:llswapped", {"-g", "4", "-u", "mb"}),
+  EXPECT_EQ(kSwapStats.Rows(host, "swapped:swapIn:llswapped", {"-u", "mb"}),
             "18446744073709551615,0,9007199254740992\n4,0,9007199254740992\n4,1,0\n");
 }
 
 TEST(SwapStats, WidensColumnsToTheirNames) {
   const TallyRun run =
-      kSwapStats.Run(TwoMachines(), {"-g", "4", "-s",
+      kSwapStats.Run(TwoMachines(), {"-s",
                                      "isSwapping:CurSwapper:parSchedGroup:swapoutReady:"
                                      "gblSwapRead:name"});
   EXPECT_EQ(run.out,
@@ -187,22 +180,13 @@ TEST(SwapStats, WidensColumnsToTheirNames) {
 TEST(SwapStats, TotalsAreZeroWithoutMachines) {
   Scenario host;
   AddUserWorld(host, 4, {});
-  EXPECT_EQ(kSwapStats.Rows(host, "", {"-g", "4"}),
-            "Total,,,,,,,,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0\n");
+  EXPECT_EQ(kSwapStats.Rows(host, ""), "Total,,,,,,,,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0\n");
 }
 
 TEST(SwapStatsFailure, HidesTheMachine) {
   ExpectFailuresHideGroup10(
       kSwapStats, TwoMachines(),
-      {{"sched_groups_groupFlags", {10}, "Tally_GroupGetFlags() failure, error code: 195887107\n"},
-       {"sched_groups_groupName", {10}, "Tally_GroupGetName() failure, error code: 195887107\n"},
-       {"sched_groups_parentGroupID",
-        {10},
-        "Tally_GroupGetParentID() failure, error code: 195887107\n"},
-       {"sched_groups_groupLeaderID",
-        {10},
-        "Tally_GroupGetGroupLeaderID() failure, error code: 195887107\n"},
-       {"worldGroups_vmmLeaderID", {100}, "Tally_GetVmmLeaderID() failure: Not found\n"},
+      {{"worldGroups_vmmLeaderID", {100}, "Tally_GetVmmLeaderID() failure: Not found\n"},
        {"sched_memClients_swapInfo",
         {101},
         "TallySwapGetSwapStats() failure, error code: 195887107\n"},

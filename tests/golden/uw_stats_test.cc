@@ -68,26 +68,19 @@ TEST(UwStats, PrintsATableWithDescriptions) {
 }
 
 TEST(UwStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kUwStats.Run(RawUserWorlds(), {"-g", "4", "-q"}).out, kKilobytes);
-  EXPECT_EQ(kUwStats.Rows(RawUserWorlds(), "", {"-g", "4", "-u", "mb"}), kMegabytes);
-  EXPECT_EQ(kUwStats.Rows(RawUserWorlds(), "", {"-g", "4", "-u", "pg"}), kPages);
+  EXPECT_EQ(kUwStats.Run(RawUserWorlds(), {"-q"}).out, kKilobytes);
+  EXPECT_EQ(kUwStats.Rows(RawUserWorlds(), "", {"-u", "mb"}), kMegabytes);
+  EXPECT_EQ(kUwStats.Rows(RawUserWorlds(), "", {"-u", "pg"}), kPages);
 }
 
 TEST(UwStats, ReadsAUserWorldInOrder) {
   Scenario host;
   AddUserWorld(host, 20, {.leader = -300});
   EXPECT_EQ(kUwStats.Run(host, {"-g", "20"}).Calls(),
-            "CheckSig() "
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupName,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_parentGroupID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupLeaderID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-300) Get(sched_memClients_tally_uw,[-300]) RemoveLast() "
-            "Destroy() "
-            "Destroy(sched_groups_members_groups,[20])");
+            ReadsOfClient20() +
+                "Create(1,2) AddInt(-300) Get(sched_memClients_tally_uw,[-300]) RemoveLast() "
+                "Destroy() "
+                "Destroy(sched_groups_members_groups,[20])");
 }
 
 // Groups below 4: 40 a machine, 6 a user world, 7 both, 8 neither with 9, a user world, below it.
@@ -102,11 +95,7 @@ Scenario Mixed() {
   return host;
 }
 
-std::string Names(const Args& filters) {
-  Args args = {"-g", "4"};
-  args.insert(args.end(), filters.begin(), filters.end());
-  return kUwStats.Rows(Mixed(), "type:name", args);
-}
+std::string Names(const Args& filters) { return kUwStats.Rows(Mixed(), "type:name", filters); }
 
 TEST(UwStats, ShowsUserWorldsAndTheirTypes) {
   EXPECT_EQ(Names({}), "uw,alone\n(all),both\nuw,below\n,\n");
@@ -132,9 +121,7 @@ TEST(UwStats, ShowsTheFiltersInTheTitle) {
       {{"-i", "", "-e", "vm:uw"}, "(none)\n   Exclusion filter : (all)\n"},
   };
   for (const auto& [args, shown] : filters) {
-    Args all = {"-g", "4"};
-    all.insert(all.end(), args.begin(), args.end());
-    const TallyRun run = kUwStats.Run(Mixed(), all);
+    const TallyRun run = kUwStats.Run(Mixed(), args);
     EXPECT_NE(run.out.find("\n   Unit             : KB\n   Inclusion filter : " + shown +
                            "   Selected columns : (all)\n\n"),
               std::string::npos)
@@ -232,9 +219,9 @@ TEST(UwStats, TotalsAreConvertedOnceAndWrap) {
   world.uw.touched = 1;
   world.uw.shm = 3;
   AddUserWorld(host, 20, world);
-  EXPECT_EQ(kUwStats.Rows(host, "min:touched:shm", {"-g", "4"}),
+  EXPECT_EQ(kUwStats.Rows(host, "min:touched:shm"),
             "9223372036854775807,1023,18446744073709551615\n3,1,3\n-9223372036854775806,1024,2\n");
-  EXPECT_EQ(kUwStats.Rows(host, "min:touched:shm", {"-g", "4", "-u", "mb"}),
+  EXPECT_EQ(kUwStats.Rows(host, "min:touched:shm", {"-u", "mb"}),
             "9007199254740991,0,18446744073709551615\n0,0,0\n9007199254740992,1,0\n");
 }
 
@@ -250,7 +237,7 @@ TEST(UwStats, ConsumedWraps) {
 TEST(UwStats, TotalsAreZeroWithoutUserWorlds) {
   Scenario host;
   AddVirtualMachine(host, 4, {});
-  const TallyRun run = kUwStats.Run(host, {"-g", "4", "-s", "type:name:min:max:memSize:swapScope"});
+  const TallyRun run = kUwStats.Run(host, {"-s", "type:name:min:max:memSize:swapScope"});
   EXPECT_EQ(
       run.out,
       "\n USER-WORLD STATS: Sat Nov 21 10:00:00 2026\n"
@@ -268,8 +255,7 @@ TEST(UwStats, TotalsAreZeroWithoutUserWorlds) {
       "                                                   0                     0          \n"
       "------------------------------------------------------------------------------------\n");
   EXPECT_EQ(run.status, 0);
-  EXPECT_EQ(kUwStats.Rows(host, "", {"-g", "4"}),
-            ",,,,,0,,,,0,0,,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,,\n");
+  EXPECT_EQ(kUwStats.Rows(host, ""), ",,,,,0,,,,0,0,,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,,\n");
 }
 
 TEST(UwStats, ShowsANameThatFillsItsField) {
@@ -278,19 +264,10 @@ TEST(UwStats, ShowsANameThatFillsItsField) {
 }
 
 TEST(UwStatsFailure, HidesTheUserWorld) {
-  ExpectFailuresHideGroup10(
-      kUwStats, TwoUserWorlds(),
-      {{"sched_groups_groupFlags", {10}, "Tally_GroupGetFlags() failure, error code: 195887107\n"},
-       {"sched_groups_groupName", {10}, "Tally_GroupGetName() failure, error code: 195887107\n"},
-       {"sched_groups_parentGroupID",
-        {10},
-        "Tally_GroupGetParentID() failure, error code: 195887107\n"},
-       {"sched_groups_groupLeaderID",
-        {10},
-        "Tally_GroupGetGroupLeaderID() failure, error code: 195887107\n"},
-       {"sched_memClients_tally_uw",
-        {100},
-        "TallyUWGetUWStats() failure, error code: 195887107\n"}});
+  ExpectFailuresHideGroup10(kUwStats, TwoUserWorlds(),
+                            {{"sched_memClients_tally_uw",
+                              {100},
+                              "TallyUWGetUWStats() failure, error code: 195887107\n"}});
 }
 
 TEST(UwStatsFailure, OfTheTallysListAndKey) {

@@ -71,42 +71,35 @@ TEST(VmStats, PrintsATableWithDescriptions) {
 }
 
 TEST(VmStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kVmStats.Run(RawMachines(), {"-g", "4", "-q"}).out, kKilobytes);
-  EXPECT_EQ(kVmStats.Rows(RawMachines(), "", {"-g", "4", "-u", "mb"}), kMegabytes);
-  EXPECT_EQ(kVmStats.Rows(RawMachines(), "", {"-g", "4", "-u", "pg"}), kPages);
+  EXPECT_EQ(kVmStats.Run(RawMachines(), {"-q"}).out, kKilobytes);
+  EXPECT_EQ(kVmStats.Rows(RawMachines(), "", {"-u", "mb"}), kMegabytes);
+  EXPECT_EQ(kVmStats.Rows(RawMachines(), "", {"-u", "pg"}), kPages);
 }
 
 TEST(VmStats, ReadsAMachineInOrder) {
   Scenario host;
   AddVirtualMachine(host, 20, {.leader = -300});
-  EXPECT_EQ(kVmStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
-            "CheckSig() "
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupName,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_parentGroupID,[20]) RemoveLast() Destroy() "
-            // The leader, after the flags once more.
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupLeaderID,[20]) RemoveLast() Destroy() "
-            // The allocation: the VMM's group, then the amounts of both.
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "GetInt64(sched_groups_members_groups,[20],0) "
-            "Create(1,2) AddInt(21) Get(sched_groups_groupFlags,[21]) RemoveLast() Destroy() "
-            "Destroy(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_memAllocationInKB,[20]) RemoveLast() "
-            "Destroy() "
-            "Create(1,2) AddInt(21) Get(sched_groups_memAllocationInKB,[21]) RemoveLast() "
-            "Destroy() "
-            "Create(1,2) AddInt(-300) Get(sched_memClients_tally_vmm,[-300]) RemoveLast() "
-            "Destroy() "
-            "Create(1,2) AddInt(-300) Get(worldGroups_vmmLeaderID,[-300]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-299) Get(sched_memClients_swapInfo,[-299]) RemoveLast() "
-            "Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_stats_memoryStats,[20]) RemoveLast() "
-            "Destroy() "
-            "Destroy(sched_groups_members_groups,[20])");
+  EXPECT_EQ(
+      kVmStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
+      ReadsOfClient20() +
+          // The allocation: the VMM's group, then the amounts of both.
+          "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
+          "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
+          "GetInt64(sched_groups_members_groups,[20],0) "
+          "Create(1,2) AddInt(21) Get(sched_groups_groupFlags,[21]) RemoveLast() Destroy() "
+          "Destroy(sched_groups_members_groups,[20]) "
+          "Create(1,2) AddInt(20) Get(sched_groups_memAllocationInKB,[20]) RemoveLast() "
+          "Destroy() "
+          "Create(1,2) AddInt(21) Get(sched_groups_memAllocationInKB,[21]) RemoveLast() "
+          "Destroy() "
+          "Create(1,2) AddInt(-300) Get(sched_memClients_tally_vmm,[-300]) RemoveLast() "
+          "Destroy() "
+          "Create(1,2) AddInt(-300) Get(worldGroups_vmmLeaderID,[-300]) RemoveLast() Destroy() "
+          "Create(1,2) AddInt(-299) Get(sched_memClients_swapInfo,[-299]) RemoveLast() "
+          "Destroy() "
+          "Create(1,2) AddInt(20) Get(sched_groups_stats_memoryStats,[20]) RemoveLast() "
+          "Destroy() "
+          "Destroy(sched_groups_members_groups,[20])");
 }
 
 TEST(VmStats, ShowsOnlyMachines) {
@@ -115,7 +108,7 @@ TEST(VmStats, ShowsOnlyMachines) {
   AddVirtualMachine(host, 10, {.name = "one", .flags = 0x4});
   AddGroup(host, 5, {.flags = 0, .children = {20}});
   AddVirtualMachine(host, 20, {.name = "two", .flags = 0x7fff});
-  EXPECT_EQ(kVmStats.Rows(host, "name:schedGrp", {"-g", "4"}), "one,10\ntwo,20\nTotal,\n");
+  EXPECT_EQ(kVmStats.Rows(host, "name:schedGrp"), "one,10\ntwo,20\nTotal,\n");
 }
 
 TEST(VmStats, ShowsAMachineInsideAMachine) {
@@ -129,7 +122,7 @@ TEST(VmStats, ShowsAMachineInsideAMachine) {
 TEST(VmStats, TotalsAreZeroWithoutMachines) {
   Scenario host;
   AddGroup(host, 4, {});
-  const TallyRun run = kVmStats.Run(host, {"-g", "4", "-s", "name:b:memSize:min:max:swapScope"});
+  const TallyRun run = kVmStats.Run(host, {"-s", "name:b:memSize:min:max:swapScope"});
   EXPECT_EQ(run.out,
             "\n VIRTUAL MACHINE STATS: Sat Nov 21 10:00:00 2026\n"
             " -----------------------------------------------\n"
@@ -144,8 +137,7 @@ TEST(VmStats, TotalsAreZeroWithoutMachines) {
             "          Total            0          0                     \n"
             "------------------------------------------------------------\n");
   EXPECT_EQ(run.status, 0);
-  EXPECT_EQ(kVmStats.Rows(host, "", {"-g", "4"}),
-            "Total,,,,,0,0,0,,,,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,,\n");
+  EXPECT_EQ(kVmStats.Rows(host, ""), "Total,,,,,0,0,0,,,,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,0,,\n");
 }
 
 TEST(VmStats, KeepsWhatIsNotAvailableInEveryUnit) {
@@ -180,9 +172,8 @@ TEST(VmStats, AddsWhatIsNotAvailableLikeANumber) {
   machine.vmm.memSize = 4097;
   machine.vmmAllocation.min = 2049;
   AddVirtualMachine(host, 20, machine);
-  EXPECT_EQ(kVmStats.Rows(host, "memSize:min", {"-g", "4"}),
-            "18446744073709551615,-1\n4097,2049\n4096,2048\n");
-  EXPECT_EQ(kVmStats.Rows(host, "memSize:min", {"-g", "4", "-u", "mb"}),
+  EXPECT_EQ(kVmStats.Rows(host, "memSize:min"), "18446744073709551615,-1\n4097,2049\n4096,2048\n");
+  EXPECT_EQ(kVmStats.Rows(host, "memSize:min", {"-u", "mb"}),
             "18446744073709551615,-1\n4,2\n4,2\n");
 }
 
@@ -194,8 +185,8 @@ TEST(VmStats, ConvertsTotalsOnce) {
   AddVirtualMachine(host, 10, machine);
   machine.leader = -300;
   AddVirtualMachine(host, 20, machine);
-  EXPECT_EQ(kVmStats.Rows(host, "touched", {"-g", "4", "-u", "mb"}), "0\n0\n1\n");
-  EXPECT_EQ(kVmStats.Rows(host, "min:touched", {"-g", "4", "-u", "pg"}), "0,255\n0,255\n1,511\n");
+  EXPECT_EQ(kVmStats.Rows(host, "touched", {"-u", "mb"}), "0\n0\n1\n");
+  EXPECT_EQ(kVmStats.Rows(host, "min:touched", {"-u", "pg"}), "0,255\n0,255\n1,511\n");
 }
 
 TEST(VmStats, KeepsTheAllocationIn32Bits) {
@@ -240,9 +231,9 @@ TEST(VmStats, AddsReservationsIn32Bits) {
   machine.leader = -300;
   machine.vmmAllocation.min = 0x7ffffffe;
   AddVirtualMachine(host, 20, machine);
-  EXPECT_EQ(kVmStats.Rows(host, "min", {"-g", "4"}), "2147483647\n2147483646\n-3\n");
+  EXPECT_EQ(kVmStats.Rows(host, "min"), "2147483647\n2147483646\n-3\n");
   // -3 KB, widened, are 0x3ffffffffffffffe pages, of which 32 bits are kept.
-  EXPECT_EQ(kVmStats.Rows(host, "min", {"-g", "4", "-u", "pg"}), "536870911\n536870911\n-1\n");
+  EXPECT_EQ(kVmStats.Rows(host, "min", {"-u", "pg"}), "536870911\n536870911\n-1\n");
 }
 
 TEST(VmStats, ConsumedWraps) {
@@ -303,15 +294,7 @@ TEST(VmStats, TakesTheFirstVmmChild) {
 TEST(VmStatsFailure, HidesTheMachine) {
   ExpectFailuresHideGroup10(
       kVmStats, TwoMachines(),
-      {{"sched_groups_groupFlags", {10}, "Tally_GroupGetFlags() failure, error code: 195887107\n"},
-       {"sched_groups_groupName", {10}, "Tally_GroupGetName() failure, error code: 195887107\n"},
-       {"sched_groups_parentGroupID",
-        {10},
-        "Tally_GroupGetParentID() failure, error code: 195887107\n"},
-       {"sched_groups_groupLeaderID",
-        {10},
-        "Tally_GroupGetGroupLeaderID() failure, error code: 195887107\n"},
-       {"sched_groups_memAllocationInKB",
+      {{"sched_groups_memAllocationInKB",
         {10},
         "Tally_GroupGetAlloc() failure, error code: 195887107\n"
         "Tally_GroupGetVMMAlloc: VM GroupGetAlloc failure, error code: 195887107\n"},

@@ -54,9 +54,7 @@ Scenario Caches(const KSI_MemzipInfo& first, const KSI_MemzipInfo& second) {
 }
 
 std::string Rows(const Scenario& host, const std::string& columns, const Args& args = {}) {
-  Args all = {"-g", "4"};
-  all.insert(all.end(), args.begin(), args.end());
-  return kZipStats.Rows(host, columns, all);
+  return kZipStats.Rows(host, columns, args);
 }
 
 TEST(ZipStats, PrintsATableWithDescriptions) {
@@ -64,7 +62,7 @@ TEST(ZipStats, PrintsATableWithDescriptions) {
 }
 
 TEST(ZipStats, ShowsEachFieldInItsColumn) {
-  EXPECT_EQ(kZipStats.Run(RawMachines(), {"-g", "4", "-q"}).out, kKilobytes);
+  EXPECT_EQ(kZipStats.Run(RawMachines(), {"-q"}).out, kKilobytes);
   EXPECT_EQ(Rows(RawMachines(), "", {"-u", "mb"}), kMegabytes);
   EXPECT_EQ(Rows(RawMachines(), "", {"-u", "pg"}), kPages);
 }
@@ -73,17 +71,10 @@ TEST(ZipStats, ReadsAMachineInOrder) {
   Scenario host;
   AddVirtualMachine(host, 20, {.leader = -300});
   EXPECT_EQ(kZipStats.Run(host, {"-g", "20", "-l", "1"}).Calls(),
-            "CheckSig() "
-            "Create(1,2) AddInt(20) GetInstanceListAlloc(sched_groups_members_groups,[20]) "
-            "RemoveLast() Destroy() UsedCount(sched_groups_members_groups,[20]) "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupName,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_parentGroupID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupFlags,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(20) Get(sched_groups_groupLeaderID,[20]) RemoveLast() Destroy() "
-            "Create(1,2) AddInt(-300) Get(sched_memClients_memzipInfo,[-300]) RemoveLast() "
-            "Destroy() "
-            "Destroy(sched_groups_members_groups,[20])");
+            ReadsOfClient20() +
+                "Create(1,2) AddInt(-300) Get(sched_memClients_memzipInfo,[-300]) RemoveLast() "
+                "Destroy() "
+                "Destroy(sched_groups_members_groups,[20])");
 }
 
 TEST(ZipStats, ShowsTheMeanOfTheAveragesInTheTotal) {
@@ -106,7 +97,7 @@ TEST(ZipStats, TakesTheMeanOfTheMachinesShown) {
   second.avgZipTime = 21;
   Scenario host = Caches(first, second);
   host.Fails("sched_memClients_memzipInfo", {100}, 0xbad0003);
-  EXPECT_EQ(kZipStats.Run(host, {"-g", "4", "-q", "-s", "avgZipTime"}).out, "avgZipTime\n21\n21\n");
+  EXPECT_EQ(kZipStats.Run(host, {"-q", "-s", "avgZipTime"}).out, "avgZipTime\n21\n21\n");
   EXPECT_EQ(kZipStats.Rows(Caches(first, second), "avgZipTime", {"-g", "10"}), "10\n10\n");
 }
 
@@ -161,7 +152,7 @@ TEST(ZipStats, AddsCountsIn64Bits) {
 TEST(ZipStats, TotalsAreZeroWithoutMachines) {
   Scenario host;
   AddUserWorld(host, 4, {});
-  const TallyRun run = kZipStats.Run(host, {"-g", "4", "-s", "name:maxCache:avgZipTime"});
+  const TallyRun run = kZipStats.Run(host, {"-s", "name:maxCache:avgZipTime"});
   EXPECT_EQ(run.out,
             "\n VIRTUAL MACHINE COMPRESSION STATS: Sat Nov 21 10:00:00 2026\n"
             " -------------------------------------------------------------\n"
@@ -180,19 +171,10 @@ TEST(ZipStats, TotalsAreZeroWithoutMachines) {
 }
 
 TEST(ZipStatsFailure, HidesTheMachine) {
-  ExpectFailuresHideGroup10(
-      kZipStats, TwoMachines(),
-      {{"sched_groups_groupFlags", {10}, "Tally_GroupGetFlags() failure, error code: 195887107\n"},
-       {"sched_groups_groupName", {10}, "Tally_GroupGetName() failure, error code: 195887107\n"},
-       {"sched_groups_parentGroupID",
-        {10},
-        "Tally_GroupGetParentID() failure, error code: 195887107\n"},
-       {"sched_groups_groupLeaderID",
-        {10},
-        "Tally_GroupGetGroupLeaderID() failure, error code: 195887107\n"},
-       {"sched_memClients_memzipInfo",
-        {100},
-        "TallyZipGetZipStats() failure, error code: 195887107\n"}});
+  ExpectFailuresHideGroup10(kZipStats, TwoMachines(),
+                            {{"sched_memClients_memzipInfo",
+                              {100},
+                              "TallyZipGetZipStats() failure, error code: 195887107\n"}});
 }
 
 }  // namespace

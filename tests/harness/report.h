@@ -13,7 +13,7 @@ class Report {
  public:
   constexpr explicit Report(const char* name) : name_(name) {}
 
-  // Runs the report with these options besides -r.
+  // Runs the report with these options, from group 4 on unless they say otherwise.
   TallyRun Run(const Scenario& scenario, Args args = {}) const;
 
   // The rows in CSV, without the header: the columns as for -s, or all for "". Expects success
@@ -41,11 +41,15 @@ Scenario TwoMachines();
 // and whose parent is -1 by its own account. Group 12 is below user world 10.
 Scenario TwoUserWorlds();
 
-// Expects of each of these reads, if it fails alone, that group 10 of `host` gives no row and adds
-// nothing to the Total row, that group 12 below it is not visited, and that the report fails only
-// when group 10 is its start.
+// The calls of every such report on group 20, which leads memory client -300: the children, then
+// flags, name, parent and leader, with the flags once more.
+std::string ReadsOfClient20();
+
+// Expects of each of these reads, and of those of flags, name, parent and leader, if it fails
+// alone, that group 10 of `host` gives no row and adds nothing to the Total row, that group 12
+// below it is not visited, and that the report fails only when group 10 is its start.
 void ExpectFailuresHideGroup10(const Report& report, const Scenario& host,
-                               const std::vector<FailedRead>& reads);
+                               std::vector<FailedRead> reads);
 
 }  // namespace harness
 
