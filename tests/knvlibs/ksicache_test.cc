@@ -1,4 +1,5 @@
 // ksicache from its command line to its exit status.
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <spawn.h>
@@ -425,51 +426,83 @@ std::string ManyGroups() {
 
 TEST_F(Ksicache, FullDiskLosesNothingAndSaysSo) {
   WriteContent(Path("a.json"), JsonWith(ManyGroups()));
-  WriteContent(Path("a.ksi"), "precious");
-  // A limit on the size of files is the full disk that every user can have.
-  harness::Program program;
-  program.path = "/bin/sh";
-  program.args = {"sh",
-                  "-c",
-                  "trap '' XFSZ; ulimit -f 40; exec \"$0\" \"$@\"",
-                  KSICACHE_PROGRAM,
-                  "load",
-                  "--force",
-                  Path("a.json"),
-                  Path("a.ksi")};
-  program.environment = harness::OwnEnvironment();
-  const harness::Result result = harness::RunProgram(program);
-  EXPECT_EQ(result.status, 1);
-  EXPECT_EQ(result.err.find("ksicache: " + Path("a.ksi") + ": cannot write: "), 0u) << result.err;
-  EXPECT_EQ(FileContent(Path("a.ksi")), "precious");
-  EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
+  const std::vector<std::string> commands[] = {
+      {"load", "--force", Path("a.json"), Path("a.ksi")},
+      {"capture", "--force", "--root", RecordedHost("kvm-two-nodes"), Path("a.ksi")},
+  };
+  for (const std::vector<std::string>& command : commands) {
+    WriteContent(Path("a.ksi"), "precious");
+    // A limit on the size of files is the full disk that every user can have.
+    harness::Program program = Command(command);
+    program.path = "/bin/sh";
+    program.args = {"sh", "-c", "trap '' XFSZ; ulimit -f 40; exec \"$0\" \"$@\"", KSICACHE_PROGRAM};
+    program.args.insert(program.args.end(), command.begin(), command.end());
+    const harness::Result result = harness::RunProgram(program);
+    EXPECT_EQ(result.status, 1) << command[0];
+    EXPECT_NE(result.err.find("ksicache: " + Path("a.ksi") + ": cannot write: "), result.err.npos)
+        << result.err;
+    EXPECT_EQ(FileContent(Path("a.ksi")), "precious");
+    EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
+  }
+}
+
+// Starts ksicache, which makes a temporary file beside `names` and then waits for what does not
+// come; expects a signal to end it and to leave nothing but `names`. `diagnostics`, unless
+// negative, is its standard error.
+void ExpectNothingLeftBy(int signal, std::vector<std::string> words, int diagnostics,
+                         const TestDirectory& directory, const std::vector<std::string>& names) {
+  std::vector<char*> args;
+  for (std::string& word : words) args.push_back(word.data());
+  args.push_back(nullptr);
+  posix_spawn_file_actions_t actions;
+  posix_spawn_file_actions_init(&actions);
+  if (diagnostics >= 0) {
+    posix_spawn_file_actions_adddup2(&actions, diagnostics, STDERR_FILENO);
+  }
+  pid_t process = 0;
+  ASSERT_EQ(posix_spawn(&process, KSICACHE_PROGRAM, &actions, nullptr, args.data(), environ), 0);
+  posix_spawn_file_actions_destroy(&actions);
+  for (int i = 0; i < 1000 && directory.Names().size() == names.size(); ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  }
+  EXPECT_EQ(directory.Names().size(), names.size() + 1);
+  ASSERT_EQ(kill(process, signal), 0);
+  int status = 0;
+  ASSERT_EQ(waitpid(process, &status, 0), process);
+  EXPECT_TRUE(WIFSIGNALED(status));
+  EXPECT_EQ(WTERMSIG(status), signal);
+  EXPECT_EQ(directory.Names(), names);
 }
 
 TEST_F(Ksicache, SignalsLeaveNothingBehind) {
+  // JSON that does not come.
+  const std::string pipe = Path("pipe");
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  const int writer = open(pipe.c_str(), O_RDWR | O_CLOEXEC);
+  ASSERT_GE(writer, 0);
   for (const int signal : {SIGINT, SIGTERM}) {
-    // It waits for JSON that does not come.
-    const std::string pipe = Path("pipe");
-    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
-    std::array<std::string, 4> words = {"ksicache", "load", pipe, Path("a.ksi")};
-    std::array<char*, 5> args = {};
-    std::ranges::transform(words, args.begin(), [](std::string& word) { return word.data(); });
-    pid_t process = 0;
-    ASSERT_EQ(posix_spawn(&process, KSICACHE_PROGRAM, nullptr, nullptr, args.data(), environ), 0);
-    std::FILE* writer = std::fopen(pipe.c_str(), "w");
-    ASSERT_NE(writer, nullptr);
-    for (int i = 0; i < 1000 && directory_.Names().size() < 2; ++i) {
-      std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-    EXPECT_EQ(directory_.Names().size(), 2u);  // the pipe and the temporary file
-    ASSERT_EQ(kill(process, signal), 0);
-    int status = 0;
-    ASSERT_EQ(waitpid(process, &status, 0), process);
-    EXPECT_TRUE(WIFSIGNALED(status));
-    EXPECT_EQ(WTERMSIG(status), signal);
-    std::fclose(writer);
-    EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"pipe"}));
-    ASSERT_EQ(unlink(pipe.c_str()), 0);
+    ExpectNothingLeftBy(signal, {"ksicache", "load", pipe, Path("a.ksi")}, -1, directory_,
+                        {"pipe"});
   }
+  close(writer);
+}
+
+TEST_F(Ksicache, SignalsLeaveNothingOfACapture) {
+  // A diagnostic that nobody reads.
+  const HostTree host;
+  host.Write("/proc/meminfo", "MemTotal: 1000 kB\n");
+  host.Write("/proc/buddyinfo", "no line of this file\n");
+  std::array<int, 2> pipe = {};
+  ASSERT_EQ(pipe2(pipe.data(), O_CLOEXEC | O_NONBLOCK), 0);
+  const std::string page(4096, ' ');
+  while (write(pipe[1], page.data(), page.size()) > 0) continue;
+  ASSERT_EQ(fcntl(pipe[1], F_SETFL, 0), 0);
+  for (const int signal : {SIGINT, SIGTERM}) {
+    ExpectNothingLeftBy(signal, {"ksicache", "capture", "--root", host.Root(), Path("a.ksi")},
+                        pipe[1], directory_, {});
+  }
+  close(pipe[0]);
+  close(pipe[1]);
 }
 
 TEST_F(Ksicache, CheckFindsNothingInGoodFiles) {
