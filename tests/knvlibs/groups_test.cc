@@ -33,10 +33,10 @@ INSTANTIATE_TEST_SUITE_P(Hosts, RecordedGroupsTest,
                            return name;
                          });
 
-// A host of cgroup version 2 with one cgroup, "work" (id 7), and one process in it, 100.
+// A host of cgroup version 2 with one cgroup, "jobs" (id 7), and one process in it, 100.
 class GroupsTest : public testing::Test {
  protected:
-  static constexpr int64_t kWork = 7;
+  static constexpr int64_t kJobs = 7;
   static constexpr int32_t kPid = 100;
 
   GroupsTest() {
@@ -45,7 +45,7 @@ class GroupsTest : public testing::Test {
                 "VmallocUsed: 4 kB\nSwapTotal: 0 kB\nSwapFree: 0 kB\n");
     tree_.Write("/sys/fs/cgroup/cgroup.controllers", "cpu memory\n");
     tree_.Write("/sys/fs/cgroup/cgroup.procs", "");
-    WriteCgroup("/work", kWork, "100\n");
+    WriteCgroup("/jobs", kJobs, "100\n");
     WriteProcess(kPid, "worker");
   }
 
@@ -101,22 +101,22 @@ class GroupsTest : public testing::Test {
 TEST_F(GroupsTest, AProcessStandsBelowItsCgroup) {
   LinuxSource source(tree_.Root());
   EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
-            (std::vector<int64_t>{kKernelGroup, kWork}));
-  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kWork}),
+            (std::vector<int64_t>{kKernelGroup, kJobs}));
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}),
             (std::vector<int64_t>{kProcessGroup + kPid}));
   EXPECT_EQ(GetIds(source, "sched/groups/members/memClients", {kProcessGroup + kPid}),
             (std::vector<int64_t>{kPid}));
-  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + kPid), kWork);
+  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + kPid), kJobs);
   EXPECT_EQ(Get<int32_t>("sched/groups/groupLeaderID", kProcessGroup + kPid), kPid);
   EXPECT_EQ(FlagsOf(kProcessGroup + kPid), uint32_t{KSI_GROUP_USER_WORLD | KSI_GROUP_LEAF});
 }
 
 TEST_F(GroupsTest, WithoutARecordedIdACgroupHasThatOfItsDirectory) {
-  const std::string directory = tree_.Root() + "/sys/fs/cgroup/work";
+  const std::string directory = tree_.Root() + "/sys/fs/cgroup/jobs";
   std::filesystem::remove(directory + "/cgroup.id");
   struct stat status = {};
   ASSERT_EQ(stat(directory.c_str(), &status), 0);
-  EXPECT_EQ(NameOf(static_cast<int64_t>(status.st_ino)), "work");
+  EXPECT_EQ(NameOf(static_cast<int64_t>(status.st_ino)), "jobs");
 }
 
 TEST_F(GroupsTest, WithoutCgroupsProcessesStandBelowTheRoot) {
@@ -128,8 +128,8 @@ TEST_F(GroupsTest, WithoutCgroupsProcessesStandBelowTheRoot) {
 
 TEST_F(GroupsTest, AProcessThatNoCgroupListsTellsWhereItIs) {
   WriteProcess(101, "moved");
-  tree_.Write("/proc/101/cgroup", "1:cpu,cpuacct:/\n0::/work\n");
-  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + 101), kWork);
+  tree_.Write("/proc/101/cgroup", "1:cpu,cpuacct:/\n0::/jobs\n");
+  EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + 101), kJobs);
   WriteProcess(102, "outside");
   tree_.Write("/proc/102/cgroup", "0::/../..\n");
   EXPECT_EQ(Get<int64_t>("sched/groups/parentGroupID", kProcessGroup + 102), kRootGroup);
@@ -139,7 +139,7 @@ TEST_F(GroupsTest, WhatDoesNotExistIsNotFound) {
   for (const int64_t id : {int64_t{-1}, int64_t{8}, kProcessGroup + 101, kVmmGroup + kPid}) {
     EXPECT_EQ(StatusOf<KSI_GroupName>("sched/groups/groupName", id), KSI_STATUS_NOT_FOUND) << id;
   }
-  EXPECT_EQ(StatusOf<int32_t>("sched/groups/groupLeaderID", kWork), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(StatusOf<int32_t>("sched/groups/groupLeaderID", kJobs), KSI_STATUS_NOT_FOUND);
   for (const int64_t id : {int64_t{-1}, int64_t{0}, int64_t{101}, kProcessGroup}) {
     EXPECT_EQ(StatusOf<KSI_UwTally>("sched/memClients/tally/uw", id), KSI_STATUS_NOT_FOUND) << id;
   }
@@ -191,34 +191,34 @@ TEST_F(GroupsTest, KernelThreadsAndTheDeadAreNoUserWorlds) {
   std::filesystem::create_directories(tree_.Root() + "/proc/8");
   LinuxSource source(tree_.Root());
   EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
-            (std::vector<int64_t>{kKernelGroup, kWork}));
+            (std::vector<int64_t>{kKernelGroup, kJobs}));
 }
 
 TEST_F(GroupsTest, ReservationsAddUpAndLimitsMayBeMissing) {
-  tree_.Write("/sys/fs/cgroup/work/memory.min", "65536\n");
-  tree_.Write("/sys/fs/cgroup/work/memory.max", "1048576\n");
-  const auto allocation = Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kWork);
+  tree_.Write("/sys/fs/cgroup/jobs/memory.min", "65536\n");
+  tree_.Write("/sys/fs/cgroup/jobs/memory.max", "1048576\n");
+  const auto allocation = Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kJobs);
   EXPECT_EQ(int64_t{allocation.min}, 64);
   EXPECT_EQ(int64_t{allocation.max}, 1024);
   const auto root = Get<KSI_GroupCapacity>("sched/groups/stats/capacity", kRootGroup);
   EXPECT_EQ(uint64_t{root.conResv}, 64u);
   EXPECT_EQ(uint64_t{root.availResv}, 960u);
-  const auto work = Get<KSI_GroupCapacity>("sched/groups/stats/capacity", kWork);
+  const auto work = Get<KSI_GroupCapacity>("sched/groups/stats/capacity", kJobs);
   EXPECT_EQ(uint64_t{work.availResv}, 64u);
-  const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kWork);
+  const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kJobs);
   EXPECT_EQ(uint64_t{stats.eMin}, kNoValue);
 
-  tree_.Write("/sys/fs/cgroup/work/memory.min", "max\n");
-  std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/work/memory.max");
-  const auto without = Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kWork);
+  tree_.Write("/sys/fs/cgroup/jobs/memory.min", "max\n");
+  std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/jobs/memory.max");
+  const auto without = Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kJobs);
   EXPECT_EQ(int64_t{without.max}, -1);
 }
 
 TEST_F(GroupsTest, ACgroupWithoutTheControllerHasNoFigures) {
   for (const char* file : {"memory.current", "memory.stat", "memory.min", "memory.max"}) {
-    std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/work/" + file);
+    std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/jobs/" + file);
   }
-  const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kWork);
+  const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kJobs);
   EXPECT_EQ(uint64_t{stats.consumed}, kNoValue);
   EXPECT_EQ(uint64_t{stats.memSize}, kNoValue);
   EXPECT_EQ(uint64_t{stats.bMin}, 0u);
@@ -226,20 +226,20 @@ TEST_F(GroupsTest, ACgroupWithoutTheControllerHasNoFigures) {
 
 TEST_F(GroupsTest, WhatVanishesAfterTheScanIsNotFound) {
   LinuxSource source(tree_.Root());
-  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kWork}).size(), 1u);
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
   std::filesystem::remove_all(tree_.Root() + "/proc/100");
-  std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup/work");
+  std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup/jobs");
   KSI_UwTally tally = {};
   EXPECT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
             KSI_STATUS_NOT_FOUND);
   KSI_GroupMemoryStats stats = {};
-  EXPECT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kWork}, &stats),
+  EXPECT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kJobs}, &stats),
             KSI_STATUS_NOT_FOUND);
 }
 
 TEST_F(GroupsTest, AnEndedProcessIsNotFoundThoughItWaits) {
   LinuxSource source(tree_.Root());
-  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kWork}).size(), 1u);
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
   std::filesystem::remove(tree_.Root() + "/proc/100/smaps_rollup");
   tree_.Write("/proc/100/status", "Name:\tworker\nState:\tZ (zombie)\nPPid:\t1\n");
   KSI_UwTally tally = {};
@@ -256,21 +256,21 @@ TEST_F(GroupsTest, WhatIsNotUnderstoodIsToldOnceAndLeftOut) {
   EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
   EXPECT_EQ(testing::internal::GetCapturedStderr(), "/proc/201/status: line 2 is not understood\n");
 
-  tree_.Write("/sys/fs/cgroup/work/memory.current", "plenty\n");
+  tree_.Write("/sys/fs/cgroup/jobs/memory.current", "plenty\n");
   tree_.Write("/proc/100/limits", "Max address space         vast\n");
   testing::internal::CaptureStderr();
   LinuxSource again(tree_.Root());
   KSI_GroupMemoryStats stats = {};
   KSI_UwTally tally = {};
   for (int i = 0; i < 2; ++i) {
-    EXPECT_EQ(GetValue(again, "sched/groups/stats/memoryStats", {kWork}, &stats),
+    EXPECT_EQ(GetValue(again, "sched/groups/stats/memoryStats", {kJobs}, &stats),
               KSI_STATUS_INVALID_METADATA);
     EXPECT_EQ(GetValue(again, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
               KSI_STATUS_INVALID_METADATA);
   }
   EXPECT_EQ(testing::internal::GetCapturedStderr(),
             "/proc/201/status: line 2 is not understood\n"
-            "/sys/fs/cgroup/work/memory.current: line 1 is not understood\n"
+            "/sys/fs/cgroup/jobs/memory.current: line 1 is not understood\n"
             "/proc/100/limits: line 1 is not understood\n");
 }
 
@@ -303,11 +303,11 @@ TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
 }
 
 TEST_F(GroupsTest, ALockedCgroupIsDeniedAndNoZero) {
-  tree_.Lock("/sys/fs/cgroup/work/memory.current");
+  tree_.Lock("/sys/fs/cgroup/jobs/memory.current");
   const auto asNobody = [&] {
     constexpr uid_t kNobody = 65534;
     if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
-    _exit(StatusOf<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kWork) ==
+    _exit(StatusOf<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kJobs) ==
                   KSI_STATUS_PERMISSION_DENIED
               ? 0
               : 1);
