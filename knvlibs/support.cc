@@ -11,7 +11,8 @@ void Warning(const char* format, ...) {
   if (format == nullptr) return;
   va_list arguments;
   va_start(arguments, format);
-  static_cast<void>(std::vfprintf(stderr, format, arguments));  // nobody to tell of a failure
+  // Nobody is left to tell of a failure. NOLINTNEXTLINE: va_start is not seen
+  static_cast<void>(std::vfprintf(stderr, format, arguments));
   va_end(arguments);
 }
 
