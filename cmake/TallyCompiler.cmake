@@ -36,13 +36,3 @@ else()
   target_link_options(tally_compiler INTERFACE
     "$<$<LINK_LANGUAGE:CXX>:-static-libstdc++;-static-libgcc>")
 endif()
-
-include(CheckIPOSupported)
-check_ipo_supported(RESULT tally_lto OUTPUT tally_lto_why LANGUAGES CXX)
-if(tally_lto AND NOT TALLY_SANITIZE)
-  set(CMAKE_INTERPROCEDURAL_OPTIMIZATION_RELEASE ON)
-  # g++ 12 takes short strings for overflows when it optimizes across files; what each file does is
-  # checked when it is compiled.
-  target_link_options(tally_compiler INTERFACE
-    "$<$<CXX_COMPILER_ID:GNU>:-Wno-stringop-overflow;-Wno-stringop-overread>")
-endif()
