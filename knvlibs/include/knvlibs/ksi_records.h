@@ -69,7 +69,7 @@ struct KSI_GroupAllocation {
 /* A scheduler group's reservation bookkeeping. */
 struct KSI_GroupCapacity {
   uint8_t unused0[8];
-  uint64_t conResv; /* KB; reserved by the children */
+  uint64_t conResv;   /* KB; reserved by the children */
   uint64_t availResv; /* KB; left to reserve */
 };
 
@@ -79,7 +79,7 @@ struct KSI_GroupMemoryStats {
   uint64_t memSize; /* KB */
   uint8_t unused12[8];
   uint64_t ovhdResv; /* KB; reserved overhead */
-  uint64_t ovhd; /* KB; consumed overhead */
+  uint64_t ovhd;     /* KB; consumed overhead */
   uint8_t unused36[24];
   uint64_t sharedSaved; /* KB; saved by page sharing */
   uint8_t unused68[40];
@@ -87,16 +87,16 @@ struct KSI_GroupMemoryStats {
   uint8_t unused116[24];
   uint64_t touched; /* KB */
   uint8_t unused148[8];
-  uint64_t bMin; /* KB; base reservation */
-  uint64_t bMax; /* KB; base limit */
-  uint64_t bShares; /* base shares */
-  uint64_t fShares; /* flattened base shares */
-  uint64_t iMin; /* KB; implicit reservation */
-  uint64_t eMin; /* KB; effective reservation */
-  uint64_t bActive; /* KB; base activeness */
+  uint64_t bMin;     /* KB; base reservation */
+  uint64_t bMax;     /* KB; base limit */
+  uint64_t bShares;  /* base shares */
+  uint64_t fShares;  /* flattened base shares */
+  uint64_t iMin;     /* KB; implicit reservation */
+  uint64_t eMin;     /* KB; effective reservation */
+  uint64_t bActive;  /* KB; base activeness */
   uint64_t allocTgt; /* KB; allocation target */
   uint8_t unused220[16];
-  int64_t mps; /* KB per share */
+  int64_t mps;       /* KB per share */
   uint64_t rMinPeak; /* KB; peak of the requested reservation */
   uint8_t unused252[8];
   uint64_t eMinPeak; /* KB */
@@ -118,39 +118,39 @@ struct KSI_CommonTally {
 struct KSI_VmmTally {
   uint8_t unused0[28];
   uint64_t memSizeLimit; /* KB */
-  uint64_t memSize; /* KB */
-  uint64_t touched; /* KB */
+  uint64_t memSize;      /* KB */
+  uint64_t touched;      /* KB */
   uint8_t unused52[16];
   uint64_t allocTgt; /* KB */
   uint8_t unused76[24];
   uint64_t vpmemRO; /* KB; persistent memory cached read-only */
   uint8_t unused108[16];
-  uint64_t vpmemUC; /* KB; persistent memory not yet cached */
-  uint64_t llswapped; /* KB */
-  uint64_t zipSaved; /* KB */
-  uint64_t shared; /* KB */
-  uint64_t zero; /* KB */
-  uint64_t llswapUsed; /* KB */
-  uint64_t mapped; /* KB */
-  uint64_t zipped; /* KB */
-  uint64_t vpmemRW; /* KB; persistent memory cached read-write */
+  uint64_t vpmemUC;     /* KB; persistent memory not yet cached */
+  uint64_t llswapped;   /* KB */
+  uint64_t zipSaved;    /* KB */
+  uint64_t shared;      /* KB */
+  uint64_t zero;        /* KB */
+  uint64_t llswapUsed;  /* KB */
+  uint64_t mapped;      /* KB */
+  uint64_t zipped;      /* KB */
+  uint64_t vpmemRW;     /* KB; persistent memory cached read-write */
   uint64_t sharedSaved; /* KB */
   uint8_t unused204[8];
   uint64_t swapTgt; /* KB */
   uint8_t unused220[8];
-  uint64_t swapScope; /* a code */
+  uint64_t swapScope;     /* a code */
   uint8_t useReliableMem; /* flag */
   uint8_t unused237[35];
   uint8_t balloonActive; /* flag */
-  uint64_t ballooned; /* KB */
-  uint64_t balloonTgt; /* KB */
+  uint64_t ballooned;    /* KB */
+  uint64_t balloonTgt;   /* KB */
   uint8_t unused289[43];
 };
 
 /* A user world's memory, by the client id of its world group. */
 struct KSI_UwTally {
-  int64_t min; /* KB */
-  int64_t max; /* KB */
+  int64_t min;      /* KB */
+  int64_t max;      /* KB */
   int64_t minLimit; /* KB */
   int32_t shares;
   int32_t memSizeLimit; /* KB */
@@ -164,60 +164,60 @@ struct KSI_UwTally {
   uint8_t unused132[40];
   uint64_t mapped; /* KB */
   uint8_t unused180[8];
-  uint64_t vpmemRW; /* KB */
+  uint64_t vpmemRW;     /* KB */
   uint64_t sharedSaved; /* KB */
   uint8_t unused204[8];
   uint64_t swapTgt; /* KB */
   uint8_t unused220[8];
-  uint64_t swapScope; /* a code */
+  uint64_t swapScope;     /* a code */
   uint8_t useReliableMem; /* flag */
   uint8_t unused237[27];
-  uint64_t totalResv; /* KB */
-  uint64_t pinnedResv; /* KB */
-  uint64_t memBStore; /* KB */
-  uint64_t swapBStore; /* KB */
-  uint64_t swappable; /* KB */
-  uint64_t pinned; /* KB */
-  uint64_t cow; /* KB */
-  uint64_t pageable; /* KB */
+  uint64_t totalResv;      /* KB */
+  uint64_t pinnedResv;     /* KB */
+  uint64_t memBStore;      /* KB */
+  uint64_t swapBStore;     /* KB */
+  uint64_t swappable;      /* KB */
+  uint64_t pinned;         /* KB */
+  uint64_t cow;            /* KB */
+  uint64_t pageable;       /* KB */
   uint64_t pageableUnacct; /* KB */
-  uint64_t swapped; /* KB */
-  uint64_t prealloced; /* KB */
-  uint64_t shm; /* KB */
+  uint64_t swapped;        /* KB */
+  uint64_t prealloced;     /* KB */
+  uint64_t shm;            /* KB */
 };
 
 /* What a virtual machine's guest reports of itself; all ones: not known. */
 struct KSI_GuestTally {
-  uint64_t memTotal; /* KB */
+  uint64_t memTotal;   /* KB */
   uint32_t lpageTotal; /* large pages */
-  uint64_t memNeeded; /* KB */
+  uint64_t memNeeded;  /* KB */
 };
 
 /* A virtual machine's host swapping, by the client id of its VMM leader. */
 struct KSI_SwapInfo {
   uint8_t isSwapping; /* flag */
-  uint64_t swapTgt; /* KB */
-  uint64_t swapped; /* KB */
-  uint64_t swapRead; /* KB */
-  uint64_t swapIn; /* KB */
-  uint64_t swapOut; /* KB */
+  uint64_t swapTgt;   /* KB */
+  uint64_t swapped;   /* KB */
+  uint64_t swapRead;  /* KB */
+  uint64_t swapIn;    /* KB */
+  uint64_t swapOut;   /* KB */
   uint8_t unused41[16];
   uint64_t gblSwapRead; /* KB */
-  uint64_t gblSwapIn; /* KB */
-  uint64_t gblSwapOut; /* KB */
-  uint64_t COWSwapper; /* KB */
-  uint64_t discarded; /* KB */
-  uint32_t vmmSwapOn; /* times */
-  uint32_t knvSwapOn; /* times */
-  uint32_t curSwapper; /* 0: vmm, else knv */
+  uint64_t gblSwapIn;   /* KB */
+  uint64_t gblSwapOut;  /* KB */
+  uint64_t COWSwapper;  /* KB */
+  uint64_t discarded;   /* KB */
+  uint32_t vmmSwapOn;   /* times */
+  uint32_t knvSwapOn;   /* times */
+  uint32_t curSwapper;  /* 0: vmm, else knv */
   uint8_t unused109[28];
-  uint64_t totalReg; /* KB */
-  uint64_t freeReg; /* KB */
-  uint64_t cptTgt; /* KB */
-  uint64_t cptRead; /* KB */
+  uint64_t totalReg;   /* KB */
+  uint64_t freeReg;    /* KB */
+  uint64_t cptTgt;     /* KB */
+  uint64_t cptRead;    /* KB */
   uint64_t cptWritten; /* KB */
-  uint64_t totalMig; /* KB */
-  uint64_t freeMig; /* KB */
+  uint64_t totalMig;   /* KB */
+  uint64_t freeMig;    /* KB */
   uint32_t cacheUsage; /* KB */
   uint8_t unused197[12];
   uint64_t swapoutReady; /* ready time */
@@ -226,13 +226,13 @@ struct KSI_SwapInfo {
 
 /* A virtual machine's compression cache, by the client id of its world group. */
 struct KSI_MemzipInfo {
-  uint64_t totalCache; /* KB */
-  uint64_t usedCache; /* KB */
-  uint64_t maxCache; /* KB */
-  uint32_t nrFreeHalf; /* half pages */
+  uint64_t totalCache;    /* KB */
+  uint64_t usedCache;     /* KB */
+  uint64_t maxCache;      /* KB */
+  uint32_t nrFreeHalf;    /* half pages */
   uint32_t nrFreeQuarter; /* quarter pages */
-  uint64_t zipped; /* KB */
-  uint64_t unZipped; /* KB */
+  uint64_t zipped;        /* KB */
+  uint64_t unZipped;      /* KB */
   uint8_t unused48[8];
   uint64_t zipRejected; /* KB */
   uint8_t unused64[16];
@@ -244,15 +244,15 @@ struct KSI_MemzipInfo {
 
 /* Pages of one remap type of a memory client. */
 struct KSI_RemapType {
-  uint64_t added; /* pages ever */
-  uint64_t filtered; /* pages ever */
-  uint64_t prepared; /* pages ever */
-  uint64_t staged; /* pages ever */
-  uint64_t canceled; /* pages ever */
-  uint64_t remapped; /* pages ever */
+  uint64_t added;       /* pages ever */
+  uint64_t filtered;    /* pages ever */
+  uint64_t prepared;    /* pages ever */
+  uint64_t staged;      /* pages ever */
+  uint64_t canceled;    /* pages ever */
+  uint64_t remapped;    /* pages ever */
   uint64_t cUnprepared; /* pages now */
-  uint64_t cPrepared; /* pages now */
-  uint64_t cStaged; /* pages now */
+  uint64_t cPrepared;   /* pages now */
+  uint64_t cStaged;     /* pages now */
   uint8_t unused72[8];
 };
 
@@ -278,18 +278,18 @@ struct KSI_StateTransitions {
 
 /* How the host's physical memory is divided. */
 struct KSI_Comprehensive {
-  uint64_t total; /* KB */
-  uint64_t managedByMemMap; /* KB */
-  uint64_t reliableMem; /* KB */
-  uint64_t discarded; /* KB */
-  uint64_t critical; /* KB */
-  uint64_t buddyOvhd; /* KB */
-  uint64_t kernelCode; /* KB */
-  uint64_t dataAndHeap; /* KB */
+  uint64_t total;             /* KB */
+  uint64_t managedByMemMap;   /* KB */
+  uint64_t reliableMem;       /* KB */
+  uint64_t discarded;         /* KB */
+  uint64_t critical;          /* KB */
+  uint64_t buddyOvhd;         /* KB */
+  uint64_t kernelCode;        /* KB */
+  uint64_t dataAndHeap;       /* KB */
   uint64_t knvClientConsumed; /* KB */
-  uint64_t otherConsumed; /* KB */
-  uint64_t rsvdLow; /* KB */
-  uint64_t free; /* KB */
+  uint64_t otherConsumed;     /* KB */
+  uint64_t rsvdLow;           /* KB */
+  uint64_t free;              /* KB */
 };
 
 /* The host's memory hardware. */
@@ -307,18 +307,18 @@ struct KSI_MemNode {
 
 /* Page sharing, host-wide. */
 struct KSI_PshareStats {
-  uint64_t cow; /* pages */
+  uint64_t cow;  /* pages */
   uint64_t cow1; /* pages with one reference */
   uint64_t zero; /* pages */
   uint8_t unused24[8];
-  uint64_t used; /* pages */
-  uint64_t reclaimed; /* pages */
-  uint64_t totAdd; /* pages */
-  uint64_t totRemove; /* pages */
-  uint64_t hintsActive; /* pages */
-  uint64_t hintsAdded; /* pages */
-  uint64_t hintsRemoved; /* pages */
-  uint64_t lpageHintsAdded; /* pages */
+  uint64_t used;              /* pages */
+  uint64_t reclaimed;         /* pages */
+  uint64_t totAdd;            /* pages */
+  uint64_t totRemove;         /* pages */
+  uint64_t hintsActive;       /* pages */
+  uint64_t hintsAdded;        /* pages */
+  uint64_t hintsRemoved;      /* pages */
+  uint64_t lpageHintsAdded;   /* pages */
   uint64_t lpageHintsRemoved; /* pages */
   uint8_t unused104[64];
   uint64_t peakChainLength;
@@ -354,35 +354,35 @@ struct KSI_HeapStats {
   uint8_t unused50[8];
   uint32_t numRanges;
   uint32_t dlMallocOvdh; /* bytes */
-  uint32_t size; /* bytes */
-  uint32_t initial; /* bytes */
+  uint32_t size;         /* bytes */
+  uint32_t initial;      /* bytes */
   uint8_t unused74[4];
   uint32_t avail; /* bytes */
   uint8_t unused82[4];
   uint32_t pctFreeOfCur; /* % */
   uint8_t unused90[4];
-  uint32_t max; /* bytes */
-  uint32_t maxAvail; /* bytes */
-  uint32_t pctFreeOfMax; /* % */
+  uint32_t max;             /* bytes */
+  uint32_t maxAvail;        /* bytes */
+  uint32_t pctFreeOfMax;    /* % */
   uint32_t lowPctFreeOfMax; /* % */
   uint8_t unused110[4];
   uint32_t numSuccAllocs; /* times */
   uint32_t numFailAllocs; /* times */
   uint8_t unused122[4];
-  uint32_t avgAllocSize; /* bytes */
+  uint32_t avgAllocSize;     /* bytes */
   uint32_t numReqsPerGrowth; /* times */
-  uint32_t numGrowthOps; /* times */
-  uint32_t numShrinkOps; /* times */
+  uint32_t numGrowthOps;     /* times */
+  uint32_t numShrinkOps;     /* times */
   uint8_t unused142[2];
 };
 
 /* A virtual machine's large pages, by the client id of its VMM leader. */
 struct KSI_VmLargePages {
-  uint32_t nrBackings; /* large pages */
+  uint32_t nrBackings;       /* large pages */
   uint32_t maxSwapThreshold; /* pages */
-  uint64_t nrAllocSuccess; /* times */
-  uint64_t nrFailPinned; /* times */
-  uint64_t nrFailSwapped; /* times */
+  uint64_t nrAllocSuccess;   /* times */
+  uint64_t nrFailPinned;     /* times */
+  uint64_t nrFailSwapped;    /* times */
   uint64_t nrFailPinnedLate; /* times */
   uint8_t unused40[16];
   uint64_t nrFailNoMem; /* times */
@@ -393,19 +393,19 @@ struct KSI_VmLargePages {
 
 /* A pool of large pages on one memory node. */
 struct KSI_LargePagePool {
-  uint32_t nrLPages; /* 2 MB pages */
-  uint32_t nrFreeSPages; /* 4 KB pages */
-  uint64_t nrSPageAllocs; /* pages */
-  uint64_t nrSPageFrees; /* pages */
-  uint64_t nrReapAttempts; /* times */
-  uint64_t nrSPagesReaped; /* pages */
+  uint32_t nrLPages;         /* 2 MB pages */
+  uint32_t nrFreeSPages;     /* 4 KB pages */
+  uint64_t nrSPageAllocs;    /* pages */
+  uint64_t nrSPageFrees;     /* pages */
+  uint64_t nrReapAttempts;   /* times */
+  uint64_t nrSPagesReaped;   /* pages */
   uint64_t nrDefragAttempts; /* times */
   uint8_t unused48[8];
-  uint64_t nrDefragCancelled; /* times */
-  uint64_t nrDefragReaped; /* pages */
-  uint64_t nrLPagesDefragged; /* pages */
+  uint64_t nrDefragCancelled;  /* times */
+  uint64_t nrDefragReaped;     /* pages */
+  uint64_t nrLPagesDefragged;  /* pages */
   uint64_t peakDefragAttempts; /* times */
-  uint64_t nrCachehit; /* times */
+  uint64_t nrCachehit;         /* times */
 };
 
 /* A persistent memory volume; no field of it is used yet. */
@@ -426,9 +426,10 @@ struct KSI_PmemRegionStore {
 /* A region of a persistent memory volume. */
 struct KSI_PmemRegion {
   uint8_t unused0[37];
-  uint64_t size; /* bytes */
+  uint64_t size;     /* bytes */
   uint64_t reserved; /* 2 MB blocks */
-  uint32_t flags; /* bits, from 0: allocated, deleting, locked, readOnly, blockDev, persistResv, system */
+  uint32_t flags;    /* bits, from 0: allocated, deleting, locked, readOnly, blockDev, persistResv,
+                        system */
   uint8_t unused57[3];
 };
 
