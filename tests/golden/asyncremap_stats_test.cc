@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <initializer_list>
 #include <string>
 #include <utility>
 
@@ -43,7 +44,7 @@ constexpr char kPages[] =
 // more in each next one.
 RawRecord RawPages(uint64_t first) {
   RawRecord record(80);
-  for (const size_t offset : {0, 16, 8, 24, 40, 32, 48, 56, 64}) {
+  for (const size_t offset : std::initializer_list<size_t>{0, 16, 8, 24, 40, 32, 48, 56, 64}) {
     record.U64(offset, 256 * first++ + 255);
   }
   return record;
