@@ -25,6 +25,7 @@ struct HostFile {
 
 constexpr std::string_view kNew = "kvm-two-nodes";
 constexpr std::string_view kOld = "cgroup-v1-vm";
+constexpr std::string_view kPlain = "systemd-server";
 constexpr std::string_view kMachine =
     "sys/fs/cgroup/machine.slice/machine-qemu\\x2d1\\x2dweb.scope/";
 
@@ -56,12 +57,14 @@ constexpr HostFile kFiles[] = {
     {kOld, "sys/fs/cgroup/memory/agents/memory.stat", "sched/"},
     {kOld, "sys/fs/cgroup/memory/agents/cgroup.procs", "sched/"},
     {kOld, "proc/903/status", "sched/"},
+    {kPlain, "sys/kernel/slab/dentry/objects", "system/heaps"},
+    {kPlain, "sys/kernel/slab/dentry/order", "system/heaps"},
 };
 
 class Hosts {
  public:
   Hosts() {
-    for (const std::string_view host : {kNew, kOld}) {
+    for (const std::string_view host : {kNew, kOld, kPlain}) {
       std::filesystem::copy(std::string(TALLY_HOSTS_DIRECTORY "/").append(host), Root(host),
                             std::filesystem::copy_options::recursive);
     }
