@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstring>
 #include <initializer_list>
 #include <string>
 #include <utility>
@@ -151,15 +152,20 @@ TEST(AsyncRemapStats, TurnsPagesIntoTheUnit) {
 }
 
 TEST(AsyncRemapStats, KilobytesWrap) {
-  KSI_RemapType pages{};
-  pages.staged = kAllOnes;  // a count like any other
-  pages.remapped = uint64_t{1} << 62;
-  EXPECT_EQ(Rows(OneType(pages), "staged:remapped"),
-            "numa,18446744073709551612,0\n,18446744073709551612,0\n");
-  EXPECT_EQ(Rows(OneType(pages), "staged:remapped", {"-u", "mb"}),
-            "numa,18014398509481983,0\n,18014398509481983,0\n");
-  EXPECT_EQ(Rows(OneType(pages), "staged:remapped", {"-u", "pg"}),
-            "numa,4611686018427387903,0\n,4611686018427387903,0\n");
+  // All ones are a count like any other.
+  KSI_RemapType pages;
+  std::memset(&pages, 0xff, sizeof pages);
+  const std::pair<const char*, std::string> units[] = {{"kb", ",18446744073709551612"},
+                                                       {"mb", ",18014398509481983"},
+                                                       {"pg", ",4611686018427387903"}};
+  for (const auto& [unit, figure] : units) {
+    std::string figures;
+    for (int column = 4; column <= 12; ++column) figures += figure;
+    EXPECT_EQ(Rows(OneType(pages), "", {"-u", unit}),
+              "world,100,numa" + figures + "\n,," + figures + "\n");
+  }
+  pages.added = uint64_t{1} << 62;
+  EXPECT_EQ(Rows(OneType(pages), "added"), "numa,0\n,0\n");
 }
 
 TEST(AsyncRemapStats, TotalsAreConvertedOnceAndWrap) {

@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <cstring>
 #include <string>
 #include <utility>
 
@@ -100,6 +101,22 @@ TEST(LPageStats, AddsBackingsIn32Bits) {
             "2147483649,2147483649,9223372036854775808,4294967295,18446744073709551615\n"
             "2147483649,2147483649,9223372036854775808,4294967295,18446744073709551615\n"
             "2,4294967298,0,8589934590,18446744073709551614\n");
+}
+
+TEST(LPageStats, KnowsNoFigureThatIsNotAvailable) {
+  KSI_VmLargePages pages;
+  std::memset(&pages, 0xff, sizeof pages);
+  const std::string ones = "18446744073709551615";
+  const std::string others = ",4294967295," + ones + "," + ones + "," + ones + "," + ones + "\n";
+  Scenario host = Pages(pages, {});
+  for (const char* unit : {"kb", "mb", "pg"}) {
+    EXPECT_EQ(kLPageStats.Rows(host, "", {"-u", unit}),
+              "web,10,4,100,4294967295," + ones + ",4294967295," + ones + others +
+                  "a database in its 28 letters,20,18446744073709551615,4294966996,"
+                  "0,0,0,0,0,0,0,0,0\n"
+                  "Total,,,,4294967295," +
+                  ones + ",4294967295," + ones + others);
+  }
 }
 
 TEST(LPageStats, LeavesOutAMachineWithoutAVmm) {
