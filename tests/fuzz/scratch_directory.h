@@ -1,8 +1,7 @@
-// A directory in memory for the files of a target, removed when the program ends as it should.
+// A directory for the files of a target. Programs of libFuzzer end without removing it:
+// scripts/fuzz gives them a TMPDIR, in memory, that it removes.
 #ifndef TESTS_FUZZ_SCRATCH_DIRECTORY_H_
 #define TESTS_FUZZ_SCRATCH_DIRECTORY_H_
-
-#include <unistd.h>
 
 #include <cstdlib>
 #include <filesystem>
@@ -15,10 +14,7 @@ namespace fuzz {
 class ScratchDirectory {
  public:
   ScratchDirectory() {
-    const std::filesystem::path memory = "/dev/shm";
-    const auto parent =
-        access(memory.c_str(), W_OK) == 0 ? memory : std::filesystem::temp_directory_path();
-    path_ = parent / "tally-fuzz.XXXXXX";
+    path_ = std::filesystem::temp_directory_path() / "tally-fuzz.XXXXXX";
     if (mkdtemp(path_.data()) == nullptr) std::abort();
   }
   ~ScratchDirectory() {
