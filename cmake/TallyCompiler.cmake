@@ -17,6 +17,10 @@ add_library(tally_compiler INTERFACE)
 target_include_directories(tally_compiler INTERFACE "${PROJECT_SOURCE_DIR}")
 target_compile_options(tally_compiler INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Werror)
+if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
+  # It takes std::string's operator+ for a copy onto itself.
+  target_compile_options(tally_compiler INTERFACE -Wno-restrict)
+endif()
 
 if(TALLY_COVERAGE)
   target_compile_options(tally_compiler INTERFACE --coverage)

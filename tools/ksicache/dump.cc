@@ -86,7 +86,8 @@ class Dumper {
       keys.push_back(key.kind == ksi::KeyKind::kNumber ? Json(key.number) : TextToJson(key.text));
     }
     const Json line = {{"node", reading.row->path}, {"keys", keys}, {member, answer}};
-    Print((first_ ? "\n    " : ",\n    ") + line.dump());
+    Print(first_ ? "\n    " : ",\n    ");
+    Print(line.dump());
     first_ = false;
   }
 
