@@ -16,8 +16,8 @@
 #include <string_view>
 #include <vector>
 
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/catalogue.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
 #include "tools/ksicache/cache_writer.h"

@@ -16,9 +16,9 @@
 #include <string>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 
 namespace {
 

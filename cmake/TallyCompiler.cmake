@@ -14,7 +14,8 @@ include(CheckPIESupported)
 check_pie_supported()
 
 add_library(tally_compiler INTERFACE)
-target_include_directories(tally_compiler INTERFACE "${PROJECT_SOURCE_DIR}")
+target_include_directories(tally_compiler INTERFACE
+  "${PROJECT_SOURCE_DIR}" "${PROJECT_SOURCE_DIR}/knvlibs/include")
 target_compile_options(tally_compiler INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Werror)
 if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)

@@ -1,7 +1,7 @@
 #include "framework/display_unit.h"
 
+#include <knvlibs/ksi.h>
 #include "framework/name_list.h"
-#include "knvlibs/include/knvlibs/ksi.h"
 
 namespace tally {
 

@@ -2,8 +2,8 @@
 
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_records.h>
 
 namespace tally {
 

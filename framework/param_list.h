@@ -7,8 +7,8 @@
 #include <memory>
 #include <utility>
 
+#include <knvlibs/ksi.h>
 #include "framework/status.h"
-#include "knvlibs/include/knvlibs/ksi.h"
 
 namespace tally {
 

@@ -5,7 +5,7 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 
 namespace tally {
 namespace {

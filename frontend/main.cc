@@ -8,9 +8,9 @@
 #include <cstdlib>
 #include <cstring>
 
+#include <knvlibs/ksi.h>
 #include "frontend/report_names.h"
 #include "frontend/usage.h"
-#include "knvlibs/include/knvlibs/ksi.h"
 
 namespace tally {
 namespace {

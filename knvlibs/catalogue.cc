@@ -4,7 +4,7 @@
 #include <array>
 #include <type_traits>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/node_table.h"
 
 namespace ksi {

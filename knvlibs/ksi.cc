@@ -1,6 +1,6 @@
 // The interface: checks what comes from outside, asks the source, and lets no exception out.
 #pragma GCC visibility push(default)
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 #pragma GCC visibility pop
 
 #include <algorithm>

@@ -1,6 +1,6 @@
 // The exported objects that hold the nodes' identifiers.
 #pragma GCC visibility push(default)
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
+#include <knvlibs/ksi_nodes.h>
 #pragma GCC visibility pop
 
 #include "knvlibs/node_table.h"

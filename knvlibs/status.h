@@ -4,7 +4,7 @@
 
 #include <cstdint>
 
-#include "knvlibs/include/knvlibs/ksi_status.h"
+#include <knvlibs/ksi_status.h>
 
 namespace ksi {
 

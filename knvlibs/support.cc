@@ -1,6 +1,6 @@
 // The two helpers of the interface that have nothing to do with the kernel.
 #pragma GCC visibility push(default)
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 #pragma GCC visibility pop
 
 #include <cstdarg>

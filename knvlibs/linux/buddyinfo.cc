@@ -8,7 +8,7 @@
 #include <string_view>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/memory_nodes.h"
 #include "knvlibs/linux/recent.h"

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/text.h"
 
 namespace ksi {

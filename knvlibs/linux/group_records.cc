@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/cgroup.h"
 #include "knvlibs/linux/figures.h"
 #include "knvlibs/linux/groups.h"

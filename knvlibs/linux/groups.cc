@@ -2,8 +2,8 @@
 
 #include <algorithm>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/recent.h"
 #include "knvlibs/linux/text.h"
 

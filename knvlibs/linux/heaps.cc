@@ -6,8 +6,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/figures.h"
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/recent.h"

@@ -7,7 +7,7 @@
 
 #include <cerrno>
 
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/text.h"
 
 namespace ksi {

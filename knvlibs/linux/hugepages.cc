@@ -5,7 +5,7 @@
 #include <utility>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/memory_nodes.h"
 #include "knvlibs/linux/text.h"

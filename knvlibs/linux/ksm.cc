@@ -2,7 +2,7 @@
 #include <string>
 #include <string_view>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/handlers.h"
 
 namespace ksi {

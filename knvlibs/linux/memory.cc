@@ -4,7 +4,7 @@
 #include <array>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/figures.h"
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/iomem.h"

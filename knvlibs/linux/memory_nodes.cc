@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/recent.h"
 #include "knvlibs/linux/text.h"

@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/process.h"
 #include "knvlibs/linux/recent.h"
 #include "knvlibs/linux/text.h"

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <string_view>
 
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/process.h"
 #include "knvlibs/linux/text.h"
 

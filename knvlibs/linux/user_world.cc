@@ -1,7 +1,7 @@
 // A user world is a process. docs/linux-host.md says where each figure comes from and why.
 #include <algorithm>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups.h"
 #include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/smaps.h"

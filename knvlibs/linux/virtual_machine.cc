@@ -2,7 +2,7 @@
 // why.
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/cgroup.h"
 #include "knvlibs/linux/groups.h"
 #include "knvlibs/linux/handlers.h"

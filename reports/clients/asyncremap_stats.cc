@@ -4,10 +4,10 @@
 
 #include <string_view>
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/param_list.h"
 #include "framework/return_status.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

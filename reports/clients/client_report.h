@@ -5,9 +5,9 @@
 
 #include <cstdint>
 
+#include <knvlibs/ksi_records.h>
 #include "framework/fixed_text.h"
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/groups/group_readers.h"
 #include "reports/groups/group_walk.h"
 

@@ -2,8 +2,8 @@
 // (memClients/tally/guest of the world group). A guest that reports nothing shows -1 and adds
 // nothing to the Total row. Memory arrives in kilobytes.
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

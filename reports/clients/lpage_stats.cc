@@ -2,8 +2,8 @@
 // memory/lpage/vmLPage of its VMM leader. All figures are counts: the unit only stands in the
 // title.
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

@@ -4,8 +4,8 @@
 // the local swap are in its world group's tally (memClients/tally/vmm). Memory arrives in
 // kilobytes; counts and times are shown as they are.
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

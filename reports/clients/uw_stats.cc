@@ -3,8 +3,8 @@
 // All memory figures are those of the world group's tally (memClients/tally/uw), what is configured
 // for the user world included. They arrive in kilobytes.
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

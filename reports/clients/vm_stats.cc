@@ -5,8 +5,8 @@
 // together with that of its VMM's group, its world group's tally (memClients/tally/vmm) and the
 // swapping of its VMM leader (memClients/swapInfo). Memory arrives in kilobytes.
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

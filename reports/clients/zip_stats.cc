@@ -2,8 +2,8 @@
 // the world group). Sizes arrive in kilobytes; counts and times are shown as they are. In the Total
 // row the times are the mean of the machines' averages.
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 

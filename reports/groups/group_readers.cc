@@ -1,7 +1,7 @@
 #include "reports/groups/group_readers.h"
 
+#include <knvlibs/ksi_nodes.h>
 #include "framework/return_status.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
 
 namespace tally {
 namespace {

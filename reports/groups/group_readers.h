@@ -6,9 +6,9 @@
 #include <cstddef>
 #include <cstdint>
 
+#include <knvlibs/ksi_records.h>
 #include "framework/param_list.h"
 #include "framework/status.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 
 namespace tally {
 

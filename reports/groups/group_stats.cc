@@ -12,9 +12,9 @@
 #include <string_view>
 #include <vector>
 
+#include <knvlibs/ksi.h>
 #include "framework/fixed_text.h"
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi.h"
 #include "reports/groups/group_readers.h"
 #include "reports/groups/group_walk.h"
 #include "reports/reports.h"

@@ -12,10 +12,10 @@
 #include <span>
 #include <utility>
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/param_list.h"
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/reports.h"
 
 namespace tally {

@@ -5,9 +5,9 @@
 // keeps and the state are sched/globalStats/memory/tally; the entries into a state are counted from
 // sched/globalStats/memory/stateTransitions, which tells for each state how often it was left.
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/host/host_record.h"
 #include "reports/reports.h"
 

@@ -7,11 +7,11 @@
 #include <new>
 #include <span>
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/fixed_text.h"
 #include "framework/param_list.h"
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/reports.h"
 
 namespace tally {

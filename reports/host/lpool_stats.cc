@@ -6,10 +6,10 @@
 #include <string>
 #include <string_view>
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/param_list.h"
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/reports.h"
 
 namespace tally {

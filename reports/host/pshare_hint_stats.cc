@@ -3,9 +3,9 @@
 // the large ones, so the regular ones are the difference. The active hints of the Total row are the
 // kernel's own count, which need not be the sum of the rows.
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/host/host_record.h"
 #include "reports/reports.h"
 

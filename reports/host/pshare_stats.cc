@@ -2,9 +2,9 @@
 // in the title block the peaks of the table that finds them. All is memory/pshare/stats, which
 // counts in pages.
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/report.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "reports/host/host_record.h"
 #include "reports/reports.h"
 

@@ -41,9 +41,9 @@
 #include <utility>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_status.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_status.h>
 #include "tests/double/nodes.h"
 #include "tests/double/script.h"
 

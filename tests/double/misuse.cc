@@ -4,9 +4,9 @@
 #include <ctime>
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 
 namespace {
 

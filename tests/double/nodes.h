@@ -3,7 +3,7 @@
 #ifndef TESTS_DOUBLE_NODES_H_
 #define TESTS_DOUBLE_NODES_H_
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 
 #define TALLY_DOUBLE_NODES(NODE)                                                \
   NODE(sched_groups_groupName, sizeof(KSI_GroupName))                           \

@@ -5,8 +5,8 @@
 #include <string>
 #include <string_view>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/catalogue.h"
-#include "knvlibs/include/knvlibs/ksi.h"
 #include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
 #include "tests/fuzz/node_walk.h"

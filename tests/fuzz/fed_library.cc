@@ -9,8 +9,8 @@
 #include <variant>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_nodes.h>
 #include "tests/double/nodes.h"
 #include "tests/fuzz/feed.h"
 

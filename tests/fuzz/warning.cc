@@ -2,7 +2,7 @@
 #include <cstdarg>
 #include <cstdio>
 
-#include "knvlibs/include/knvlibs/ksi.h"
+#include <knvlibs/ksi.h>
 
 void Warning(const char* format, ...) {
   char text[512];

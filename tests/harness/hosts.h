@@ -6,7 +6,7 @@
 #include <cstdint>
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "tests/harness/scenario.h"
 
 namespace harness {

@@ -9,7 +9,7 @@
 #include <fstream>
 #include <iterator>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/sqlite.h"
 
 namespace ksi {

@@ -11,10 +11,10 @@
 #include <random>
 #include <set>
 
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/cache_file.h"
 #include "knvlibs/cache_format.h"
 #include "knvlibs/cache_source.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "tests/knvlibs/cache_fixture.h"
 
 #if defined(__SANITIZE_ADDRESS__)

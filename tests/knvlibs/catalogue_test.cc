@@ -6,8 +6,8 @@
 #include <set>
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/source.h"
 
 namespace ksi {

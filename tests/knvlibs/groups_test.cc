@@ -8,7 +8,7 @@
 #include <filesystem>
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups.h"
 #include "knvlibs/linux/linux_source.h"
 #include "tests/harness/golden.h"

@@ -5,10 +5,10 @@
 #include <cstring>
 #include <string>
 
-#include "knvlibs/include/knvlibs/ksi.h"
-#include "knvlibs/include/knvlibs/ksi_nodes.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
-#include "knvlibs/include/knvlibs/ksi_status.h"
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
+#include <knvlibs/ksi_status.h>
 #include "tests/knvlibs/cache_fixture.h"
 
 namespace {

@@ -5,7 +5,7 @@
 
 #include <numeric>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/linux_source.h"
 #include "tests/harness/golden.h"
 #include "tests/knvlibs/host_tree.h"

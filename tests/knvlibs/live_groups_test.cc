@@ -16,7 +16,7 @@
 #include <thread>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups.h"
 #include "knvlibs/linux/linux_source.h"
 #include "tests/harness/program.h"

@@ -12,7 +12,7 @@
 #include <string>
 #include <vector>
 
-#include "knvlibs/include/knvlibs/ksi_records.h"
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/linux_source.h"
 #include "tests/knvlibs/host_tree.h"
 

@@ -14,8 +14,8 @@
 #include <string>
 #include <vector>
 
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/catalogue.h"
-#include "knvlibs/include/knvlibs/ksi_records.h"
 #include "knvlibs/linux/linux_source.h"
 #include "knvlibs/node_table.h"
 #include "tools/ksicache/cache_writer.h"

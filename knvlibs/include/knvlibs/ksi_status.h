@@ -16,8 +16,8 @@
 #define KSI_STATUS_PERMISSION_DENIED 0xbad005au
 #define KSI_STATUS_BAD_PARAM_COUNT 0xbad0083u
 #define KSI_STATUS_BAD_PARAM_TYPE 0xbad0084u
-#define KSI_STATUS_INVALID_METADATA 0xbad0099u /* not a cache file; a kernel file not understood \
-                                                */
+/* Not a cache file; a kernel file that is not understood. */
+#define KSI_STATUS_INVALID_METADATA 0xbad0099u
 #define KSI_STATUS_TOO_MANY_ELEMENTS 0xbad00b4u
 #define KSI_STATUS_NO_HANDLER 0xbad00c3u
 #define KSI_STATUS_INVALID_NODE 0xbad00d8u
