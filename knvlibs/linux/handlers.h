@@ -5,7 +5,7 @@
 
 #include <cstdint>
 
-#include "knvlibs/linux/host.h"
+#include "knvlibs/linux/host/host.h"
 #include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
 

@@ -4,7 +4,7 @@
 
 #include <string>
 
-#include "knvlibs/linux/host.h"
+#include "knvlibs/linux/host/host.h"
 #include "knvlibs/source.h"
 
 namespace ksi {

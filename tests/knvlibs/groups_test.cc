@@ -9,7 +9,7 @@
 #include <string>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/groups.h"
+#include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/linux_source.h"
 #include "tests/harness/golden.h"
 #include "tests/knvlibs/host_tree.h"

@@ -17,7 +17,7 @@
 #include <vector>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/groups.h"
+#include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/linux_source.h"
 #include "tests/harness/program.h"
 #include "tests/harness/tally.h"

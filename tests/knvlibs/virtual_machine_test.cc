@@ -1,9 +1,9 @@
 // What a QEMU command line and its monitor tell of a virtual machine.
 #include <gtest/gtest.h>
 
-#include "knvlibs/linux/json.h"
-#include "knvlibs/linux/qemu_command_line.h"
-#include "knvlibs/linux/qmp.h"
+#include "knvlibs/linux/host/json.h"
+#include "knvlibs/linux/machines/qemu_command_line.h"
+#include "knvlibs/linux/machines/qmp.h"
 #include "tests/knvlibs/host_tree.h"
 
 namespace ksi {

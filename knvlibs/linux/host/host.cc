@@ -1,0 +1,150 @@
+#include "knvlibs/linux/host/host.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+
+#include <knvlibs/ksi.h>
+#include "knvlibs/linux/host/text.h"
+
+namespace ksi {
+namespace {
+
+// No file that is read whole is anywhere near this large.
+constexpr size_t kLargestFile = size_t{64} << 20;
+
+class FileDescriptor {
+ public:
+  explicit FileDescriptor(int fd) : fd_(fd) {}
+  FileDescriptor(const FileDescriptor&) = delete;
+  FileDescriptor& operator=(const FileDescriptor&) = delete;
+  ~FileDescriptor() {
+    if (fd_ >= 0) close(fd_);
+  }
+  int get() const { return fd_; }
+
+ private:
+  int fd_;
+};
+
+class Directory {
+ public:
+  explicit Directory(DIR* stream) : stream_(stream) {}
+  Directory(const Directory&) = delete;
+  Directory& operator=(const Directory&) = delete;
+  ~Directory() {
+    if (stream_ != nullptr) closedir(stream_);
+  }
+  DIR* get() const { return stream_; }
+
+ private:
+  DIR* stream_;
+};
+
+bool IsDirectory(DIR* stream, const dirent& entry) {
+  if (entry.d_type != DT_UNKNOWN) return entry.d_type == DT_DIR;
+  struct stat status = {};
+  return fstatat(dirfd(stream), entry.d_name, &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+         S_ISDIR(status.st_mode);
+}
+
+std::string WithoutLastSlash(std::string path) {
+  while (!path.empty() && path.back() == '/') path.pop_back();
+  return path;
+}
+
+}  // namespace
+
+LinuxHost::LinuxHost(std::string root)
+    : root_(WithoutLastSlash(std::move(root))),
+      pageKB_(static_cast<uint64_t>(sysconf(_SC_PAGESIZE)) / 1024) {}
+
+Status LinuxHost::Read(std::string_view file, std::string* content) const {
+  std::string path = root_;
+  path += file;
+  // Without O_NONBLOCK a FIFO in a recorded tree would hold the program up.
+  const FileDescriptor fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  if (fd.get() < 0) return StatusOfErrno(errno);
+
+  // Kernel files have no size to ask for: grow until a read comes back empty.
+  size_t length = 0;
+  content->resize(16384);
+  for (;;) {
+    const ssize_t count = read(fd.get(), content->data() + length, content->size() - length);
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return StatusOfErrno(errno);
+    if (count == 0) break;
+    length += static_cast<size_t>(count);
+    if (length == content->size()) {
+      if (length >= kLargestFile) return KSI_STATUS_READ_ERROR;
+      content->resize(2 * length);
+    }
+  }
+  content->resize(length);
+  return kOk;
+}
+
+Status LinuxHost::ReadNumber(std::string_view file, uint64_t* number) const {
+  std::string content;
+  const Status status = Read(file, &content);
+  if (status != kOk) return status;
+  Lines lines(content);
+  std::string_view line;
+  if (!lines.Next(&line) || !ParseNumber(line, number) || lines.Next(&line)) {
+    return NotUnderstood(file, 1);
+  }
+  return kOk;
+}
+
+Status LinuxHost::List(std::string_view directory, std::vector<Entry>* entries) const {
+  std::string path = root_;
+  path += directory;
+  const Directory stream(opendir(path.c_str()));
+  if (stream.get() == nullptr) return StatusOfErrno(errno);
+
+  entries->clear();
+  for (;;) {
+    errno = 0;
+    const dirent* entry = readdir(stream.get());
+    if (entry == nullptr) return errno == 0 ? kOk : StatusOfErrno(errno);
+    const std::string_view name = entry->d_name;
+    if (name == "." || name == "..") continue;
+    entries->push_back({std::string(name), entry->d_ino, IsDirectory(stream.get(), *entry)});
+  }
+}
+
+Status LinuxHost::List(std::string_view directory, Entries wanted,
+                       std::vector<std::string>* names) const {
+  std::vector<Entry> entries;
+  const Status status = List(directory, &entries);
+  if (status != kOk) return status;
+
+  names->clear();
+  for (Entry& entry : entries) {
+    if (entry.name.starts_with('.')) continue;
+    if (wanted == Entries::kDirectories && !entry.isDirectory) continue;
+    names->push_back(std::move(entry.name));
+  }
+  return kOk;
+}
+
+Status LinuxHost::NotUnderstoodOnce(std::string_view kind, std::string_view file,
+                                    size_t line) const {
+  return First(kind) ? NotUnderstood(file, line) : KSI_STATUS_INVALID_METADATA;
+}
+
+Status NotUnderstood(std::string_view file, size_t line) {
+  Warning("%.*s: line %zu is not understood\n", static_cast<int>(file.size()), file.data(), line);
+  return KSI_STATUS_INVALID_METADATA;
+}
+
+Status NameNotUnderstood(std::string_view directory, std::string_view name) {
+  Warning("%.*s: the name %.*s is not understood\n", static_cast<int>(directory.size()),
+          directory.data(), static_cast<int>(name.size()), name.data());
+  return KSI_STATUS_INVALID_METADATA;
+}
+
+}  // namespace ksi
