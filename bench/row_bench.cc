@@ -7,25 +7,11 @@
 #include <array>
 #include <cstdio>
 #include <cstdlib>
-#include <new>
 #include <string>
 #include <vector>
 
+#include "bench/allocations.h"
 #include "framework/column_table.h"
-
-namespace {
-
-uint64_t allocations = 0;
-
-}  // namespace
-
-void* operator new(size_t size) {
-  ++allocations;
-  if (void* const memory = std::malloc(size)) return memory;
-  throw std::bad_alloc();
-}
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, size_t) noexcept { std::free(memory); }
 
 namespace {
 
@@ -113,10 +99,10 @@ void Measure(benchmark::State& state, Print print) {
   FILE* const saved = stdout;
   stdout = std::fopen("/dev/null", "w");
   print(table);
-  const uint64_t before = allocations;
+  const uint64_t before = Allocations();
   for (auto _ : state) print(table);
   state.counters["allocations_per_row"] = benchmark::Counter(
-      static_cast<double>(allocations - before), benchmark::Counter::kAvgIterations);
+      static_cast<double>(Allocations() - before), benchmark::Counter::kAvgIterations);
   std::fclose(stdout);
   stdout = saved;
 }
