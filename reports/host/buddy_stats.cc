@@ -27,7 +27,8 @@ constexpr ReportFrame kFrame = {
     .options = "s:vq",
 };
 
-constexpr size_t kMaxBuddies = 64;
+// Room for the names of all buddies, and for a row of each.
+constexpr size_t kMaxBuddies = 99;
 
 // Where a name tells the memory node and the type of memory: "memmap-03-lo".
 constexpr size_t kNodeAt = 7;
@@ -145,19 +146,16 @@ Status ReadBuddyName(const char* name, BuddyRow& row) {
 // told is left out.
 size_t ReadBuddies(std::span<BuddyRow, kMaxBuddies> rows) {
   constexpr char kPrefix[] = "memmap";
-  constexpr int kMaxNames = 99;
   constexpr size_t kNameBytes = 12672;
-  const ParamList names(KSI_ParamListCreateAndAllocateParams(1, kMaxNames, kNameBytes));
+  const ParamList names(KSI_ParamListCreateAndAllocateParams(1, kMaxBuddies, kNameBytes));
   if (!names || KSI_GetInstanceList(KSI_NODE_system_buddy, nullptr, names.get()) != kSuccess) {
     return 0;
   }
-  size_t found = 0;
   size_t kept = 0;
-  for (uint32_t i = 0; i < KSI_ParamListUsedCount(names.get()); ++i) {
+  for (uint32_t i = 0; i < KSI_ParamListUsedCount(names.get()) && kept < rows.size(); ++i) {
     const char* name = nullptr;
     if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) break;
     if (std::strncmp(name, kPrefix, sizeof kPrefix - 1) != 0) continue;
-    if (found++ == rows.size()) break;
     if (ReadBuddyName(name, rows[kept]) == kSuccess) ++kept;
   }
   return kept;

@@ -296,34 +296,36 @@ std::vector<Name> ManyBuddies(uint32_t count) {
   return names;
 }
 
-TEST(BuddyStats, ReportsSixtyFourBuddies) {
-  std::vector<Name> names = ManyBuddies(64);
-  names.resize(99, {"other"});
+TEST(BuddyStats, ReportsAsManyBuddiesAsTheListHolds) {
   std::string rows;
-  for (int node = 0; node < 64; ++node) {
-    rows += std::to_string(node) + "," + std::to_string(1000 * (64 - node) + 517) + "\n";
+  for (int node = 0; node < 99; ++node) {
+    rows += std::to_string(node) + "," + std::to_string(1000 * (99 - node) + 517) + "\n";
   }
-  EXPECT_EQ(Cells(Host(names), "512MBused"), rows + ",2113088\n");
+  EXPECT_EQ(Cells(Host(ManyBuddies(99)), "512MBused"), rows + ",5001183\n");
 }
 
-// Nothing is asked of the one that there is no room for, nor of those behind it.
-TEST(BuddyStats, EndsTheWalkAtTheSixtyFifthBuddy) {
-  const std::vector<Name> names = ManyBuddies(64);
-  Items instances = {"other"};
-  for (const Name& name : names) instances.emplace_back(name.text);
-  instances.insert(instances.end(), {"memmap-64-lo", "memmap-65-lo", "other"});
-  Scenario host = Host(names).List(kNames, {}, instances);
-  const std::string rows = Cells(host, "name");
-  EXPECT_EQ(std::count(rows.begin(), rows.end(), '\n'), 65);
-  EXPECT_TRUE(rows.ends_with("\nmemmap-63-lo,63\nTotal,\n"));
-
-  // One that is left out counts, too.
-  host.Fails(kMemNodes, {5}, 0xbad0003);
+// A buddy that is left out takes the room of no other one, and all are asked about in the order of
+// their names.
+TEST(BuddyStats, LeavesOutWhatCannotBeTold) {
+  const std::vector<Name> names = ManyBuddies(70);
+  Scenario host = Host(names);
+  std::string warnings;
+  for (const uint32_t node : {69, 40, 5}) {
+    host.Fails(kMemNodes, {node}, 0xbad0003);
+    warnings += "Error 0xbad0003 while reading /memory/memNodes/" + std::to_string(node);
+  }
   const TallyRun run = BuddyStats(host, {"-q", "-s", "name"});
-  EXPECT_EQ(std::count(run.out.begin(), run.out.end(), '\n'), 65);
-  EXPECT_EQ(run.out.find("memmap-05-lo"), std::string::npos);
-  EXPECT_TRUE(run.out.ends_with("\nmemmap-63-lo,63\nTotal,\n"));
-  EXPECT_EQ(run.err, "Error 0xbad0003 while reading /memory/memNodes/5");
+  std::string rows;
+  std::string calls;
+  for (auto name = names.rbegin(); name != names.rend(); ++name) {
+    if (name->memNode == 69 || name->memNode == 40 || name->memNode == 5) continue;
+    rows += name->text + "," + std::to_string(name->memNode) + "\n";
+    calls += " Create(1,1) AddString('" + name->text + "') Get(system_buddy_comprehensive,['" +
+             name->text + "']) Destroy()";
+  }
+  EXPECT_EQ(Rows(run.out), rows + "Total,\n");
+  EXPECT_EQ(run.err, warnings);
+  EXPECT_TRUE(run.Calls().ends_with("Destroy(system_buddy,[])" + calls));
 }
 
 TEST(BuddyStats, HasRoomForNinetyNineNames) {
