@@ -1,6 +1,6 @@
-// The catalogue of the kernel information tree: one table of all nodes. What else there is to know
-// of a node derives from it: the exported KSI_NODE_ objects, the size of a record, the signature of
-// the definitions, and how a record is shown and written down.
+// The catalogue of the kernel information tree: the tables of ksi_nodes.h and ksi_records.h as
+// data. The size of a record, the signature of the definitions, and how a record is shown and
+// written down derive from it.
 #ifndef KNVLIBS_CATALOGUE_H_
 #define KNVLIBS_CATALOGUE_H_
 
@@ -9,6 +9,9 @@
 #include <span>
 #include <string_view>
 
+#include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
+
 namespace ksi {
 
 enum class KeyKind : uint8_t { kNumber, kText };
@@ -16,28 +19,25 @@ enum class KeyKind : uint8_t { kNumber, kText };
 // What a key, or an entry of an instance list, names.
 enum class Instance : uint8_t {
   kNone,
-  // Numbers.
-  kGroup,
-  kClient,
-  kMemNode,
-  // Texts.
-  kRemapType,
-  kState,
-  kBuddy,
-  kHeap,
-  kPool,
-  kVolume,
-  kRegion,
+#define KSI_INSTANCE(identifier, kind, name) identifier,
+  KSI_INSTANCES(KSI_INSTANCE)
+#undef KSI_INSTANCE
 };
 
+// REQUIRES: `instance` is not kNone.
 constexpr KeyKind KindOf(Instance instance) {
-  return instance < Instance::kRemapType ? KeyKind::kNumber : KeyKind::kText;
+#define KSI_INSTANCE(identifier, kind, name) KeyKind::kind,
+  constexpr KeyKind kKinds[] = {KSI_INSTANCES(KSI_INSTANCE)};
+#undef KSI_INSTANCE
+  return kKinds[static_cast<size_t>(instance) - 1];
 }
 
 const char* NameOf(Instance instance);
 
 // The memory states of a host, best first; a state's index is its number.
-constexpr std::string_view kMemoryStates[] = {"high", "clear", "soft", "hard", "low"};
+#define KSI_STATE(number, identifier, name, title) name,
+constexpr std::string_view kMemoryStates[] = {KSI_MEMORY_STATES(KSI_STATE)};
+#undef KSI_STATE
 
 // The longest path of keys that selects an instance.
 constexpr size_t kMaxKeys = 2;
@@ -54,10 +54,11 @@ struct Keying {
 
 enum class FieldType : uint8_t { kUnsigned, kSigned, kBits, kText };
 
-// A named part of a record. `unit` is empty where the name says it all.
+// A named part of a record. `unit` is empty where the meaning says it all.
 struct Field {
   const char* name;
   const char* unit;
+  const char* meaning;
   uint16_t offset;
   uint16_t width;
   FieldType type;
@@ -65,6 +66,7 @@ struct Field {
 
 struct Node {
   std::string_view path;
+  const char* meaning;
 
   // The value, a record of `recordSize` bytes; 0: the node has none.
   uint16_t recordSize = 0;

@@ -5,5 +5,6 @@
 
 #include "knvlibs/node_table.h"
 
-#define OBJECT(name, value, list) const uint16_t KSI_NODE_##name = ksi::node::name;
-KSI_NODE_TABLE(OBJECT)
+#define OBJECT(name, record, keys, entries, listKeys, meaning) \
+  const uint16_t KSI_NODE_##name = ksi::node::name;
+KSI_NODES(OBJECT)

@@ -43,8 +43,8 @@
 
 #include <knvlibs/ksi.h>
 #include <knvlibs/ksi_nodes.h>
+#include <knvlibs/ksi_records.h>
 #include <knvlibs/ksi_status.h>
-#include "tests/double/nodes.h"
 #include "tests/double/script.h"
 
 #define TALLY_DOUBLE_EXPORT extern "C" __attribute__((visibility("default")))
@@ -57,14 +57,14 @@ struct Node {
 };
 
 constexpr Node kNodes[] = {
-#define NODE(name, size) {#name, size},
-    TALLY_DOUBLE_NODES(NODE)
+#define NODE(name, record, keys, entries, listKeys, meaning) {#name, KSI_SIZE_##record},
+    KSI_NODES(NODE)
 #undef NODE
 };
 
 enum NodeIndex : unsigned {
-#define NODE(name, size) kIndexOf_##name,
-  TALLY_DOUBLE_NODES(NODE)
+#define NODE(name, record, keys, entries, listKeys, meaning) kIndexOf_##name,
+  KSI_NODES(NODE)
 #undef NODE
 };
 
@@ -428,10 +428,10 @@ uint32_t ReadEntry(KSI_ParamList* list, const char* operation, uint32_t index, E
 
 }  // namespace
 
-#define NODE(name, size)                                                             \
+#define NODE(name, record, keys, entries, listKeys, meaning)                         \
   extern "C" __attribute__((visibility("default"))) const uint16_t KSI_NODE_##name = \
       NodeValue(kIndexOf_##name);
-TALLY_DOUBLE_NODES(NODE)
+KSI_NODES(NODE)
 #undef NODE
 
 TALLY_DOUBLE_EXPORT uint32_t KSI_UseCache(const char* fileName, int flags) {

@@ -11,7 +11,7 @@
 
 #include <knvlibs/ksi.h>
 #include <knvlibs/ksi_nodes.h>
-#include "tests/double/nodes.h"
+#include <knvlibs/ksi_records.h>
 #include "tests/fuzz/feed.h"
 
 struct KSI_ParamList {
@@ -35,15 +35,15 @@ constexpr size_t kMostEntriesOfList = 12;
 
 enum Id : uint16_t {
   kNone,
-#define FUZZ_ID(name, size) k_##name,
-  TALLY_DOUBLE_NODES(FUZZ_ID)
+#define FUZZ_ID(name, record, keys, entries, listKeys, meaning) k_##name,
+  KSI_NODES(FUZZ_ID)
 #undef FUZZ_ID
 };
 
 // By identifier.
 constexpr size_t kRecordSizes[] = {0,
-#define FUZZ_SIZE(name, size) size,
-                                   TALLY_DOUBLE_NODES(FUZZ_SIZE)
+#define FUZZ_SIZE(name, record, keys, entries, listKeys, meaning) KSI_SIZE_##record,
+                                   KSI_NODES(FUZZ_SIZE)
 #undef FUZZ_SIZE
 };
 
@@ -153,10 +153,9 @@ FedLibrary::~FedLibrary() {
 
 using namespace fuzz;
 
-#define FUZZ_NODE(name, size)            \
-  extern const uint16_t KSI_NODE_##name; \
+#define FUZZ_NODE(name, record, keys, entries, listKeys, meaning) \
   const uint16_t KSI_NODE_##name = k_##name;
-TALLY_DOUBLE_NODES(FUZZ_NODE)
+KSI_NODES(FUZZ_NODE)
 #undef FUZZ_NODE
 
 uint32_t KSI_UseCache(const char* fileName, int flags) {

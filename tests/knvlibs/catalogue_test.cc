@@ -5,9 +5,11 @@
 
 #include <set>
 #include <string>
+#include <type_traits>
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "knvlibs/node_table.h"
 #include "knvlibs/source.h"
 
 namespace ksi {
@@ -121,6 +123,40 @@ TEST(Catalogue, KeysAreKnown) {
   EXPECT_EQ(KindOf(Instance::kMemNode), KeyKind::kNumber);
   EXPECT_FALSE(FindNode("system/heaps")->HasValue());
   EXPECT_FALSE(FindNode("memory/memInfo")->HasList());
+}
+
+TEST(Catalogue, SaysWhatEveryNodeAndEveryFieldIs) {
+  for (const Node& node : Catalogue()) {
+    EXPECT_STRNE(node.meaning, "") << node.path;
+    for (const Field& field : node.fields) EXPECT_STRNE(field.meaning, "") << field.name;
+  }
+}
+
+TEST(Catalogue, NamesEveryInstance) {
+  EXPECT_STREQ(NameOf(Instance::kNone), "none");
+  EXPECT_STREQ(NameOf(Instance::kGroup), "group");
+  EXPECT_STREQ(NameOf(Instance::kRemapType), "remap type");
+  EXPECT_STREQ(NameOf(Instance::kRegion), "region");
+}
+
+// A node's value is of one type, also where it is one number.
+static_assert(std::is_same_v<node::Record<node::sched_groups_groupFlags>, uint32_t>);
+static_assert(std::is_same_v<node::Record<node::system_heaps_stats>, KSI_HeapStats>);
+static_assert(std::is_same_v<node::Record<node::memory_lpage_nodeList_psharePool>,
+                             node::Record<node::memory_lpage_nodeList_vmPools>>);
+static_assert(std::is_same_v<node::Record<node::system_heaps>, KSI_None>);
+
+TEST(Catalogue, StatesAreInTheirOrder) {
+  EXPECT_EQ(kMemoryStates[KSI_MEMORY_STATE_HIGH], "high");
+  EXPECT_EQ(kMemoryStates[KSI_MEMORY_STATE_CLEAR], "clear");
+  EXPECT_EQ(kMemoryStates[KSI_MEMORY_STATE_SOFT], "soft");
+  EXPECT_EQ(kMemoryStates[KSI_MEMORY_STATE_HARD], "hard");
+  EXPECT_EQ(kMemoryStates[KSI_MEMORY_STATE_LOW], "low");
+}
+
+// Captures bear it: another signature is a change of what a read means.
+TEST(Definitions, HaveTheSignatureOfTheCapturesThatThereAre) {
+  EXPECT_EQ(kDefinitions.signature, "1ef96ca059bf6e0ce741ce53e37060cf");
 }
 
 TEST(Definitions, AreADigestAndADate) {

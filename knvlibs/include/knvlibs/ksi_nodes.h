@@ -1,6 +1,7 @@
-/* The nodes of the kernel information tree. The name spells the path with '_' for '/'; the value
- * is the library's own and no program assumes one. Each line names the keys in brackets and the
- * record of the value (ksi_records.h), or the entries of the instance list. */
+/* The nodes of the kernel information tree: one table, from which the objects below and all that
+ * the library knows of its nodes derive. The name spells the path with '_' for '/'; the value of an
+ * object is the library's own and no program assumes one.
+ */
 #ifndef KNVLIBS_KSI_NODES_H_
 #define KNVLIBS_KSI_NODES_H_
 
@@ -10,62 +11,87 @@
 extern "C" {
 #endif
 
-/* Scheduler groups, by group id. */
-extern const uint16_t KSI_NODE_sched_groups_groupName;          /* [group] KSI_GroupName */
-extern const uint16_t KSI_NODE_sched_groups_groupTag;           /* [group] KSI_GroupTag */
-extern const uint16_t KSI_NODE_sched_groups_parentGroupID;      /* [group] int64_t */
-extern const uint16_t KSI_NODE_sched_groups_groupFlags;         /* [group] uint32_t */
-extern const uint16_t KSI_NODE_sched_groups_groupLeaderID;      /* [group] int32_t */
-extern const uint16_t KSI_NODE_sched_groups_memAllocationInKB;  /* [group] KSI_GroupAllocation */
-extern const uint16_t KSI_NODE_sched_groups_stats_capacity;     /* [group] KSI_GroupCapacity */
-extern const uint16_t KSI_NODE_sched_groups_stats_memoryStats;  /* [group] KSI_GroupMemoryStats */
-extern const uint16_t KSI_NODE_sched_groups_members_groups;     /* [group] list of group ids */
-extern const uint16_t KSI_NODE_sched_groups_members_memClients; /* [group] list of client ids */
+/* What the keys of a node, and the entries of its instance list, name:
+ * INSTANCE(identifier, kind, name). Of the kind kNumber they are integers, else strings. */
+/* clang-format off */
+#define KSI_INSTANCES(INSTANCE)              \
+  INSTANCE(kGroup, kNumber, "group")         \
+  INSTANCE(kClient, kNumber, "client")       \
+  INSTANCE(kMemNode, kNumber, "memory node") \
+  INSTANCE(kRemapType, kText, "remap type")  \
+  INSTANCE(kState, kText, "state")           \
+  INSTANCE(kBuddy, kText, "buddy")           \
+  INSTANCE(kHeap, kText, "heap")             \
+  INSTANCE(kPool, kText, "pool")             \
+  INSTANCE(kVolume, kText, "volume")         \
+  INSTANCE(kRegion, kText, "region")
 
-/* Memory clients, by client id. */
-extern const uint16_t KSI_NODE_sched_memClients_tally_totalCommon; /* [client] KSI_CommonTally */
-extern const uint16_t KSI_NODE_sched_memClients_tally_vmm;         /* [client] KSI_VmmTally */
-extern const uint16_t KSI_NODE_sched_memClients_tally_uw;          /* [client] KSI_UwTally */
-extern const uint16_t KSI_NODE_sched_memClients_tally_guest;       /* [client] KSI_GuestTally */
-extern const uint16_t KSI_NODE_sched_memClients_swapInfo;          /* [client] KSI_SwapInfo */
-extern const uint16_t KSI_NODE_sched_memClients_memzipInfo;        /* [client] KSI_MemzipInfo */
-extern const uint16_t KSI_NODE_sched_memClients_remapTypes;        /* [client] list of type names;
-                                                                      [client, type] KSI_RemapType */
-extern const uint16_t KSI_NODE_worldGroups_vmmLeaderID;            /* [client] int32_t */
+/* NODE(name, record, keys, entries, list keys, meaning): the value is KSI_<record> (ksi_records.h),
+ * selected by the keys; the instance list names the entries, selected by its own keys. A node
+ * without a value has the record None, one without a list the entries kNone. */
+#define KSI_NODES(NODE)                                                                            \
+  /* Scheduler groups, by group id. */                                                             \
+  NODE(sched_groups_groupName, GroupName, (kGroup), kNone, (), "Its name")                         \
+  NODE(sched_groups_groupTag, GroupTag, (kGroup), kNone, (), "Its tag")                            \
+  NODE(sched_groups_parentGroupID, ParentGroupID, (kGroup), kNone, (), "The group above it")       \
+  NODE(sched_groups_groupFlags, GroupFlags, (kGroup), kNone, (), "What it is")                     \
+  NODE(sched_groups_groupLeaderID, GroupLeaderID, (kGroup), kNone, (), "The world that leads it")  \
+  NODE(sched_groups_memAllocationInKB, GroupAllocation, (kGroup), kNone, (),                       \
+       "How its memory is configured")                                                             \
+  NODE(sched_groups_stats_capacity, GroupCapacity, (kGroup), kNone, (),                            \
+       "What is reserved of its memory")                                                           \
+  NODE(sched_groups_stats_memoryStats, GroupMemoryStats, (kGroup), kNone, (), "Its memory")        \
+  NODE(sched_groups_members_groups, None, (), kGroup, (kGroup), "The groups below it")             \
+  NODE(sched_groups_members_memClients, None, (), kClient, (kGroup), "Its memory clients")         \
+  /* Memory clients, by client id. */                                                              \
+  NODE(sched_memClients_tally_totalCommon, CommonTally, (kClient), kNone, (),                      \
+       "What all tallies have in common")                                                          \
+  NODE(sched_memClients_tally_vmm, VmmTally, (kClient), kNone, (), "A virtual machine's memory")   \
+  NODE(sched_memClients_tally_uw, UwTally, (kClient), kNone, (), "A user world's memory")          \
+  NODE(sched_memClients_tally_guest, GuestTally, (kClient), kNone, (),                             \
+       "What its guest says of itself")                                                            \
+  NODE(sched_memClients_swapInfo, SwapInfo, (kClient), kNone, (), "How the host swaps it")         \
+  NODE(sched_memClients_memzipInfo, MemzipInfo, (kClient), kNone, (), "Its compression cache")     \
+  NODE(sched_memClients_remapTypes, RemapType, (kClient, kRemapType), kRemapType, (kClient),       \
+       "Its remapped pages")                                                                       \
+  NODE(worldGroups_vmmLeaderID, VmmLeaderID, (kClient), kNone, (),                                 \
+       "The VMM leader of its world group")                                                        \
+  /* The host. */                                                                                  \
+  NODE(sched_globalStats_numVMs, NumVMs, (), kNone, (), "How many virtual machines there are")     \
+  NODE(sched_globalStats_memory_tally, GlobalTally, (), kNone, (),                                 \
+       "What the memory scheduler manages")                                                        \
+  NODE(sched_globalStats_memory_stateTransitions, StateTransitions, (kState), kNone, (),           \
+       "How often it was left")                                                                    \
+  NODE(memory_comprehensive, Comprehensive, (), kNone, (), "How its memory is divided")            \
+  NODE(memory_memInfo, MemInfo, (), kNone, (), "Its memory hardware")                              \
+  NODE(memory_memNodes, MemNode, (kMemNode), kNone, (), "Where a memory node is")                  \
+  NODE(memory_pshare_stats, PshareStats, (), kNone, (), "Page sharing")                            \
+  NODE(system_buddy, None, (), kBuddy, (), "The buddy allocators")                                 \
+  NODE(system_buddy_comprehensive, BuddyStats, (kBuddy), kNone, (), "The buffers of one")          \
+  NODE(system_heaps, None, (), kHeap, (), "The kernel's heaps")                                    \
+  NODE(system_heaps_stats, HeapStats, (kHeap), kNone, (), "One of them")                           \
+  /* Large pages; a virtual machine's by the client id of its VMM leader. */                       \
+  NODE(memory_lpage_vmLPage, VmLargePages, (kClient), kNone, (), "The large pages behind one")     \
+  NODE(memory_lpage_nodeList_psharePool, LargePagePool, (kMemNode), kNone, (),                     \
+       "The pool for page sharing")                                                                \
+  NODE(memory_lpage_nodeList_vmPools, LargePagePool, (kMemNode, kPool), kPool, (kMemNode),         \
+       "The other pools")                                                                          \
+  /* Persistent memory. */                                                                         \
+  NODE(memory_pmem_volumes, None, (), kVolume, (), "The volumes")                                  \
+  NODE(memory_pmem_volumes_info, PmemVolume, (kVolume), kNone, (), "One of them")                  \
+  NODE(memory_pmem_volumes_regionStore_info, PmemRegionStore, (kVolume), kNone, (),                \
+       "Its store of regions")                                                                     \
+  NODE(memory_pmem_volumes_regionStore_isClean, IsClean, (kVolume), kNone, (),                     \
+       "Was the store closed in order?")                                                           \
+  NODE(memory_pmem_volumes_regionStore_regions, None, (), kRegion, (kVolume), "The regions")       \
+  NODE(memory_pmem_volumes_regionStore_regions_info, PmemRegion, (kVolume, kRegion), kNone, (),    \
+       "One of them")
+/* clang-format on */
 
-/* The host. */
-extern const uint16_t KSI_NODE_sched_globalStats_numVMs;                  /* uint32_t */
-extern const uint16_t KSI_NODE_sched_globalStats_memory_tally;            /* KSI_GlobalTally */
-extern const uint16_t KSI_NODE_sched_globalStats_memory_stateTransitions; /* [state name]
-                                                                           KSI_StateTransitions */
-extern const uint16_t KSI_NODE_memory_comprehensive;                      /* KSI_Comprehensive */
-extern const uint16_t KSI_NODE_memory_memInfo;                            /* KSI_MemInfo */
-extern const uint16_t KSI_NODE_memory_memNodes;            /* [memory node] KSI_MemNode */
-extern const uint16_t KSI_NODE_memory_pshare_stats;        /* KSI_PshareStats */
-extern const uint16_t KSI_NODE_system_buddy;               /* list of buddy names */
-extern const uint16_t KSI_NODE_system_buddy_comprehensive; /* [buddy name] KSI_BuddyStats */
-extern const uint16_t KSI_NODE_system_heaps;               /* list of heap names */
-extern const uint16_t KSI_NODE_system_heaps_stats;         /* [heap name] KSI_HeapStats */
-
-/* Large pages; the value of a pool is KSI_LargePagePool. */
-extern const uint16_t KSI_NODE_memory_lpage_vmLPage;             /* [VMM leader] KSI_VmLargePages */
-extern const uint16_t KSI_NODE_memory_lpage_nodeList_psharePool; /* [memory node] */
-/* [memory node] list of names; [memory node, name] a pool */
-extern const uint16_t KSI_NODE_memory_lpage_nodeList_vmPools;
-
-/* Persistent memory. */
-/* list of volume names */
-extern const uint16_t KSI_NODE_memory_pmem_volumes;
-/* [volume] KSI_PmemVolume */
-extern const uint16_t KSI_NODE_memory_pmem_volumes_info;
-/* [volume] KSI_PmemRegionStore */
-extern const uint16_t KSI_NODE_memory_pmem_volumes_regionStore_info;
-/* [volume] uint8_t: not 0 if the store is clean */
-extern const uint16_t KSI_NODE_memory_pmem_volumes_regionStore_isClean;
-/* [volume] list of region names */
-extern const uint16_t KSI_NODE_memory_pmem_volumes_regionStore_regions;
-/* [volume, region] KSI_PmemRegion */
-extern const uint16_t KSI_NODE_memory_pmem_volumes_regionStore_regions_info;
+#define KSI_NODE(name, record, keys, entries, listKeys, meaning) \
+  extern const uint16_t KSI_NODE_##name;
+KSI_NODES(KSI_NODE)
+#undef KSI_NODE
 
 #ifdef __cplusplus
 }

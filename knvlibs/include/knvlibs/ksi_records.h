@@ -1,9 +1,17 @@
 /* The records that are the values of the nodes (ksi_nodes.h).
  *
  * A record is what the kernel delivers: little-endian and packed, so fields lie at any offset and
- * are read by value, never through a pointer or a reference to the field. Bytes that no field
- * names are `unused` with their offset. Unless a comment says otherwise an all-ones memory figure
- * means that the kernel has no value.
+ * are read by value, never through a pointer or a reference to the field. Each is stated once, as a
+ * table KSI_RECORD_<name>, from which its struct KSI_<name>, the checks of its layout and all that
+ * is told of it derive. A line of a table is one of
+ *
+ *   FIELD(offset, type, name, unit, meaning)   the unit is "" where the meaning says it all;
+ *                                              "bits": a word of flags
+ *   TEXT(offset, size, name, meaning)          ends at the first NUL or at the field's size
+ *   GAP(offset, size)                          bytes of no known meaning: `unused<offset>`
+ *
+ * Units: KB are 1024 bytes, pages 4 KB where no other size is said. A figure for which the
+ * kernel has no value is KSI_NO_VALUE, or all ones in its own width.
  */
 #ifndef KNVLIBS_KSI_RECORDS_H_
 #define KNVLIBS_KSI_RECORDS_H_
@@ -14,6 +22,29 @@
 #if defined(__BYTE_ORDER__) && __BYTE_ORDER__ != __ORDER_LITTLE_ENDIAN__
 #error "the records are read as they lie, which takes a little-endian machine"
 #endif
+
+/* "No value": all ones, of a 64-bit and of a 32-bit figure; -1 in a signed one. */
+#define KSI_NO_VALUE UINT64_MAX
+#define KSI_NO_VALUE_32 UINT32_MAX
+
+/* A limit in KB stands for none if it is negative; one of a group's allocation also above
+ * KSI_GROUP_LARGEST_LIMIT, one of a user world from KSI_UW_NO_LIMIT on (compared unsigned). */
+#define KSI_GROUP_LARGEST_LIMIT INT64_C(0xFFFFFFFFF0)
+#define KSI_UW_NO_LIMIT UINT64_C(0x3FFFFFFF0)
+
+/* The memory states of a host, best first: STATE(number, identifier, name, title). */
+#define KSI_MEMORY_STATES(STATE)    \
+  STATE(0, HIGH, "high", "High")    \
+  STATE(1, CLEAR, "clear", "Clear") \
+  STATE(2, SOFT, "soft", "Soft")    \
+  STATE(3, HARD, "hard", "Hard")    \
+  STATE(4, LOW, "low", "Low")
+
+enum {
+#define KSI_STATE(number, identifier, name, title) KSI_MEMORY_STATE_##identifier = number,
+  KSI_MEMORY_STATES(KSI_STATE)
+#undef KSI_STATE
+};
 
 /* Bits of a scheduler group's flag word. */
 enum {
@@ -45,643 +76,470 @@ enum {
   KSI_PMEM_SYSTEM = 64
 };
 
-#pragma pack(push, 1)
+/* clang-format off */
 
 /* A scheduler group's name: ends at the first NUL or at the field's size. */
-struct KSI_GroupName {
-  char text[64];
-};
+#define KSI_RECORD_GroupName(FIELD, TEXT, GAP)                                                     \
+  TEXT(0, 64, text, "The name")
 
 /* A scheduler group's tag, likewise. */
-struct KSI_GroupTag {
-  char text[8];
-};
+#define KSI_RECORD_GroupTag(FIELD, TEXT, GAP)                                                      \
+  TEXT(0, 8, text, "The tag")
 
 /* A scheduler group's configured memory allocation. */
-struct KSI_GroupAllocation {
-  int64_t min; /* KB; reservation */
-  int64_t max; /* KB; limit, very large or -1: none */
-  int32_t shares;
-  int64_t minLimit; /* KB; bound of the reservation */
-  uint8_t unused28[4];
-};
+#define KSI_RECORD_GroupAllocation(FIELD, TEXT, GAP)                                               \
+  FIELD(0, int64_t, min, "KB", "Reservation")                                                      \
+  FIELD(8, int64_t, max, "KB", "Limit; KSI_GROUP_LARGEST_LIMIT")                                   \
+  FIELD(16, int32_t, shares, "", "Share of what is contended for")                                 \
+  FIELD(20, int64_t, minLimit, "KB", "Bound of the reservation")                                   \
+  GAP(28, 4)
 
 /* A scheduler group's reservation bookkeeping. */
-struct KSI_GroupCapacity {
-  uint8_t unused0[8];
-  uint64_t conResv;   /* KB; reserved by the children */
-  uint64_t availResv; /* KB; left to reserve */
-};
+#define KSI_RECORD_GroupCapacity(FIELD, TEXT, GAP)                                                 \
+  GAP(0, 8)                                                                                        \
+  FIELD(8, uint64_t, conResv, "KB", "Reserved by the children")                                    \
+  FIELD(16, uint64_t, availResv, "KB", "Left to reserve")
 
 /* A scheduler group's memory statistics. The peaks are since the last reset. */
-struct KSI_GroupMemoryStats {
-  uint8_t unused0[4];
-  uint64_t memSize; /* KB */
-  uint8_t unused12[8];
-  uint64_t ovhdResv; /* KB; reserved overhead */
-  uint64_t ovhd;     /* KB; consumed overhead */
-  uint8_t unused36[24];
-  uint64_t sharedSaved; /* KB; saved by page sharing */
-  uint8_t unused68[40];
-  uint64_t consumed; /* KB */
-  uint8_t unused116[24];
-  uint64_t touched; /* KB */
-  uint8_t unused148[8];
-  uint64_t bMin;     /* KB; base reservation */
-  uint64_t bMax;     /* KB; base limit */
-  uint64_t bShares;  /* base shares */
-  uint64_t fShares;  /* flattened base shares */
-  uint64_t iMin;     /* KB; implicit reservation */
-  uint64_t eMin;     /* KB; effective reservation */
-  uint64_t bActive;  /* KB; base activeness */
-  uint64_t allocTgt; /* KB; allocation target */
-  uint8_t unused220[16];
-  int64_t mps;       /* KB per share */
-  uint64_t rMinPeak; /* KB; peak of the requested reservation */
-  uint8_t unused252[8];
-  uint64_t eMinPeak; /* KB */
-  uint8_t unused268[8];
-  uint64_t consumedPeak; /* KB */
-  uint8_t unused284[8];
-  uint64_t memSizePeak; /* KB */
-  uint8_t unused300[8];
-  uint8_t throttlePct; /* % of time allowed to run */
-  uint8_t unused309[3];
-};
+#define KSI_RECORD_GroupMemoryStats(FIELD, TEXT, GAP)                                              \
+  GAP(0, 4)                                                                                        \
+  FIELD(4, uint64_t, memSize, "KB", "Address space in use")                                        \
+  GAP(12, 8)                                                                                       \
+  FIELD(20, uint64_t, ovhdResv, "KB", "Reserved overhead")                                         \
+  FIELD(28, uint64_t, ovhd, "KB", "Consumed overhead")                                             \
+  GAP(36, 24)                                                                                      \
+  FIELD(60, uint64_t, sharedSaved, "KB", "Saved by page sharing")                                  \
+  GAP(68, 40)                                                                                      \
+  FIELD(108, uint64_t, consumed, "KB", "Host memory in use")                                       \
+  GAP(116, 24)                                                                                     \
+  FIELD(140, uint64_t, touched, "KB", "Memory in active use, estimated")                           \
+  GAP(148, 8)                                                                                      \
+  FIELD(156, uint64_t, bMin, "KB", "Base reservation")                                             \
+  FIELD(164, uint64_t, bMax, "KB", "Base limit")                                                   \
+  FIELD(172, uint64_t, bShares, "", "Base shares")                                                 \
+  FIELD(180, uint64_t, fShares, "", "Base shares, flattened")                                      \
+  FIELD(188, uint64_t, iMin, "KB", "Implicit reservation")                                         \
+  FIELD(196, uint64_t, eMin, "KB", "Effective reservation")                                        \
+  FIELD(204, uint64_t, bActive, "KB", "Base activeness")                                           \
+  FIELD(212, uint64_t, allocTgt, "KB", "Allocation target")                                        \
+  GAP(220, 16)                                                                                     \
+  FIELD(236, int64_t, mps, "KB per share", "Memory for each share")                                \
+  FIELD(244, uint64_t, rMinPeak, "KB", "Peak of the requested reservation")                        \
+  GAP(252, 8)                                                                                      \
+  FIELD(260, uint64_t, eMinPeak, "KB", "Peak of eMin")                                             \
+  GAP(268, 8)                                                                                      \
+  FIELD(276, uint64_t, consumedPeak, "KB", "Peak of consumed")                                     \
+  GAP(284, 8)                                                                                      \
+  FIELD(292, uint64_t, memSizePeak, "KB", "Peak of memSize")                                       \
+  GAP(300, 8)                                                                                      \
+  FIELD(308, uint8_t, throttlePct, "%", "Part of the time that it may run")                        \
+  GAP(309, 3)
 
 /* What every memory client's tally has in common; no field of it is used yet. */
-struct KSI_CommonTally {
-  uint8_t unused0[264];
-};
+#define KSI_RECORD_CommonTally(FIELD, TEXT, GAP)                                                   \
+  GAP(0, 264)
 
 /* A virtual machine's memory, by the client id of its world group. */
-struct KSI_VmmTally {
-  uint8_t unused0[28];
-  uint64_t memSizeLimit; /* KB */
-  uint64_t memSize;      /* KB */
-  uint64_t touched;      /* KB */
-  uint8_t unused52[16];
-  uint64_t allocTgt; /* KB */
-  uint8_t unused76[24];
-  uint64_t vpmemRO; /* KB; persistent memory cached read-only */
-  uint8_t unused108[16];
-  uint64_t vpmemUC;     /* KB; persistent memory not yet cached */
-  uint64_t llswapped;   /* KB */
-  uint64_t zipSaved;    /* KB */
-  uint64_t shared;      /* KB */
-  uint64_t zero;        /* KB */
-  uint64_t llswapUsed;  /* KB */
-  uint64_t mapped;      /* KB */
-  uint64_t zipped;      /* KB */
-  uint64_t vpmemRW;     /* KB; persistent memory cached read-write */
-  uint64_t sharedSaved; /* KB */
-  uint8_t unused204[8];
-  uint64_t swapTgt; /* KB */
-  uint8_t unused220[8];
-  uint64_t swapScope;     /* a code */
-  uint8_t useReliableMem; /* flag */
-  uint8_t unused237[35];
-  uint8_t balloonActive; /* flag */
-  uint64_t ballooned;    /* KB */
-  uint64_t balloonTgt;   /* KB */
-  uint8_t unused289[43];
-};
+#define KSI_RECORD_VmmTally(FIELD, TEXT, GAP)                                                      \
+  GAP(0, 28)                                                                                       \
+  FIELD(28, uint64_t, memSizeLimit, "KB", "What the guest may grow to")                            \
+  FIELD(36, uint64_t, memSize, "KB", "Guest physical memory")                                      \
+  FIELD(44, uint64_t, touched, "KB", "Guest memory in active use")                                 \
+  GAP(52, 16)                                                                                      \
+  FIELD(68, uint64_t, allocTgt, "KB", "Allocation target")                                         \
+  GAP(76, 24)                                                                                      \
+  FIELD(100, uint64_t, vpmemRO, "KB", "Persistent memory cached read-only")                        \
+  GAP(108, 16)                                                                                     \
+  FIELD(124, uint64_t, vpmemUC, "KB", "Persistent memory not yet cached")                          \
+  FIELD(132, uint64_t, llswapped, "KB", "Swapped to llswap")                                       \
+  FIELD(140, uint64_t, zipSaved, "KB", "Saved by compression")                                     \
+  FIELD(148, uint64_t, shared, "KB", "Mapped memory that is marked COW by page sharing")           \
+  FIELD(156, uint64_t, zero, "KB", "Shared memory that is zero-filled")                            \
+  FIELD(164, uint64_t, llswapUsed, "KB", "Space used in llswap, fragments included")               \
+  FIELD(172, uint64_t, mapped, "KB", "Guest memory backed by host memory")                         \
+  FIELD(180, uint64_t, zipped, "KB", "Guest memory that is compressed")                            \
+  FIELD(188, uint64_t, vpmemRW, "KB", "Persistent memory cached read-write")                       \
+  FIELD(196, uint64_t, sharedSaved, "KB", "Saved by page sharing")                                 \
+  GAP(204, 8)                                                                                      \
+  FIELD(212, uint64_t, swapTgt, "KB", "Swap target")                                               \
+  GAP(220, 8)                                                                                      \
+  FIELD(228, uint64_t, swapScope, "code", "Where it is swapped to")                                \
+  FIELD(236, uint8_t, useReliableMem, "flag", "Placed in reliable memory")                         \
+  GAP(237, 35)                                                                                     \
+  FIELD(272, uint8_t, balloonActive, "flag", "The balloon driver runs")                            \
+  FIELD(273, uint64_t, ballooned, "KB", "Size of the balloon")                                     \
+  FIELD(281, uint64_t, balloonTgt, "KB", "Target size of the balloon")                             \
+  GAP(289, 43)
 
 /* A user world's memory, by the client id of its world group. */
-struct KSI_UwTally {
-  int64_t min;      /* KB */
-  int64_t max;      /* KB */
-  int64_t minLimit; /* KB */
-  int32_t shares;
-  int32_t memSizeLimit; /* KB */
-  uint8_t unused32[4];
-  uint64_t memSize; /* KB */
-  uint64_t touched; /* KB */
-  uint8_t unused52[16];
-  uint64_t allocTgt; /* KB */
-  uint8_t unused76[48];
-  uint64_t vpmemUC; /* KB */
-  uint8_t unused132[40];
-  uint64_t mapped; /* KB */
-  uint8_t unused180[8];
-  uint64_t vpmemRW;     /* KB */
-  uint64_t sharedSaved; /* KB */
-  uint8_t unused204[8];
-  uint64_t swapTgt; /* KB */
-  uint8_t unused220[8];
-  uint64_t swapScope;     /* a code */
-  uint8_t useReliableMem; /* flag */
-  uint8_t unused237[27];
-  uint64_t totalResv;      /* KB */
-  uint64_t pinnedResv;     /* KB */
-  uint64_t memBStore;      /* KB */
-  uint64_t swapBStore;     /* KB */
-  uint64_t swappable;      /* KB */
-  uint64_t pinned;         /* KB */
-  uint64_t cow;            /* KB */
-  uint64_t pageable;       /* KB */
-  uint64_t pageableUnacct; /* KB */
-  uint64_t swapped;        /* KB */
-  uint64_t prealloced;     /* KB */
-  uint64_t shm;            /* KB */
-};
+#define KSI_RECORD_UwTally(FIELD, TEXT, GAP)                                                       \
+  FIELD(0, int64_t, min, "KB", "Reservation")                                                      \
+  FIELD(8, int64_t, max, "KB", "Limit; KSI_UW_NO_LIMIT")                                           \
+  FIELD(16, int64_t, minLimit, "KB", "Bound of the reservation; KSI_UW_NO_LIMIT")                  \
+  FIELD(24, int32_t, shares, "", "Share of what is contended for")                                 \
+  FIELD(28, int32_t, memSizeLimit, "KB", "What the address space may grow to")                     \
+  GAP(32, 4)                                                                                       \
+  FIELD(36, uint64_t, memSize, "KB", "Address space")                                              \
+  FIELD(44, uint64_t, touched, "KB", "Memory in active use")                                       \
+  GAP(52, 16)                                                                                      \
+  FIELD(68, uint64_t, allocTgt, "KB", "Allocation target")                                         \
+  GAP(76, 48)                                                                                      \
+  FIELD(124, uint64_t, vpmemUC, "KB", "Persistent memory not yet cached")                          \
+  GAP(132, 40)                                                                                     \
+  FIELD(172, uint64_t, mapped, "KB", "Address space backed by host memory")                        \
+  GAP(180, 8)                                                                                      \
+  FIELD(188, uint64_t, vpmemRW, "KB", "Persistent memory cached read-write")                       \
+  FIELD(196, uint64_t, sharedSaved, "KB", "Saved by page sharing")                                 \
+  GAP(204, 8)                                                                                      \
+  FIELD(212, uint64_t, swapTgt, "KB", "Swap target")                                               \
+  GAP(220, 8)                                                                                      \
+  FIELD(228, uint64_t, swapScope, "code", "Where it is swapped to")                                \
+  FIELD(236, uint8_t, useReliableMem, "flag", "Placed in reliable memory")                         \
+  GAP(237, 27)                                                                                     \
+  FIELD(264, uint64_t, totalResv, "KB", "Reserved in all")                                         \
+  FIELD(272, uint64_t, pinnedResv, "KB", "Reserved for pinning")                                   \
+  FIELD(280, uint64_t, memBStore, "KB", "Backing store in memory")                                 \
+  FIELD(288, uint64_t, swapBStore, "KB", "Backing store in swap")                                  \
+  FIELD(296, uint64_t, swappable, "KB", "Mapped, not shared, can be reclaimed")                    \
+  FIELD(304, uint64_t, pinned, "KB", "Mapped, cannot be swapped")                                  \
+  FIELD(312, uint64_t, cow, "KB", "Marked copy-on-write")                                          \
+  FIELD(320, uint64_t, pageable, "KB", "Pageable, accounted")                                      \
+  FIELD(328, uint64_t, pageableUnacct, "KB", "Pageable, not accounted")                            \
+  FIELD(336, uint64_t, swapped, "KB", "Swapped to secondary storage")                              \
+  FIELD(344, uint64_t, prealloced, "KB", "Allocated beforehand")                                   \
+  FIELD(352, uint64_t, shm, "KB", "Shared memory objects")
 
 /* What a virtual machine's guest reports of itself; all ones: not known. */
-struct KSI_GuestTally {
-  uint64_t memTotal;   /* KB */
-  uint32_t lpageTotal; /* large pages */
-  uint64_t memNeeded;  /* KB */
-};
+#define KSI_RECORD_GuestTally(FIELD, TEXT, GAP)                                                    \
+  FIELD(0, uint64_t, memTotal, "KB", "Memory that the guest sees")                                 \
+  FIELD(8, uint32_t, lpageTotal, "large pages", "Large pages for the guest's programs")            \
+  FIELD(12, uint64_t, memNeeded, "KB", "What its present work needs")
 
 /* A virtual machine's host swapping, by the client id of its VMM leader. */
-struct KSI_SwapInfo {
-  uint8_t isSwapping; /* flag */
-  uint64_t swapTgt;   /* KB */
-  uint64_t swapped;   /* KB */
-  uint64_t swapRead;  /* KB */
-  uint64_t swapIn;    /* KB */
-  uint64_t swapOut;   /* KB */
-  uint8_t unused41[16];
-  uint64_t gblSwapRead; /* KB */
-  uint64_t gblSwapIn;   /* KB */
-  uint64_t gblSwapOut;  /* KB */
-  uint64_t COWSwapper;  /* KB */
-  uint64_t discarded;   /* KB */
-  uint32_t vmmSwapOn;   /* times */
-  uint32_t knvSwapOn;   /* times */
-  uint32_t curSwapper;  /* 0: vmm, else knv */
-  uint8_t unused109[28];
-  uint64_t totalReg;   /* KB */
-  uint64_t freeReg;    /* KB */
-  uint64_t cptTgt;     /* KB */
-  uint64_t cptRead;    /* KB */
-  uint64_t cptWritten; /* KB */
-  uint64_t totalMig;   /* KB */
-  uint64_t freeMig;    /* KB */
-  uint32_t cacheUsage; /* KB */
-  uint8_t unused197[12];
-  uint64_t swapoutReady; /* ready time */
-  uint8_t unused217[3];
-};
+#define KSI_RECORD_SwapInfo(FIELD, TEXT, GAP)                                                      \
+  FIELD(0, uint8_t, isSwapping, "flag", "It is being swapped out now")                             \
+  FIELD(1, uint64_t, swapTgt, "KB", "Swap target")                                                 \
+  FIELD(9, uint64_t, swapped, "KB", "Swapped by the host")                                         \
+  FIELD(17, uint64_t, swapRead, "KB", "Ever read from swap and kept there")                        \
+  FIELD(25, uint64_t, swapIn, "KB", "Ever swapped in and released there")                          \
+  FIELD(33, uint64_t, swapOut, "KB", "Ever swapped out")                                           \
+  GAP(41, 16)                                                                                      \
+  FIELD(57, uint64_t, gblSwapRead, "KB", "swapRead of the global swap file")                       \
+  FIELD(65, uint64_t, gblSwapIn, "KB", "swapIn of the global swap file")                           \
+  FIELD(73, uint64_t, gblSwapOut, "KB", "swapOut of the global swap file")                         \
+  FIELD(81, uint64_t, COWSwapper, "KB", "Swapped out while marked COW")                            \
+  FIELD(89, uint64_t, discarded, "KB", "Swapped memory that was discarded")                        \
+  FIELD(97, uint32_t, vmmSwapOn, "times", "The vmm swapper was turned on")                         \
+  FIELD(101, uint32_t, knvSwapOn, "times", "The knv swapper was turned on")                        \
+  FIELD(105, uint32_t, curSwapper, "code", "Active swapper; 0: vmm, else knv")                     \
+  GAP(109, 28)                                                                                     \
+  FIELD(137, uint64_t, totalReg, "KB", "Size of the regular swap file")                            \
+  FIELD(145, uint64_t, freeReg, "KB", "Free in the regular swap file")                             \
+  FIELD(153, uint64_t, cptTgt, "KB", "Checkpoint memory to read")                                  \
+  FIELD(161, uint64_t, cptRead, "KB", "Checkpoint memory read")                                    \
+  FIELD(169, uint64_t, cptWritten, "KB", "Checkpoint memory written")                              \
+  FIELD(177, uint64_t, totalMig, "KB", "Size of the migration swap file")                          \
+  FIELD(185, uint64_t, freeMig, "KB", "Free in the migration swap file")                           \
+  FIELD(193, uint32_t, cacheUsage, "KB", "Cache of swap slots in use")                             \
+  GAP(197, 12)                                                                                     \
+  FIELD(209, uint64_t, swapoutReady, "", "Ready time spent by swapping out")                       \
+  GAP(217, 3)
 
 /* A virtual machine's compression cache, by the client id of its world group. */
-struct KSI_MemzipInfo {
-  uint64_t totalCache;    /* KB */
-  uint64_t usedCache;     /* KB */
-  uint64_t maxCache;      /* KB */
-  uint32_t nrFreeHalf;    /* half pages */
-  uint32_t nrFreeQuarter; /* quarter pages */
-  uint64_t zipped;        /* KB */
-  uint64_t unZipped;      /* KB */
-  uint8_t unused48[8];
-  uint64_t zipRejected; /* KB */
-  uint8_t unused64[16];
-  uint64_t avgZipTime; /* microseconds */
-  uint8_t unused88[16];
-  uint64_t avgUnzipTime; /* microseconds */
-  uint8_t unused112[24];
-};
+#define KSI_RECORD_MemzipInfo(FIELD, TEXT, GAP)                                                    \
+  FIELD(0, uint64_t, totalCache, "KB", "Cache as configured")                                      \
+  FIELD(8, uint64_t, usedCache, "KB", "Cache in use")                                              \
+  FIELD(16, uint64_t, maxCache, "KB", "Cache at most")                                             \
+  FIELD(24, uint32_t, nrFreeHalf, "half pages", "Free halves of pages")                            \
+  FIELD(28, uint32_t, nrFreeQuarter, "quarter pages", "Free quarters of pages")                    \
+  FIELD(32, uint64_t, zipped, "KB", "Ever compressed")                                             \
+  FIELD(40, uint64_t, unZipped, "KB", "Ever decompressed")                                         \
+  GAP(48, 8)                                                                                       \
+  FIELD(56, uint64_t, zipRejected, "KB", "Ever found not worth compressing")                       \
+  GAP(64, 16)                                                                                      \
+  FIELD(80, uint64_t, avgZipTime, "us", "To compress a page, on average")                          \
+  GAP(88, 16)                                                                                      \
+  FIELD(104, uint64_t, avgUnzipTime, "us", "To decompress a page, on average")                     \
+  GAP(112, 24)
 
 /* Pages of one remap type of a memory client. */
-struct KSI_RemapType {
-  uint64_t added;       /* pages ever */
-  uint64_t filtered;    /* pages ever */
-  uint64_t prepared;    /* pages ever */
-  uint64_t staged;      /* pages ever */
-  uint64_t canceled;    /* pages ever */
-  uint64_t remapped;    /* pages ever */
-  uint64_t cUnprepared; /* pages now */
-  uint64_t cPrepared;   /* pages now */
-  uint64_t cStaged;     /* pages now */
-  uint8_t unused72[8];
-};
+#define KSI_RECORD_RemapType(FIELD, TEXT, GAP)                                                     \
+  FIELD(0, uint64_t, added, "pages", "Ever added")                                                 \
+  FIELD(8, uint64_t, filtered, "pages", "Ever filtered out")                                       \
+  FIELD(16, uint64_t, prepared, "pages", "Ever prepared")                                          \
+  FIELD(24, uint64_t, staged, "pages", "Ever staged")                                              \
+  FIELD(32, uint64_t, canceled, "pages", "Ever canceled")                                          \
+  FIELD(40, uint64_t, remapped, "pages", "Ever remapped")                                          \
+  FIELD(48, uint64_t, cUnprepared, "pages", "Unprepared now")                                      \
+  FIELD(56, uint64_t, cPrepared, "pages", "Prepared now")                                          \
+  FIELD(64, uint64_t, cStaged, "pages", "Staged now")                                              \
+  GAP(72, 8)
 
 /* Host-wide memory statistics of the scheduler. */
-struct KSI_GlobalTally {
-  uint8_t unused0[12];
-  uint64_t managedByMemSched; /* KB */
-  uint8_t unused20[16];
-  uint64_t minFree; /* KB */
-  uint8_t unused44[24];
-  uint32_t memState; /* 0 high, 1 clear, 2 soft, 3 hard, 4 low */
-  uint8_t unused72[280];
-};
+#define KSI_RECORD_GlobalTally(FIELD, TEXT, GAP)                                                   \
+  GAP(0, 12)                                                                                       \
+  FIELD(12, uint64_t, managedByMemSched, "KB", "Managed by the memory scheduler")                  \
+  GAP(20, 16)                                                                                      \
+  FIELD(36, uint64_t, minFree, "KB", "Free memory that it keeps to")                               \
+  GAP(44, 24)                                                                                      \
+  FIELD(68, uint32_t, memState, "state", "KSI_MEMORY_STATE_ now")                                  \
+  GAP(72, 280)
 
 /* How often the host left one memory state. */
-struct KSI_StateTransitions {
-  uint8_t unused0[4];
-  uint32_t up; /* times to the next better state */
-  uint8_t unused8[12];
-  uint32_t down; /* times to the next worse state */
-  uint8_t unused24[8];
-};
+#define KSI_RECORD_StateTransitions(FIELD, TEXT, GAP)                                              \
+  GAP(0, 4)                                                                                        \
+  FIELD(4, uint32_t, up, "times", "Left for the next better state")                                \
+  GAP(8, 12)                                                                                       \
+  FIELD(20, uint32_t, down, "times", "Left for the next worse state")                              \
+  GAP(24, 8)
 
 /* How the host's physical memory is divided. */
-struct KSI_Comprehensive {
-  uint64_t total;             /* KB */
-  uint64_t managedByMemMap;   /* KB */
-  uint64_t reliableMem;       /* KB */
-  uint64_t discarded;         /* KB */
-  uint64_t critical;          /* KB */
-  uint64_t buddyOvhd;         /* KB */
-  uint64_t kernelCode;        /* KB */
-  uint64_t dataAndHeap;       /* KB */
-  uint64_t knvClientConsumed; /* KB */
-  uint64_t otherConsumed;     /* KB */
-  uint64_t rsvdLow;           /* KB */
-  uint64_t free;              /* KB */
-};
+#define KSI_RECORD_Comprehensive(FIELD, TEXT, GAP)                                                 \
+  FIELD(0, uint64_t, total, "KB", "Physical memory")                                               \
+  FIELD(8, uint64_t, managedByMemMap, "KB", "Managed by the memory map")                           \
+  FIELD(16, uint64_t, reliableMem, "KB", "Reliable memory")                                        \
+  FIELD(24, uint64_t, discarded, "KB", "Discarded by the kernel")                                  \
+  FIELD(32, uint64_t, critical, "KB", "Space for critical allocations")                            \
+  FIELD(40, uint64_t, buddyOvhd, "KB", "Overhead of the buddy allocators")                         \
+  FIELD(48, uint64_t, kernelCode, "KB", "Code of the kernel")                                      \
+  FIELD(56, uint64_t, dataAndHeap, "KB", "Data and heaps of the kernel")                           \
+  FIELD(64, uint64_t, knvClientConsumed, "KB", "In use by clients of the kernel")                  \
+  FIELD(72, uint64_t, otherConsumed, "KB", "In use by others")                                     \
+  FIELD(80, uint64_t, rsvdLow, "KB", "Low memory that is reserved")                                \
+  FIELD(88, uint64_t, free, "KB", "Free memory")
 
 /* The host's memory hardware. */
-struct KSI_MemInfo {
-  uint8_t unused0[20];
-  uint32_t numNodes; /* memory nodes */
-  uint8_t unused24[8];
-};
+#define KSI_RECORD_MemInfo(FIELD, TEXT, GAP)                                                       \
+  GAP(0, 20)                                                                                       \
+  FIELD(20, uint32_t, numNodes, "", "Memory nodes")                                                \
+  GAP(24, 8)
 
 /* A memory node. */
-struct KSI_MemNode {
-  uint8_t numaNode; /* NUMA node it belongs to */
-  uint8_t unused1[27];
-};
+#define KSI_RECORD_MemNode(FIELD, TEXT, GAP)                                                       \
+  FIELD(0, uint8_t, numaNode, "", "The NUMA node that it belongs to")                              \
+  GAP(1, 27)
 
 /* Page sharing, host-wide. */
-struct KSI_PshareStats {
-  uint64_t cow;  /* pages */
-  uint64_t cow1; /* pages with one reference */
-  uint64_t zero; /* pages */
-  uint8_t unused24[8];
-  uint64_t used;              /* pages */
-  uint64_t reclaimed;         /* pages */
-  uint64_t totAdd;            /* pages */
-  uint64_t totRemove;         /* pages */
-  uint64_t hintsActive;       /* pages */
-  uint64_t hintsAdded;        /* pages */
-  uint64_t hintsRemoved;      /* pages */
-  uint64_t lpageHintsAdded;   /* pages */
-  uint64_t lpageHintsRemoved; /* pages */
-  uint8_t unused104[64];
-  uint64_t peakChainLength;
-  uint64_t peakChainIndex;
-  uint64_t peakRefCount;
-  uint8_t unused192[16];
-};
+#define KSI_RECORD_PshareStats(FIELD, TEXT, GAP)                                                   \
+  FIELD(0, uint64_t, cow, "pages", "Client memory marked copy-on-write")                           \
+  FIELD(8, uint64_t, cow1, "pages", "Of cow: with a single reference")                             \
+  FIELD(16, uint64_t, zero, "pages", "Client memory that is zero-filled")                          \
+  GAP(24, 8)                                                                                       \
+  FIELD(32, uint64_t, used, "pages", "Host memory behind cow")                                     \
+  FIELD(40, uint64_t, reclaimed, "pages", "Host memory reclaimed by sharing")                      \
+  FIELD(48, uint64_t, totAdd, "pages", "Ever added to the table")                                  \
+  FIELD(56, uint64_t, totRemove, "pages", "Ever removed from the table")                           \
+  FIELD(64, uint64_t, hintsActive, "pages", "Hints now")                                           \
+  FIELD(72, uint64_t, hintsAdded, "pages", "Hints ever added")                                     \
+  FIELD(80, uint64_t, hintsRemoved, "pages", "Hints ever removed")                                 \
+  FIELD(88, uint64_t, lpageHintsAdded, "pages", "Hints of large pages ever added")                 \
+  FIELD(96, uint64_t, lpageHintsRemoved, "pages", "Hints of large pages ever removed")             \
+  GAP(104, 64)                                                                                     \
+  FIELD(168, uint64_t, peakChainLength, "", "Longest chain of the table")                          \
+  FIELD(176, uint64_t, peakChainIndex, "", "Where that chain stands")                              \
+  FIELD(184, uint64_t, peakRefCount, "", "Most references to one page")                            \
+  GAP(192, 16)
 
 /* The free and used buffers of one size of a buddy allocator. */
-struct KSI_BuddyBuffers {
-  uint32_t free;
-  uint32_t used;
-  uint8_t unused8[4];
-};
+#define KSI_RECORD_BuddyBuffers(FIELD, TEXT, GAP)                                                  \
+  FIELD(0, uint32_t, free, "buffers", "Free")                                                      \
+  FIELD(4, uint32_t, used, "buffers", "In use")                                                    \
+  GAP(8, 4)
 
-/* Buffer sizes of a buddy allocator: 4 KB, each twice the one before, up to 1 GB. */
-enum { KSI_BUDDY_SIZES = 19 };
+/* The buffer sizes of a buddy allocator, in the order of its record: each twice the one before. */
+#define KSI_BUDDY_SIZE_TABLE(SIZE)                                                                 \
+  SIZE("4KB") SIZE("8KB") SIZE("16KB") SIZE("32KB") SIZE("64KB") SIZE("128KB") SIZE("256KB")       \
+  SIZE("512KB") SIZE("1MB") SIZE("2MB") SIZE("4MB") SIZE("8MB") SIZE("16MB") SIZE("32MB")          \
+  SIZE("64MB") SIZE("128MB") SIZE("256MB") SIZE("512MB") SIZE("1GB")
+
+/* A kernel heap. */
+#define KSI_RECORD_HeapStats(FIELD, TEXT, GAP)                                                     \
+  TEXT(0, 36, name, "The name")                                                                    \
+  FIELD(36, uint8_t, dynGrow, "flag", "It may grow")                                               \
+  GAP(37, 4)                                                                                       \
+  FIELD(41, uint32_t, lowerLimit, "", "Lower limit of its addresses")                              \
+  FIELD(45, uint32_t, upperLimit, "", "Upper limit of its addresses")                              \
+  FIELD(49, uint8_t, reserved, "", "Reserved")                                                     \
+  GAP(50, 8)                                                                                       \
+  FIELD(58, uint32_t, numRanges, "", "Ranges that it consists of")                                 \
+  FIELD(62, uint32_t, dlMallocOvdh, "bytes", "Overhead of the allocator")                          \
+  FIELD(66, uint32_t, size, "bytes", "Size now")                                                   \
+  FIELD(70, uint32_t, initial, "bytes", "Size at first")                                           \
+  GAP(74, 4)                                                                                       \
+  FIELD(78, uint32_t, avail, "bytes", "Free now")                                                  \
+  GAP(82, 4)                                                                                       \
+  FIELD(86, uint32_t, pctFreeOfCur, "%", "Free part of size")                                      \
+  GAP(90, 4)                                                                                       \
+  FIELD(94, uint32_t, max, "bytes", "What it may grow to")                                         \
+  FIELD(98, uint32_t, maxAvail, "bytes", "Free if grown so far")                                   \
+  FIELD(102, uint32_t, pctFreeOfMax, "%", "Free part of max")                                      \
+  FIELD(106, uint32_t, lowPctFreeOfMax, "%", "Lowest pctFreeOfMax ever")                           \
+  GAP(110, 4)                                                                                      \
+  FIELD(114, uint32_t, numSuccAllocs, "times", "Allocations that succeeded")                       \
+  FIELD(118, uint32_t, numFailAllocs, "times", "Allocations that failed")                          \
+  GAP(122, 4)                                                                                      \
+  FIELD(126, uint32_t, avgAllocSize, "bytes", "An allocation, on average")                         \
+  FIELD(130, uint32_t, numReqsPerGrowth, "times", "Requests for each growth")                      \
+  FIELD(134, uint32_t, numGrowthOps, "times", "It has grown")                                      \
+  FIELD(138, uint32_t, numShrinkOps, "times", "It has shrunk")                                     \
+  GAP(142, 2)
+
+/* A virtual machine's large pages, by the client id of its VMM leader. */
+#define KSI_RECORD_VmLargePages(FIELD, TEXT, GAP)                                                  \
+  FIELD(0, uint32_t, nrBackings, "large pages", "Backed by large pages now")                       \
+  FIELD(4, uint32_t, maxSwapThreshold, "pages", "Most swapped pages to map a large one")           \
+  FIELD(8, uint64_t, nrAllocSuccess, "times", "Mapping succeeded")                                 \
+  FIELD(16, uint64_t, nrFailPinned, "times", "Mapping failed: pinned pages")                       \
+  FIELD(24, uint64_t, nrFailSwapped, "times", "Mapping failed: too much to swap in")               \
+  FIELD(32, uint64_t, nrFailPinnedLate, "times", "Mapping failed: pages pinned late")              \
+  GAP(40, 16)                                                                                      \
+  FIELD(56, uint64_t, nrFailNoMem, "times", "Mapping failed: no memory")                           \
+  GAP(64, 8)                                                                                       \
+  FIELD(72, uint32_t, nrLocked, "times", "A mapping of the guest was made")                        \
+  FIELD(76, uint64_t, nrBroken, "times", "A mapping of the guest was broken up")
+
+/* A pool of large pages on one memory node. */
+#define KSI_RECORD_LargePagePool(FIELD, TEXT, GAP)                                                 \
+  FIELD(0, uint32_t, nrLPages, "2 MB pages", "Large pages in the pool")                            \
+  FIELD(4, uint32_t, nrFreeSPages, "4 KB pages", "Small pages of them that are free")              \
+  FIELD(8, uint64_t, nrSPageAllocs, "pages", "Small pages ever allocated")                         \
+  FIELD(16, uint64_t, nrSPageFrees, "pages", "Small pages ever freed")                             \
+  FIELD(24, uint64_t, nrReapAttempts, "times", "Reaping was tried")                                \
+  FIELD(32, uint64_t, nrSPagesReaped, "pages", "Small pages ever reaped")                          \
+  FIELD(40, uint64_t, nrDefragAttempts, "times", "Defragmenting was tried")                        \
+  GAP(48, 8)                                                                                       \
+  FIELD(56, uint64_t, nrDefragCancelled, "times", "Defragmenting was given up")                    \
+  FIELD(64, uint64_t, nrDefragReaped, "pages", "Pages reaped by defragmenting")                    \
+  FIELD(72, uint64_t, nrLPagesDefragged, "pages", "Large pages defragmented")                      \
+  FIELD(80, uint64_t, peakDefragAttempts, "times", "Most tries for one large page")                \
+  FIELD(88, uint64_t, nrCachehit, "times", "Found in the cache of victims")
+
+/* A persistent memory volume; no field of it is used yet. */
+#define KSI_RECORD_PmemVolume(FIELD, TEXT, GAP)                                                    \
+  GAP(0, 40)
+
+/* The region store of a persistent memory volume. */
+#define KSI_RECORD_PmemRegionStore(FIELD, TEXT, GAP)                                               \
+  FIELD(0, uint64_t, alloc2MBlocks, "2 MB blocks", "Allocated")                                    \
+  FIELD(8, uint64_t, resvd2MBlocks, "2 MB blocks", "Reserved")                                     \
+  FIELD(16, uint64_t, avail2MBlocks, "2 MB blocks", "Left to reserve")                             \
+  FIELD(24, uint32_t, totalRegions, "", "Regions that it has room for")                            \
+  FIELD(28, uint32_t, freeRegions, "", "Regions not in use")                                       \
+  FIELD(32, uint64_t, total2MBlocks, "2 MB blocks", "All blocks")
+
+/* A region of a persistent memory volume. */
+#define KSI_RECORD_PmemRegion(FIELD, TEXT, GAP)                                                    \
+  GAP(0, 37)                                                                                       \
+  FIELD(37, uint64_t, size, "bytes", "Memory of the region")                                       \
+  FIELD(45, uint64_t, reserved, "2 MB blocks", "Reserved")                                         \
+  FIELD(53, uint32_t, flags, "bits", "KSI_PMEM_ bits")                                             \
+  GAP(57, 3)
+
+/* Values that are one number: NUMBER(name, type, field, unit, meaning); KSI_<name> is the type. */
+#define KSI_NUMBERS(NUMBER)                                                                        \
+  NUMBER(ParentGroupID, int64_t, parentGroupID, "", "Group above this one; -1: none")              \
+  NUMBER(GroupFlags, uint32_t, groupFlags, "bits", "KSI_GROUP_ bits")                              \
+  NUMBER(GroupLeaderID, int32_t, groupLeaderID, "", "World group that leads the group")            \
+  NUMBER(VmmLeaderID, int32_t, vmmLeaderID, "", "VMM leader of a world group")                     \
+  NUMBER(NumVMs, uint32_t, numVMs, "", "Virtual machines on the host")                             \
+  NUMBER(IsClean, uint8_t, isClean, "flag", "The store was closed in order")
+
+/* All records with their sizes in bytes. A buddy's stands apart: its buffers are an array. */
+#define KSI_RECORDS(RECORD)                                                                        \
+  RECORD(GroupName, 64)                                                                            \
+  RECORD(GroupTag, 8)                                                                              \
+  RECORD(GroupAllocation, 32)                                                                      \
+  RECORD(GroupCapacity, 24)                                                                        \
+  RECORD(GroupMemoryStats, 312)                                                                    \
+  RECORD(CommonTally, 264)                                                                         \
+  RECORD(VmmTally, 332)                                                                            \
+  RECORD(UwTally, 360)                                                                             \
+  RECORD(GuestTally, 20)                                                                           \
+  RECORD(SwapInfo, 220)                                                                            \
+  RECORD(MemzipInfo, 136)                                                                          \
+  RECORD(RemapType, 80)                                                                            \
+  RECORD(GlobalTally, 352)                                                                         \
+  RECORD(StateTransitions, 32)                                                                     \
+  RECORD(Comprehensive, 96)                                                                        \
+  RECORD(MemInfo, 32)                                                                              \
+  RECORD(MemNode, 28)                                                                              \
+  RECORD(PshareStats, 208)                                                                         \
+  RECORD(BuddyBuffers, 12)                                                                         \
+  RECORD(HeapStats, 144)                                                                           \
+  RECORD(VmLargePages, 84)                                                                         \
+  RECORD(LargePagePool, 96)                                                                        \
+  RECORD(PmemVolume, 40)                                                                           \
+  RECORD(PmemRegionStore, 40)                                                                      \
+  RECORD(PmemRegion, 60)
+/* clang-format on */
+
+#define KSI_FIELD(offset, type, name, unit, meaning) type name;
+#define KSI_TEXT(offset, size, name, meaning) char name[size];
+#define KSI_GAP(offset, size) uint8_t unused##offset[size];
+#define KSI_STRUCT(record, size)                      \
+  struct KSI_##record {                               \
+    KSI_RECORD_##record(KSI_FIELD, KSI_TEXT, KSI_GAP) \
+  };
+#define KSI_NUMBER(record, type, name, unit, meaning) typedef type KSI_##record;
+
+#pragma pack(push, 1)
+KSI_RECORDS(KSI_STRUCT)
 
 /* A buddy allocator. */
+#define KSI_COUNT(size) +1
+enum { KSI_BUDDY_SIZES = 0 KSI_BUDDY_SIZE_TABLE(KSI_COUNT) };
 struct KSI_BuddyStats {
   uint8_t unused0[8];
   struct KSI_BuddyBuffers buffers[KSI_BUDDY_SIZES];
 };
-
-/* A kernel heap. */
-struct KSI_HeapStats {
-  char name[36];
-  uint8_t dynGrow; /* flag */
-  uint8_t unused37[4];
-  uint32_t lowerLimit;
-  uint32_t upperLimit;
-  uint8_t reserved;
-  uint8_t unused50[8];
-  uint32_t numRanges;
-  uint32_t dlMallocOvdh; /* bytes */
-  uint32_t size;         /* bytes */
-  uint32_t initial;      /* bytes */
-  uint8_t unused74[4];
-  uint32_t avail; /* bytes */
-  uint8_t unused82[4];
-  uint32_t pctFreeOfCur; /* % */
-  uint8_t unused90[4];
-  uint32_t max;             /* bytes */
-  uint32_t maxAvail;        /* bytes */
-  uint32_t pctFreeOfMax;    /* % */
-  uint32_t lowPctFreeOfMax; /* % */
-  uint8_t unused110[4];
-  uint32_t numSuccAllocs; /* times */
-  uint32_t numFailAllocs; /* times */
-  uint8_t unused122[4];
-  uint32_t avgAllocSize;     /* bytes */
-  uint32_t numReqsPerGrowth; /* times */
-  uint32_t numGrowthOps;     /* times */
-  uint32_t numShrinkOps;     /* times */
-  uint8_t unused142[2];
-};
-
-/* A virtual machine's large pages, by the client id of its VMM leader. */
-struct KSI_VmLargePages {
-  uint32_t nrBackings;       /* large pages */
-  uint32_t maxSwapThreshold; /* pages */
-  uint64_t nrAllocSuccess;   /* times */
-  uint64_t nrFailPinned;     /* times */
-  uint64_t nrFailSwapped;    /* times */
-  uint64_t nrFailPinnedLate; /* times */
-  uint8_t unused40[16];
-  uint64_t nrFailNoMem; /* times */
-  uint8_t unused64[8];
-  uint32_t nrLocked; /* times */
-  uint64_t nrBroken; /* times */
-};
-
-/* A pool of large pages on one memory node. */
-struct KSI_LargePagePool {
-  uint32_t nrLPages;         /* 2 MB pages */
-  uint32_t nrFreeSPages;     /* 4 KB pages */
-  uint64_t nrSPageAllocs;    /* pages */
-  uint64_t nrSPageFrees;     /* pages */
-  uint64_t nrReapAttempts;   /* times */
-  uint64_t nrSPagesReaped;   /* pages */
-  uint64_t nrDefragAttempts; /* times */
-  uint8_t unused48[8];
-  uint64_t nrDefragCancelled;  /* times */
-  uint64_t nrDefragReaped;     /* pages */
-  uint64_t nrLPagesDefragged;  /* pages */
-  uint64_t peakDefragAttempts; /* times */
-  uint64_t nrCachehit;         /* times */
-};
-
-/* A persistent memory volume; no field of it is used yet. */
-struct KSI_PmemVolume {
-  uint8_t unused0[40];
-};
-
-/* The region store of a persistent memory volume. */
-struct KSI_PmemRegionStore {
-  uint64_t alloc2MBlocks; /* 2 MB blocks */
-  uint64_t resvd2MBlocks; /* 2 MB blocks */
-  uint64_t avail2MBlocks; /* 2 MB blocks */
-  uint32_t totalRegions;
-  uint32_t freeRegions;
-  uint64_t total2MBlocks; /* 2 MB blocks */
-};
-
-/* A region of a persistent memory volume. */
-struct KSI_PmemRegion {
-  uint8_t unused0[37];
-  uint64_t size;     /* bytes */
-  uint64_t reserved; /* 2 MB blocks */
-  uint32_t flags;    /* bits, from 0: allocated, deleting, locked, readOnly, blockDev, persistResv,
-                        system */
-  uint8_t unused57[3];
-};
-
 #pragma pack(pop)
 
-#ifdef __cplusplus
-#define KSI_AT(record, field, at) \
-  static_assert(offsetof(struct record, field) == (at), #record "." #field)
-#define KSI_SIZE(record, size) static_assert(sizeof(struct record) == (size), #record)
-#else
-#define KSI_AT(record, field, at) \
-  _Static_assert(offsetof(struct record, field) == (at), #record "." #field)
-#define KSI_SIZE(record, size) _Static_assert(sizeof(struct record) == (size), #record)
-#endif
+KSI_NUMBERS(KSI_NUMBER)
 
-KSI_AT(KSI_GroupName, text, 0);
-KSI_SIZE(KSI_GroupName, 64);
-KSI_AT(KSI_GroupTag, text, 0);
-KSI_SIZE(KSI_GroupTag, 8);
-KSI_AT(KSI_GroupAllocation, min, 0);
-KSI_AT(KSI_GroupAllocation, max, 8);
-KSI_AT(KSI_GroupAllocation, shares, 16);
-KSI_AT(KSI_GroupAllocation, minLimit, 20);
-KSI_SIZE(KSI_GroupAllocation, 32);
-KSI_AT(KSI_GroupCapacity, conResv, 8);
-KSI_AT(KSI_GroupCapacity, availResv, 16);
-KSI_SIZE(KSI_GroupCapacity, 24);
-KSI_AT(KSI_GroupMemoryStats, memSize, 4);
-KSI_AT(KSI_GroupMemoryStats, ovhdResv, 20);
-KSI_AT(KSI_GroupMemoryStats, ovhd, 28);
-KSI_AT(KSI_GroupMemoryStats, sharedSaved, 60);
-KSI_AT(KSI_GroupMemoryStats, consumed, 108);
-KSI_AT(KSI_GroupMemoryStats, touched, 140);
-KSI_AT(KSI_GroupMemoryStats, bMin, 156);
-KSI_AT(KSI_GroupMemoryStats, bMax, 164);
-KSI_AT(KSI_GroupMemoryStats, bShares, 172);
-KSI_AT(KSI_GroupMemoryStats, fShares, 180);
-KSI_AT(KSI_GroupMemoryStats, iMin, 188);
-KSI_AT(KSI_GroupMemoryStats, eMin, 196);
-KSI_AT(KSI_GroupMemoryStats, bActive, 204);
-KSI_AT(KSI_GroupMemoryStats, allocTgt, 212);
-KSI_AT(KSI_GroupMemoryStats, mps, 236);
-KSI_AT(KSI_GroupMemoryStats, rMinPeak, 244);
-KSI_AT(KSI_GroupMemoryStats, eMinPeak, 260);
-KSI_AT(KSI_GroupMemoryStats, consumedPeak, 276);
-KSI_AT(KSI_GroupMemoryStats, memSizePeak, 292);
-KSI_AT(KSI_GroupMemoryStats, throttlePct, 308);
-KSI_SIZE(KSI_GroupMemoryStats, 312);
-KSI_SIZE(KSI_CommonTally, 264);
-KSI_AT(KSI_VmmTally, memSizeLimit, 28);
-KSI_AT(KSI_VmmTally, memSize, 36);
-KSI_AT(KSI_VmmTally, touched, 44);
-KSI_AT(KSI_VmmTally, allocTgt, 68);
-KSI_AT(KSI_VmmTally, vpmemRO, 100);
-KSI_AT(KSI_VmmTally, vpmemUC, 124);
-KSI_AT(KSI_VmmTally, llswapped, 132);
-KSI_AT(KSI_VmmTally, zipSaved, 140);
-KSI_AT(KSI_VmmTally, shared, 148);
-KSI_AT(KSI_VmmTally, zero, 156);
-KSI_AT(KSI_VmmTally, llswapUsed, 164);
-KSI_AT(KSI_VmmTally, mapped, 172);
-KSI_AT(KSI_VmmTally, zipped, 180);
-KSI_AT(KSI_VmmTally, vpmemRW, 188);
-KSI_AT(KSI_VmmTally, sharedSaved, 196);
-KSI_AT(KSI_VmmTally, swapTgt, 212);
-KSI_AT(KSI_VmmTally, swapScope, 228);
-KSI_AT(KSI_VmmTally, useReliableMem, 236);
-KSI_AT(KSI_VmmTally, balloonActive, 272);
-KSI_AT(KSI_VmmTally, ballooned, 273);
-KSI_AT(KSI_VmmTally, balloonTgt, 281);
-KSI_SIZE(KSI_VmmTally, 332);
-KSI_AT(KSI_UwTally, min, 0);
-KSI_AT(KSI_UwTally, max, 8);
-KSI_AT(KSI_UwTally, minLimit, 16);
-KSI_AT(KSI_UwTally, shares, 24);
-KSI_AT(KSI_UwTally, memSizeLimit, 28);
-KSI_AT(KSI_UwTally, memSize, 36);
-KSI_AT(KSI_UwTally, touched, 44);
-KSI_AT(KSI_UwTally, allocTgt, 68);
-KSI_AT(KSI_UwTally, vpmemUC, 124);
-KSI_AT(KSI_UwTally, mapped, 172);
-KSI_AT(KSI_UwTally, vpmemRW, 188);
-KSI_AT(KSI_UwTally, sharedSaved, 196);
-KSI_AT(KSI_UwTally, swapTgt, 212);
-KSI_AT(KSI_UwTally, swapScope, 228);
-KSI_AT(KSI_UwTally, useReliableMem, 236);
-KSI_AT(KSI_UwTally, totalResv, 264);
-KSI_AT(KSI_UwTally, pinnedResv, 272);
-KSI_AT(KSI_UwTally, memBStore, 280);
-KSI_AT(KSI_UwTally, swapBStore, 288);
-KSI_AT(KSI_UwTally, swappable, 296);
-KSI_AT(KSI_UwTally, pinned, 304);
-KSI_AT(KSI_UwTally, cow, 312);
-KSI_AT(KSI_UwTally, pageable, 320);
-KSI_AT(KSI_UwTally, pageableUnacct, 328);
-KSI_AT(KSI_UwTally, swapped, 336);
-KSI_AT(KSI_UwTally, prealloced, 344);
-KSI_AT(KSI_UwTally, shm, 352);
-KSI_SIZE(KSI_UwTally, 360);
-KSI_AT(KSI_GuestTally, memTotal, 0);
-KSI_AT(KSI_GuestTally, lpageTotal, 8);
-KSI_AT(KSI_GuestTally, memNeeded, 12);
-KSI_SIZE(KSI_GuestTally, 20);
-KSI_AT(KSI_SwapInfo, isSwapping, 0);
-KSI_AT(KSI_SwapInfo, swapTgt, 1);
-KSI_AT(KSI_SwapInfo, swapped, 9);
-KSI_AT(KSI_SwapInfo, swapRead, 17);
-KSI_AT(KSI_SwapInfo, swapIn, 25);
-KSI_AT(KSI_SwapInfo, swapOut, 33);
-KSI_AT(KSI_SwapInfo, gblSwapRead, 57);
-KSI_AT(KSI_SwapInfo, gblSwapIn, 65);
-KSI_AT(KSI_SwapInfo, gblSwapOut, 73);
-KSI_AT(KSI_SwapInfo, COWSwapper, 81);
-KSI_AT(KSI_SwapInfo, discarded, 89);
-KSI_AT(KSI_SwapInfo, vmmSwapOn, 97);
-KSI_AT(KSI_SwapInfo, knvSwapOn, 101);
-KSI_AT(KSI_SwapInfo, curSwapper, 105);
-KSI_AT(KSI_SwapInfo, totalReg, 137);
-KSI_AT(KSI_SwapInfo, freeReg, 145);
-KSI_AT(KSI_SwapInfo, cptTgt, 153);
-KSI_AT(KSI_SwapInfo, cptRead, 161);
-KSI_AT(KSI_SwapInfo, cptWritten, 169);
-KSI_AT(KSI_SwapInfo, totalMig, 177);
-KSI_AT(KSI_SwapInfo, freeMig, 185);
-KSI_AT(KSI_SwapInfo, cacheUsage, 193);
-KSI_AT(KSI_SwapInfo, swapoutReady, 209);
-KSI_SIZE(KSI_SwapInfo, 220);
-KSI_AT(KSI_MemzipInfo, totalCache, 0);
-KSI_AT(KSI_MemzipInfo, usedCache, 8);
-KSI_AT(KSI_MemzipInfo, maxCache, 16);
-KSI_AT(KSI_MemzipInfo, nrFreeHalf, 24);
-KSI_AT(KSI_MemzipInfo, nrFreeQuarter, 28);
-KSI_AT(KSI_MemzipInfo, zipped, 32);
-KSI_AT(KSI_MemzipInfo, unZipped, 40);
-KSI_AT(KSI_MemzipInfo, zipRejected, 56);
-KSI_AT(KSI_MemzipInfo, avgZipTime, 80);
-KSI_AT(KSI_MemzipInfo, avgUnzipTime, 104);
-KSI_SIZE(KSI_MemzipInfo, 136);
-KSI_AT(KSI_RemapType, added, 0);
-KSI_AT(KSI_RemapType, filtered, 8);
-KSI_AT(KSI_RemapType, prepared, 16);
-KSI_AT(KSI_RemapType, staged, 24);
-KSI_AT(KSI_RemapType, canceled, 32);
-KSI_AT(KSI_RemapType, remapped, 40);
-KSI_AT(KSI_RemapType, cUnprepared, 48);
-KSI_AT(KSI_RemapType, cPrepared, 56);
-KSI_AT(KSI_RemapType, cStaged, 64);
-KSI_SIZE(KSI_RemapType, 80);
-KSI_AT(KSI_GlobalTally, managedByMemSched, 12);
-KSI_AT(KSI_GlobalTally, minFree, 36);
-KSI_AT(KSI_GlobalTally, memState, 68);
-KSI_SIZE(KSI_GlobalTally, 352);
-KSI_AT(KSI_StateTransitions, up, 4);
-KSI_AT(KSI_StateTransitions, down, 20);
-KSI_SIZE(KSI_StateTransitions, 32);
-KSI_AT(KSI_Comprehensive, total, 0);
-KSI_AT(KSI_Comprehensive, managedByMemMap, 8);
-KSI_AT(KSI_Comprehensive, reliableMem, 16);
-KSI_AT(KSI_Comprehensive, discarded, 24);
-KSI_AT(KSI_Comprehensive, critical, 32);
-KSI_AT(KSI_Comprehensive, buddyOvhd, 40);
-KSI_AT(KSI_Comprehensive, kernelCode, 48);
-KSI_AT(KSI_Comprehensive, dataAndHeap, 56);
-KSI_AT(KSI_Comprehensive, knvClientConsumed, 64);
-KSI_AT(KSI_Comprehensive, otherConsumed, 72);
-KSI_AT(KSI_Comprehensive, rsvdLow, 80);
-KSI_AT(KSI_Comprehensive, free, 88);
-KSI_SIZE(KSI_Comprehensive, 96);
-KSI_AT(KSI_MemInfo, numNodes, 20);
-KSI_SIZE(KSI_MemInfo, 32);
-KSI_AT(KSI_MemNode, numaNode, 0);
-KSI_SIZE(KSI_MemNode, 28);
-KSI_AT(KSI_PshareStats, cow, 0);
-KSI_AT(KSI_PshareStats, cow1, 8);
-KSI_AT(KSI_PshareStats, zero, 16);
-KSI_AT(KSI_PshareStats, used, 32);
-KSI_AT(KSI_PshareStats, reclaimed, 40);
-KSI_AT(KSI_PshareStats, totAdd, 48);
-KSI_AT(KSI_PshareStats, totRemove, 56);
-KSI_AT(KSI_PshareStats, hintsActive, 64);
-KSI_AT(KSI_PshareStats, hintsAdded, 72);
-KSI_AT(KSI_PshareStats, hintsRemoved, 80);
-KSI_AT(KSI_PshareStats, lpageHintsAdded, 88);
-KSI_AT(KSI_PshareStats, lpageHintsRemoved, 96);
-KSI_AT(KSI_PshareStats, peakChainLength, 168);
-KSI_AT(KSI_PshareStats, peakChainIndex, 176);
-KSI_AT(KSI_PshareStats, peakRefCount, 184);
-KSI_SIZE(KSI_PshareStats, 208);
-KSI_AT(KSI_HeapStats, name, 0);
-KSI_AT(KSI_HeapStats, dynGrow, 36);
-KSI_AT(KSI_HeapStats, lowerLimit, 41);
-KSI_AT(KSI_HeapStats, upperLimit, 45);
-KSI_AT(KSI_HeapStats, reserved, 49);
-KSI_AT(KSI_HeapStats, numRanges, 58);
-KSI_AT(KSI_HeapStats, dlMallocOvdh, 62);
-KSI_AT(KSI_HeapStats, size, 66);
-KSI_AT(KSI_HeapStats, initial, 70);
-KSI_AT(KSI_HeapStats, avail, 78);
-KSI_AT(KSI_HeapStats, pctFreeOfCur, 86);
-KSI_AT(KSI_HeapStats, max, 94);
-KSI_AT(KSI_HeapStats, maxAvail, 98);
-KSI_AT(KSI_HeapStats, pctFreeOfMax, 102);
-KSI_AT(KSI_HeapStats, lowPctFreeOfMax, 106);
-KSI_AT(KSI_HeapStats, numSuccAllocs, 114);
-KSI_AT(KSI_HeapStats, numFailAllocs, 118);
-KSI_AT(KSI_HeapStats, avgAllocSize, 126);
-KSI_AT(KSI_HeapStats, numReqsPerGrowth, 130);
-KSI_AT(KSI_HeapStats, numGrowthOps, 134);
-KSI_AT(KSI_HeapStats, numShrinkOps, 138);
-KSI_SIZE(KSI_HeapStats, 144);
-KSI_AT(KSI_VmLargePages, nrBackings, 0);
-KSI_AT(KSI_VmLargePages, maxSwapThreshold, 4);
-KSI_AT(KSI_VmLargePages, nrAllocSuccess, 8);
-KSI_AT(KSI_VmLargePages, nrFailPinned, 16);
-KSI_AT(KSI_VmLargePages, nrFailSwapped, 24);
-KSI_AT(KSI_VmLargePages, nrFailPinnedLate, 32);
-KSI_AT(KSI_VmLargePages, nrFailNoMem, 56);
-KSI_AT(KSI_VmLargePages, nrLocked, 72);
-KSI_AT(KSI_VmLargePages, nrBroken, 76);
-KSI_SIZE(KSI_VmLargePages, 84);
-KSI_AT(KSI_LargePagePool, nrLPages, 0);
-KSI_AT(KSI_LargePagePool, nrFreeSPages, 4);
-KSI_AT(KSI_LargePagePool, nrSPageAllocs, 8);
-KSI_AT(KSI_LargePagePool, nrSPageFrees, 16);
-KSI_AT(KSI_LargePagePool, nrReapAttempts, 24);
-KSI_AT(KSI_LargePagePool, nrSPagesReaped, 32);
-KSI_AT(KSI_LargePagePool, nrDefragAttempts, 40);
-KSI_AT(KSI_LargePagePool, nrDefragCancelled, 56);
-KSI_AT(KSI_LargePagePool, nrDefragReaped, 64);
-KSI_AT(KSI_LargePagePool, nrLPagesDefragged, 72);
-KSI_AT(KSI_LargePagePool, peakDefragAttempts, 80);
-KSI_AT(KSI_LargePagePool, nrCachehit, 88);
-KSI_SIZE(KSI_LargePagePool, 96);
-KSI_SIZE(KSI_PmemVolume, 40);
-KSI_AT(KSI_PmemRegionStore, alloc2MBlocks, 0);
-KSI_AT(KSI_PmemRegionStore, resvd2MBlocks, 8);
-KSI_AT(KSI_PmemRegionStore, avail2MBlocks, 16);
-KSI_AT(KSI_PmemRegionStore, totalRegions, 24);
-KSI_AT(KSI_PmemRegionStore, freeRegions, 28);
-KSI_AT(KSI_PmemRegionStore, total2MBlocks, 32);
-KSI_SIZE(KSI_PmemRegionStore, 40);
-KSI_AT(KSI_PmemRegion, size, 37);
-KSI_AT(KSI_PmemRegion, reserved, 45);
-KSI_AT(KSI_PmemRegion, flags, 53);
-KSI_SIZE(KSI_PmemRegion, 60);
-KSI_AT(KSI_BuddyBuffers, free, 0);
-KSI_AT(KSI_BuddyBuffers, used, 4);
-KSI_SIZE(KSI_BuddyBuffers, 12);
-KSI_AT(KSI_BuddyStats, buffers, 8);
-KSI_SIZE(KSI_BuddyStats, 236);
+#undef KSI_FIELD
+#undef KSI_TEXT
+#undef KSI_GAP
+#undef KSI_STRUCT
+#undef KSI_NUMBER
+#undef KSI_COUNT
 
-#undef KSI_AT
+/* The sizes of all values in bytes, those of nodes without a value (None) included. */
+enum {
+  KSI_SIZE_None = 0,
+  KSI_SIZE_BuddyStats = 236,
+#define KSI_SIZE(record, size) KSI_SIZE_##record = size,
+  KSI_RECORDS(KSI_SIZE)
 #undef KSI_SIZE
+#define KSI_SIZE(record, type, name, unit, meaning) KSI_SIZE_##record = sizeof(type),
+      KSI_NUMBERS(KSI_SIZE)
+#undef KSI_SIZE
+};
+
+/* The structs lie as the tables say. */
+#ifdef __cplusplus
+#define KSI_CHECK(condition, what) static_assert(condition, what)
+#else
+#define KSI_CHECK(condition, what) _Static_assert(condition, what)
+#endif
+#define KSI_AT(at, name) KSI_CHECK(offsetof(Record, name) == (at), #name);
+#define KSI_FIELD(offset, type, name, unit, meaning) KSI_AT(offset, name)
+#define KSI_TEXT(offset, size, name, meaning) KSI_AT(offset, name)
+#define KSI_GAP(offset, size) KSI_AT(offset, unused##offset)
+#define KSI_LAYOUT(record, size)                       \
+  static inline void KSI_CheckLayoutOf##record(void) { \
+    typedef struct KSI_##record Record;                \
+    KSI_CHECK(sizeof(Record) == (size), #record);      \
+    KSI_RECORD_##record(KSI_FIELD, KSI_TEXT, KSI_GAP)  \
+  }
+KSI_RECORDS(KSI_LAYOUT)
+KSI_CHECK(offsetof(struct KSI_BuddyStats, buffers) == 8, "BuddyStats.buffers");
+KSI_CHECK(sizeof(struct KSI_BuddyStats) == KSI_SIZE_BuddyStats, "BuddyStats");
+
+#undef KSI_CHECK
+#undef KSI_AT
+#undef KSI_FIELD
+#undef KSI_TEXT
+#undef KSI_GAP
+#undef KSI_LAYOUT
 
 #endif /* KNVLIBS_KSI_RECORDS_H_ */
