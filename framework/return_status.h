@@ -1,5 +1,5 @@
-// The messages of kernel return statuses. Both names are part of the executable's interface and
-// exported from it.
+// The messages of kernel return statuses, whatever library the program meets. Both names are part
+// of the executable's interface and exported from it.
 #ifndef FRAMEWORK_RETURN_STATUS_H_
 #define FRAMEWORK_RETURN_STATUS_H_
 
