@@ -39,8 +39,8 @@ class CacheFile {
   //   KSI_STATUS_MAJOR_VERSION_MISMATCH: of a newer schema,
   //   KSI_STATUS_METADATA_READ_ERROR: damaged.
   // `why`, if not null, receives what is wrong with a damaged file.
-  static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file,
-                     std::string* why = nullptr);
+  [[nodiscard]] static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file,
+                                   std::string* why = nullptr);
 
   const Capture& GetCapture() const { return capture_; }
   const std::vector<NodeRow>& NodeRows() const { return nodes_; }
@@ -54,12 +54,12 @@ class CacheFile {
  private:
   CacheFile() = default;
 
-  Status Configure();
-  Status CheckSchema();
-  Status ReadCapture();
-  Status ReadNodes();
-  Status Failed(int code);
-  Status Damaged(const char* why);
+  [[nodiscard]] Status Configure();
+  [[nodiscard]] Status CheckSchema();
+  [[nodiscard]] Status ReadCapture();
+  [[nodiscard]] Status ReadNodes();
+  [[nodiscard]] Status Failed(int code);
+  [[nodiscard]] Status Damaged(const char* why);
 
   Database database_;
   std::string why_;
@@ -72,7 +72,7 @@ class CacheFile {
 const char* BadMember(const CacheFile::Capture& capture);
 
 // The status for a failed call of SQLite on a cache file.
-Status StatusOfSqlite(int code);
+[[nodiscard]] Status StatusOfSqlite(int code);
 
 }  // namespace ksi
 

@@ -21,12 +21,12 @@ namespace ksi {
 class CacheSource : public Source {
  public:
   // The statuses of CacheFile::Open.
-  static Status Open(const char* fileName, std::unique_ptr<CacheSource>* source);
+  [[nodiscard]] static Status Open(const char* fileName, std::unique_ptr<CacheSource>* source);
 
   // A key that the file does not have is KSI_STATUS_NOT_FOUND; a read that failed when it was
   // captured fails with its status again.
-  Status Value(const Node& node, const Keys& keys, Buffer record) override;
-  Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
+  [[nodiscard]] Status Value(const Node& node, const Keys& keys, Buffer record) override;
+  [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
   Definitions KernelDefinitions() const override;
 
  private:
@@ -58,13 +58,13 @@ class CacheSource : public Source {
 
   CacheSource() = default;
 
-  Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
-              const Reading** reading);
-  Status TakeEntry(const Node& node, ParamList& instances) const;
-  Status FindObject(const Keys& keys, const Object** object);
-  Status Load(const Keys& keys, Object& object);
-  Status StepCursor();
-  Status SeekCursor(const Keys& keys);
+  [[nodiscard]] Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
+                            const Reading** reading);
+  [[nodiscard]] Status TakeEntry(const Node& node, ParamList& instances) const;
+  [[nodiscard]] Status FindObject(const Keys& keys, const Object** object);
+  [[nodiscard]] Status Load(const Keys& keys, Object& object);
+  [[nodiscard]] Status StepCursor();
+  [[nodiscard]] Status SeekCursor(const Keys& keys);
   bool CursorAt(const Keys& keys) const;
 
   std::unique_ptr<CacheFile> file_;

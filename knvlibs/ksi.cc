@@ -3,13 +3,18 @@
 #include <knvlibs/ksi.h>
 #pragma GCC visibility pop
 
+#include <sys/stat.h>
+
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <cstring>
 #include <memory>
 #include <new>
+#include <utility>
 
 #include "knvlibs/cache_source.h"
+#include "knvlibs/handle.h"
 #include "knvlibs/linux/linux_source.h"
 #include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
@@ -17,13 +22,14 @@
 namespace ksi {
 namespace {
 
-// The source in use, made on first use and never destroyed: what the process ends with.
-constinit Source* currentSource = nullptr;
-
-Source& CurrentSource() {
-  if (currentSource == nullptr) currentSource = new LinuxSource("/");
-  return *currentSource;
+// The source of the reads that name none: made on first use and never destroyed, because the
+// process ends with it.
+KSI_Source& CurrentSource() {
+  static auto* const current = new KSI_Source(std::make_unique<LinuxSource>("/"));
+  return *current;
 }
+
+KSI_Source& SourceOf(KSI_Source* handle) { return handle == nullptr ? CurrentSource() : *handle; }
 
 // Runs one operation at the boundary.
 template <class Operation>
@@ -54,7 +60,7 @@ Status TakeKeys(const ParamList* list, const Keying& keying, Keys* keys) {
   return kOk;
 }
 
-Status Get(uint16_t id, const ParamList* list, void* buffer, size_t size) {
+Status Get(KSI_Source* source, uint16_t id, const ParamList* list, void* buffer, size_t size) {
   const Node* node = FindNode(id);
   if (node == nullptr) return KSI_STATUS_INVALID_NODE;
   if (!node->HasValue()) return KSI_STATUS_NO_HANDLER;
@@ -66,29 +72,72 @@ Status Get(uint16_t id, const ParamList* list, void* buffer, size_t size) {
 
   std::array<std::byte, kMaxRecordSize> record;
   std::memset(record.data(), 0, size);
-  status = CurrentSource().Value(*node, keys, Buffer(record).first(size));
+  status = SourceOf(source).Ask(
+      [&](Source& asked) { return asked.Value(*node, keys, Buffer(record).first(size)); });
   if (status == kOk) std::memcpy(buffer, record.data(), size);
   return status;
 }
 
-Status GetInstances(uint16_t id, const ParamList* list, ParamList& instances) {
+Status GetInstances(KSI_Source* source, uint16_t id, const ParamList* list, ParamList& instances) {
   const Node* node = FindNode(id);
   if (node == nullptr) return KSI_STATUS_INVALID_NODE;
   if (!node->HasList()) return KSI_STATUS_NO_HANDLER;
   Keys keys;
   const Status status = TakeKeys(list, node->listKeys, &keys);
-  return status == kOk ? CurrentSource().Instances(*node, keys, instances) : status;
+  if (status != kOk) return status;
+  return SourceOf(source).Ask(
+      [&](Source& asked) { return asked.Instances(*node, keys, instances); });
 }
 
-Status GetInstanceListAlloc(uint16_t id, const ParamList* keys, uint32_t hint, ParamList** out) {
+Status GetInstanceListAlloc(KSI_Source* source, uint16_t id, const ParamList* keys, uint32_t hint,
+                            ParamList** out) {
   if (out == nullptr) return KSI_STATUS_BAD_PARAM;
   // A hint is worth an allocation less, not the trust that so many will come.
   constexpr uint32_t kLargestHint = 4096;
   auto instances = std::make_unique<ParamList>(ParamList::kNoLimit);
   instances->Reserve(std::min(hint, kLargestHint));
-  const Status status = GetInstances(id, keys, *instances);
+  const Status status = GetInstances(source, id, keys, *instances);
   if (status == kOk) *out = instances.release();
   return status;
+}
+
+Status CheckSig(KSI_Source* source, char* buildBuffer, size_t size, const char** appBuild) {
+  const bool matches = SourceOf(source).Ask([&](const Source& asked) {
+    const Definitions kernel = asked.KernelDefinitions();
+    Str_Strcpy(buildBuffer, kernel.built.data(), size);
+    return kernel.signature == kDefinitions.signature;
+  });
+  if (buildBuffer == nullptr || size == 0 || appBuild == nullptr) return KSI_STATUS_BAD_PARAM;
+  return matches ? kOk : KSI_STATUS_CHECKSUM_MISMATCH;
+}
+
+Status OpenHost(const char* root, std::unique_ptr<Source>* source) {
+  struct stat directory;
+  if (root == nullptr) root = "/";
+  if (stat(root, &directory) != 0) return StatusOfErrno(errno);
+  if (!S_ISDIR(directory.st_mode)) return StatusOfErrno(ENOTDIR);
+  *source = std::make_unique<LinuxSource>(root);
+  return kOk;
+}
+
+Status OpenCache(const char* fileName, std::unique_ptr<Source>* source) {
+  if (fileName == nullptr) return KSI_STATUS_BAD_PARAM;
+  std::unique_ptr<CacheSource> cache;
+  const Status status = CacheSource::Open(fileName, &cache);
+  if (status == kOk) *source = std::move(cache);
+  return status;
+}
+
+// Gives what `open` opens to the caller.
+template <class Open>
+Status OpenHandle(KSI_Source** handle, Open&& open) {
+  return Guarded([&]() -> Status {
+    if (handle == nullptr) return KSI_STATUS_BAD_PARAM;
+    std::unique_ptr<Source> source;
+    const Status status = open(&source);
+    if (status == kOk) *handle = new KSI_Source(std::move(source));
+    return status;
+  });
 }
 
 constexpr int kParamListVersion = 1;
@@ -118,29 +167,20 @@ Status ReadEntry(const ParamList* list, uint32_t index, KeyKind kind, Out* out, 
 
 uint32_t KSI_UseCache(const char* fileName, int flags) {
   return ksi::Guarded([&]() -> ksi::Status {
-    if (fileName == nullptr || flags != 0) return KSI_STATUS_BAD_PARAM;
-    std::unique_ptr<ksi::CacheSource> source;
-    const ksi::Status status = ksi::CacheSource::Open(fileName, &source);
-    if (status != ksi::kOk) return status;
-    delete ksi::currentSource;
-    ksi::currentSource = source.release();
-    return ksi::kOk;
+    if (flags != 0) return KSI_STATUS_BAD_PARAM;
+    std::unique_ptr<ksi::Source> source;
+    const ksi::Status status = ksi::OpenCache(fileName, &source);
+    if (status == ksi::kOk) ksi::CurrentSource().Become(std::move(source));
+    return status;
   });
 }
 
 uint32_t KSI_CheckSig(char* buildBuffer, size_t size, const char** appBuild) {
-  if (appBuild != nullptr) *appBuild = ksi::kDefinitions.built.data();
-  return ksi::Guarded([&]() -> ksi::Status {
-    const ksi::Definitions kernel = ksi::CurrentSource().KernelDefinitions();
-    Str_Strcpy(buildBuffer, kernel.built.data(), size);
-    if (buildBuffer == nullptr || size == 0 || appBuild == nullptr) return KSI_STATUS_BAD_PARAM;
-    return kernel.signature == ksi::kDefinitions.signature ? ksi::kOk
-                                                           : KSI_STATUS_CHECKSUM_MISMATCH;
-  });
+  return KSI_SourceCheckSig(nullptr, buildBuffer, size, appBuild);
 }
 
 uint32_t KSI_Get(uint16_t node, struct KSI_ParamList* keys, void* buffer, size_t size) {
-  return ksi::Guarded([&] { return ksi::Get(node, keys, buffer, size); });
+  return KSI_SourceGet(nullptr, node, keys, buffer, size);
 }
 
 uint32_t KSI_GetInstanceList(uint16_t node, struct KSI_ParamList* keys,
@@ -148,19 +188,56 @@ uint32_t KSI_GetInstanceList(uint16_t node, struct KSI_ParamList* keys,
   return ksi::Guarded([&]() -> ksi::Status {
     if (list == nullptr) return KSI_STATUS_BAD_PARAM;
     ksi::ParamList instances(ksi::ParamList::kNoLimit);
-    const ksi::Status status = ksi::GetInstances(node, keys, instances);
+    const ksi::Status status = ksi::GetInstances(nullptr, node, keys, instances);
     return status == ksi::kOk ? list->Append(instances) : status;
   });
 }
 
 uint32_t KSI_GetInstanceListAlloc(uint16_t node, struct KSI_ParamList* keys,
                                   struct KSI_ParamList** list) {
-  return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(node, keys, 0, list); });
+  return KSI_SourceGetInstanceListAlloc(nullptr, node, keys, list);
 }
 
 uint32_t KSI_GetInstanceListAllocHint(uint16_t node, struct KSI_ParamList* keys, uint32_t hint,
                                       struct KSI_ParamList** list) {
-  return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(node, keys, hint, list); });
+  return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(nullptr, node, keys, hint, list); });
+}
+
+uint32_t KSI_OpenHost(const char* root, struct KSI_Source** source) {
+  return ksi::OpenHandle(
+      source, [&](std::unique_ptr<ksi::Source>* opened) { return ksi::OpenHost(root, opened); });
+}
+
+uint32_t KSI_OpenCache(const char* fileName, struct KSI_Source** source) {
+  return ksi::OpenHandle(source, [&](std::unique_ptr<ksi::Source>* opened) {
+    return ksi::OpenCache(fileName, opened);
+  });
+}
+
+void KSI_CloseSource(struct KSI_Source* source) { delete source; }
+
+void KSI_RefreshSource(struct KSI_Source* source) {
+  // Without the memory for the current source there is nothing that it could have kept.
+  static_cast<void>(ksi::Guarded([&] {
+    ksi::SourceOf(source).Ask([](ksi::Source& asked) { asked.Refresh(); });
+    return ksi::kOk;
+  }));
+}
+
+uint32_t KSI_SourceCheckSig(struct KSI_Source* source, char* buildBuffer, size_t size,
+                            const char** appBuild) {
+  if (appBuild != nullptr) *appBuild = ksi::kDefinitions.built.data();
+  return ksi::Guarded([&] { return ksi::CheckSig(source, buildBuffer, size, appBuild); });
+}
+
+uint32_t KSI_SourceGet(struct KSI_Source* source, uint16_t node, struct KSI_ParamList* keys,
+                       void* buffer, size_t size) {
+  return ksi::Guarded([&] { return ksi::Get(source, node, keys, buffer, size); });
+}
+
+uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source, uint16_t node,
+                                        struct KSI_ParamList* keys, struct KSI_ParamList** list) {
+  return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(source, node, keys, 0, list); });
 }
 
 struct KSI_ParamList* KSI_ParamListCreate(int version, int capacity) {

@@ -23,12 +23,12 @@ struct KSI_ParamList {
   // The same with `textRoom` bytes, taken at once, for the texts and their terminators.
   KSI_ParamList(size_t capacity, size_t textRoom);
 
-  ksi::Status AddNumber(uint64_t value);
-  ksi::Status AddText(std::string_view text);
+  [[nodiscard]] ksi::Status AddNumber(uint64_t value);
+  [[nodiscard]] ksi::Status AddText(std::string_view text);
   void RemoveLast();
 
   // Appends the entries of `other`; without room for all of them, none.
-  ksi::Status Append(const KSI_ParamList& other);
+  [[nodiscard]] ksi::Status Append(const KSI_ParamList& other);
 
   // Prepares for `count` more entries.
   void Reserve(size_t count) { entries_.reserve(entries_.size() + count); }

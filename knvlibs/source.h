@@ -50,11 +50,15 @@ class Source {
 
   // The value of `node` for `keys` into `record`, which is zeroed.
   // REQUIRES: the node has a value of record.size() bytes, `keys` are of its kinds.
-  virtual Status Value(const Node& node, const Keys& keys, Buffer record) = 0;
+  [[nodiscard]] virtual Status Value(const Node& node, const Keys& keys, Buffer record) = 0;
 
   // The instances of `node` for `keys`, appended to `instances`, which may be changed on failure.
   // REQUIRES: the node has a list, `keys` are of its kinds.
-  virtual Status Instances(const Node& node, const Keys& keys, ParamList& instances) = 0;
+  [[nodiscard]] virtual Status Instances(const Node& node, const Keys& keys,
+                                         ParamList& instances) = 0;
+
+  // Forgets what was read: later answers are read anew.
+  virtual void Refresh() {}
 
   // The definitions of the kernel that answers.
   virtual Definitions KernelDefinitions() const = 0;

@@ -13,7 +13,7 @@ using Status = uint32_t;
 constexpr Status kOk = KSI_STATUS_SUCCESS;
 
 // The status for a failed system call's errno.
-Status StatusOfErrno(int error);
+[[nodiscard]] Status StatusOfErrno(int error);
 
 }  // namespace ksi
 

@@ -19,29 +19,29 @@ KSI_ParamList* Heaps() {
 void Misuse(const std::string& how) {
   KSI_ParamList* list = KSI_ParamListCreate(how == "version" ? 2 : 1, 1);
   if (how == "leak") {
-    KSI_ParamListAddInt(list, 7);
+    (void)KSI_ParamListAddInt(list, 7);
     return;
   }
   if (how == "full") {
-    KSI_ParamListAddInt(list, 7);
-    KSI_ParamListAddInt(list, 8);
+    (void)KSI_ParamListAddInt(list, 7);
+    (void)KSI_ParamListAddInt(list, 8);
   }
   if (how == "size") {
     uint64_t flags = 0;
-    KSI_ParamListAddInt(list, 4);
-    KSI_Get(KSI_NODE_sched_groups_groupFlags, list, &flags, sizeof flags);
+    (void)KSI_ParamListAddInt(list, 4);
+    (void)KSI_Get(KSI_NODE_sched_groups_groupFlags, list, &flags, sizeof flags);
   }
   if (how == "node") {
     uint32_t flags = 0;
-    KSI_Get(0, list, &flags, sizeof flags);
+    (void)KSI_Get(0, list, &flags, sizeof flags);
   }
   if (how == "unanswered") {
     uint32_t machines = 0;
-    KSI_Get(KSI_NODE_sched_globalStats_numVMs, nullptr, &machines, sizeof machines);
+    (void)KSI_Get(KSI_NODE_sched_globalStats_numVMs, nullptr, &machines, sizeof machines);
   }
   if (how == "append") {
     KSI_ParamList* heaps = Heaps();
-    KSI_ParamListAddInt(heaps, 1);
+    (void)KSI_ParamListAddInt(heaps, 1);
     KSI_ParamListDestroy(heaps);
   }
   if (how == "leak-instances") Heaps();
@@ -53,7 +53,7 @@ void Misuse(const std::string& how) {
   if (how == "text-after-destroy") {
     KSI_ParamList* heaps = Heaps();
     const char* name = "";
-    KSI_ParamListGetString(heaps, 0, &name);
+    (void)KSI_ParamListGetString(heaps, 0, &name);
     std::puts(name);
     KSI_ParamListDestroy(heaps);
     std::puts(name);
