@@ -114,12 +114,13 @@ TEST(Sources, AreReadAgainAfterARefresh) {
 
 TEST(Sources, TellTheirDefinitions) {
   const Handle example(Cache(TALLY_EXAMPLE));
-  char own[21] = "";
   char kernel[21] = "";
+  const char* own = nullptr;
   const char* built = nullptr;
-  EXPECT_EQ(KSI_CheckSig(own, sizeof own, &built), 0U);
+  EXPECT_EQ(KSI_CheckSig(kernel, sizeof kernel, &own), 0U);
   EXPECT_EQ(KSI_SourceCheckSig(example, kernel, sizeof kernel, &built), 0U);
-  EXPECT_STREQ(built, kernel);
+  EXPECT_STREQ(built, own);
+  EXPECT_EQ(std::strlen(kernel), 20U);
   EXPECT_EQ(KSI_SourceCheckSig(example, nullptr, 0, &built), KSI_STATUS_BAD_PARAM);
 }
 
