@@ -1,5 +1,4 @@
-# How everything here is compiled: the language, the warnings (errors all), the hardening of a
-# release and the sanitizers. Targets take it by linking to `tally_compiler`.
+# How everything here is compiled: the language, the warnings, the hardening and the sanitizers. Targets take it by linking to `tally_compiler`.
 set(CMAKE_CXX_STANDARD 20)
 set(CMAKE_CXX_STANDARD_REQUIRED ON)
 set(CMAKE_CXX_EXTENSIONS OFF)
@@ -17,7 +16,7 @@ add_library(tally_compiler INTERFACE)
 target_include_directories(tally_compiler INTERFACE
   "${PROJECT_SOURCE_DIR}" "${PROJECT_SOURCE_DIR}/knvlibs/include")
 target_compile_options(tally_compiler INTERFACE
-  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Werror)
+  -Wall -Wextra -Wpedantic -Wshadow -Wconversion $<$<BOOL:${TALLY_WERROR}>:-Werror>)
 if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
   # It takes std::string's operator+ for a copy onto itself.
   target_compile_options(tally_compiler INTERFACE -Wno-restrict)
@@ -33,10 +32,7 @@ if(TALLY_SANITIZE)
     "-fsanitize=${TALLY_SANITIZE}" -fno-sanitize-recover=all -fno-omit-frame-pointer)
   target_link_options(tally_compiler INTERFACE "-fsanitize=${TALLY_SANITIZE}")
 else()
-  target_compile_options(tally_compiler INTERFACE
-    -fstack-protector-strong
-    "$<$<CONFIG:Release,RelWithDebInfo>:-U_FORTIFY_SOURCE;-D_FORTIFY_SOURCE=2>")
-  target_link_options(tally_compiler INTERFACE LINKER:-z,relro,-z,now)
+  include(TallyHardening)
   # libstdc++ inside the program: a third less time to start.
   target_link_options(tally_compiler INTERFACE
     "$<$<LINK_LANGUAGE:CXX>:-static-libstdc++;-static-libgcc>")
