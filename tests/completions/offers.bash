@@ -9,9 +9,10 @@ offers=${2%/*}/offers.bash
 
 # Runs inside the interactive shell.
 setup() {
-  COMP_WORDBREAKS=${COMP_WORDBREAKS//["$plain"]/}
+  # shellcheck source=../../completions/tally.bash disable=SC2154
   source "$completions/tally.bash"
-
+  COMP_WORDBREAKS=${COMP_WORDBREAKS//["$plain"]/}
+  # shellcheck disable=SC2317
   offer() {
     "_$1" "$@"
     local typed=${COMP_LINE##* } breaks=${COMP_WORDBREAKS//[!:=]/} kept=''
