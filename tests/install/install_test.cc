@@ -90,6 +90,68 @@ TEST(Library, ServesThisMachine) {
   EXPECT_EQ(result.err, "");
 }
 
+#ifdef TALLY_HARDENED
+// The programs and the library, each with a function of it.
+struct Binary {
+  const char* name;
+  const char* function;
+};
+
+class Hardening : public testing::TestWithParam<Binary> {
+ protected:
+  std::string path_ = fs::path(BuiltTally({}).path).parent_path() / GetParam().name;
+};
+
+TEST_P(Hardening, MemoryIsNeverBothWrittenAndRun) {
+  const std::string segments = Tool({TALLY_READELF, "--segments", "--wide", path_});
+  EXPECT_EQ(Lines(segments, "RWE"), "");
+  EXPECT_NE(Lines(segments, "GNU_STACK"), "");
+}
+
+TEST_P(Hardening, NothingOfTheLinkerStaysWritable) {
+  EXPECT_NE(Lines(Tool({TALLY_READELF, "--segments", "--wide", path_}), "GNU_RELRO"), "");
+  EXPECT_NE(Lines(Tool({TALLY_READELF, "--dynamic", path_}), "BIND_NOW"), "");
+}
+
+TEST_P(Hardening, StandsAnywhereInMemory) {
+  EXPECT_NE(Lines(Tool({TALLY_READELF, "--file-header", path_}), "DYN"), "");
+}
+
+TEST_P(Hardening, StackIsGuarded) {
+  EXPECT_NE(Lines(Tool({TALLY_NM, "--dynamic", "--undefined-only", path_}), "__stack_chk_fail"),
+            "");
+}
+
+TEST_P(Hardening, ContainersCheckTheirIndexes) {
+  EXPECT_NE(Lines(Tool({TALLY_NM, path_}), "__glibcxx_assert_fail"), "");
+}
+
+#ifdef TALLY_FORTIFIED
+TEST_P(Hardening, CallsOfTheCLibraryAreChecked) {
+  EXPECT_NE(Lines(Tool({TALLY_NM, "--dynamic", "--undefined-only", path_}), "_chk@"), "");
+}
+#endif
+
+#ifdef TALLY_HAS_CF_PROTECTION
+// The C library's start files have no such marks, so that the linker leaves the note of the whole
+// file away: the functions themselves tell.
+TEST_P(Hardening, FunctionsAreMarkedAsPlacesToJumpTo) {
+  const std::string code =
+      Tool({TALLY_OBJDUMP, std::string("--disassemble=") + GetParam().function, path_});
+  EXPECT_NE(Lines(code, "endbr64"), "") << code;
+}
+#endif
+
+INSTANTIATE_TEST_SUITE_P(All, Hardening,
+                         testing::Values(Binary{"tally", "KNV_ReturnStatusToString"},
+                                         Binary{"ksicache", "main"},
+                                         Binary{"libknvlibs.so", "KSI_Get"}),
+                         [](const testing::TestParamInfo<Binary>& binary) {
+                           const std::string name = binary.param.name;
+                           return name.substr(0, name.find('.'));
+                         });
+#endif
+
 class Installed : public testing::Test {
  protected:
   void SetUp() override {
