@@ -115,7 +115,7 @@ void PutCell(Line& line, const Cell& cell, const ColumnDesc& column) {
       break;
     case 'c': {
       const char letter = static_cast<char>(cell.number());
-      line.Put(std::string_view(&letter, 1), column.width);
+      line.Put(cell.text().empty() ? std::string_view(&letter, 1) : cell.text(), column.width);
       break;
     }
     default:

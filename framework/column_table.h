@@ -35,6 +35,13 @@ class Cell {
   constexpr Cell(std::string_view text) : text_(text) {}
   constexpr Cell(const char* text) : text_(text) {}
 
+  // A flag: 1 or 0, and the letter that is shown for it.
+  static constexpr Cell YesNo(bool flag) {
+    Cell cell(flag ? "y" : "n");
+    cell.number_ = flag;
+    return cell;
+  }
+
   constexpr uint64_t number() const { return number_; }
   constexpr std::string_view text() const { return text_; }
 

@@ -52,4 +52,10 @@ uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit) {
   return kilobytes == kNoValue ? kNoValue : ShiftKilobytes(kilobytes, unit);
 }
 
+uint64_t FromPages(uint64_t pages, DisplayUnit unit) { return ShiftKilobytes(pages * 4, unit); }
+
+uint64_t FromBytes(uint64_t bytes, DisplayUnit unit) {
+  return unit == DisplayUnit::b ? bytes : ShiftKilobytes(bytes >> 10, unit);
+}
+
 }  // namespace tally

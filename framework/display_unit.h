@@ -29,8 +29,11 @@ uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit);
 // From kilobytes; kNoValue stays.
 uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit);
 
-// The kilobytes of a count of 4 KB pages; the two top bits are lost.
-constexpr uint64_t PagesToKilobytes(uint64_t pages) { return pages * 4; }
+// From 4 KB pages. They become kilobytes first, so the two top bits are lost.
+uint64_t FromPages(uint64_t pages, DisplayUnit unit);
+
+// From bytes.
+uint64_t FromBytes(uint64_t bytes, DisplayUnit unit);
 
 }  // namespace tally
 

@@ -1,25 +1,14 @@
 #include "framework/report.h"
 
-#include <algorithm>
-#include <cassert>
-#include <cstdio>
-#include <ctime>
 #include <string>
 
+#include "framework/csv_sink.h"
+#include "framework/table_sink.h"
+
 namespace tally {
-namespace {
 
-bool IsText(const ColumnDesc& column) { return column.conversion[0] == 's'; }
-
-}  // namespace
-
-Status ReportContextBase::Begin(int argc, char** argv) {
-  ReportOptions options;
-  if (Status status = ParseReportOptions(frame_, argc, argv, options)) return status;
-  return Begin(options);
-}
-
-Status ReportContextBase::Begin(const ReportOptions& options) {
+Status ReportContextBase::Settle(const ReportOptions& options) {
+  if (options.levels == 0) return kBadParameter;  // the walk would have no end
   options_ = options;
   const auto selectColumnsAt = [this](SelectColumnsAt point) {
     if (frame_.selectColumnsAt == point) SelectColumns();
@@ -45,80 +34,71 @@ Status ReportContextBase::Begin(const ReportOptions& options) {
   return kSuccess;
 }
 
-void ReportContextBase::PrintTitleBlock(std::initializer_list<Setting> own) const {
-  if (options_.csvMode) return;
-  const auto print = [this](const char* label, std::string_view value) {
-    std::printf("   %-*s : %.*s\n", frame_.labelWidth, label, static_cast<int>(value.size()),
-                value.data());
+void ReportContextBase::Begin(std::initializer_list<HostFigure> own) {
+  const auto add = [this](const char* label, std::string_view value) {
+    settings_.push_back({label, std::string(value)});
   };
-  const auto printNumber = [&](const char* label, uint64_t value) {
-    print(label, std::to_string(value));
+  const auto addNumber = [&](const char* label, uint64_t value) {
+    add(label, std::to_string(value));
   };
-
-  const std::time_t now = std::time(nullptr);
-  std::printf("\n %s: %s", frame_.title, std::ctime(&now));
-  std::printf(" %s\n", std::string(static_cast<size_t>(frame_.ruleLength), '-').c_str());
-  if (frame_.Takes('g')) printNumber("Start Group ID", static_cast<uint64_t>(options_.startGid));
-  if (frame_.Takes('l')) printNumber("No. of levels", options_.levels);
-  if (frame_.Takes('u')) print("Unit", UnitTitle(unit_));
-  for (const Setting& setting : own) printNumber(setting.label, setting.value);
+  const auto addMask = [&](const char* label, uint32_t mask) {
+    add(label, FormatFlagMask(mask, frame_.filterNames).text());
+  };
+  if (frame_.Takes('g')) addNumber("Start Group ID", static_cast<uint64_t>(options_.startGid));
+  if (frame_.Takes('l')) addNumber("No. of levels", options_.levels);
+  if (frame_.Takes('u')) add("Unit", UnitTitle(unit_));
+  for (const HostFigure& figure : own) addNumber(figure.label, figure.value);
   if (frame_.filterNames != nullptr) {
-    print("Inclusion filter", FormatFlagMask(filter_.inclusionMask, frame_.filterNames).text());
-    print("Exclusion filter", FormatFlagMask(filter_.exclusionMask, frame_.filterNames).text());
+    addMask("Inclusion filter", filter_.inclusionMask);
+    addMask("Exclusion filter", filter_.exclusionMask);
   }
-  print("Selected columns", FormatSelectedColumns(table_.data()).text());
-  std::putchar('\n');
-}
-
-void ReportContextBase::PrintHead() const {
-  PrintDashes();
-  PrintHeader(table_.data(), options_.csvMode);
-  PrintDashes();
+  sink_.Begin({.frame = &frame_,
+               .unit = unit_,
+               .settings = settings_,
+               .columns = std::span(table_).first(figures_.size()),
+               .figures = figures_});
 }
 
 void ReportContextBase::PrintTotal() {
   for (size_t i = 0; i < cells_.size(); ++i) {
-    const uint64_t divisor = treatments_[i].inTotal == InTotal::mean && rows_ > 0 ? rows_ : 1;
-    cells_[i] = IsText(table_[i]) ? Cell("Total") : Cell(treatments_[i].total / divisor);
+    const InTotal inTotal = figures_[i].inTotal;
+    const uint64_t divisor = inTotal == InTotal::mean && rows_ > 0 ? rows_ : 1;
+    cells_[i] = inTotal == InTotal::label ? Cell("Total") : Cell(totals_[i] / divisor);
   }
-  PrintDashes();
-  PrintCells(true);
-  PrintDashes();
+  Rule();
+  PutCells(RowKind::total);
+  Rule();
 }
 
-void ReportContextBase::PrintDescriptions() const {
-  if (options_.verbose) PrintColumnDescriptions(table_.data());
+void ReportContextBase::PrintDescriptions() {
+  if (options_.verbose) sink_.Describe();
 }
 
-uint64_t& ReportContextBase::total(std::string_view name) {
-  const auto column = std::find_if(table_.begin(), table_.end() - 1,
-                                   [name](const ColumnDesc& desc) { return name == desc.name; });
-  assert(column != table_.end() - 1);
-  return treatments_[static_cast<size_t>(column - table_.begin())].total;
-}
-
-void ReportContextBase::AddColumn(const ColumnDesc& desc, InTotal inTotal, Conversion toUnit) {
-  table_.insert(table_.end() - 1, desc);
-  treatments_.push_back({inTotal, toUnit});
+void ReportContextBase::AddColumn(const ColumnInfo& column) {
+  table_.insert(table_.end() - 1, column.desc);
+  figures_.push_back(column.figure);
+  totals_.push_back(0);
   cells_.emplace_back();
 }
 
 void ReportContextBase::AddUpCells() {
+  if (!frame_.totalRow) return;
   ++rows_;
   for (size_t i = 0; i < cells_.size(); ++i) {
-    const uint64_t value = cells_[i].number();
-    const bool known = treatments_[i].inTotal != InTotal::knownSum || value != kNoValue;
-    if (known) treatments_[i].total += value;
+    const bool known = figures_[i].inTotal != InTotal::knownSum || !figures_[i].IsNone(cells_[i]);
+    if (known) totals_[i] += cells_[i].number();
   }
 }
 
-void ReportContextBase::PrintCells(bool totalRow) {
-  for (size_t i = 0; i < cells_.size(); ++i) {
-    if (treatments_[i].toUnit != nullptr) {
-      cells_[i] = treatments_[i].toUnit(cells_[i].number(), unit_);
-    }
+Status PrintReport(const Report& report, int argc, char** argv) {
+  ReportOptions options;
+  if (Status status = ParseReportOptions(*report.frame, argc, argv, options)) return status;
+  if (options.csvMode) {
+    CsvSink sink;
+    return report.run(options, sink);
   }
-  tally::PrintRow(table_.data(), options_.csvMode, totalRow, cells_);
+  TableSink sink;
+  return report.run(options, sink);
 }
 
 }  // namespace tally

@@ -1,8 +1,8 @@
 // What every report is made of.
 //
-// A report states its frame (ReportFrame) and one table of columns (Column): of each its label, its
-// place in the Total row, its unit and the figure of a row that it shows. ReportContext turns these
-// and the rows into output; its address is what the walk over the groups hands to a visitor.
+// A report states its frame (ReportFrame) and a table of columns (Column), and hands its rows to a
+// ReportContext, which turns them into what a Sink takes; the context's address is what the walk
+// over the groups hands to a visitor. A Report is what others know of it.
 #ifndef FRAMEWORK_REPORT_H_
 #define FRAMEWORK_REPORT_H_
 
@@ -10,108 +10,77 @@
 #include <initializer_list>
 #include <span>
 #include <string_view>
+#include <utility>
 #include <vector>
 
-#include "framework/column_table.h"
+#include "framework/column.h"
 #include "framework/display_unit.h"
 #include "framework/flag_filter.h"
 #include "framework/report_options.h"
+#include "framework/sink.h"
 #include "framework/status.h"
 
 namespace tally {
 
-// What a column shows in the Total row.
-enum class InTotal : uint8_t {
-  blank,
-  sum,       // of the rows' figures, 64 bits wrapping; in a text column the label "Total"
-  knownSum,  // of those figures that are not kNoValue
-  mean,      // the sum divided by the number of rows
-};
-
-constexpr InTotal kBlank = InTotal::blank;
-constexpr InTotal kSum = InTotal::sum;
-
-// Whether -s can hide a column.
-enum class Fixed : uint8_t { no, yes };
-
-// One column of a report on `Row`s.
-template <class Row>
-struct Column {
-  const char* name;
-  const char* description;
-  uint8_t width;
-  const char* conversion;  // as in ColumnDesc
-  InTotal inTotal;
-  Conversion toUnit;  // null for what is no amount of memory: it is shown as it is
-  Cell (*value)(const Row& row);
-  Fixed fixed = Fixed::no;
-};
-
-// What all reports do alike, whatever their rows.
+// What all reports do alike, whatever their rows. Every run has its own context, with its own copy
+// of the columns.
 class ReportContextBase {
  public:
-  // Settles unit, filters and columns. On failure the report ends with the status; nothing has been
-  // printed to standard output.
-  Status Begin(const ReportOptions& options);
+  ReportContextBase(const ReportContextBase&) = delete;
+  ReportContextBase& operator=(const ReportContextBase&) = delete;
 
-  // The same after reading the command line.
-  Status Begin(int argc, char** argv);
+  // Settles unit, filters and columns. On failure the report ends with the status; the sink has
+  // been told nothing.
+  Status Settle(const ReportOptions& options);
 
   const ReportOptions& options() const { return options_; }
-  DisplayUnit unit() const { return unit_; }
   const FlagFilter& filter() const { return filter_; }
 
   // Settles the columns.
   void SelectColumns() { ApplyColumnSelection(table_.data(), options_.columnMask); }
 
-  // A line of the title block of a report's own.
-  struct Setting {
+  // A figure of the host as a whole, for the title block.
+  struct HostFigure {
     const char* label;
     uint64_t value;
   };
 
-  // The title block, a report's `own` settings just before the selected columns; nothing in CSV.
-  void PrintTitleBlock(std::initializer_list<Setting> own = {}) const;
+  // Tells the sink what is settled, a report's `own` figures among it; rows may follow.
+  void Begin(std::initializer_list<HostFigure> own = {});
 
-  // The labels between two lines of dashes.
-  void PrintHead() const;
+  void Rule() { sink_.Rule(); }
+  void Note(std::string_view text) { sink_.Note(text); }
 
-  void PrintDashes() const { tally::PrintDashes(table_.data(), options_.csvMode); }
-
-  // The Total row of the rows so far between two lines of dashes.
+  // The Total row of the rows so far between two rules.
   void PrintTotal();
 
   // The descriptions of the columns, when they were asked for.
-  void PrintDescriptions() const;
+  void PrintDescriptions();
 
-  // The sum of the column called `name` over the rows so far.
-  // REQUIRES: there is such a column.
-  uint64_t& total(std::string_view name);
+  // The sum of the column at `place` (PlaceOf) over the rows so far.
+  uint64_t& total(size_t place) { return totals_[place]; }
 
  protected:
-  explicit ReportContextBase(const ReportFrame& frame) : frame_(frame) {}
+  ReportContextBase(const ReportFrame& frame, Sink& sink) : frame_(frame), sink_(sink) {}
+  ~ReportContextBase() = default;
 
-  void AddColumn(const ColumnDesc& desc, InTotal inTotal, Conversion toUnit);
+  void AddColumn(const ColumnInfo& column);
 
   // The cells of the row at hand, in table order.
   std::vector<Cell>& cells() { return cells_; }
   void AddUpCells();
-  void PrintCells(bool totalRow);
+  void PutCells(RowKind kind) { sink_.Row(kind, cells_); }
 
  private:
-  // What a column needs besides its description.
-  struct Treatment {
-    InTotal inTotal;
-    Conversion toUnit;
-    uint64_t total = 0;
-  };
-
   const ReportFrame& frame_;
+  Sink& sink_;
   ReportOptions options_;
   DisplayUnit unit_ = DisplayUnit::kb;
   FlagFilter filter_;
+  std::vector<Setting> settings_;
   std::vector<ColumnDesc> table_{ColumnDesc{}};  // with the null name at its end
-  std::vector<Treatment> treatments_;
+  std::vector<Figure> figures_;
+  std::vector<uint64_t> totals_;
   std::vector<Cell> cells_;
   uint64_t rows_ = 0;  // added up so far
 };
@@ -121,32 +90,23 @@ class ReportContextBase {
 template <class Row, class ColumnOfRow = Column<Row>>
 class ReportContext : public ReportContextBase {
  public:
-  // `frame` and `columns` outlive the context.
-  ReportContext(const ReportFrame& frame, std::span<const ColumnOfRow> columns)
-      : ReportContextBase(frame), columns_(columns) {
-    for (const Column<Row>& column : columns_) {
-      AddColumn({.name = column.name,
-                 .description = column.description,
-                 .width = column.width,
-                 .conversion = column.conversion,
-                 .summable = column.inTotal != InTotal::blank,
-                 .fixed = column.fixed == Fixed::yes,
-                 .selected = true},
-                column.inTotal, column.toUnit);
-    }
+  // `frame`, `columns` and `sink` outlive the context.
+  ReportContext(const ReportFrame& frame, std::span<const ColumnOfRow> columns, Sink& sink)
+      : ReportContextBase(frame, sink), columns_(columns) {
+    for (const ColumnInfo& column : columns_) AddColumn(column);
   }
 
-  // Prints a row and adds it to the Total row.
+  // Puts out a row and adds it to the Total row.
   void PrintRow(const Row& row) {
     FillCells(row);
     AddUpCells();
-    PrintCells(false);
+    PutCells(RowKind::item);
   }
 
-  // Prints a Total row that the kernel counts itself.
+  // Puts out a Total row that the kernel counts itself.
   void PrintTotalRow(const Row& row) {
     FillCells(row);
-    PrintCells(true);
+    PutCells(RowKind::total);
   }
 
  private:
@@ -156,6 +116,34 @@ class ReportContext : public ReportContextBase {
 
   std::span<const ColumnOfRow> columns_;
 };
+
+// The columns that a report has when it goes down so many levels.
+struct ReportVariant {
+  uint32_t levels;
+  std::span<const ColumnInfo> columns;
+};
+
+// The one variant of a report with these columns.
+template <const auto& kColumns>
+constexpr ReportVariant kOnlyVariant[] = {{kMaxLevels, kColumnInfos<kColumns>}};
+
+using ReportEntry = Status (*)(int argc, char** argv);
+
+// A report as others see it. All of it is constant: a report can be run any number of times.
+struct Report {
+  const char* name;  // the word of -r
+  const ReportFrame* frame;
+  std::span<const ReportVariant> variants;
+
+  // Reads the host and puts the report into the sink. A failure has been worded with Warning.
+  Status (*run)(const ReportOptions& options, Sink& sink);
+
+  // Goes on with the scan of the command line and prints the report to standard output.
+  ReportEntry entry;
+};
+
+// What an entry does: runs the report with the options of the command line, as a table or as CSV.
+Status PrintReport(const Report& report, int argc, char** argv);
 
 }  // namespace tally
 

@@ -10,8 +10,6 @@
 namespace tally {
 namespace {
 
-constexpr uint32_t kMaxLevels = 12;
-
 // The long options of all reports; a report has those whose letter is among its short ones.
 constexpr option kLongOptions[] = {
     {"gid", required_argument, nullptr, 'g'},     {"level", required_argument, nullptr, 'l'},

@@ -9,6 +9,9 @@
 
 namespace tally {
 
+// The deepest level of a walk.
+constexpr uint32_t kMaxLevels = 12;
+
 // How a level is compared with the deepest one.
 enum class LevelCheck : uint8_t { asUnsigned, asSigned };
 
@@ -22,7 +25,8 @@ struct ReportFrame {
   int ruleLength;         // dashes below the title
   const char* options;    // short options, for getopt; the long ones follow from them
   int longVerbose = 'v';  // what --verbose is taken for
-  uint32_t defaultLevels = 12;
+  bool totalRow = false;  // the rows are added up
+  uint32_t defaultLevels = kMaxLevels;
   LevelCheck levelCheck = LevelCheck::asUnsigned;
   bool allowBytes = false;  // "b" is a display unit, and the default one
   SelectColumnsAt selectColumnsAt = SelectColumnsAt::afterUnit;
@@ -35,7 +39,7 @@ struct ReportFrame {
 // What the command line says to a report.
 struct ReportOptions {
   int64_t startGid = 0;
-  uint32_t levels = 0;
+  uint32_t levels = kMaxLevels;  // not 0
   const char* unitText = nullptr;
   const char* inclusionText = nullptr;
   const char* exclusionText = nullptr;

@@ -9,8 +9,8 @@
 #include <cstring>
 
 #include <knvlibs/ksi.h>
-#include "frontend/report_names.h"
 #include "frontend/usage.h"
+#include "reports/reports.h"
 
 namespace tally {
 namespace {
@@ -26,7 +26,7 @@ constexpr option kLongOptions[] = {
 };
 
 struct Options {
-  const ReportName* report = nullptr;
+  const Report* report = nullptr;
   const char* cacheFile = nullptr;
   bool checkVersion = true;
 };

@@ -1,13 +1,21 @@
-// The reports' entries, one a report; the front end picks one by name. Each goes on with the scan
-// of the command line, prints its report and returns a status.
+// All reports, for the front end, which picks one by name, and for programs that run one into a
+// sink of their own. The entries, one a report, go on with the scan of the command line, print the
+// report and return a status.
 #ifndef REPORTS_REPORTS_H_
 #define REPORTS_REPORTS_H_
 
+#include <span>
+
+#include "framework/report.h"
 #include "framework/status.h"
 
 namespace tally {
 
-using ReportEntry = Status (*)(int argc, char** argv);
+// In the order of their numbers.
+std::span<const Report* const> Reports();
+
+// The report called `name`, in any case; null when there is none.
+const Report* FindReport(const char* name);
 
 Status TallyGroupStats(int argc, char** argv);
 Status TallyVMStats(int argc, char** argv);
@@ -24,6 +32,22 @@ Status TallyZipStats(int argc, char** argv);
 Status TallyLPageStats(int argc, char** argv);
 Status TallyAsyncRemapStats(int argc, char** argv);
 Status TallyPMemStats(int argc, char** argv);
+
+extern const Report groupStats;
+extern const Report vmStats;
+extern const Report uwStats;
+extern const Report pshareStats;
+extern const Report pshareHintStats;
+extern const Report swapStats;
+extern const Report buddyStats;
+extern const Report compStats;
+extern const Report lpoolStats;
+extern const Report heapStats;
+extern const Report guestStats;
+extern const Report zipStats;
+extern const Report lpageStats;
+extern const Report asyncRemapStats;
+extern const Report pmemStats;
 
 }  // namespace tally
 

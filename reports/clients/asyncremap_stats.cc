@@ -18,6 +18,7 @@ constexpr ReportFrame kFrame = {
     .title = "ASYNC_REMAP STATS",
     .ruleLength = 43,
     .options = "g:s:u:vq",
+    .totalRow = true,
 };
 
 struct RemapRow {
@@ -29,31 +30,29 @@ struct RemapRow {
 
 // No identity column has a cell in the Total row: it bears no label.
 constexpr Column<RemapRow> kColumns[] = {
-    {"name", "Group name", 27, "s", kBlank, nullptr,
-     [](const RemapRow& row) -> Cell { return row.name; }},
-    {"grpLeader", "Group leader ID", 10, "d", kBlank, nullptr,
-     [](const RemapRow& row) -> Cell { return row.grpLeader; }},
-    {"type", "Type of remap", 28, "s", kBlank, nullptr,
-     [](const RemapRow& row) -> Cell { return row.type; }, Fixed::yes},
-    {"added", "Total number of pages ever added", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.added); }},
-    {"prepared", "Number of pages ever prepared", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.prepared); }},
-    {"filtered", "Number of pages ever filtered", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.filtered); }},
-    {"staged", "Number of pages ever staged", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.staged); }},
-    {"remapped", "Total number of pages ever remapped", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.remapped); }},
-    {"canceled", "Total number of pages ever canceled", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.canceled); }},
-    {"cUnprepared", "Number of pages currently unprepared", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cUnprepared); }},
-    {"cPrepared", "Number of pages currently prepared", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cPrepared); }},
-    {"cStaged", "Number of pages currently staged", 10, "Lu", kSum, FromKilobytes,
-     [](const RemapRow& row) -> Cell { return PagesToKilobytes(row.pages.cStaged); }},
+    Text("name", "Group name", [](const RemapRow& row) { return row.name; }).Wide(27),
+    Id("grpLeader", "Group leader ID", [](const RemapRow& row) { return row.grpLeader; }),
+    Text("type", "Type of remap", [](const RemapRow& row) { return row.type; }).Wide(28).Fixed(),
+    Pages("added", "Total number of pages ever added",
+          [](const RemapRow& row) { return row.pages.added; }),
+    Pages("prepared", "Number of pages ever prepared",
+          [](const RemapRow& row) { return row.pages.prepared; }),
+    Pages("filtered", "Number of pages ever filtered",
+          [](const RemapRow& row) { return row.pages.filtered; }),
+    Pages("staged", "Number of pages ever staged",
+          [](const RemapRow& row) { return row.pages.staged; }),
+    Pages("remapped", "Total number of pages ever remapped",
+          [](const RemapRow& row) { return row.pages.remapped; }),
+    Pages("canceled", "Total number of pages ever canceled",
+          [](const RemapRow& row) { return row.pages.canceled; }),
+    Pages("cUnprepared", "Number of pages currently unprepared",
+          [](const RemapRow& row) { return row.pages.cUnprepared; }),
+    Pages("cPrepared", "Number of pages currently prepared",
+          [](const RemapRow& row) { return row.pages.cPrepared; }),
+    Pages("cStaged", "Number of pages currently staged",
+          [](const RemapRow& row) { return row.pages.cStaged; }),
 };
+static_assert(IsSound(kColumns));
 
 // A failure is known by its function and number; the number does not move with the source.
 Status WarnAt(const char* function, unsigned number, Status status) {
@@ -140,11 +139,22 @@ Status TallyAsyncRemapReportCallback(uint64_t gid, uint32_t /*childCount*/, int 
   return kSuccess;
 }
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<RemapRow>(kFrame, kColumns, TallyAsyncRemapReportCallback, options, sink);
+}
+
 }  // namespace
 
+const Report asyncRemapStats = {
+    .name = "asyncremap-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyAsyncRemapStats,
+};
+
 Status TallyAsyncRemapStats(int argc, char** argv) {
-  ReportContext<RemapRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallyAsyncRemapReportCallback, argc, argv);
+  return PrintReport(asyncRemapStats, argc, argv);
 }
 
 }  // namespace tally

@@ -4,6 +4,8 @@
 #define REPORTS_CLIENTS_CLIENT_REPORT_H_
 
 #include <cstdint>
+#include <span>
+#include <type_traits>
 
 #include <knvlibs/ksi_records.h>
 #include "framework/fixed_text.h"
@@ -42,42 +44,23 @@ uint64_t Consumed(const Tally& tally) {
 
 // The columns of these figures; a Row has a member `client`.
 template <class Row>
-constexpr Column<Row> NameColumn(const char* description, uint8_t width, InTotal inTotal) {
-  return {"name", description, width, "s", inTotal, nullptr, [](const Row& row) -> Cell {
-            return FixedText(row.client.name.text);
-          }};
+constexpr Column<Row> NameColumn(const char* description) {
+  return Text("name", description, [](const Row& row) { return FixedText(row.client.name.text); });
 }
 
 template <class Row>
-constexpr Column<Row> kSchedGrpColumn = {
-    "schedGrp",
-    "Scheduler group ID",
-    10,
-    "Lu",
-    InTotal::blank,
-    nullptr,
-    [](const Row& row) -> Cell { return row.client.schedGrp; }};
+constexpr Column<Row> kSchedGrpColumn = Id("schedGrp", "Scheduler group ID",
+                                           [](const Row& row) { return row.client.schedGrp; });
 
 template <class Row>
-constexpr Column<Row> kParSchedGroupColumn = {
-    "parSchedGroup",
-    "Parent scheduler group ID",
-    10,
-    "Lu",
-    InTotal::blank,
-    nullptr,
-    [](const Row& row) -> Cell { return row.client.parSchedGroup; }};
+constexpr Column<Row> kParSchedGroupColumn =
+    Id("parSchedGroup", "Parent scheduler group ID", [](const Row& row) {
+      return row.client.parSchedGroup;
+    }).As("Lu");
 
 template <class Row>
-constexpr Column<Row> WorldGrpColumn(const char* conversion) {
-  return {"worldGrp",
-          "World group ID",
-          10,
-          conversion,
-          InTotal::blank,
-          nullptr,
-          [](const Row& row) -> Cell { return row.client.worldGrp; }};
-}
+constexpr Column<Row> kWorldGrpColumn = Id("worldGrp", "World group ID",
+                                           [](const Row& row) { return row.client.worldGrp; });
 
 // The visitor of a report on virtual machines. A group without the flag gives no row, and the walk
 // goes on into its children; one of which anything cannot be read gives none either and is passed
@@ -97,11 +80,12 @@ Status VisitVirtualMachine(uint64_t groupId, uint32_t /*childCount*/, int /*csvM
 // Runs a report whose visitor prints the rows. The Total row and the closing lines are printed even
 // when the walk failed; its status is the report's.
 template <class Row>
-Status RunClientReport(ReportContext<Row>& context, GroupVisitor visitor, int argc, char** argv) {
-  if (Status status = context.Begin(argc, argv)) return status;
-  context.PrintTitleBlock();
-  context.PrintHead();
-  const ReportOptions& options = context.options();
+Status RunClientReport(const ReportFrame& frame,
+                       std::type_identity_t<std::span<const Column<Row>>> columns,
+                       GroupVisitor visitor, const ReportOptions& options, Sink& sink) {
+  ReportContext<Row> context(frame, columns, sink);
+  if (Status status = context.Settle(options)) return status;
+  context.Begin();
   const Status status = TallyTraverseGroups(static_cast<uint64_t>(options.startGid), options.levels,
                                             options.csvMode, visitor, &context);
   context.PrintTotal();

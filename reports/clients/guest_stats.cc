@@ -14,6 +14,7 @@ constexpr ReportFrame kFrame = {
     .title = "GUEST STATS",
     .ruleLength = 37,
     .options = "g:l:s:u:vq",
+    .totalRow = true,
     .selectColumnsAt = SelectColumnsAt::beforeUnit,
 };
 
@@ -22,20 +23,24 @@ struct GuestStatsRow {
   KSI_GuestTally guest;
 };
 
-constexpr InTotal kKnownSum = InTotal::knownSum;
-
 constexpr Column<GuestStatsRow> kColumns[] = {
-    NameColumn<GuestStatsRow>("Virtual machine name", 20, kSum),
+    NameColumn<GuestStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<GuestStatsRow>,
     kParSchedGroupColumn<GuestStatsRow>,
-    WorldGrpColumn<GuestStatsRow>("d"),
-    {"memTotal", "Total memory", 10, "Ld", kKnownSum, FromKilobytes,
-     [](const GuestStatsRow& row) -> Cell { return row.guest.memTotal; }},
-    {"lpageTotal", "Total large pages available for guest apps", 10, "d", kKnownSum, nullptr,
-     [](const GuestStatsRow& row) -> Cell { return static_cast<int32_t>(row.guest.lpageTotal); }},
-    {"memNeeded", "Memory required by current workload", 10, "Ld", kKnownSum, FromKilobytes,
-     [](const GuestStatsRow& row) -> Cell { return row.guest.memNeeded; }},
+    kWorldGrpColumn<GuestStatsRow>,
+    Kilobytes("memTotal", "Total memory",
+              [](const GuestStatsRow& row) { return row.guest.memTotal; })
+        .As("Ld")
+        .Total(kKnownSum),
+    Count("lpageTotal", "Total large pages available for guest apps",
+          [](const GuestStatsRow& row) { return static_cast<int32_t>(row.guest.lpageTotal); })
+        .Total(kKnownSum),
+    Kilobytes("memNeeded", "Memory required by current workload",
+              [](const GuestStatsRow& row) { return row.guest.memNeeded; })
+        .As("Ld")
+        .Total(kKnownSum),
 };
+static_assert(IsSound(kColumns));
 
 Status ReadGuestStats(uint64_t /*gid*/, GuestStatsRow& row) {
   return ReadClientRecord("TallyGuestGetStats", row.client.worldGrp,
@@ -44,11 +49,20 @@ Status ReadGuestStats(uint64_t /*gid*/, GuestStatsRow& row) {
 
 constexpr GroupVisitor TallyGuestStatsGroup = VisitVirtualMachine<GuestStatsRow, ReadGuestStats>;
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<GuestStatsRow>(kFrame, kColumns, TallyGuestStatsGroup, options, sink);
+}
+
 }  // namespace
 
-Status TallyGuestStats(int argc, char** argv) {
-  ReportContext<GuestStatsRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallyGuestStatsGroup, argc, argv);
-}
+const Report guestStats = {
+    .name = "guest-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyGuestStats,
+};
+
+Status TallyGuestStats(int argc, char** argv) { return PrintReport(guestStats, argc, argv); }
 
 }  // namespace tally

@@ -14,6 +14,7 @@ constexpr ReportFrame kFrame = {
     .title = "VIRTUAL MACHINE LARGE PAGE STATS",
     .ruleLength = 58,
     .options = "g:l:s:u:vq",
+    .totalRow = true,
 };
 
 struct LPageStatsRow {
@@ -23,29 +24,32 @@ struct LPageStatsRow {
 };
 
 constexpr Column<LPageStatsRow> kColumns[] = {
-    NameColumn<LPageStatsRow>("Virtual machine name", 20, kSum),
+    NameColumn<LPageStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<LPageStatsRow>,
     kParSchedGroupColumn<LPageStatsRow>,
-    WorldGrpColumn<LPageStatsRow>("u"),
-    {"nrBackings", "Current number of lpage backings", 10, "u", kSum, nullptr,
-     [](const LPageStatsRow& row) -> Cell { return row.lpage.nrBackings; }},
-    {"nrAllocSuccess", "Number of lpage mapping attempts succeeded", 10, "Lu", kSum, nullptr,
-     [](const LPageStatsRow& row) -> Cell { return row.lpage.nrAllocSuccess; }},
-    {"nrLocked", "Number of guest lpage mappings created", 10, "Lu", kSum, nullptr,
-     [](const LPageStatsRow& row) -> Cell { return row.lpage.nrLocked; }},
-    {"nrBroken", "Number of guest lpage mappings broken", 10, "Lu", kSum, nullptr,
-     [](const LPageStatsRow& row) -> Cell { return row.lpage.nrBroken; }},
-    {"maxSwapThreshold", "Current max swap-in threshold to map lpage", 10, "Lu", kSum, nullptr,
-     [](const LPageStatsRow& row) -> Cell { return row.lpage.maxSwapThreshold; }},
-    {"nrFailPinned", "Number of lpage mapping attempts failed due to pinning", 10, "Lu", kSum,
-     nullptr, [](const LPageStatsRow& row) -> Cell { return row.lpage.nrFailPinned; }},
-    {"nrFailSwapped", "Number of lpage mapping attempts failed to avoid excessive swapins", 10,
-     "Lu", kSum, nullptr, [](const LPageStatsRow& row) -> Cell { return row.lpage.nrFailSwapped; }},
-    {"nrFailPinnedLate", "Number of lpage mapping attempts failed due to late pinning", 10, "Lu",
-     kSum, nullptr, [](const LPageStatsRow& row) -> Cell { return row.lpage.nrFailPinnedLate; }},
-    {"nrFailNoMem", "Number of lpage mapping attempts failed due to lack of memory", 10, "Lu", kSum,
-     nullptr, [](const LPageStatsRow& row) -> Cell { return row.lpage.nrFailNoMem; }},
+    kWorldGrpColumn<LPageStatsRow>.As("u"),
+    Count("nrBackings", "Current number of lpage backings",
+          [](const LPageStatsRow& row) { return row.lpage.nrBackings; }),
+    Count("nrAllocSuccess", "Number of lpage mapping attempts succeeded",
+          [](const LPageStatsRow& row) { return row.lpage.nrAllocSuccess; }),
+    Count("nrLocked", "Number of guest lpage mappings created",
+          [](const LPageStatsRow& row) { return row.lpage.nrLocked; })
+        .As("Lu"),
+    Count("nrBroken", "Number of guest lpage mappings broken",
+          [](const LPageStatsRow& row) { return row.lpage.nrBroken; }),
+    Count("maxSwapThreshold", "Current max swap-in threshold to map lpage",
+          [](const LPageStatsRow& row) { return row.lpage.maxSwapThreshold; })
+        .As("Lu"),
+    Count("nrFailPinned", "Number of lpage mapping attempts failed due to pinning",
+          [](const LPageStatsRow& row) { return row.lpage.nrFailPinned; }),
+    Count("nrFailSwapped", "Number of lpage mapping attempts failed to avoid excessive swapins",
+          [](const LPageStatsRow& row) { return row.lpage.nrFailSwapped; }),
+    Count("nrFailPinnedLate", "Number of lpage mapping attempts failed due to late pinning",
+          [](const LPageStatsRow& row) { return row.lpage.nrFailPinnedLate; }),
+    Count("nrFailNoMem", "Number of lpage mapping attempts failed due to lack of memory",
+          [](const LPageStatsRow& row) { return row.lpage.nrFailNoMem; }),
 };
+static_assert(IsSound(kColumns));
 
 Status ReadLPageStats(uint64_t /*gid*/, LPageStatsRow& row) {
   Status status = kSuccess;
@@ -59,11 +63,20 @@ Status ReadLPageStats(uint64_t /*gid*/, LPageStatsRow& row) {
 
 constexpr GroupVisitor TallyLPageStatsGroup = VisitVirtualMachine<LPageStatsRow, ReadLPageStats>;
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<LPageStatsRow>(kFrame, kColumns, TallyLPageStatsGroup, options, sink);
+}
+
 }  // namespace
 
-Status TallyLPageStats(int argc, char** argv) {
-  ReportContext<LPageStatsRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallyLPageStatsGroup, argc, argv);
-}
+const Report lpageStats = {
+    .name = "lpage-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyLPageStats,
+};
+
+Status TallyLPageStats(int argc, char** argv) { return PrintReport(lpageStats, argc, argv); }
 
 }  // namespace tally

@@ -16,6 +16,7 @@ constexpr ReportFrame kFrame = {
     .title = "VIRTUAL MACHINE SWAP STATS",
     .ruleLength = 52,
     .options = "g:l:s:u:vq",
+    .totalRow = true,
 };
 
 struct SwapStatsRow {
@@ -26,62 +27,66 @@ struct SwapStatsRow {
 };
 
 constexpr Column<SwapStatsRow> kColumns[] = {
-    NameColumn<SwapStatsRow>("Virtual machine name", 20, kSum),
+    NameColumn<SwapStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<SwapStatsRow>,
     kParSchedGroupColumn<SwapStatsRow>,
-    WorldGrpColumn<SwapStatsRow>("d"),
-    {"isSwapping", "is the VM currently swapping out", 10, "c", kBlank, nullptr,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.isSwapping != 0 ? 'y' : 'n'; }},
-    {"CurSwapper", "knv or vmm swapper currently active", 10, "s", kBlank, nullptr,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.curSwapper == 0 ? "vmm" : "knv"; }},
-    {"cacheUsage", "Swap slot cache usage", 10, "Lu", kBlank, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.cacheUsage; }},
-    {"swapoutReady", "Ready-time spent by swap-out client", 10, "Lu", kBlank, nullptr,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.swapoutReady; }},
-    {"swapTgt", "Host swap target", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.swapTgt; }},
-    {"swapped", "Amount swapped by host", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.swapped; }},
-    {"swapRead", "Total guest phsyical memory read, and not released, from swap space", 10, "Lu",
-     kSum, FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.swap.swapRead; }},
-    {"swapIn", "Total guest phsyical memory swapped in, and released, from swap space", 10, "Lu",
-     kSum, FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.swap.swapIn; }},
-    {"swapOut", "Total guest physical memory swapped out to swap space", 10, "Lu", kSum,
-     FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.swap.swapOut; }},
-    {"discarded", "Total swapped memory discarded from swap space", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.discarded; }},
-    {"COWSwapper", "Total guest physical memory swapped out which was marked as COW by Kernova", 10,
-     "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.COWSwapper; }},
-    {"vmmSwapOn", "Number of times vmm swapper was turned on", 10, "Lu", kSum, nullptr,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.vmmSwapOn; }},
-    {"knvSwapOn", "Number of times knv swapper was turned on", 10, "Lu", kSum, nullptr,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.knvSwapOn; }},
-    {"llswapped", "Memory swapped to llswap", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.vmm.llswapped; }},
-    {"llswapUsed", "Total space used in llswap including internal fragmentation", 10, "Lu", kSum,
-     FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.vmm.llswapUsed; }},
-    {"totalReg", "Total space in the regular swap file", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.totalReg; }},
-    {"freeReg", "Free space in the regular swap file", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.freeReg; }},
-    {"cptTgt", "Total checkpoint memory to read", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.cptTgt; }},
-    {"cptRead", "Checkpoint memory read from checkpoint file", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.cptRead; }},
-    {"cptWritten", "Checkpoint memory written to checkpoint file", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.cptWritten; }},
-    {"totalMig", "Total space in the migration swap file", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.totalMig; }},
-    {"freeMig", "Free space in the migration swap file", 10, "Lu", kSum, FromKilobytes,
-     [](const SwapStatsRow& row) -> Cell { return row.swap.freeMig; }},
-    {"gblSwapRead", "Guest physical memory read from global swap file", 10, "Lu", kSum,
-     FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.swap.gblSwapRead; }},
-    {"gblSwapIn", "Guest physical memory swapped in from global swap file", 10, "Lu", kSum,
-     FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.swap.gblSwapIn; }},
-    {"gblSwapOut", "Guest physical memory swapped out to global swap file", 10, "Lu", kSum,
-     FromKilobytes, [](const SwapStatsRow& row) -> Cell { return row.swap.gblSwapOut; }},
+    kWorldGrpColumn<SwapStatsRow>,
+    Flag("isSwapping", "is the VM currently swapping out",
+         [](const SwapStatsRow& row) { return row.swap.isSwapping != 0; }),
+    Text("CurSwapper", "knv or vmm swapper currently active",
+         [](const SwapStatsRow& row) { return row.swap.curSwapper == 0 ? "vmm" : "knv"; }),
+    Kilobytes("cacheUsage", "Swap slot cache usage",
+              [](const SwapStatsRow& row) { return row.swap.cacheUsage; })
+        .Total(kBlank),
+    Time("swapoutReady", "Ready-time spent by swap-out client",
+         [](const SwapStatsRow& row) { return row.swap.swapoutReady; }),
+    Kilobytes("swapTgt", "Host swap target",
+              [](const SwapStatsRow& row) { return row.swap.swapTgt; }),
+    Kilobytes("swapped", "Amount swapped by host",
+              [](const SwapStatsRow& row) { return row.swap.swapped; }),
+    Kilobytes("swapRead", "Total guest phsyical memory read, and not released, from swap space",
+              [](const SwapStatsRow& row) { return row.swap.swapRead; }),
+    Kilobytes("swapIn", "Total guest phsyical memory swapped in, and released, from swap space",
+              [](const SwapStatsRow& row) { return row.swap.swapIn; }),
+    Kilobytes("swapOut", "Total guest physical memory swapped out to swap space",
+              [](const SwapStatsRow& row) { return row.swap.swapOut; }),
+    Kilobytes("discarded", "Total swapped memory discarded from swap space",
+              [](const SwapStatsRow& row) { return row.swap.discarded; }),
+    Kilobytes("COWSwapper",
+              "Total guest physical memory swapped out which was marked as COW by Kernova",
+              [](const SwapStatsRow& row) { return row.swap.COWSwapper; }),
+    Count("vmmSwapOn", "Number of times vmm swapper was turned on",
+          [](const SwapStatsRow& row) { return row.swap.vmmSwapOn; })
+        .As("Lu"),
+    Count("knvSwapOn", "Number of times knv swapper was turned on",
+          [](const SwapStatsRow& row) { return row.swap.knvSwapOn; })
+        .As("Lu"),
+    Kilobytes("llswapped", "Memory swapped to llswap",
+              [](const SwapStatsRow& row) { return row.vmm.llswapped; }),
+    Kilobytes("llswapUsed", "Total space used in llswap including internal fragmentation",
+              [](const SwapStatsRow& row) { return row.vmm.llswapUsed; }),
+    Kilobytes("totalReg", "Total space in the regular swap file",
+              [](const SwapStatsRow& row) { return row.swap.totalReg; }),
+    Kilobytes("freeReg", "Free space in the regular swap file",
+              [](const SwapStatsRow& row) { return row.swap.freeReg; }),
+    Kilobytes("cptTgt", "Total checkpoint memory to read",
+              [](const SwapStatsRow& row) { return row.swap.cptTgt; }),
+    Kilobytes("cptRead", "Checkpoint memory read from checkpoint file",
+              [](const SwapStatsRow& row) { return row.swap.cptRead; }),
+    Kilobytes("cptWritten", "Checkpoint memory written to checkpoint file",
+              [](const SwapStatsRow& row) { return row.swap.cptWritten; }),
+    Kilobytes("totalMig", "Total space in the migration swap file",
+              [](const SwapStatsRow& row) { return row.swap.totalMig; }),
+    Kilobytes("freeMig", "Free space in the migration swap file",
+              [](const SwapStatsRow& row) { return row.swap.freeMig; }),
+    Kilobytes("gblSwapRead", "Guest physical memory read from global swap file",
+              [](const SwapStatsRow& row) { return row.swap.gblSwapRead; }),
+    Kilobytes("gblSwapIn", "Guest physical memory swapped in from global swap file",
+              [](const SwapStatsRow& row) { return row.swap.gblSwapIn; }),
+    Kilobytes("gblSwapOut", "Guest physical memory swapped out to global swap file",
+              [](const SwapStatsRow& row) { return row.swap.gblSwapOut; }),
 };
+static_assert(IsSound(kColumns));
 
 // The swapping is read before the tally here, the other way round from vm-stats.
 Status ReadSwapStats(uint64_t /*gid*/, SwapStatsRow& row) {
@@ -98,11 +103,20 @@ Status ReadSwapStats(uint64_t /*gid*/, SwapStatsRow& row) {
 
 constexpr GroupVisitor TallySwapStatsGroup = VisitVirtualMachine<SwapStatsRow, ReadSwapStats>;
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<SwapStatsRow>(kFrame, kColumns, TallySwapStatsGroup, options, sink);
+}
+
 }  // namespace
 
-Status TallySwapStats(int argc, char** argv) {
-  ReportContext<SwapStatsRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallySwapStatsGroup, argc, argv);
-}
+const Report swapStats = {
+    .name = "swap-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallySwapStats,
+};
+
+Status TallySwapStats(int argc, char** argv) { return PrintReport(swapStats, argc, argv); }
 
 }  // namespace tally

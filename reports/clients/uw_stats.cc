@@ -15,6 +15,7 @@ constexpr ReportFrame kFrame = {
     .title = "USER-WORLD STATS",
     .ruleLength = 42,
     .options = "e:g:i:l:s:u:vq",
+    .totalRow = true,
     .filterNames = uwTypeNames,
 };
 
@@ -34,63 +35,70 @@ uint64_t LimitOrNone(int64_t kilobytes) {
 
 // Neither type nor name has a cell in the Total row: it bears no label.
 constexpr Column<UWStatsRow> kColumns[] = {
-    {"type", "Type of user-world (uw: stand-alone, vm: VM-based)", 20, "s", kBlank, nullptr,
-     [](const UWStatsRow& row) -> Cell { return row.typeNames.text(); }},
-    NameColumn<UWStatsRow>("User world name", 20, kBlank),
+    Text("type", "Type of user-world (uw: stand-alone, vm: VM-based)",
+         [](const UWStatsRow& row) { return row.typeNames.text(); })
+        .Wide(20),
+    NameColumn<UWStatsRow>("User world name").Wide(20),
     kSchedGrpColumn<UWStatsRow>,
     kParSchedGroupColumn<UWStatsRow>,
-    WorldGrpColumn<UWStatsRow>("d"),
-    {"min", "Configured memory reservation", 10, "Ld", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.min; }},
-    {"max", "Configured memory limit", 10, "Ld", kBlank, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return LimitOrNone(row.uw.max); }},
-    {"minLimit", "Configured memory reservation limit", 10, "Ld", kBlank, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return LimitOrNone(row.uw.minLimit); }},
-    {"shares", "Configured memory shares", 10, "Ld", kBlank, nullptr,
-     [](const UWStatsRow& row) -> Cell { return row.uw.shares; }},
-    {"totalResv", "Total memory reservation", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.totalResv; }},
-    {"pinnedResv", "Memory reserved for pinning purposes", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.pinnedResv; }},
-    {"memSizeLimit", "Limit on virtual address-space size", 10, "Ld", kBlank, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.memSizeLimit; }},
-    {"memSize", "Current virtual address-space size", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.memSize; }},
-    {"memBStore", "Memory backing store consumed", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.memBStore; }},
-    {"swapBStore", "Swap backing store consumed", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.swapBStore; }},
-    {"mapped", "Virtual address-space size backed by physical memory (private + shared + pinned)",
-     10, "Lu", kSum, FromKilobytes, [](const UWStatsRow& row) -> Cell { return row.uw.mapped; }},
-    {"touched", "Virtual memory touched used by VM", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.touched; }},
-    {"swappable", "Non-shared mapped memory that can be reclaimed", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.swappable; }},
-    {"cow", "COW memory", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.cow; }},
-    {"pageable", "Accounted pageable memory", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.pageable; }},
-    {"pageableUnacct", "Unaccounted pageable memory", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.pageableUnacct; }},
-    {"pinned", "Non-swappable mapped memory", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.pinned; }},
-    {"prealloced", "Preallocated memory", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.prealloced; }},
-    {"shm", "SHM memory", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.shm; }},
-    {"allocTgt", "Physical memory allocation target", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.allocTgt; }},
-    {"consumed", "Physical memory consumed", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return Consumed(row.uw); }},
-    {"swapTgt", "Swap target", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.swapTgt; }},
-    {"swapped", "Memory swapped to secondary storage", 10, "Lu", kSum, FromKilobytes,
-     [](const UWStatsRow& row) -> Cell { return row.uw.swapped; }},
-    {"useReliableMem", "Uses Reliable memory", 1, "s", kBlank, nullptr,
-     [](const UWStatsRow& row) -> Cell { return row.uw.useReliableMem != 0 ? "y" : "n"; }},
-    {"swapScope", "Swap scope", 1, "Lu", kBlank, nullptr,
-     [](const UWStatsRow& row) -> Cell { return row.uw.swapScope; }},
+    kWorldGrpColumn<UWStatsRow>,
+    Kilobytes("min", "Configured memory reservation",
+              [](const UWStatsRow& row) { return row.uw.min; }),
+    Kilobytes("max", "Configured memory limit",
+              [](const UWStatsRow& row) { return LimitOrNone(row.uw.max); })
+        .As("Ld")
+        .Total(kBlank),
+    Kilobytes("minLimit", "Configured memory reservation limit",
+              [](const UWStatsRow& row) { return LimitOrNone(row.uw.minLimit); })
+        .As("Ld")
+        .Total(kBlank),
+    Count("shares", "Configured memory shares", [](const UWStatsRow& row) { return row.uw.shares; })
+        .As("Ld")
+        .Total(kBlank),
+    Kilobytes("totalResv", "Total memory reservation",
+              [](const UWStatsRow& row) { return row.uw.totalResv; }),
+    Kilobytes("pinnedResv", "Memory reserved for pinning purposes",
+              [](const UWStatsRow& row) { return row.uw.pinnedResv; }),
+    Kilobytes("memSizeLimit", "Limit on virtual address-space size",
+              [](const UWStatsRow& row) { return row.uw.memSizeLimit; })
+        .Total(kBlank),
+    Kilobytes("memSize", "Current virtual address-space size",
+              [](const UWStatsRow& row) { return row.uw.memSize; }),
+    Kilobytes("memBStore", "Memory backing store consumed",
+              [](const UWStatsRow& row) { return row.uw.memBStore; }),
+    Kilobytes("swapBStore", "Swap backing store consumed",
+              [](const UWStatsRow& row) { return row.uw.swapBStore; }),
+    Kilobytes("mapped",
+              "Virtual address-space size backed by physical memory (private + shared + pinned)",
+              [](const UWStatsRow& row) { return row.uw.mapped; }),
+    Kilobytes("touched", "Virtual memory touched used by VM",
+              [](const UWStatsRow& row) { return row.uw.touched; }),
+    Kilobytes("swappable", "Non-shared mapped memory that can be reclaimed",
+              [](const UWStatsRow& row) { return row.uw.swappable; }),
+    Kilobytes("cow", "COW memory", [](const UWStatsRow& row) { return row.uw.cow; }),
+    Kilobytes("pageable", "Accounted pageable memory",
+              [](const UWStatsRow& row) { return row.uw.pageable; }),
+    Kilobytes("pageableUnacct", "Unaccounted pageable memory",
+              [](const UWStatsRow& row) { return row.uw.pageableUnacct; }),
+    Kilobytes("pinned", "Non-swappable mapped memory",
+              [](const UWStatsRow& row) { return row.uw.pinned; }),
+    Kilobytes("prealloced", "Preallocated memory",
+              [](const UWStatsRow& row) { return row.uw.prealloced; }),
+    Kilobytes("shm", "SHM memory", [](const UWStatsRow& row) { return row.uw.shm; }),
+    Kilobytes("allocTgt", "Physical memory allocation target",
+              [](const UWStatsRow& row) { return row.uw.allocTgt; }),
+    Kilobytes("consumed", "Physical memory consumed",
+              [](const UWStatsRow& row) { return Consumed(row.uw); }),
+    Kilobytes("swapTgt", "Swap target", [](const UWStatsRow& row) { return row.uw.swapTgt; }),
+    Kilobytes("swapped", "Memory swapped to secondary storage",
+              [](const UWStatsRow& row) { return row.uw.swapped; }),
+    Flag("useReliableMem", "Uses Reliable memory",
+         [](const UWStatsRow& row) { return row.uw.useReliableMem != 0; })
+        .Wide(1)
+        .As("s"),
+    Code("swapScope", "Swap scope", [](const UWStatsRow& row) { return row.uw.swapScope; }).Wide(1),
 };
+static_assert(IsSound(kColumns));
 
 Status TallyUWStatsGroup(uint64_t gid, uint32_t /*childCount*/, int /*csvMode*/, void* opaque) {
   auto& context = *static_cast<ReportContext<UWStatsRow>*>(opaque);
@@ -110,11 +118,20 @@ Status TallyUWStatsGroup(uint64_t gid, uint32_t /*childCount*/, int /*csvMode*/,
   return kSuccess;
 }
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<UWStatsRow>(kFrame, kColumns, TallyUWStatsGroup, options, sink);
+}
+
 }  // namespace
 
-Status TallyUWStats(int argc, char** argv) {
-  ReportContext<UWStatsRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallyUWStatsGroup, argc, argv);
-}
+const Report uwStats = {
+    .name = "uw-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyUWStats,
+};
+
+Status TallyUWStats(int argc, char** argv) { return PrintReport(uwStats, argc, argv); }
 
 }  // namespace tally

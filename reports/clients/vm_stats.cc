@@ -17,6 +17,7 @@ constexpr ReportFrame kFrame = {
     .title = "VIRTUAL MACHINE STATS",
     .ruleLength = 47,
     .options = "g:l:s:u:vq",
+    .totalRow = true,
     .selectColumnsAt = SelectColumnsAt::beforeUnit,
 };
 
@@ -45,68 +46,75 @@ int32_t LimitOrNone(int64_t kilobytes) {
 }
 
 constexpr Column<VMStatsRow> kColumns[] = {
-    NameColumn<VMStatsRow>("Virtual machine name", 15, kSum),
-    {"b", "Is balloon driver active?", 1, "c", kBlank, nullptr,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.balloonActive != 0 ? 'y' : 'n'; }},
+    NameColumn<VMStatsRow>("Virtual machine name").Wide(15).Total(kLabel),
+    Flag("b", "Is balloon driver active?",
+         [](const VMStatsRow& row) { return row.vmm.balloonActive != 0; })
+        .Wide(1),
     kSchedGrpColumn<VMStatsRow>,
     kParSchedGroupColumn<VMStatsRow>,
-    WorldGrpColumn<VMStatsRow>("d"),
-    {"memSizeLimit", "Upper bound on guest physical memory size", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.memSizeLimit; }},
-    {"memSize", "Guest physical memory size", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.memSize; }},
-    {"min", "Configured host physical memory reservation for guest", 10, "Ld", kSum,
-     FromSigned32Kilobytes,
-     [](const VMStatsRow& row) -> Cell { return static_cast<int32_t>(row.allocation.min); }},
-    {"max", "Configured host physical memory limit for guest", 10, "Ld", kBlank,
-     FromSigned32Kilobytes,
-     [](const VMStatsRow& row) -> Cell { return LimitOrNone(row.allocation.max); }},
-    {"minLimit", "Configured upper bound for VM reservation (includes ovhdResv)", 10, "Ld", kBlank,
-     FromSigned32Kilobytes,
-     [](const VMStatsRow& row) -> Cell { return LimitOrNone(row.allocation.minLimit); }},
-    {"shares", "Configured shares", 10, "Ld", kBlank, nullptr,
-     [](const VMStatsRow& row) -> Cell { return row.allocation.shares; }},
-    {"ovhdResv", "Reserved overhead memory", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.memory.ovhdResv; }},
-    {"ovhd", "Consumed overhead memory", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.memory.ovhd; }},
-    {"allocTgt", "Host physical memory allocation target", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.allocTgt; }},
-    {"consumed", "Host physical memory consumed by guest", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return Consumed(row.vmm); }},
-    {"balloonTgt", "Target balloon size", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.balloonTgt; }},
-    {"ballooned", "Actual balloon size", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.ballooned; }},
-    {"swapTgt", "Host swap target", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.swapTgt; }},
-    {"swapped", "Amount swapped by host", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.swap.swapped; }},
-    {"mapped", "Guest physical memory backed by host memory", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.mapped; }},
-    {"touched", "Guest physical memory actively used by VM", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.touched; }},
-    {"zipped", "Guest physical memory that is compressed", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.zipped; }},
-    {"vpmemRO", "Guest physical persistent memory that is cached read-only", 10, "Lu", kSum,
-     FromKilobytes, [](const VMStatsRow& row) -> Cell { return row.vmm.vpmemRO; }},
-    {"vpmemRW", "Guest physical persistent memory that is cached read-write", 10, "Lu", kSum,
-     FromKilobytes, [](const VMStatsRow& row) -> Cell { return row.vmm.vpmemRW; }},
-    {"vpmemUC", "Guest physical persistent memory that is not yet cached", 10, "Lu", kSum,
-     FromKilobytes, [](const VMStatsRow& row) -> Cell { return row.vmm.vpmemUC; }},
-    {"zipSaved", "Host physical memory saved by compression", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.zipSaved; }},
-    {"shared", "Subset of mapped that is marked COW as a result of page-sharing", 10, "Lu", kSum,
-     FromKilobytes, [](const VMStatsRow& row) -> Cell { return row.vmm.shared; }},
-    {"zero", "Subset of shared pages that are zero-filled", 10, "Lu", kSum, FromKilobytes,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.zero; }},
-    {"sharedSaved", "Host physical memory saved as a result of page-sharing", 10, "Lu", kSum,
-     FromKilobytes, [](const VMStatsRow& row) -> Cell { return row.vmm.sharedSaved; }},
-    {"useReliableMem", "Uses Reliable memory", 1, "s", kBlank, nullptr,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.useReliableMem != 0 ? "y" : "n"; }},
-    {"swapScope", "Swap scope", 1, "Lu", kBlank, nullptr,
-     [](const VMStatsRow& row) -> Cell { return row.vmm.swapScope; }},
+    kWorldGrpColumn<VMStatsRow>,
+    Kilobytes("memSizeLimit", "Upper bound on guest physical memory size",
+              [](const VMStatsRow& row) { return row.vmm.memSizeLimit; }),
+    Kilobytes("memSize", "Guest physical memory size",
+              [](const VMStatsRow& row) { return row.vmm.memSize; }),
+    Kilobytes("min", "Configured host physical memory reservation for guest",
+              [](const VMStatsRow& row) { return static_cast<int32_t>(row.allocation.min); })
+        .Through(FromSigned32Kilobytes),
+    Kilobytes("max", "Configured host physical memory limit for guest",
+              [](const VMStatsRow& row) { return LimitOrNone(row.allocation.max); })
+        .Through(FromSigned32Kilobytes)
+        .Total(kBlank),
+    Kilobytes("minLimit", "Configured upper bound for VM reservation (includes ovhdResv)",
+              [](const VMStatsRow& row) { return LimitOrNone(row.allocation.minLimit); })
+        .Through(FromSigned32Kilobytes)
+        .Total(kBlank),
+    Count("shares", "Configured shares",
+          [](const VMStatsRow& row) { return row.allocation.shares; })
+        .As("Ld")
+        .Total(kBlank),
+    Kilobytes("ovhdResv", "Reserved overhead memory",
+              [](const VMStatsRow& row) { return row.memory.ovhdResv; }),
+    Kilobytes("ovhd", "Consumed overhead memory",
+              [](const VMStatsRow& row) { return row.memory.ovhd; }),
+    Kilobytes("allocTgt", "Host physical memory allocation target",
+              [](const VMStatsRow& row) { return row.vmm.allocTgt; }),
+    Kilobytes("consumed", "Host physical memory consumed by guest",
+              [](const VMStatsRow& row) { return Consumed(row.vmm); }),
+    Kilobytes("balloonTgt", "Target balloon size",
+              [](const VMStatsRow& row) { return row.vmm.balloonTgt; }),
+    Kilobytes("ballooned", "Actual balloon size",
+              [](const VMStatsRow& row) { return row.vmm.ballooned; }),
+    Kilobytes("swapTgt", "Host swap target", [](const VMStatsRow& row) { return row.vmm.swapTgt; }),
+    Kilobytes("swapped", "Amount swapped by host",
+              [](const VMStatsRow& row) { return row.swap.swapped; }),
+    Kilobytes("mapped", "Guest physical memory backed by host memory",
+              [](const VMStatsRow& row) { return row.vmm.mapped; }),
+    Kilobytes("touched", "Guest physical memory actively used by VM",
+              [](const VMStatsRow& row) { return row.vmm.touched; }),
+    Kilobytes("zipped", "Guest physical memory that is compressed",
+              [](const VMStatsRow& row) { return row.vmm.zipped; }),
+    Kilobytes("vpmemRO", "Guest physical persistent memory that is cached read-only",
+              [](const VMStatsRow& row) { return row.vmm.vpmemRO; }),
+    Kilobytes("vpmemRW", "Guest physical persistent memory that is cached read-write",
+              [](const VMStatsRow& row) { return row.vmm.vpmemRW; }),
+    Kilobytes("vpmemUC", "Guest physical persistent memory that is not yet cached",
+              [](const VMStatsRow& row) { return row.vmm.vpmemUC; }),
+    Kilobytes("zipSaved", "Host physical memory saved by compression",
+              [](const VMStatsRow& row) { return row.vmm.zipSaved; }),
+    Kilobytes("shared", "Subset of mapped that is marked COW as a result of page-sharing",
+              [](const VMStatsRow& row) { return row.vmm.shared; }),
+    Kilobytes("zero", "Subset of shared pages that are zero-filled",
+              [](const VMStatsRow& row) { return row.vmm.zero; }),
+    Kilobytes("sharedSaved", "Host physical memory saved as a result of page-sharing",
+              [](const VMStatsRow& row) { return row.vmm.sharedSaved; }),
+    Flag("useReliableMem", "Uses Reliable memory",
+         [](const VMStatsRow& row) { return row.vmm.useReliableMem != 0; })
+        .Wide(1)
+        .As("s"),
+    Code("swapScope", "Swap scope", [](const VMStatsRow& row) { return row.vmm.swapScope; })
+        .Wide(1),
 };
+static_assert(IsSound(kColumns));
 
 Status ReadVMStats(uint64_t gid, VMStatsRow& row) {
   Status status = kSuccess;
@@ -124,11 +132,20 @@ Status ReadVMStats(uint64_t gid, VMStatsRow& row) {
 
 constexpr GroupVisitor TallyVMStatsGroup = VisitVirtualMachine<VMStatsRow, ReadVMStats>;
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<VMStatsRow>(kFrame, kColumns, TallyVMStatsGroup, options, sink);
+}
+
 }  // namespace
 
-Status TallyVMStats(int argc, char** argv) {
-  ReportContext<VMStatsRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallyVMStatsGroup, argc, argv);
-}
+const Report vmStats = {
+    .name = "vm-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyVMStats,
+};
+
+Status TallyVMStats(int argc, char** argv) { return PrintReport(vmStats, argc, argv); }
 
 }  // namespace tally

@@ -14,6 +14,7 @@ constexpr ReportFrame kFrame = {
     .title = "VIRTUAL MACHINE COMPRESSION STATS",
     .ruleLength = 61,
     .options = "g:l:s:u:vq",
+    .totalRow = true,
 };
 
 struct ZipStatsRow {
@@ -21,34 +22,37 @@ struct ZipStatsRow {
   KSI_MemzipInfo zip;
 };
 
-constexpr InTotal kMean = InTotal::mean;
-
 constexpr Column<ZipStatsRow> kColumns[] = {
-    NameColumn<ZipStatsRow>("Virtual machine name", 20, kSum),
+    NameColumn<ZipStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<ZipStatsRow>,
     kParSchedGroupColumn<ZipStatsRow>,
-    WorldGrpColumn<ZipStatsRow>("d"),
-    {"totalCache", "Total compression cache configured", 10, "Lu", kSum, FromKilobytes,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.totalCache; }},
-    {"maxCache", "Maximum compression cache", 10, "Lu", kSum, FromKilobytes,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.maxCache; }},
-    {"usedCache", "Total compression cache used", 10, "Lu", kSum, FromKilobytes,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.usedCache; }},
-    {"zipped", "Total memory compressed", 10, "Lu", kSum, FromKilobytes,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.zipped; }},
-    {"unZipped", "Total memory decompressed", 10, "Lu", kSum, FromKilobytes,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.unZipped; }},
-    {"zipRejected", "Total memory rejected", 10, "Lu", kSum, FromKilobytes,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.zipRejected; }},
-    {"nrFreeHalf", "Total free half pages", 10, "Lu", kSum, nullptr,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.nrFreeHalf; }},
-    {"nrFreeQuarter", "Total free quarter pages", 10, "Lu", kSum, nullptr,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.nrFreeQuarter; }},
-    {"avgZipTime", "Average compression time in usec", 10, "Lu", kMean, nullptr,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.avgZipTime; }},
-    {"avgUnzipTime", "Average decompression time in usec", 10, "Lu", kMean, nullptr,
-     [](const ZipStatsRow& row) -> Cell { return row.zip.avgUnzipTime; }},
+    kWorldGrpColumn<ZipStatsRow>,
+    Kilobytes("totalCache", "Total compression cache configured",
+              [](const ZipStatsRow& row) { return row.zip.totalCache; }),
+    Kilobytes("maxCache", "Maximum compression cache",
+              [](const ZipStatsRow& row) { return row.zip.maxCache; }),
+    Kilobytes("usedCache", "Total compression cache used",
+              [](const ZipStatsRow& row) { return row.zip.usedCache; }),
+    Kilobytes("zipped", "Total memory compressed",
+              [](const ZipStatsRow& row) { return row.zip.zipped; }),
+    Kilobytes("unZipped", "Total memory decompressed",
+              [](const ZipStatsRow& row) { return row.zip.unZipped; }),
+    Kilobytes("zipRejected", "Total memory rejected",
+              [](const ZipStatsRow& row) { return row.zip.zipRejected; }),
+    Count("nrFreeHalf", "Total free half pages",
+          [](const ZipStatsRow& row) { return row.zip.nrFreeHalf; })
+        .As("Lu"),
+    Count("nrFreeQuarter", "Total free quarter pages",
+          [](const ZipStatsRow& row) { return row.zip.nrFreeQuarter; })
+        .As("Lu"),
+    Microseconds("avgZipTime", "Average compression time in usec",
+                 [](const ZipStatsRow& row) { return row.zip.avgZipTime; })
+        .Total(kMean),
+    Microseconds("avgUnzipTime", "Average decompression time in usec",
+                 [](const ZipStatsRow& row) { return row.zip.avgUnzipTime; })
+        .Total(kMean),
 };
+static_assert(IsSound(kColumns));
 
 Status ReadZipStats(uint64_t /*gid*/, ZipStatsRow& row) {
   return ReadClientRecord("TallyZipGetZipStats", row.client.worldGrp,
@@ -57,11 +61,20 @@ Status ReadZipStats(uint64_t /*gid*/, ZipStatsRow& row) {
 
 constexpr GroupVisitor TallyZipStatsGroup = VisitVirtualMachine<ZipStatsRow, ReadZipStats>;
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return RunClientReport<ZipStatsRow>(kFrame, kColumns, TallyZipStatsGroup, options, sink);
+}
+
 }  // namespace
 
-Status TallyZipStats(int argc, char** argv) {
-  ReportContext<ZipStatsRow> context(kFrame, kColumns);
-  return RunClientReport(context, TallyZipStatsGroup, argc, argv);
-}
+const Report zipStats = {
+    .name = "zip-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyZipStats,
+};
+
+Status TallyZipStats(int argc, char** argv) { return PrintReport(zipStats, argc, argv); }
 
 }  // namespace tally

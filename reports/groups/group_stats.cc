@@ -6,7 +6,6 @@
 // are read by the group's id, and memory arrives in kilobytes.
 
 #include <array>
-#include <cstdio>
 #include <iterator>
 #include <string>
 #include <string_view>
@@ -53,7 +52,11 @@ enum class InTag : uint8_t {
   noLimit,   // -1
 };
 
+// A column says so where it is not the sum.
 struct GroupColumn : Column<GroupRow> {
+  constexpr GroupColumn(const Column<GroupRow>& column, InTag shown = InTag::sum)
+      : Column<GroupRow>(column), inTag(shown) {}
+
   InTag inTag;
 };
 
@@ -64,107 +67,85 @@ int64_t LimitOrNone(int64_t kilobytes) {
 }
 
 constexpr GroupColumn kColumns[] = {
-    {{"gid", "Group ID", 8, "Lu", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.gid; }, Fixed::yes},
+    {Id("gid", "Group ID", [](const GroupRow& row) { return row.gid; }).Wide(8).Fixed(),
      InTag::slot},
-    {{"name", "Group name", 28, "s", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return FixedText(row.name.text); }},
+    {Text("name", "Group name", [](const GroupRow& row) { return FixedText(row.name.text); })
+         .Wide(28),
      InTag::slot},
-    {{"parGid", "Parent group ID", 8, "Ld", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.parGid; }},
+    {Id("parGid", "Parent group ID", [](const GroupRow& row) { return row.parGid; }).Wide(8),
      InTag::zero},
-    {{"nChild", "Number of child groups", 8, "d", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.nChild; }},
-     InTag::sum},
-    {{"min", "Configured memory reservation", 10, "Ld", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.allocation.min; }},
-     InTag::sum},
-    {{"max", "Configured memory limit", 10, "Ld", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return LimitOrNone(row.allocation.max); }},
+    Count("nChild", "Number of child groups", [](const GroupRow& row) { return row.nChild; })
+        .Wide(8),
+    Kilobytes("min", "Configured memory reservation",
+              [](const GroupRow& row) { return row.allocation.min; }),
+    {Kilobytes("max", "Configured memory limit",
+               [](const GroupRow& row) { return LimitOrNone(row.allocation.max); }),
      InTag::noLimit},
-    {{"minLimit", "Configured memory reservation limit", 10, "Ld", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return LimitOrNone(row.allocation.minLimit); }},
+    {Kilobytes("minLimit", "Configured memory reservation limit",
+               [](const GroupRow& row) { return LimitOrNone(row.allocation.minLimit); }),
      InTag::noLimit},
-    {{"shares", "Configured shares", 10, "Ld", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.allocation.shares; }},
+    {Count("shares", "Configured shares", [](const GroupRow& row) { return row.allocation.shares; })
+         .As("Ld"),
      InTag::zero},
-    {{"conResv", "Total memory reservation consumed by children", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.capacity.conResv; }},
-     InTag::sum},
-    {{"availResv", "Total memory reservation available to group", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.capacity.availResv; }},
-     InTag::sum},
-    {{"memSize",
-      "Guest physical / Accounted UW virtual / kernel machine address space currently consumed", 10,
-      "Lu", kSum, FromKilobytes, [](const GroupRow& row) -> Cell { return row.stats.memSize; }},
-     InTag::sum},
-    {{"memSizePeak",
-      "Peak guest physical / Accounted UW virtual / kernel machine address space currently "
-      "consumed (since last reset)",
-      10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.memSizePeak; }},
-     InTag::sum},
-    {{"iMin", "Implicit memory reservation", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.iMin; }},
-     InTag::sum},
-    {{"eMin", "Effective memory reservation", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.eMin; }},
-     InTag::sum},
-    {{"eMinPeak", "Peak value for effective memory reservation (since last reset)", 10, "Lu", kSum,
-      FromKilobytes, [](const GroupRow& row) -> Cell { return row.stats.eMinPeak; }},
-     InTag::sum},
-    {{"rMinPeak", "Peak value for requested memory reservation (since last reset)", 10, "Lu", kSum,
-      FromKilobytes, [](const GroupRow& row) -> Cell { return row.stats.rMinPeak; }},
-     InTag::sum},
-    {{"bMin", "Base memory reservation", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.bMin; }},
-     InTag::sum},
-    {{"bMax", "Base memory limit", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.bMax; }},
+    Kilobytes("conResv", "Total memory reservation consumed by children",
+              [](const GroupRow& row) { return row.capacity.conResv; }),
+    Kilobytes("availResv", "Total memory reservation available to group",
+              [](const GroupRow& row) { return row.capacity.availResv; }),
+    Kilobytes(
+        "memSize",
+        "Guest physical / Accounted UW virtual / kernel machine address space currently consumed",
+        [](const GroupRow& row) { return row.stats.memSize; }),
+    Kilobytes("memSizePeak",
+              "Peak guest physical / Accounted UW virtual / kernel machine address space currently "
+              "consumed (since last reset)",
+              [](const GroupRow& row) { return row.stats.memSizePeak; }),
+    Kilobytes("iMin", "Implicit memory reservation",
+              [](const GroupRow& row) { return row.stats.iMin; }),
+    Kilobytes("eMin", "Effective memory reservation",
+              [](const GroupRow& row) { return row.stats.eMin; }),
+    Kilobytes("eMinPeak", "Peak value for effective memory reservation (since last reset)",
+              [](const GroupRow& row) { return row.stats.eMinPeak; }),
+    Kilobytes("rMinPeak", "Peak value for requested memory reservation (since last reset)",
+              [](const GroupRow& row) { return row.stats.rMinPeak; }),
+    Kilobytes("bMin", "Base memory reservation",
+              [](const GroupRow& row) { return row.stats.bMin; }),
+    {Kilobytes("bMax", "Base memory limit", [](const GroupRow& row) { return row.stats.bMax; }),
      InTag::last},
-    {{"bShares", "Base shares", 10, "Lu", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.stats.bShares; }},
+    {Count("bShares", "Base shares", [](const GroupRow& row) { return row.stats.bShares; }),
      InTag::zero},
-    {{"fShares", "flattened base shares", 10, "Lu", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.stats.fShares; }},
+    {Count("fShares", "flattened base shares",
+           [](const GroupRow& row) { return row.stats.fShares; }),
      InTag::zero},
-    {{"ovhdResv", "Reserved overhead memory", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.ovhdResv; }},
-     InTag::sum},
-    {{"ovhd", "Consumed overhead memory", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.ovhd; }},
-     InTag::sum},
-    {{"allocTgt", "Memory allocation target for group", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.allocTgt; }},
-     InTag::sum},
-    {{"consumed", "Total memory consumed by group", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.consumed; }},
+    Kilobytes("ovhdResv", "Reserved overhead memory",
+              [](const GroupRow& row) { return row.stats.ovhdResv; }),
+    Kilobytes("ovhd", "Consumed overhead memory",
+              [](const GroupRow& row) { return row.stats.ovhd; }),
+    Kilobytes("allocTgt", "Memory allocation target for group",
+              [](const GroupRow& row) { return row.stats.allocTgt; }),
+    {Kilobytes("consumed", "Total memory consumed by group",
+               [](const GroupRow& row) { return row.stats.consumed; }),
      InTag::sumTwice},
-    {{"consumedPeak", "Peak value for total memory consumed by group (since last reset)", 10, "Lu",
-      kSum, FromKilobytes, [](const GroupRow& row) -> Cell { return row.stats.consumedPeak; }},
-     InTag::sum},
-    {{"touched", "Estimate of guest memory touched", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.touched; }},
-     InTag::sum},
-    {{"bActive", "Base activeness", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.bActive; }},
-     InTag::sum},
-    {{"sharedSaved", "Estimate of memory savings from page sharing", 10, "Lu", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.sharedSaved; }},
-     InTag::sum},
-    {{"mps", "Memory per share (KB)", 20, "Ld", kSum, FromKilobytes,
-      [](const GroupRow& row) -> Cell { return row.stats.mps; }},
+    Kilobytes("consumedPeak", "Peak value for total memory consumed by group (since last reset)",
+              [](const GroupRow& row) { return row.stats.consumedPeak; }),
+    Kilobytes("touched", "Estimate of guest memory touched",
+              [](const GroupRow& row) { return row.stats.touched; }),
+    Kilobytes("bActive", "Base activeness", [](const GroupRow& row) { return row.stats.bActive; }),
+    Kilobytes("sharedSaved", "Estimate of memory savings from page sharing",
+              [](const GroupRow& row) { return row.stats.sharedSaved; }),
+    {Kilobytes("mps", "Memory per share (KB)", [](const GroupRow& row) { return row.stats.mps; })
+         .Wide(20),
      InTag::noLimit},
-    {{"throttlePct", "% of possible time the guest is allowed to be executed", 3, "u", kBlank,
-      nullptr, [](const GroupRow& row) -> Cell { return row.stats.throttlePct; }},
+    {Percent("throttlePct", "% of possible time the guest is allowed to be executed",
+             [](const GroupRow& row) { return row.stats.throttlePct; })
+         .Wide(3),
      InTag::zero},
-    {{"flags", "Group flags", 16, "s", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return row.flagNames.text(); }},
+    {Text("flags", "Group flags", [](const GroupRow& row) { return row.flagNames.text(); })
+         .Wide(16),
      InTag::slot},
-    {{"tag", "Group Tag", 28, "s", kSum, nullptr,
-      [](const GroupRow& row) -> Cell { return FixedText(row.tag.text); }},
+    {Text("tag", "Group Tag", [](const GroupRow& row) { return FixedText(row.tag.text); }).Wide(28),
      InTag::slot},
 };
+static_assert(IsSound(kColumns));
 
 // The sums of the groups that bear one tag.
 struct TagSlot {
@@ -175,7 +156,7 @@ struct TagSlot {
 
 class GroupContext : public ReportContext<GroupRow, GroupColumn> {
  public:
-  GroupContext() : ReportContext(kFrame, kColumns) {}
+  explicit GroupContext(Sink& sink) : ReportContext(kFrame, kColumns, sink) {}
 
   // Adds a group to the row of its tag; kOutOfMemory after its message when there are too many.
   Status AddToTag(const GroupRow& row);
@@ -244,7 +225,7 @@ void GroupContext::PrintTags() {
       const GroupColumn& column = kColumns[i];
       cells()[i] = column.inTag == InTag::slot ? column.value(row) : Cell(slot.figures[i]);
     }
-    PrintCells(false);
+    PutCells(RowKind::tag);
   }
 }
 
@@ -269,24 +250,32 @@ Status TallyGroupStatsGroup(uint64_t gid, uint32_t childCount, int /*csvMode*/, 
   return kSuccess;
 }
 
-}  // namespace
-
-Status TallyGroupStats(int argc, char** argv) {
-  GroupContext context;
-  if (Status status = context.Begin(argc, argv)) return status;
-  context.PrintTitleBlock();
-  context.PrintHead();
-  const ReportOptions& options = context.options();
+Status Run(const ReportOptions& options, Sink& sink) {
+  GroupContext context(sink);
+  if (Status status = context.Settle(options)) return status;
+  context.Begin();
   const Status status = TallyTraverseGroups(static_cast<uint64_t>(options.startGid), options.levels,
                                             options.csvMode, TallyGroupStatsGroup, &context);
-  context.PrintDashes();
+  context.Rule();
   if (options.tags) {
-    std::puts("Virtual tags report");
+    context.Note("Virtual tags report");
     context.PrintTags();
-    context.PrintDashes();
+    context.Rule();
   }
   context.PrintDescriptions();
   return status;
 }
+
+}  // namespace
+
+const Report groupStats = {
+    .name = "group-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyGroupStats,
+};
+
+Status TallyGroupStats(int argc, char** argv) { return PrintReport(groupStats, argc, argv); }
 
 }  // namespace tally

@@ -25,6 +25,7 @@ constexpr ReportFrame kFrame = {
     .title = "MEMMAP BUDDY STATS",
     .ruleLength = 44,
     .options = "s:vq",
+    .totalRow = true,
 };
 
 // Room for the names of all buddies, and for a row of each.
@@ -42,64 +43,66 @@ struct BuddyRow {
   KSI_BuddyStats stats;
 };
 
+// The buffers of the size 4 KB << kSize.
 template <size_t kSize>
-Cell Free(const BuddyRow& row) {
-  return row.stats.buffers[kSize].free;
-}
-
+constexpr auto kFree = [](const BuddyRow& row) { return row.stats.buffers[kSize].free; };
 template <size_t kSize>
-Cell Used(const BuddyRow& row) {
-  return row.stats.buffers[kSize].used;
-}
+constexpr auto kUsed = [](const BuddyRow& row) { return row.stats.buffers[kSize].used; };
 
 constexpr Column<BuddyRow> kColumns[] = {
-    {"name", "Name of the buddy", 20, "s", kSum, nullptr,
-     [](const BuddyRow& row) -> Cell { return row.name; }},
-    {"memNode", "Memory node the buddy belongs to", 2, "u", kBlank, nullptr,
-     [](const BuddyRow& row) -> Cell { return row.memNode; }, Fixed::yes},
-    {"type", "Legacy memory type name", 4, "s", kBlank, nullptr,
-     [](const BuddyRow& row) -> Cell { return row.isLow ? "low" : "high"; }},
-    {"numaNode", "NUMA node the buddy belongs to", 2, "u", kBlank, nullptr,
-     [](const BuddyRow& row) -> Cell { return row.numaNode; }},
-    {"4KBfree", "free 4KB buffers", 10, "u", kSum, nullptr, Free<0>},
-    {"8KBfree", "free 8KB buffers", 10, "u", kSum, nullptr, Free<1>},
-    {"16KBfree", "free 16KB buffers", 10, "u", kSum, nullptr, Free<2>},
-    {"32KBfree", "free 32KB buffers", 10, "u", kSum, nullptr, Free<3>},
-    {"64KBfree", "free 64KB buffers", 10, "u", kSum, nullptr, Free<4>},
-    {"128KBfree", "free 128 KB buffers", 10, "u", kSum, nullptr, Free<5>},
-    {"256KBfree", "free 256 KB buffers", 10, "u", kSum, nullptr, Free<6>},
-    {"512KBfree", "free 512 KB buffers", 10, "u", kSum, nullptr, Free<7>},
-    {"1MBfree", "free 1MB buffers", 10, "u", kSum, nullptr, Free<8>},
-    {"2MBfree", "free 2MB buffers", 10, "u", kSum, nullptr, Free<9>},
-    {"4MBfree", "free 4MB buffers", 10, "u", kSum, nullptr, Free<10>},
-    {"8MBfree", "free 8MB buffers", 10, "u", kSum, nullptr, Free<11>},
-    {"16MBfree", "free 16MB buffers", 10, "u", kSum, nullptr, Free<12>},
-    {"32MBfree", "free 32MB buffers", 10, "u", kSum, nullptr, Free<13>},
-    {"64MBfree", "free 64MB buffers", 10, "u", kSum, nullptr, Free<14>},
-    {"128MBfree", "free 128MB buffers", 10, "u", kSum, nullptr, Free<15>},
-    {"256MBfree", "free 256MB buffers", 10, "u", kSum, nullptr, Free<16>},
-    {"512MBfree", "free 256MB buffers", 10, "u", kSum, nullptr, Free<17>},
-    {"1GBfree", "free 1GB buffers", 10, "u", kSum, nullptr, Free<18>},
-    {"4KBused", "used 4KB buffers", 10, "u", kSum, nullptr, Used<0>},
-    {"8KBused", "used 8KB buffers", 10, "u", kSum, nullptr, Used<1>},
-    {"16KBused", "used 16KB buffers", 10, "u", kSum, nullptr, Used<2>},
-    {"32KBused", "used 32KB buffers", 10, "u", kSum, nullptr, Used<3>},
-    {"64KBused", "used 64KB buffers", 10, "u", kSum, nullptr, Used<4>},
-    {"128KBused", "used 128 KB buffers", 10, "u", kSum, nullptr, Used<5>},
-    {"256KBused", "used 256 KB buffers", 10, "u", kSum, nullptr, Used<6>},
-    {"512KBused", "used 512 KB buffers", 10, "u", kSum, nullptr, Used<7>},
-    {"1MBused", "used 1MB buffers", 10, "u", kSum, nullptr, Used<8>},
-    {"2MBused", "used 2MB buffers", 10, "u", kSum, nullptr, Used<9>},
-    {"4MBused", "used 4MB buffers", 10, "u", kSum, nullptr, Used<10>},
-    {"8MBused", "used 8MB buffers", 10, "u", kSum, nullptr, Used<11>},
-    {"16MBused", "used 16MB buffers", 10, "u", kSum, nullptr, Used<12>},
-    {"32MBused", "used 32MB buffers", 10, "u", kSum, nullptr, Used<13>},
-    {"64MBused", "used 64MB buffers", 10, "u", kSum, nullptr, Used<14>},
-    {"128MBused", "used 128MB buffers", 10, "u", kSum, nullptr, Used<15>},
-    {"256MBused", "used 256MB buffers", 10, "u", kSum, nullptr, Used<16>},
-    {"512MBused", "used 512MB buffers", 10, "u", kSum, nullptr, Used<17>},
-    {"1GBused", "used 1GB buffers", 10, "u", kSum, nullptr, Used<18>},
+    Text("name", "Name of the buddy", [](const BuddyRow& row) { return row.name; })
+        .Wide(20)
+        .Total(kLabel),
+    Id("memNode", "Memory node the buddy belongs to",
+       [](const BuddyRow& row) { return row.memNode; })
+        .Wide(2)
+        .Fixed(),
+    Text("type", "Legacy memory type name",
+         [](const BuddyRow& row) { return row.isLow ? "low" : "high"; })
+        .Wide(4),
+    Id("numaNode", "NUMA node the buddy belongs to",
+       [](const BuddyRow& row) { return row.numaNode; })
+        .Wide(2),
+    Count("4KBfree", "free 4KB buffers", kFree<0>),
+    Count("8KBfree", "free 8KB buffers", kFree<1>),
+    Count("16KBfree", "free 16KB buffers", kFree<2>),
+    Count("32KBfree", "free 32KB buffers", kFree<3>),
+    Count("64KBfree", "free 64KB buffers", kFree<4>),
+    Count("128KBfree", "free 128 KB buffers", kFree<5>),
+    Count("256KBfree", "free 256 KB buffers", kFree<6>),
+    Count("512KBfree", "free 512 KB buffers", kFree<7>),
+    Count("1MBfree", "free 1MB buffers", kFree<8>),
+    Count("2MBfree", "free 2MB buffers", kFree<9>),
+    Count("4MBfree", "free 4MB buffers", kFree<10>),
+    Count("8MBfree", "free 8MB buffers", kFree<11>),
+    Count("16MBfree", "free 16MB buffers", kFree<12>),
+    Count("32MBfree", "free 32MB buffers", kFree<13>),
+    Count("64MBfree", "free 64MB buffers", kFree<14>),
+    Count("128MBfree", "free 128MB buffers", kFree<15>),
+    Count("256MBfree", "free 256MB buffers", kFree<16>),
+    Count("512MBfree", "free 256MB buffers", kFree<17>),
+    Count("1GBfree", "free 1GB buffers", kFree<18>),
+    Count("4KBused", "used 4KB buffers", kUsed<0>),
+    Count("8KBused", "used 8KB buffers", kUsed<1>),
+    Count("16KBused", "used 16KB buffers", kUsed<2>),
+    Count("32KBused", "used 32KB buffers", kUsed<3>),
+    Count("64KBused", "used 64KB buffers", kUsed<4>),
+    Count("128KBused", "used 128 KB buffers", kUsed<5>),
+    Count("256KBused", "used 256 KB buffers", kUsed<6>),
+    Count("512KBused", "used 512 KB buffers", kUsed<7>),
+    Count("1MBused", "used 1MB buffers", kUsed<8>),
+    Count("2MBused", "used 2MB buffers", kUsed<9>),
+    Count("4MBused", "used 4MB buffers", kUsed<10>),
+    Count("8MBused", "used 8MB buffers", kUsed<11>),
+    Count("16MBused", "used 16MB buffers", kUsed<12>),
+    Count("32MBused", "used 32MB buffers", kUsed<13>),
+    Count("64MBused", "used 64MB buffers", kUsed<14>),
+    Count("128MBused", "used 128MB buffers", kUsed<15>),
+    Count("256MBused", "used 256MB buffers", kUsed<16>),
+    Count("512MBused", "used 512MB buffers", kUsed<17>),
+    Count("1GBused", "used 1GB buffers", kUsed<18>),
 };
+static_assert(IsSound(kColumns));
 
 // The NUMA node of a memory node.
 Status TallyMemNode2NUMANode(uint32_t memNode, uint32_t& numaNode) {
@@ -187,13 +190,10 @@ void SortBuddies(std::span<BuddyRow> rows) {
   }
 }
 
-}  // namespace
-
-Status TallyBuddyStats(int argc, char** argv) {
-  ReportContext<BuddyRow> context(kFrame, kColumns);
-  if (Status status = context.Begin(argc, argv)) return status;
-  context.PrintTitleBlock();
-  context.PrintHead();
+Status Run(const ReportOptions& options, Sink& sink) {
+  ReportContext<BuddyRow> context(kFrame, kColumns, sink);
+  if (Status status = context.Settle(options)) return status;
+  context.Begin();
   std::array<BuddyRow, kMaxBuddies> rows = {};
   const std::span<BuddyRow> buddies = std::span(rows).first(ReadBuddies(rows));
   SortBuddies(buddies);
@@ -205,5 +205,17 @@ Status TallyBuddyStats(int argc, char** argv) {
   context.PrintDescriptions();
   return kSuccess;
 }
+
+}  // namespace
+
+const Report buddyStats = {
+    .name = "buddy-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyBuddyStats,
+};
+
+Status TallyBuddyStats(int argc, char** argv) { return PrintReport(buddyStats, argc, argv); }
 
 }  // namespace tally

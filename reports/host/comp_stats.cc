@@ -33,57 +33,57 @@ struct CompRow {
 };
 
 // Entries into a state: down from the better one and up from the worse one.
-Cell Entries(const CompRow& row, MemState state) {
+uint32_t Entries(const CompRow& row, MemState state) {
   uint32_t entries = state == kHigh ? 1 : row.transitions[state - 1].down;  // a host starts high
   if (state != kLow) entries += row.transitions[state + 1].up;
   return entries;
 }
 
 constexpr Column<CompRow> kColumns[] = {
-    {"total", "Total physical memory on host", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.total; }},
-    {"discarded", "Discarded by kernova  ", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.discarded; }},
-    {"managedByMemMap", "Memory managed by MemMap", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.managedByMemMap; }},
-    {"reliableMem", "Reliable memory", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.reliableMem; }},
-    {"kernelCode", "Kernova code region", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.kernelCode; }},
-    {"critical", "Critical space", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.critical; }},
-    {"dataAndHeap", "Kernova data and heap", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.dataAndHeap; }},
-    {"buddyOvhd", "Memmap buddy overhead ", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.buddyOvhd; }},
-    {"rsvdLow", "Reserved low memory", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.rsvdLow; }},
-    {"managedByMemSched", "Memory managed by MemSched", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.tally.managedByMemSched; }},
-    {"minFree", "Min Free", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.tally.minFree; }},
-    {"knvClientConsumed", "Consumed by kernova clients", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.knvClientConsumed; }},
-    {"otherConsumed", "Consumed by non-kernova clients", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.otherConsumed; }},
-    {"free", "Available (Free) physical memory", 10, "Lu", kBlank, FromKilobytes,
-     [](const CompRow& row) -> Cell { return row.memory.free; }},
-    {"numHigh", "Num times host in high state", 10, "u", kBlank, nullptr,
-     [](const CompRow& row) { return Entries(row, kHigh); }},
-    {"numClear", "Num times host in clear state", 10, "u", kBlank, nullptr,
-     [](const CompRow& row) { return Entries(row, kClear); }},
-    {"numSoft", "Num times host in soft state", 10, "u", kBlank, nullptr,
-     [](const CompRow& row) { return Entries(row, kSoft); }},
-    {"numHard", "Num of times host in hard state", 10, "u", kBlank, nullptr,
-     [](const CompRow& row) { return Entries(row, kHard); }},
-    {"numLow", "Num of times host in low state", 10, "u", kBlank, nullptr,
-     [](const CompRow& row) { return Entries(row, kLow); }},
-    {"memState", "Current memory state", 7, "s", kBlank, nullptr,
-     [](const CompRow& row) -> Cell {
-       const uint32_t state = row.tally.memState;
-       return kMemStateTitles[state < kUnknown ? state : kUnknown];
-     }},
+    Kilobytes("total", "Total physical memory on host",
+              [](const CompRow& row) { return row.memory.total; }),
+    Kilobytes("discarded", "Discarded by kernova  ",
+              [](const CompRow& row) { return row.memory.discarded; }),
+    Kilobytes("managedByMemMap", "Memory managed by MemMap",
+              [](const CompRow& row) { return row.memory.managedByMemMap; }),
+    Kilobytes("reliableMem", "Reliable memory",
+              [](const CompRow& row) { return row.memory.reliableMem; }),
+    Kilobytes("kernelCode", "Kernova code region",
+              [](const CompRow& row) { return row.memory.kernelCode; }),
+    Kilobytes("critical", "Critical space", [](const CompRow& row) { return row.memory.critical; }),
+    Kilobytes("dataAndHeap", "Kernova data and heap",
+              [](const CompRow& row) { return row.memory.dataAndHeap; }),
+    Kilobytes("buddyOvhd", "Memmap buddy overhead ",
+              [](const CompRow& row) { return row.memory.buddyOvhd; }),
+    Kilobytes("rsvdLow", "Reserved low memory",
+              [](const CompRow& row) { return row.memory.rsvdLow; }),
+    Kilobytes("managedByMemSched", "Memory managed by MemSched",
+              [](const CompRow& row) { return row.tally.managedByMemSched; }),
+    Kilobytes("minFree", "Min Free", [](const CompRow& row) { return row.tally.minFree; }),
+    Kilobytes("knvClientConsumed", "Consumed by kernova clients",
+              [](const CompRow& row) { return row.memory.knvClientConsumed; }),
+    Kilobytes("otherConsumed", "Consumed by non-kernova clients",
+              [](const CompRow& row) { return row.memory.otherConsumed; }),
+    Kilobytes("free", "Available (Free) physical memory",
+              [](const CompRow& row) { return row.memory.free; }),
+    Count("numHigh", "Num times host in high state",
+          [](const CompRow& row) { return Entries(row, kHigh); }),
+    Count("numClear", "Num times host in clear state",
+          [](const CompRow& row) { return Entries(row, kClear); }),
+    Count("numSoft", "Num times host in soft state",
+          [](const CompRow& row) { return Entries(row, kSoft); }),
+    Count("numHard", "Num of times host in hard state",
+          [](const CompRow& row) { return Entries(row, kHard); }),
+    Count("numLow", "Num of times host in low state",
+          [](const CompRow& row) { return Entries(row, kLow); }),
+    Text("memState", "Current memory state",
+         [](const CompRow& row) {
+           const uint32_t state = row.tally.memState;
+           return kMemStateTitles[state < kUnknown ? state : kUnknown];
+         })
+        .Wide(7),
 };
+static_assert(IsSound(kColumns));
 
 Status TallyCompGetMemMapStats(CompRow& row) {
   return ReadHostRecord("TallyCompGetMemMapStats", KSI_NODE_memory_comprehensive, {.capacity = 1},
@@ -106,20 +106,29 @@ Status TallyCompGetGlobalTally(CompRow& row) {
   return kSuccess;
 }
 
-}  // namespace
-
-Status TallyCompStats(int argc, char** argv) {
-  ReportContext<CompRow> context(kFrame, kColumns);
-  if (Status status = context.Begin(argc, argv)) return status;
-  context.PrintTitleBlock();
-  context.PrintHead();
+Status Run(const ReportOptions& options, Sink& sink) {
+  ReportContext<CompRow> context(kFrame, kColumns, sink);
+  if (Status status = context.Settle(options)) return status;
+  context.Begin();
   CompRow row;
   if (Status status = TallyCompGetMemMapStats(row)) return status;
   if (Status status = TallyCompGetGlobalTally(row)) return status;
   context.PrintRow(row);
-  context.PrintDashes();
+  context.Rule();
   context.PrintDescriptions();
   return kSuccess;
 }
+
+}  // namespace
+
+const Report compStats = {
+    .name = "comp-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyCompStats,
+};
+
+Status TallyCompStats(int argc, char** argv) { return PrintReport(compStats, argc, argv); }
 
 }  // namespace tally

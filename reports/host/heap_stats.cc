@@ -22,69 +22,77 @@ constexpr ReportFrame kFrame = {
     .ruleLength = 36,
     .options = "s:u:vq",
     .longVerbose = 'u',  // --verbose is a -u without a unit: bytes, and no descriptions
+    .totalRow = true,
     .allowBytes = true,
 };
 
-uint64_t FromBytes(uint64_t bytes, DisplayUnit unit) {
-  switch (unit) {
-    case DisplayUnit::mb:
-      return bytes >> 20;
-    case DisplayUnit::kb:
-      return bytes >> 10;
-    case DisplayUnit::pg:
-      return bytes >> 12;
-    case DisplayUnit::b:
-      return bytes;
-  }
-  return 0;
-}
-
 constexpr Column<KSI_HeapStats> kColumns[] = {
-    {"name", "heap name", 35, "s", kSum, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return FixedText(heap.name); }, Fixed::yes},
-    {"dynGrow", "dynamically growable", 12, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.dynGrow; }},
-    {"lowerLimit", "lower limit", 7, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.lowerLimit; }},
-    {"upperLimit", "upper limit", 7, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.upperLimit; }},
-    {"reserved", "reserved", 7, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.reserved; }},
-    {"numRanges", "num ranges", 7, "d", kSum, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.numRanges; }},
-    {"dlMallocOvdh", "DL malloc overhead", 10, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.dlMallocOvdh; }},
-    {"used", "current used", 10, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.size - heap.avail; }},
-    {"avail", "current available", 10, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.avail; }},
-    {"size", "current size", 10, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.size; }},
-    {"initial", "initial size", 10, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.initial; }},
-    {"max", "max size", 11, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.max; }},
-    {"pctFreeOfCur", "% free of current", 12, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.pctFreeOfCur; }},
-    {"maxAvail", "max available", 12, "Lu", kSum, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.maxAvail; }},
-    {"pctFreeOfMax", "% free of max", 7, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.pctFreeOfMax; }},
-    {"lowPctFreeOfMax", "lowest % free of max", 12, "d", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.lowPctFreeOfMax; }},
-    {"numSuccAllocs", "number of succeeded allocations", 10, "u", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.numSuccAllocs; }},
-    {"numFailAllocs", "number of succeeded allocations", 10, "u", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.numFailAllocs; }},
-    {"numGrowthOps", "number of growth operations", 10, "u", kSum, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.numGrowthOps; }},
-    {"numShrinkOps", "number of shrink operations", 10, "u", kSum, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.numShrinkOps; }},
-    {"numReqsPerGrowth", "number of requests per growth operations", 10, "u", kBlank, nullptr,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.numReqsPerGrowth; }},
-    {"avgAllocSize", "average allocation size", 10, "u", kBlank, FromBytes,
-     [](const KSI_HeapStats& heap) -> Cell { return heap.avgAllocSize; }},
+    Text("name", "heap name", [](const KSI_HeapStats& heap) { return FixedText(heap.name); })
+        .Wide(35)
+        .Total(kLabel)
+        .Fixed(),
+    Code("dynGrow", "dynamically growable", [](const KSI_HeapStats& heap) { return heap.dynGrow; })
+        .Wide(12)
+        .As("d"),
+    Count("lowerLimit", "lower limit", [](const KSI_HeapStats& heap) { return heap.lowerLimit; })
+        .Wide(7)
+        .As("d")
+        .Total(kBlank),
+    Count("upperLimit", "upper limit", [](const KSI_HeapStats& heap) { return heap.upperLimit; })
+        .Wide(7)
+        .As("d")
+        .Total(kBlank),
+    Code("reserved", "reserved", [](const KSI_HeapStats& heap) { return heap.reserved; })
+        .Wide(7)
+        .As("d"),
+    Count("numRanges", "num ranges", [](const KSI_HeapStats& heap) { return heap.numRanges; })
+        .Wide(7)
+        .As("d"),
+    Bytes("dlMallocOvdh", "DL malloc overhead",
+          [](const KSI_HeapStats& heap) { return heap.dlMallocOvdh; }),
+    Bytes("used", "current used", [](const KSI_HeapStats& heap) { return heap.size - heap.avail; }),
+    Bytes("avail", "current available", [](const KSI_HeapStats& heap) { return heap.avail; }),
+    Bytes("size", "current size", [](const KSI_HeapStats& heap) { return heap.size; }),
+    Bytes("initial", "initial size", [](const KSI_HeapStats& heap) { return heap.initial; }),
+    Bytes("max", "max size", [](const KSI_HeapStats& heap) { return heap.max; }).Wide(11),
+    Percent("pctFreeOfCur", "% free of current",
+            [](const KSI_HeapStats& heap) { return heap.pctFreeOfCur; })
+        .Wide(12)
+        .As("d"),
+    Bytes("maxAvail", "max available", [](const KSI_HeapStats& heap) { return heap.maxAvail; })
+        .Wide(12),
+    Percent("pctFreeOfMax", "% free of max",
+            [](const KSI_HeapStats& heap) { return heap.pctFreeOfMax; })
+        .Wide(7)
+        .As("d"),
+    Percent("lowPctFreeOfMax", "lowest % free of max",
+            [](const KSI_HeapStats& heap) { return heap.lowPctFreeOfMax; })
+        .Wide(12)
+        .As("d"),
+    Count("numSuccAllocs", "number of succeeded allocations",
+          [](const KSI_HeapStats& heap) { return heap.numSuccAllocs; })
+        .Total(kBlank),
+    Count("numFailAllocs", "number of succeeded allocations",
+          [](const KSI_HeapStats& heap) { return heap.numFailAllocs; })
+        .Total(kBlank),
+    Count("numGrowthOps", "number of growth operations",
+          [](const KSI_HeapStats& heap) { return heap.numGrowthOps; }),
+    Count("numShrinkOps", "number of shrink operations",
+          [](const KSI_HeapStats& heap) { return heap.numShrinkOps; }),
+    Count("numReqsPerGrowth", "number of requests per growth operations",
+          [](const KSI_HeapStats& heap) { return heap.numReqsPerGrowth; })
+        .Total(kBlank),
+    Bytes("avgAllocSize", "average allocation size",
+          [](const KSI_HeapStats& heap) { return heap.avgAllocSize; })
+        .As("u")
+        .Total(kBlank),
 };
+static_assert(IsSound(kColumns));
+
+constexpr size_t kNumRanges = PlaceOf(kColumns, "numRanges");
+constexpr size_t kUsed = PlaceOf(kColumns, "used");
+constexpr size_t kAvail = PlaceOf(kColumns, "avail");
+constexpr size_t kSize = PlaceOf(kColumns, "size");
 
 // The heaps that were read.
 struct Heaps {
@@ -138,26 +146,35 @@ bool TallyHeapGetMemMapStats(Heaps& heaps) {
   return true;
 }
 
-}  // namespace
-
 // Once the unit is accepted the report succeeds, whatever could be read.
-Status TallyHeapStats(int argc, char** argv) {
-  ReportContext<KSI_HeapStats> context(kFrame, kColumns);
-  if (Status status = context.Begin(argc, argv)) return status;
+Status Run(const ReportOptions& options, Sink& sink) {
+  ReportContext<KSI_HeapStats> context(kFrame, kColumns, sink);
+  if (Status status = context.Settle(options)) return status;
   Heaps heaps;
   if (!TallyHeapGetMemMapStats(heaps)) return kSuccess;
-  context.PrintTitleBlock();
-  context.PrintHead();
+  context.Begin();
   for (const KSI_HeapStats& heap : std::span(heaps.records.get(), heaps.count)) {
     context.PrintRow(heap);
   }
   // What is in use wraps at 32 bits in a heap's row, but not here.
-  context.total("used") = context.total("size") - context.total("avail");
+  context.total(kUsed) = context.total(kSize) - context.total(kAvail);
   // The sum takes the places of two 32-bit figures: the blank cell before it has its low half.
-  context.total("numRanges") >>= 32;
+  context.total(kNumRanges) >>= 32;
   context.PrintTotal();
   context.PrintDescriptions();
   return kSuccess;
 }
+
+}  // namespace
+
+const Report heapStats = {
+    .name = "heap-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyHeapStats,
+};
+
+Status TallyHeapStats(int argc, char** argv) { return PrintReport(heapStats, argc, argv); }
 
 }  // namespace tally

@@ -2,7 +2,6 @@
 // page sharing pool (memory/lpage/nodeList/psharePool), then the pool of each virtual machine on it
 // (memory/lpage/nodeList/vmPools). Figures are counts of 4 KB and 2 MB pages.
 
-#include <cstdio>
 #include <string>
 #include <string_view>
 
@@ -19,6 +18,7 @@ constexpr ReportFrame kFrame = {
     .title = "LPAGE POOL STATS",
     .ruleLength = 43,
     .options = "s:vq",
+    .totalRow = true,
 };
 
 struct LPoolRow {
@@ -29,35 +29,50 @@ struct LPoolRow {
 
 // The peaks are added up like the counters.
 constexpr Column<LPoolRow> kColumns[] = {
-    {"name", "Large page pool name", 15, "s", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.name; }, Fixed::yes},
-    {"nodeID", "Home memory node the pool", 7, "u", kBlank, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.nodeID; }},
-    {"nrLPages", "# of large pages in the pool", 16, "u", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrLPages; }},
-    {"nrFreeSPages", "# of small pages free", 16, "u", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrFreeSPages; }},
-    {"nrSPageAllocs", "Total small page alloc count", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrSPageAllocs; }},
-    {"nrSPageFrees", "Total small page free count", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrSPageFrees; }},
-    {"nrReapAttempts", "Total reap attemts", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrReapAttempts; }},
-    {"nrSPagesReaped", "Total number of small pages reaped", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrSPagesReaped; }},
-    {"nrDefragAttempts", "Total large page defrag attempts", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrDefragAttempts; }},
-    {"nrDefragCancelled", "Total defrag attempts cancelled", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrDefragCancelled; }},
-    {"nrDefragReaped", "Total defrag attempts reaped", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrDefragReaped; }},
-    {"nrLPagesDefragged", "Total number of large pages defragged", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrLPagesDefragged; }},
-    {"peakDefragAttempts", "Peak defrag attempts for any large page", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.peakDefragAttempts; }},
-    {"nrCachehit", "Hit count in lpage victim cache", 16, "Lu", kSum, nullptr,
-     [](const LPoolRow& row) -> Cell { return row.pool.nrCachehit; }},
+    Text("name", "Large page pool name", [](const LPoolRow& row) { return row.name; })
+        .Wide(15)
+        .Total(kLabel)
+        .Fixed(),
+    Id("nodeID", "Home memory node the pool", [](const LPoolRow& row) { return row.nodeID; })
+        .Wide(7),
+    Count("nrLPages", "# of large pages in the pool",
+          [](const LPoolRow& row) { return row.pool.nrLPages; })
+        .Wide(16),
+    Count("nrFreeSPages", "# of small pages free",
+          [](const LPoolRow& row) { return row.pool.nrFreeSPages; })
+        .Wide(16),
+    Count("nrSPageAllocs", "Total small page alloc count",
+          [](const LPoolRow& row) { return row.pool.nrSPageAllocs; })
+        .Wide(16),
+    Count("nrSPageFrees", "Total small page free count",
+          [](const LPoolRow& row) { return row.pool.nrSPageFrees; })
+        .Wide(16),
+    Count("nrReapAttempts", "Total reap attemts",
+          [](const LPoolRow& row) { return row.pool.nrReapAttempts; })
+        .Wide(16),
+    Count("nrSPagesReaped", "Total number of small pages reaped",
+          [](const LPoolRow& row) { return row.pool.nrSPagesReaped; })
+        .Wide(16),
+    Count("nrDefragAttempts", "Total large page defrag attempts",
+          [](const LPoolRow& row) { return row.pool.nrDefragAttempts; })
+        .Wide(16),
+    Count("nrDefragCancelled", "Total defrag attempts cancelled",
+          [](const LPoolRow& row) { return row.pool.nrDefragCancelled; })
+        .Wide(16),
+    Count("nrDefragReaped", "Total defrag attempts reaped",
+          [](const LPoolRow& row) { return row.pool.nrDefragReaped; })
+        .Wide(16),
+    Count("nrLPagesDefragged", "Total number of large pages defragged",
+          [](const LPoolRow& row) { return row.pool.nrLPagesDefragged; })
+        .Wide(16),
+    Count("peakDefragAttempts", "Peak defrag attempts for any large page",
+          [](const LPoolRow& row) { return row.pool.peakDefragAttempts; })
+        .Wide(16),
+    Count("nrCachehit", "Hit count in lpage victim cache",
+          [](const LPoolRow& row) { return row.pool.nrCachehit; })
+        .Wide(16),
 };
+static_assert(IsSound(kColumns));
 
 using LPoolContext = ReportContext<LPoolRow>;
 
@@ -155,20 +170,30 @@ Status TallyTraverseLPools(LPoolContext& context) {
   return kSuccess;
 }
 
-}  // namespace
-
-Status TallyLPoolStats(int argc, char** argv) {
-  LPoolContext context(kFrame, kColumns);
-  if (Status status = context.Begin(argc, argv)) return status;
-  context.PrintTitleBlock();
-  context.PrintHead();
+Status Run(const ReportOptions& options, Sink& sink) {
+  LPoolContext context(kFrame, kColumns, sink);
+  if (Status status = context.Settle(options)) return status;
+  context.Begin();
   if (Status status = TallyTraverseLPools(context)) return status;
   context.PrintTotal();
   context.PrintDescriptions();
   if (context.options().verbose) {
-    std::puts("Displayed stats are either in small 4K page (SPage) or large 2M page (LPage) units");
+    context.Note(
+        "Displayed stats are either in small 4K page (SPage) or large 2M page (LPage) units");
   }
   return kSuccess;
 }
+
+}  // namespace
+
+const Report lpoolStats = {
+    .name = "lpool-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyLPoolStats,
+};
+
+Status TallyLPoolStats(int argc, char** argv) { return PrintReport(lpoolStats, argc, argv); }
 
 }  // namespace tally

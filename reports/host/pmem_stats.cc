@@ -52,41 +52,42 @@ struct RegionRow {
   NameWriter flagNames;
 };
 
-// Whole kilobytes are shifted on, so that even bytes come rounded down to them.
-uint64_t FromRegionBytes(uint64_t bytes, DisplayUnit unit) {
-  return ShiftKilobytes(bytes >> 10, unit);
-}
-
 constexpr Column<VolumeRow> kVolumeColumns[] = {
-    {"uuid", "Volume UUID", 40, "s", kSum, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.uuid; }},
-    {"alloc2MBlocks", "Allocated 2M Blocks", 10, "Lu", kBlank, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.store.alloc2MBlocks; }},
-    {"resvd2MBlocks", "Reserved 2M Blocks", 10, "Lu", kBlank, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.store.resvd2MBlocks; }},
-    {"avail2MBlocks", "Available Reservable 2M Blocks", 10, "Lu", kSum, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.store.avail2MBlocks; }},
-    {"totalRegions", "Total regions in the region store", 10, "Lu", kSum, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.store.totalRegions; }},
-    {"freeRegions", "Free regions in the region store", 10, "Lu", kSum, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.store.freeRegions; }},
-    {"total2MBlocks", "Total 2M Blocks", 10, "Lu", kSum, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.store.total2MBlocks; }},
-    {"isClean", "Is region store clean ?", 4, "c", kSum, nullptr,
-     [](const VolumeRow& row) -> Cell { return row.isClean != 0 ? 'y' : 'n'; }},
+    Text("uuid", "Volume UUID", [](const VolumeRow& row) { return row.uuid; }).Wide(40),
+    Count("alloc2MBlocks", "Allocated 2M Blocks",
+          [](const VolumeRow& row) { return row.store.alloc2MBlocks; }),
+    Count("resvd2MBlocks", "Reserved 2M Blocks",
+          [](const VolumeRow& row) { return row.store.resvd2MBlocks; }),
+    Count("avail2MBlocks", "Available Reservable 2M Blocks",
+          [](const VolumeRow& row) { return row.store.avail2MBlocks; }),
+    Count("totalRegions", "Total regions in the region store",
+          [](const VolumeRow& row) { return row.store.totalRegions; })
+        .As("Lu"),
+    Count("freeRegions", "Free regions in the region store",
+          [](const VolumeRow& row) { return row.store.freeRegions; })
+        .As("Lu"),
+    Count("total2MBlocks", "Total 2M Blocks",
+          [](const VolumeRow& row) { return row.store.total2MBlocks; }),
+    Flag("isClean", "Is region store clean ?",
+         [](const VolumeRow& row) { return row.isClean != 0; })
+        .Wide(4),
 };
+static_assert(IsSound(kVolumeColumns));
 
 constexpr Column<RegionRow> kRegionColumns[] = {
-    {"uuid", "Volume UUID", 40, "s", kSum, nullptr,
-     [](const RegionRow& row) -> Cell { return row.uuid; }},
-    {"regionUuid", "Region UUID", 40, "s", kSum, nullptr,
-     [](const RegionRow& row) -> Cell { return row.regionUuid; }},
-    {"size", "Region memory size", 14, "Lu", kSum, FromRegionBytes,
-     [](const RegionRow& row) -> Cell { return row.region.size; }},
-    {"reserved", "Reserved 2M blocks", 10, "Lu", kSum, nullptr,
-     [](const RegionRow& row) -> Cell { return row.region.reserved; }},
-    {"flags", "Flags", 40, "s", kSum, nullptr,
-     [](const RegionRow& row) -> Cell { return row.flagNames.text(); }},
+    Text("uuid", "Volume UUID", [](const RegionRow& row) { return row.uuid; }).Wide(40),
+    Text("regionUuid", "Region UUID", [](const RegionRow& row) { return row.regionUuid; }).Wide(40),
+    Bytes("size", "Region memory size", [](const RegionRow& row) { return row.region.size; })
+        .Wide(14),
+    Code("reserved", "Reserved 2M blocks",
+         [](const RegionRow& row) { return row.region.reserved; }),
+    Text("flags", "Flags", [](const RegionRow& row) { return row.flagNames.text(); }).Wide(40),
+};
+static_assert(IsSound(kRegionColumns));
+
+constexpr ReportVariant kVariants[] = {
+    {1, kColumnInfos<kVolumeColumns>},
+    {kRegionLevel, kColumnInfos<kRegionColumns>},
 };
 
 // A volume's name as a row shows it.
@@ -211,27 +212,34 @@ void PMemRegionsReport(ReportContext<RegionRow>& context) {
 
 // Prints the report with the rows of `printRows`.
 template <class Row>
-Status Report(std::span<const Column<Row>> columns, void (*printRows)(ReportContext<Row>&),
-              const ReportOptions& options) {
-  ReportContext<Row> context(kFrame, columns);
-  if (Status status = context.Begin(options)) return status;
-  context.PrintTitleBlock();
-  context.PrintHead();
-  context.PrintDashes();
+Status RunVariant(std::span<const Column<Row>> columns, void (*printRows)(ReportContext<Row>&),
+                  const ReportOptions& options, Sink& sink) {
+  ReportContext<Row> context(kFrame, columns, sink);
+  if (Status status = context.Settle(options)) return status;
+  context.Begin();
+  context.Rule();
   printRows(context);
-  context.PrintDashes();
+  context.Rule();
   context.PrintDescriptions();
   return kSuccess;
 }
 
+Status Run(const ReportOptions& options, Sink& sink) {
+  return options.levels == kRegionLevel
+             ? RunVariant<RegionRow>(kRegionColumns, PMemRegionsReport, options, sink)
+             : RunVariant<VolumeRow>(kVolumeColumns, PMemRegionStoreReport, options, sink);
+}
+
 }  // namespace
 
-Status TallyPMemStats(int argc, char** argv) {
-  ReportOptions options;
-  if (Status status = ParseReportOptions(kFrame, argc, argv, options)) return status;
-  return options.levels == kRegionLevel
-             ? Report<RegionRow>(kRegionColumns, PMemRegionsReport, options)
-             : Report<VolumeRow>(kVolumeColumns, PMemRegionStoreReport, options);
-}
+const Report pmemStats = {
+    .name = "pmem-stats",
+    .frame = &kFrame,
+    .variants = kVariants,
+    .run = Run,
+    .entry = TallyPMemStats,
+};
+
+Status TallyPMemStats(int argc, char** argv) { return PrintReport(pmemStats, argc, argv); }
 
 }  // namespace tally

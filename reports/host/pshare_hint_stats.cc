@@ -16,6 +16,7 @@ constexpr ReportFrame kFrame = {
     .title = "PSHARE HINT STATS",
     .ruleLength = 43,
     .options = "s:u:vq",
+    .totalRow = true,
 };
 
 struct HintRow {
@@ -26,39 +27,51 @@ struct HintRow {
 };
 
 constexpr Column<HintRow> kColumns[] = {
-    {"type", "Hint type (regular or large page hint)", 10, "s", kSum, nullptr,
-     [](const HintRow& row) -> Cell { return row.type; }},
-    {"totAdd", "Total hints added", 15, "Lu", kSum, ShiftKilobytes,
-     [](const HintRow& row) -> Cell { return PagesToKilobytes(row.totAdd); }},
-    {"totRemove", "Total hints removed", 15, "Lu", kSum, ShiftKilobytes,
-     [](const HintRow& row) -> Cell { return PagesToKilobytes(row.totRemove); }},
-    {"active", "Currently active hints", 15, "Lu", kSum, ShiftKilobytes,
-     [](const HintRow& row) -> Cell { return PagesToKilobytes(row.active); }},
+    Text("type", "Hint type (regular or large page hint)",
+         [](const HintRow& row) { return row.type; })
+        .Total(kLabel),
+    Pages("totAdd", "Total hints added", [](const HintRow& row) { return row.totAdd; }).Wide(15),
+    Pages("totRemove", "Total hints removed", [](const HintRow& row) { return row.totRemove; })
+        .Wide(15),
+    Pages("active", "Currently active hints", [](const HintRow& row) { return row.active; })
+        .Wide(15),
 };
+static_assert(IsSound(kColumns));
 
-}  // namespace
-
-Status TallyPShareHintStats(int argc, char** argv) {
-  ReportContext<HintRow> context(kFrame, kColumns);
-  if (Status status = context.Begin(argc, argv)) return status;
+Status Run(const ReportOptions& options, Sink& sink) {
+  ReportContext<HintRow> context(kFrame, kColumns, sink);
+  if (Status status = context.Settle(options)) return status;
   KSI_PshareStats stats;
   if (Status status = ReadHostRecord("TallyPShareHintGetStats", KSI_NODE_memory_pshare_stats,
                                      {.capacity = 1}, stats)) {
     return status;
   }
   context.SelectColumns();
-  context.PrintTitleBlock();
-  context.PrintHead();
+  context.Begin();
   const uint64_t regularAdded = stats.hintsAdded - stats.lpageHintsAdded;
   const uint64_t regularRemoved = stats.hintsRemoved - stats.lpageHintsRemoved;
   context.PrintRow({"regular", regularAdded, regularRemoved, regularAdded - regularRemoved});
   context.PrintRow({"lpage", stats.lpageHintsAdded, stats.lpageHintsRemoved,
                     stats.lpageHintsAdded - stats.lpageHintsRemoved});
-  context.PrintDashes();
+  context.Rule();
   context.PrintTotalRow({"Total", stats.hintsAdded, stats.hintsRemoved, stats.hintsActive});
-  context.PrintDashes();
+  context.Rule();
   context.PrintDescriptions();
   return kSuccess;
+}
+
+}  // namespace
+
+const Report pshareHintStats = {
+    .name = "pshareHint-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyPShareHintStats,
+};
+
+Status TallyPShareHintStats(int argc, char** argv) {
+  return PrintReport(pshareHintStats, argc, argv);
 }
 
 }  // namespace tally

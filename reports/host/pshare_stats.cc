@@ -19,40 +19,49 @@ constexpr ReportFrame kFrame = {
 };
 
 constexpr Column<KSI_PshareStats> kColumns[] = {
-    {"cow", "Client memory marked copy-on-write", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.cow); }},
-    {"cow1", "Client's COWed memory with single ref", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.cow1); }},
-    {"zero", "Zeroed client memory", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.zero); }},
-    {"used", "Machine memory used for backing COWed client memory", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.used); }},
-    {"reclaimed", "Machine memory reclaimed via pshare", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.reclaimed); }},
-    {"totAdd", "Total client memory added to pshare table", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.totAdd); }},
-    {"totRemove", "Total client memory removed from pshare table", 10, "Lu", kSum, ShiftKilobytes,
-     [](const KSI_PshareStats& row) -> Cell { return PagesToKilobytes(row.totRemove); }},
+    Pages("cow", "Client memory marked copy-on-write",
+          [](const KSI_PshareStats& row) { return row.cow; }),
+    Pages("cow1", "Client's COWed memory with single ref",
+          [](const KSI_PshareStats& row) { return row.cow1; }),
+    Pages("zero", "Zeroed client memory", [](const KSI_PshareStats& row) { return row.zero; }),
+    Pages("used", "Machine memory used for backing COWed client memory",
+          [](const KSI_PshareStats& row) { return row.used; }),
+    Pages("reclaimed", "Machine memory reclaimed via pshare",
+          [](const KSI_PshareStats& row) { return row.reclaimed; }),
+    Pages("totAdd", "Total client memory added to pshare table",
+          [](const KSI_PshareStats& row) { return row.totAdd; }),
+    Pages("totRemove", "Total client memory removed from pshare table",
+          [](const KSI_PshareStats& row) { return row.totRemove; }),
 };
+static_assert(IsSound(kColumns));
 
-}  // namespace
-
-Status TallyPShareStats(int argc, char** argv) {
-  ReportContext<KSI_PshareStats> context(kFrame, kColumns);
-  if (Status status = context.Begin(argc, argv)) return status;
+Status Run(const ReportOptions& options, Sink& sink) {
+  ReportContext<KSI_PshareStats> context(kFrame, kColumns, sink);
+  if (Status status = context.Settle(options)) return status;
   KSI_PshareStats row;
   if (Status status = ReadHostRecord("TallyPShareGetStats", KSI_NODE_memory_pshare_stats,
                                      {.capacity = 1}, row)) {
     return status;
   }
-  context.PrintTitleBlock({{"Peak chain length", row.peakChainLength},
-                           {"Peak chain index", row.peakChainIndex},
-                           {"Peak ref.  count", row.peakRefCount}});
-  context.PrintHead();
+  context.Begin({{"Peak chain length", row.peakChainLength},
+                 {"Peak chain index", row.peakChainIndex},
+                 {"Peak ref.  count", row.peakRefCount}});
   context.PrintRow(row);
-  context.PrintDashes();
+  context.Rule();
   context.PrintDescriptions();
   return kSuccess;
 }
+
+}  // namespace
+
+const Report pshareStats = {
+    .name = "pshare-stats",
+    .frame = &kFrame,
+    .variants = kOnlyVariant<kColumns>,
+    .run = Run,
+    .entry = TallyPShareStats,
+};
+
+Status TallyPShareStats(int argc, char** argv) { return PrintReport(pshareStats, argc, argv); }
 
 }  // namespace tally

@@ -1,0 +1,305 @@
+// The columns of a report.
+//
+// A report's table is an array of Column, one entry a column, made by the function that is named
+// after what the figure is:
+//
+//   Kilobytes("touched", "Guest physical memory actively used by VM",
+//             [](const VMStatsRow& row) { return row.vmm.touched; }),
+//
+// The function and the figure's type settle how the figure is converted, printed and added up; what
+// differs is said behind the entry: Count(...).Wide(7).As("d").Total(kBlank). IsSound() is asserted
+// of each table, so that what could not be printed does not compile.
+#ifndef FRAMEWORK_COLUMN_H_
+#define FRAMEWORK_COLUMN_H_
+
+#include <algorithm>
+#include <array>
+#include <concepts>
+#include <cstdint>
+#include <iterator>
+#include <string_view>
+
+#include "framework/column_table.h"
+#include "framework/display_unit.h"
+
+namespace tally {
+
+// What a figure is, in the measure that the kernel gives it in.
+enum class Kind : uint8_t {
+  text,
+  flag,  // 0 or 1; shown as a letter
+  id,
+  code,  // one of a few numbers, each with a meaning of its own
+  count,
+  percent,
+  time,  // in a unit that the kernel does not tell
+  microseconds,
+  kilobytes,
+  pages,  // of 4 KB
+  bytes,
+};
+
+// What a column shows in the Total row.
+enum class InTotal : uint8_t {
+  blank,
+  label,     // the word "Total"
+  sum,       // of the rows' figures, 64 bits wrapping
+  knownSum,  // of those figures that have a value
+  mean,      // the sum divided by the number of rows
+};
+
+constexpr InTotal kBlank = InTotal::blank;
+constexpr InTotal kLabel = InTotal::label;
+constexpr InTotal kSum = InTotal::sum;
+constexpr InTotal kKnownSum = InTotal::knownSum;
+constexpr InTotal kMean = InTotal::mean;
+
+// A column's figure: what there is to know of it beside its ColumnDesc.
+struct Figure {
+  Kind kind;
+  uint8_t bits;   // of the record's number; 0 for a text
+  bool isSigned;  // the number is
+  InTotal inTotal;
+  Conversion toUnit;  // null for what is shown as it is
+
+  bool IsNumber() const { return kind != Kind::text && kind != Kind::flag; }
+
+  // Whether the kernel has no value for the figure: all of the number's bits are ones.
+  bool IsNone(const Cell& cell) const {
+    return IsNumber() && cell.number() << (64 - bits) == UINT64_MAX << (64 - bits);
+  }
+
+  // Whether the figure is shown as it is in `unit`.
+  bool IsShownAsItIs(DisplayUnit unit) const {
+    return toUnit == nullptr || (kind == Kind::kilobytes && bits == 64 && unit == DisplayUnit::kb);
+  }
+
+  // The figure as it is shown in `unit`.
+  Cell Shown(const Cell& cell, DisplayUnit unit) const {
+    return toUnit == nullptr ? cell : Cell(toUnit(cell.number(), unit));
+  }
+};
+
+// A column, whatever the rows.
+struct ColumnInfo {
+  ColumnDesc desc;
+  Figure figure;
+};
+
+// One column of a report on `Row`s.
+template <class Row>
+struct Column : ColumnInfo {
+  Cell (*value)(const Row& row);
+
+  constexpr Column Wide(uint8_t width) const {
+    Column column = *this;
+    column.desc.width = width;
+    return column;
+  }
+
+  // Printed with another conversion than that of the figure's type.
+  constexpr Column As(const char* conversion) const {
+    Column column = *this;
+    column.desc.conversion = conversion;
+    return column;
+  }
+
+  // Converted to the display unit in another way than others of its kind.
+  constexpr Column Through(Conversion toUnit) const {
+    Column column = *this;
+    column.figure.toUnit = toUnit;
+    return column;
+  }
+
+  constexpr Column Total(InTotal inTotal) const {
+    Column column = *this;
+    column.figure.inTotal = inTotal;
+    column.desc.summable = inTotal != InTotal::blank;
+    return column;
+  }
+
+  // -s cannot hide it.
+  constexpr Column Fixed() const {
+    Column column = *this;
+    column.desc.fixed = 1;
+    return column;
+  }
+};
+
+namespace column_internal {
+
+// The row that a figure's function takes, and what it returns.
+template <class Function>
+struct Signature;
+template <class Class, class R, class T>
+struct Signature<R (Class::*)(const T&) const> {
+  using Row = T;
+  using Result = R;
+};
+template <class Read>
+using RowOf = typename Signature<decltype(&Read::operator())>::Row;
+template <class Read>
+using ResultOf = typename Signature<decltype(&Read::operator())>::Result;
+
+// How a number is printed: memory in 64 bits, others as wide as they are.
+template <std::integral Number>
+constexpr const char* ConversionOf(Kind kind) {
+  const bool isMemory = kind == Kind::kilobytes || kind == Kind::pages || kind == Kind::bytes;
+  if (isMemory || sizeof(Number) == sizeof(uint64_t))
+    return std::signed_integral<Number> ? "Ld" : "Lu";
+  return std::signed_integral<Number> ? "d" : "u";
+}
+
+template <class Row>
+constexpr Column<Row> Make(const char* name, const char* description, const char* conversion,
+                           const Figure& figure, Cell (*value)(const Row& row)) {
+  return {{{.name = name,
+            .description = description,
+            .width = 10,
+            .conversion = conversion,
+            .summable = figure.inTotal != InTotal::blank,
+            .fixed = 0,
+            .selected = 1},
+           figure},
+          value};
+}
+
+template <class Read>
+constexpr auto Number(Kind kind, const char* name, const char* description, InTotal inTotal,
+                      Conversion toUnit) {
+  using Row = RowOf<Read>;
+  using Result = ResultOf<Read>;
+  static_assert(std::integral<Result> && !std::same_as<Result, bool>);
+  return Make<Row>(name, description, ConversionOf<Result>(kind),
+                   {.kind = kind,
+                    .bits = 8 * sizeof(Result),
+                    .isSigned = std::signed_integral<Result>,
+                    .inTotal = inTotal,
+                    .toUnit = toUnit},
+                   [](const Row& row) -> Cell { return Read{}(row); });
+}
+
+}  // namespace column_internal
+
+// A text that is the row's for as long as the row is.
+template <class Read>
+constexpr auto Text(const char* name, const char* description, Read /*read*/) {
+  using Row = column_internal::RowOf<Read>;
+  return column_internal::Make<Row>(
+      name, description, "s",
+      {.kind = Kind::text, .bits = 0, .isSigned = false, .inTotal = kBlank, .toUnit = nullptr},
+      [](const Row& row) -> Cell { return std::string_view(Read{}(row)); });
+}
+
+// 'y' or 'n'.
+template <class Read>
+constexpr auto Flag(const char* name, const char* description, Read /*read*/) {
+  using Row = column_internal::RowOf<Read>;
+  static_assert(std::same_as<column_internal::ResultOf<Read>, bool>);
+  return column_internal::Make<Row>(
+      name, description, "c",
+      {.kind = Kind::flag, .bits = 1, .isSigned = false, .inTotal = kBlank, .toUnit = nullptr},
+      [](const Row& row) { return Cell::YesNo(Read{}(row)); });
+}
+
+template <class Read>
+constexpr auto Id(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::id, name, description, kBlank, nullptr);
+}
+
+template <class Read>
+constexpr auto Code(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::code, name, description, kBlank, nullptr);
+}
+
+template <class Read>
+constexpr auto Count(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::count, name, description, kSum, nullptr);
+}
+
+template <class Read>
+constexpr auto Percent(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::percent, name, description, kBlank, nullptr);
+}
+
+template <class Read>
+constexpr auto Time(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::time, name, description, kBlank, nullptr);
+}
+
+template <class Read>
+constexpr auto Microseconds(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::microseconds, name, description, kBlank, nullptr);
+}
+
+// Memory, shown in the display unit. One without a value is shown as it is, ...
+template <class Read>
+constexpr auto Kilobytes(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::kilobytes, name, description, kSum, FromKilobytes);
+}
+
+// ... but is converted like any other where the kernel counts pages or bytes.
+template <class Read>
+constexpr auto Pages(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::pages, name, description, kSum, FromPages);
+}
+
+template <class Read>
+constexpr auto Bytes(const char* name, const char* description, Read /*read*/) {
+  return column_internal::Number<Read>(Kind::bytes, name, description, kSum, FromBytes);
+}
+
+// Whether a column can be printed and added up as it says.
+constexpr bool IsSound(const ColumnInfo& column) {
+  const std::string_view conversion = column.desc.conversion;
+  const bool isText = column.figure.kind == Kind::text;
+  const bool isFlag = column.figure.kind == Kind::flag;
+  const bool isSum = column.desc.summable != 0 && column.figure.inTotal != kLabel;
+  if (std::string_view(column.desc.name).find_first_of(":,\"") != std::string_view::npos)
+    return false;
+  if (isSum && isText) return false;
+  if (column.figure.inTotal == kLabel && !isText) return false;
+  if (conversion == "s") return isText || isFlag;
+  if (conversion == "c") return isFlag;
+  if (isText || isFlag) return false;
+  if (conversion == "u" || conversion == "d") return column.figure.bits <= 32;
+  return conversion == "Lu" || conversion == "Ld";
+}
+
+// Whether all columns of a table are sound and their names differ, whatever the case.
+template <class ColumnOfRow, size_t kCount>
+constexpr bool IsSound(const ColumnOfRow (&columns)[kCount]) {
+  constexpr auto lower = [](char letter) {
+    return letter >= 'A' && letter <= 'Z' ? static_cast<char>(letter - 'A' + 'a') : letter;
+  };
+  for (size_t i = 0; i < kCount; ++i) {
+    const std::string_view name = columns[i].desc.name;
+    if (name.empty() || !IsSound(columns[i])) return false;
+    for (size_t other = 0; other < i; ++other) {
+      if (std::ranges::equal(name, std::string_view(columns[other].desc.name), {}, lower, lower))
+        return false;
+    }
+  }
+  return kCount <= UINT8_MAX;
+}
+
+// The place of the column called `name`; does not compile where there is none.
+template <class ColumnOfRow, size_t kCount>
+consteval size_t PlaceOf(const ColumnOfRow (&columns)[kCount], std::string_view name) {
+  for (size_t place = 0; place < kCount; ++place) {
+    if (name == columns[place].desc.name) return place;
+  }
+  throw "there is no such column";
+}
+
+// A table without its rows.
+template <const auto& kColumns>
+constexpr auto kColumnInfos = [] {
+  std::array<ColumnInfo, std::size(kColumns)> infos{};
+  std::copy(std::begin(kColumns), std::end(kColumns), infos.begin());
+  return infos;
+}();
+
+}  // namespace tally
+
+#endif  // FRAMEWORK_COLUMN_H_

@@ -1,0 +1,34 @@
+#include "framework/text_sink.h"
+
+#include <algorithm>
+#include <cstdio>
+
+namespace tally {
+
+void TextSink::Begin(const Heading& heading) {
+  heading_ = heading;
+  shown_.resize(heading.columns.size());
+  converted_.clear();
+  for (size_t i = 0; i < heading.figures.size(); ++i) {
+    if (!heading.figures[i].IsShownAsItIs(heading.unit)) converted_.push_back(i);
+  }
+}
+
+void TextSink::Row(RowKind kind, std::span<const Cell> cells) {
+  if (!converted_.empty()) {
+    std::ranges::copy(cells, shown_.begin());
+    for (const size_t i : converted_) {
+      shown_[i] = heading_.figures[i].Shown(cells[i], heading_.unit);
+    }
+    cells = shown_;
+  }
+  PrintRow(table(), csvMode_, kind == RowKind::total, cells);
+}
+
+void TextSink::Note(std::string_view text) {
+  std::printf("%.*s\n", static_cast<int>(text.size()), text.data());
+}
+
+void TextSink::Describe() { PrintColumnDescriptions(table()); }
+
+}  // namespace tally
