@@ -22,6 +22,12 @@ if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_L
   target_compile_options(tally_compiler INTERFACE -Wno-restrict)
 endif()
 
+# Where the sources lay when they were built shows in no release.
+if(NOT TALLY_COVERAGE)
+  target_compile_options(tally_compiler INTERFACE "$<$<CONFIG:Release,RelWithDebInfo>:\
+-ffile-prefix-map=${PROJECT_SOURCE_DIR}/=;-ffile-prefix-map=${PROJECT_BINARY_DIR}=build>")
+endif()
+
 if(TALLY_COVERAGE)
   target_compile_options(tally_compiler INTERFACE --coverage)
   target_link_options(tally_compiler INTERFACE --coverage)
