@@ -31,61 +31,67 @@ extern "C" {
  * without a value has the record None, one without a list the entries kNone. */
 #define KSI_NODES(NODE)                                                                            \
   /* Scheduler groups, by group id. */                                                             \
-  NODE(sched_groups_groupName, GroupName, (kGroup), kNone, (), "Its name")                         \
-  NODE(sched_groups_groupTag, GroupTag, (kGroup), kNone, (), "Its tag")                            \
-  NODE(sched_groups_parentGroupID, ParentGroupID, (kGroup), kNone, (), "The group above it")       \
-  NODE(sched_groups_groupFlags, GroupFlags, (kGroup), kNone, (), "What it is")                     \
-  NODE(sched_groups_groupLeaderID, GroupLeaderID, (kGroup), kNone, (), "The world that leads it")  \
+  NODE(sched_groups_groupName, GroupName, (kGroup), kNone, (), "A group's name")                   \
+  NODE(sched_groups_groupTag, GroupTag, (kGroup), kNone, (), "A group's tag")                      \
+  NODE(sched_groups_parentGroupID, ParentGroupID, (kGroup), kNone, (), "The group above a group")  \
+  NODE(sched_groups_groupFlags, GroupFlags, (kGroup), kNone, (), "What a group is")                \
+  NODE(sched_groups_groupLeaderID, GroupLeaderID, (kGroup), kNone, (),                             \
+       "The world that leads a group")                                                             \
   NODE(sched_groups_memAllocationInKB, GroupAllocation, (kGroup), kNone, (),                       \
-       "How its memory is configured")                                                             \
+       "How a group's memory is configured")                                                       \
   NODE(sched_groups_stats_capacity, GroupCapacity, (kGroup), kNone, (),                            \
-       "What is reserved of its memory")                                                           \
-  NODE(sched_groups_stats_memoryStats, GroupMemoryStats, (kGroup), kNone, (), "Its memory")        \
-  NODE(sched_groups_members_groups, None, (), kGroup, (kGroup), "The groups below it")             \
-  NODE(sched_groups_members_memClients, None, (), kClient, (kGroup), "Its memory clients")         \
+       "What is reserved of a group's memory")                                                     \
+  NODE(sched_groups_stats_memoryStats, GroupMemoryStats, (kGroup), kNone, (), "A group's memory")  \
+  NODE(sched_groups_members_groups, None, (), kGroup, (kGroup), "The groups below a group")        \
+  NODE(sched_groups_members_memClients, None, (), kClient, (kGroup), "A group's memory clients")   \
   /* Memory clients, by client id. */                                                              \
   NODE(sched_memClients_tally_totalCommon, CommonTally, (kClient), kNone, (),                      \
-       "What all tallies have in common")                                                          \
+       "What the tallies of all clients have in common")                                           \
   NODE(sched_memClients_tally_vmm, VmmTally, (kClient), kNone, (), "A virtual machine's memory")   \
   NODE(sched_memClients_tally_uw, UwTally, (kClient), kNone, (), "A user world's memory")          \
   NODE(sched_memClients_tally_guest, GuestTally, (kClient), kNone, (),                             \
-       "What its guest says of itself")                                                            \
-  NODE(sched_memClients_swapInfo, SwapInfo, (kClient), kNone, (), "How the host swaps it")         \
-  NODE(sched_memClients_memzipInfo, MemzipInfo, (kClient), kNone, (), "Its compression cache")     \
+       "What a virtual machine's guest says of itself")                                            \
+  NODE(sched_memClients_swapInfo, SwapInfo, (kClient), kNone, (),                                  \
+       "How the host swaps a virtual machine")                                                     \
+  NODE(sched_memClients_memzipInfo, MemzipInfo, (kClient), kNone, (),                              \
+       "A virtual machine's compression cache")                                                    \
   NODE(sched_memClients_remapTypes, RemapType, (kClient, kRemapType), kRemapType, (kClient),       \
-       "Its remapped pages")                                                                       \
+       "A client's remapped pages, by type")                                                       \
   NODE(worldGroups_vmmLeaderID, VmmLeaderID, (kClient), kNone, (),                                 \
-       "The VMM leader of its world group")                                                        \
+       "The VMM leader of a client's world group")                                                 \
   /* The host. */                                                                                  \
   NODE(sched_globalStats_numVMs, NumVMs, (), kNone, (), "How many virtual machines there are")     \
   NODE(sched_globalStats_memory_tally, GlobalTally, (), kNone, (),                                 \
        "What the memory scheduler manages")                                                        \
   NODE(sched_globalStats_memory_stateTransitions, StateTransitions, (kState), kNone, (),           \
-       "How often it was left")                                                                    \
-  NODE(memory_comprehensive, Comprehensive, (), kNone, (), "How its memory is divided")            \
-  NODE(memory_memInfo, MemInfo, (), kNone, (), "Its memory hardware")                              \
+       "How often the host left a memory state")                                                   \
+  NODE(memory_comprehensive, Comprehensive, (), kNone, (), "How the host's memory is divided")     \
+  NODE(memory_memInfo, MemInfo, (), kNone, (), "The host's memory hardware")                       \
   NODE(memory_memNodes, MemNode, (kMemNode), kNone, (), "Where a memory node is")                  \
-  NODE(memory_pshare_stats, PshareStats, (), kNone, (), "Page sharing")                            \
+  NODE(memory_pshare_stats, PshareStats, (), kNone, (), "Page sharing on the host")                \
   NODE(system_buddy, None, (), kBuddy, (), "The buddy allocators")                                 \
-  NODE(system_buddy_comprehensive, BuddyStats, (kBuddy), kNone, (), "The buffers of one")          \
+  NODE(system_buddy_comprehensive, BuddyStats, (kBuddy), kNone, (),                                \
+       "The buffers of a buddy allocator")                                                         \
   NODE(system_heaps, None, (), kHeap, (), "The kernel's heaps")                                    \
-  NODE(system_heaps_stats, HeapStats, (kHeap), kNone, (), "One of them")                           \
+  NODE(system_heaps_stats, HeapStats, (kHeap), kNone, (), "A heap")                                \
   /* Large pages; a virtual machine's by the client id of its VMM leader. */                       \
-  NODE(memory_lpage_vmLPage, VmLargePages, (kClient), kNone, (), "The large pages behind one")     \
+  NODE(memory_lpage_vmLPage, VmLargePages, (kClient), kNone, (),                                   \
+       "The large pages behind a virtual machine")                                                 \
   NODE(memory_lpage_nodeList_psharePool, LargePagePool, (kMemNode), kNone, (),                     \
-       "The pool for page sharing")                                                                \
+       "A memory node's pool for page sharing")                                                    \
   NODE(memory_lpage_nodeList_vmPools, LargePagePool, (kMemNode, kPool), kPool, (kMemNode),         \
-       "The other pools")                                                                          \
+       "A memory node's other pools of large pages")                                               \
   /* Persistent memory. */                                                                         \
-  NODE(memory_pmem_volumes, None, (), kVolume, (), "The volumes")                                  \
-  NODE(memory_pmem_volumes_info, PmemVolume, (kVolume), kNone, (), "One of them")                  \
+  NODE(memory_pmem_volumes, None, (), kVolume, (), "The volumes of persistent memory")             \
+  NODE(memory_pmem_volumes_info, PmemVolume, (kVolume), kNone, (), "A volume")                     \
   NODE(memory_pmem_volumes_regionStore_info, PmemRegionStore, (kVolume), kNone, (),                \
-       "Its store of regions")                                                                     \
+       "A volume's store of regions")                                                              \
   NODE(memory_pmem_volumes_regionStore_isClean, IsClean, (kVolume), kNone, (),                     \
-       "Was the store closed in order?")                                                           \
-  NODE(memory_pmem_volumes_regionStore_regions, None, (), kRegion, (kVolume), "The regions")       \
+       "Whether the store was closed in order")                                                    \
+  NODE(memory_pmem_volumes_regionStore_regions, None, (), kRegion, (kVolume),                      \
+       "The regions in the store")                                                                 \
   NODE(memory_pmem_volumes_regionStore_regions_info, PmemRegion, (kVolume, kRegion), kNone, (),    \
-       "One of them")
+       "A region")
 /* clang-format on */
 
 #define KSI_NODE(name, record, keys, entries, listKeys, meaning) \

@@ -91,7 +91,7 @@ enum {
   FIELD(0, int64_t, min, "KB", "Reservation")                                                      \
   FIELD(8, int64_t, max, "KB", "Limit; KSI_GROUP_LARGEST_LIMIT")                                   \
   FIELD(16, int32_t, shares, "", "Share of what is contended for")                                 \
-  FIELD(20, int64_t, minLimit, "KB", "Bound of the reservation")                                   \
+  FIELD(20, int64_t, minLimit, "KB", "Bound of the reservation; as max")                           \
   GAP(28, 4)
 
 /* A scheduler group's reservation bookkeeping. */
@@ -153,9 +153,9 @@ enum {
   FIELD(124, uint64_t, vpmemUC, "KB", "Persistent memory not yet cached")                          \
   FIELD(132, uint64_t, llswapped, "KB", "Swapped to llswap")                                       \
   FIELD(140, uint64_t, zipSaved, "KB", "Saved by compression")                                     \
-  FIELD(148, uint64_t, shared, "KB", "Mapped memory that is marked COW by page sharing")           \
+  FIELD(148, uint64_t, shared, "KB", "Mapped memory marked COW by page sharing")                   \
   FIELD(156, uint64_t, zero, "KB", "Shared memory that is zero-filled")                            \
-  FIELD(164, uint64_t, llswapUsed, "KB", "Space used in llswap, fragments included")               \
+  FIELD(164, uint64_t, llswapUsed, "KB", "Space used in llswap with fragments")                    \
   FIELD(172, uint64_t, mapped, "KB", "Guest memory backed by host memory")                         \
   FIELD(180, uint64_t, zipped, "KB", "Guest memory that is compressed")                            \
   FIELD(188, uint64_t, vpmemRW, "KB", "Persistent memory cached read-write")                       \
@@ -175,7 +175,7 @@ enum {
 #define KSI_RECORD_UwTally(FIELD, TEXT, GAP)                                                       \
   FIELD(0, int64_t, min, "KB", "Reservation")                                                      \
   FIELD(8, int64_t, max, "KB", "Limit; KSI_UW_NO_LIMIT")                                           \
-  FIELD(16, int64_t, minLimit, "KB", "Bound of the reservation; KSI_UW_NO_LIMIT")                  \
+  FIELD(16, int64_t, minLimit, "KB", "Bound of the reservation; as max")                           \
   FIELD(24, int32_t, shares, "", "Share of what is contended for")                                 \
   FIELD(28, int32_t, memSizeLimit, "KB", "What the address space may grow to")                     \
   GAP(32, 4)                                                                                       \
@@ -437,7 +437,7 @@ enum {
 
 /* Values that are one number: NUMBER(name, type, field, unit, meaning); KSI_<name> is the type. */
 #define KSI_NUMBERS(NUMBER)                                                                        \
-  NUMBER(ParentGroupID, int64_t, parentGroupID, "", "Group above this one; -1: none")              \
+  NUMBER(ParentGroupID, int64_t, parentGroupID, "", "Id of the group above")                       \
   NUMBER(GroupFlags, uint32_t, groupFlags, "bits", "KSI_GROUP_ bits")                              \
   NUMBER(GroupLeaderID, int32_t, groupLeaderID, "", "World group that leads the group")            \
   NUMBER(VmmLeaderID, int32_t, vmmLeaderID, "", "VMM leader of a world group")                     \
