@@ -18,7 +18,6 @@
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/catalogue.h"
-#include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
 #include "tools/ksicache/cache_writer.h"
 
@@ -54,8 +53,8 @@ class Host {
     stats.eMin = stats.bMin = stats.ovhd = Unsigned();
     Value("sched/groups/stats/memoryStats", id, stats);
 
-    KSI_ParamList list(KSI_ParamList::kNoLimit);
-    for (const int64_t child : children) list.AddNumber(static_cast<uint64_t>(child));
+    std::vector<ksi::Key> list;
+    for (const int64_t child : children) list.push_back({ksi::KeyKind::kNumber, child, {}});
     writer_.AddList(Node("sched/groups/members/groups"), Keys(id), list);
   }
 

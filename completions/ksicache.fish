@@ -50,7 +50,7 @@ function __ksicache_words
     set -e words[1]
     while set -q words[1]
         switch $words[1]
-            case --root
+            case --root --mode
                 set -e words[1]
             case '-*'
             case '*'
@@ -75,8 +75,10 @@ end
 function __ksicache_wants_file
     set -l words (__ksicache_words)
     switch "$words[1]"
-        case capture info dump check
+        case capture dump
             not set -q words[2]
+        case info check
+            true
         case load
             not set -q words[3]
         case '*'
@@ -96,5 +98,6 @@ complete -c ksicache -n $no_command -l version -d 'Print the version'
 complete -c ksicache -n __ksicache_wants_file -F
 complete -c ksicache -n __ksicache_wants_node -a '(__ksicache_nodes)'
 complete -c ksicache -n '__ksicache_command capture load' -l force -d 'Replace the file'
+complete -c ksicache -n '__ksicache_command capture load' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
 complete -c ksicache -n '__ksicache_command capture' -l root -x -a '(__fish_complete_directories)' -d 'Capture the host recorded there'
 complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'

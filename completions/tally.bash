@@ -350,29 +350,33 @@ _ksicache() {
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
     if [[ -n $skip ]]; then
       skip=
-    elif [[ $word == --root ]]; then
-      skip=yes
+    elif [[ $word == --root || $word == --mode ]]; then
+      skip=$word
     elif [[ $word != -* ]]; then
       if [[ -z $command ]]; then command=$word; else count=$((count + 1)); fi
     fi
   done
 
   word=${_tally_line[-1]}
-  if [[ -n $skip ]]; then
+  if [[ $skip == --mode ]]; then
+    _tally_reply '' "$word" '0600 0640 0644'
+  elif [[ -n $skip ]]; then
     _tally_reply_files '' "$word" -d
+  elif [[ $word == --mode=* ]]; then
+    _tally_reply --mode= "${word#*=}" '0600 0640 0644'
   elif [[ $word == --root=* ]]; then
     _tally_reply_files --root= "${word#*=}" -d
   elif [[ $word == -* ]]; then
     case $command in
-      capture) _tally_reply '' "$word" '--force --root' ;;
+      capture) _tally_reply '' "$word" '--force --mode --root' ;;
       dump) _tally_reply '' "$word" --json ;;
-      load) _tally_reply '' "$word" --force ;;
+      load) _tally_reply '' "$word" '--force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac
   else
     case $command$count in
       0) _tally_reply '' "$word" 'capture info dump load check' ;;
-      capture0 | info0 | dump0 | check0 | load0 | load1) _tally_reply_files '' "$word" -f ;;
+      capture0 | info* | dump0 | check* | load0 | load1) _tally_reply_files '' "$word" -f ;;
       dump*) _tally_reply '' "$word" "$_ksicache_nodes" ;;
     esac
   fi

@@ -63,15 +63,17 @@ const Node& NodeAt(std::string_view path) {
   return *node;
 }
 
-ParamList NumberList(std::initializer_list<uint64_t> numbers) {
-  ParamList list(ParamList::kNoLimit);
-  for (const uint64_t number : numbers) EXPECT_EQ(list.AddNumber(number), kOk);
+std::vector<Key> NumberList(std::initializer_list<uint64_t> numbers) {
+  std::vector<Key> list;
+  for (const uint64_t number : numbers) {
+    list.push_back({KeyKind::kNumber, static_cast<int64_t>(number), {}});
+  }
   return list;
 }
 
-ParamList TextList(std::initializer_list<std::string_view> texts) {
-  ParamList list(ParamList::kNoLimit);
-  for (const std::string_view text : texts) EXPECT_EQ(list.AddText(text), kOk);
+std::vector<Key> TextList(std::initializer_list<std::string_view> texts) {
+  std::vector<Key> list;
+  for (const std::string_view text : texts) list.push_back({KeyKind::kText, 0, text});
   return list;
 }
 

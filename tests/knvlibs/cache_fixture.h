@@ -46,8 +46,9 @@ std::span<const std::byte> BytesOf(const Record& record) {
   return std::as_bytes(std::span(&record, 1));
 }
 
-ParamList NumberList(std::initializer_list<uint64_t> numbers);
-ParamList TextList(std::initializer_list<std::string_view> texts);
+// Entries of a list; the texts have to live as long.
+std::vector<Key> NumberList(std::initializer_list<uint64_t> numbers);
+std::vector<Key> TextList(std::initializer_list<std::string_view> texts);
 
 // What a file of this library would say of itself.
 CacheFile::Capture TestCapture();

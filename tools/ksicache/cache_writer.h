@@ -1,4 +1,7 @@
 // Writes a cache file.
+//
+// The file is made in memory, where it may grow to kLargestFile, and written at once when it is
+// whole: its place need not be a file system that SQLite can work on, nor a file at all.
 #ifndef TOOLS_KSICACHE_CACHE_WRITER_H_
 #define TOOLS_KSICACHE_CACHE_WRITER_H_
 
@@ -7,10 +10,9 @@
 #include <string>
 
 #include "knvlibs/cache_file.h"
-#include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
 #include "knvlibs/sqlite.h"
-#include "tools/ksicache/temporary_file.h"
+#include "tools/ksicache/new_file.h"
 
 namespace ksicache {
 
@@ -18,35 +20,44 @@ namespace ksicache {
 // stands under its name after Commit, and before it nothing does.
 class CacheWriter {
  public:
-  // `replace`: the file may exist already.
-  CacheWriter(const std::string& fileName, bool replace);
+  static constexpr int64_t kLargestFile = int64_t{1} << 30;
+
+  // As for a NewFile.
+  CacheWriter(const std::string& fileName, bool replace, mode_t mode = NewFile::kMode);
 
   void AddValue(const ksi::Node& node, const ksi::Keys& keys, std::span<const std::byte> record);
-  void AddList(const ksi::Node& node, const ksi::Keys& keys, const ksi::ParamList& instances);
   void AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys, ksi::Status status);
+
+  // A list and then, one by one, its `count` entries.
+  void StartList(const ksi::Node& node, const ksi::Keys& keys, size_t count);
+  void AddEntry(const ksi::Key& entry);
+  // All at once.
+  void AddList(const ksi::Node& node, const ksi::Keys& keys, std::span<const ksi::Key> entries);
 
   void Commit(const ksi::CacheFile::Capture& capture);
 
+  const std::string& FileName() const { return file_.Name(); }
   size_t Values() const { return values_; }
   size_t Lists() const { return lists_; }
-  size_t Failures() const { return failures_; }
 
  private:
+  void Open();
   void Execute(const std::string& sql);
-  void Require(bool good, const char* action);
+  void Require(bool good);
   void WriteNodes();
-  static void CheckText(std::string_view text);
+  void WriteCapture(const ksi::CacheFile::Capture& capture);
+  void BindKey(ksi::Statement& statement, int parameter, const ksi::Key& key);
   void BindKeys(ksi::Statement& statement, const ksi::Keys& keys);
   // Adds the row of which the answer is bound already.
   void AddReading(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys, ksi::Status status);
 
-  TemporaryFile file_;
+  NewFile file_;
   ksi::Database database_;
   ksi::Statement addReading_;
-  ksi::Statement addInstance_;
+  ksi::Statement addEntry_;
+  int64_t position_ = 0;  // of the list's next entry
   size_t values_ = 0;
   size_t lists_ = 0;
-  size_t failures_ = 0;
 };
 
 }  // namespace ksicache

@@ -21,24 +21,10 @@ std::string NameOf(std::string_view path, const ksi::Keys& keys) {
   for (size_t i = 0; i < keys.count; ++i) {
     const ksi::Key& key = keys[i];
     name += " [";
-    name += key.kind == ksi::KeyKind::kNumber ? std::to_string(key.number) : Printable(key.text);
+    name += key.kind == ksi::KeyKind::kNumber ? std::to_string(key.number) : std::string(key.text);
     name += ']';
   }
   return name;
-}
-
-std::string Printable(std::string_view text) {
-  std::string result;
-  for (const char c : text) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < ' ' || byte == 0x7f) {
-      result += byte < 16 ? "\\x0" : "\\x";
-      result += Hex(byte).substr(2);
-    } else {
-      result += c;
-    }
-  }
-  return result;
 }
 
 }  // namespace ksicache

@@ -22,6 +22,12 @@ class DataError : public Error {
   using Error::Error;
 };
 
+// The same for standard output: with that lost, there is no going on.
+class OutputError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
 // Ends the command with its message, a word on how to get help, and exit status 2.
 class UsageError : public std::runtime_error {
  public:
@@ -36,9 +42,6 @@ std::string Hex(uint64_t number);
 
 // "sched/groups/groupName [5]"
 std::string NameOf(std::string_view path, const ksi::Keys& keys);
-
-// The text with what a terminal might take for a command written as "\x1b".
-std::string Printable(std::string_view text);
 
 }  // namespace ksicache
 

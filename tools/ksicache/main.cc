@@ -1,99 +1,104 @@
 // ksicache: the tool for KSI cache files.
 #include <getopt.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <exception>
+#include <new>
 #include <string>
+#include <vector>
 
-#include "tools/ksicache/commands.h"
+#include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/help.h"
 #include "tools/ksicache/output.h"
 
 namespace ksicache {
 namespace {
 
-constexpr const char* kHelp =
-    R"(Usage: ksicache capture FILE [--force] [--root DIR]
-       ksicache info FILE
-       ksicache dump FILE [NODE...] [--json]
-       ksicache load JSON FILE [--force]
-       ksicache check FILE
+enum Letter : int { kHelpLetter = 'h', kVersionLetter = 'V', kFirstOption = 256 };
 
-Captures, shows, makes and checks KSI cache files, which `tally -c FILE` reads
-instead of the host it runs on.
-
-Commands:
-  capture   record every node and instance of this Linux host in FILE
-  info      say which host FILE is of, when it was taken and what it holds
-  dump      show what FILE holds, of all nodes or of those named
-  load      make FILE from JSON, the output of dump --json
-  check     say what is wrong with FILE
-
-Options:
-      --force     replace FILE if it exists
-      --root DIR  capture the host whose files are recorded below DIR
-      --json      dump as JSON
-  -h, --help      show this message
-      --version   show the version
-
-Exit status: 0 if all went well, 1 if something failed or check found something
-wrong, 2 if the command line is wrong.
-)";
-
-struct Command {
-  const char* name;
-  int (*run)(const Options&);
-  const char* options;  // the ones it takes, by their letters below
-};
-constexpr Command kCommands[] = {
-    {"capture", Capture, "fr"}, {"info", Info, ""},   {"dump", Dump, "j"},
-    {"load", Load, "f"},        {"check", Check, ""},
+// All that may be given, whatever the command; an option of a command is known by its place in
+// `all`.
+struct Given {
+  std::vector<const Option*> all;
+  bool help = false;
+  bool version = false;
+  CommandLine line;
 };
 
-const Command& FindCommand(const std::string& name) {
-  for (const Command& command : kCommands) {
-    if (name == command.name) return command;
+std::vector<option> LongOptions(Given& given) {
+  std::vector<option> options = {{"help", no_argument, nullptr, kHelpLetter},
+                                 {"version", no_argument, nullptr, kVersionLetter}};
+  for (const Command* command : kCommands) {
+    for (const Option* each : command->options) {
+      if (std::ranges::find(given.all, each) != given.all.end()) continue;
+      const int letter = kFirstOption + static_cast<int>(given.all.size());
+      options.push_back(
+          {each->name, each->value == nullptr ? no_argument : required_argument, nullptr, letter});
+      given.all.push_back(each);
+    }
   }
-  throw UsageError("there is no command " + name);
+  options.push_back({nullptr, 0, nullptr, 0});
+  return options;
+}
+
+Given Parse(int argc, char** argv) {
+  Given given;
+  const std::vector<option> options = LongOptions(given);
+  opterr = 0;
+  for (int letter; (letter = getopt_long(argc, argv, "h", options.data(), nullptr)) != -1;) {
+    if (letter >= kFirstOption) {
+      const Option* each = given.all[static_cast<size_t>(letter - kFirstOption)];
+      given.line.options[each] = optarg == nullptr ? "" : optarg;
+    } else if (letter == kHelpLetter) {
+      given.help = true;
+    } else if (letter == kVersionLetter) {
+      given.version = true;
+    } else {
+      throw UsageError(std::string("unknown or incomplete option ") + argv[optind - 1]);
+    }
+  }
+  given.line.arguments.assign(argv + optind, argv + argc);
+  return given;
+}
+
+// Null if there is none of that name.
+const Command* FindCommand(const std::string& name) {
+  const auto* found =
+      std::ranges::find_if(kCommands, [&](const Command* each) { return each->name == name; });
+  return found == std::end(kCommands) ? nullptr : *found;
+}
+
+void CheckLine(const Command& command, const CommandLine& line) {
+  for (const auto& [option, value] : line.options) {
+    if (std::ranges::find(command.options, option) == command.options.end()) {
+      throw UsageError(std::string(command.name) + " does not take --" + option->name);
+    }
+  }
+  const size_t count = line.arguments.size();
+  if (count < command.fewest || count > command.most) {
+    throw UsageError("not as in: " + UsageOf(command));
+  }
 }
 
 int Run(int argc, char** argv) {
-  constexpr option kOptions[] = {
-      {"force", no_argument, nullptr, 'f'},   {"root", required_argument, nullptr, 'r'},
-      {"json", no_argument, nullptr, 'j'},    {"help", no_argument, nullptr, 'h'},
-      {"version", no_argument, nullptr, 'V'}, {nullptr, 0, nullptr, 0}};
-  Options options;
-  std::string given;
-  opterr = 0;
-  for (int letter; (letter = getopt_long(argc, argv, "h", kOptions, nullptr)) != -1;) {
-    switch (letter) {
-      case 'h':
-        Print(kHelp);
-        return 0;
-      case 'V':
-        Print("ksicache " KSICACHE_VERSION "\n");
-        return 0;
-      case 'f':
-        options.force = true;
-        break;
-      case 'j':
-        options.json = true;
-        break;
-      case 'r':
-        options.root = optarg;
-        break;
-      default:
-        throw UsageError(std::string("unknown or incomplete option ") + argv[optind - 1]);
-    }
-    given += static_cast<char>(letter);
+  Given given = Parse(argc, argv);
+  std::vector<std::string>& arguments = given.line.arguments;
+  if (given.version) {
+    Print("ksicache " KSICACHE_VERSION "\n");
+    return 0;
   }
-  if (optind == argc) throw UsageError("which command?");
-  const Command& command = FindCommand(argv[optind]);
-  if (given.find_first_not_of(command.options) != std::string::npos) {
-    throw UsageError(std::string(command.name) + " does not take that option");
+  const Command* command = arguments.empty() ? nullptr : FindCommand(arguments.front());
+  if (given.help) {
+    Print(command == nullptr ? Help() : HelpOf(*command));
+    return 0;
   }
-  options.arguments.assign(argv + optind + 1, argv + argc);
-  return command.run(options);
+  if (arguments.empty()) throw UsageError("which command?");
+  if (command == nullptr) throw UsageError("there is no command " + arguments.front());
+  arguments.erase(arguments.begin());
+  CheckLine(*command, given.line);
+  return command->run(given.line);
 }
 
 }  // namespace
@@ -105,8 +110,13 @@ int main(int argc, char** argv) {
     ksicache::FinishOutput();
     return status;
   } catch (const ksicache::UsageError& error) {
-    ksicache::PrintError(std::string(error.what()) + "\nTry 'ksicache --help'.");
+    ksicache::PrintError(error.what());
+    static_cast<void>(std::fputs("Try 'ksicache --help'.\n", stderr));
     return 2;
+  } catch (const std::bad_alloc&) {
+    // Without memory, which is what there is none of.
+    static_cast<void>(std::fputs("ksicache: out of memory\n", stderr));
+    return 1;
   } catch (const std::exception& error) {
     ksicache::PrintError(error.what());
     return 1;

@@ -2,25 +2,38 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <string>
 
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/printable.h"
 
 namespace ksicache {
+namespace {
+
+[[noreturn]] void ThrowLost() { throw OutputError(SystemError("standard output", errno).what()); }
+
+}  // namespace
 
 // A failed write is an error at once: the rest of a large file would be formatted for nothing.
 void Print(std::string_view text) {
   if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size()) {
-    throw SystemError("standard output", errno);
+    ThrowLost();
   }
 }
 
-void PrintError(const std::string& message) {
+void PrintLine(std::string_view text) { Print(Printable(text) + "\n"); }
+
+void PrintError(std::string_view message) {
+  // More than any message with the longest file name has.
+  constexpr size_t kLongest = 8192;
+  std::string line = "ksicache: " + Printable(message.substr(0, kLongest));
+  line += message.size() > kLongest ? "...\n" : "\n";
   // When even this fails, there is nobody to tell.
-  static_cast<void>(std::fprintf(stderr, "ksicache: %s\n", message.c_str()));
+  static_cast<void>(std::fputs(line.c_str(), stderr));
 }
 
 void FinishOutput() {
-  if (std::fflush(stdout) != 0) throw SystemError("standard output", errno);
+  if (std::fflush(stdout) != 0) ThrowLost();
 }
 
 }  // namespace ksicache

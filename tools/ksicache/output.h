@@ -1,18 +1,21 @@
-// Standard output, of which nothing is lost unseen.
+// Standard output, of which nothing is lost unseen: what cannot be written is an OutputError.
 #ifndef TOOLS_KSICACHE_OUTPUT_H_
 #define TOOLS_KSICACHE_OUTPUT_H_
 
-#include <string>
 #include <string_view>
 
 namespace ksicache {
 
+// As it is; for what holds no text from outside, or holds it escaped.
 void Print(std::string_view text);
 
-// A line on standard error, after the program's name.
-void PrintError(const std::string& message);
+// A line, escaped.
+void PrintLine(std::string_view text);
 
-// Fails with an Error if not all that was printed got out.
+// A line on standard error, after the program's name, escaped; cut where nobody reads on.
+void PrintError(std::string_view message);
+
+// Fails if not all that was printed got out.
 void FinishOutput();
 
 }  // namespace ksicache

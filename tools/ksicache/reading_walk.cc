@@ -1,12 +1,14 @@
 #include "tools/ksicache/reading_walk.h"
 
+#include "knvlibs/cache_format.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/output.h"
 
 namespace ksicache {
 namespace {
 
 [[noreturn]] void ThrowDamaged(const ksi::CacheFile& file) {
-  throw Error(std::string("damaged: ") + sqlite3_errmsg(file.Handle()));
+  throw DataError(std::string("damaged: ") + sqlite3_errmsg(file.Handle()));
 }
 
 const char* MeaningOf(ksi::Status status) {
@@ -46,6 +48,12 @@ bool TakeKey(const ksi::Statement& row, int column, ksi::Key* key) {
 
 bool IsAbsent(const ksi::Key& key) { return key.kind == ksi::KeyKind::kText && key.text.empty(); }
 
+// A program asks with texts of C, and a file holds none that are longer.
+bool CanBeAsked(const ksi::Key& key) {
+  return key.kind == ksi::KeyKind::kNumber || (key.text.find('\0') == std::string_view::npos &&
+                                               key.text.size() <= ksi::cache::kLongestText);
+}
+
 // Takes the keys of a row, as many as its node has, or else as many as there are.
 bool TakeKeys(const ksi::Statement& row, const ksi::CacheFile::NodeRow* nodeRow, ksi::Keys* keys) {
   for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
@@ -59,8 +67,9 @@ bool TakeKeys(const ksi::Statement& row, const ksi::CacheFile::NodeRow* nodeRow,
       nodeRow->kind == ksi::Kind::kValue ? nodeRow->node->valueKeys : nodeRow->node->listKeys;
   keys->count = keying.Count();
   for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
+    const ksi::Key& key = keys->at[i];
     const bool good =
-        i < keys->count ? keys->at[i].kind == ksi::KindOf(keying.at[i]) : IsAbsent(keys->at[i]);
+        i < keys->count ? key.kind == ksi::KindOf(keying.at[i]) && CanBeAsked(key) : IsAbsent(key);
     if (!good) return false;
   }
   return true;
@@ -72,12 +81,29 @@ std::string Reading::Name() const {
   return NameOf(row == nullptr ? "node " + std::to_string(node) : row->path, keys);
 }
 
+int ForEachFile(const std::vector<std::string>& fileNames,
+                const std::function<bool(const std::string& fileName)>& visit) {
+  bool good = true;
+  for (const std::string& fileName : fileNames) {
+    try {
+      good = visit(fileName) && good;
+    } catch (const DataError& error) {
+      PrintError(fileName + ": " + error.what());
+      good = false;
+    } catch (const Error& error) {
+      PrintError(error.what());
+      good = false;
+    }
+  }
+  return good ? 0 : 1;
+}
+
 std::unique_ptr<ksi::CacheFile> OpenCacheFile(const std::string& fileName) {
   std::unique_ptr<ksi::CacheFile> file;
   std::string why;
   const ksi::Status status = ksi::CacheFile::Open(fileName.c_str(), &file, &why);
   if (status != ksi::kOk) {
-    throw Error(fileName + ": " + MeaningOf(status) + (why.empty() ? "" : ": " + Printable(why)));
+    throw DataError(MeaningOf(status) + (why.empty() ? "" : ": " + why));
   }
   return file;
 }

@@ -7,6 +7,7 @@
 #include <memory>
 #include <span>
 #include <string>
+#include <vector>
 
 #include "knvlibs/cache_file.h"
 #include "knvlibs/source.h"
@@ -19,7 +20,7 @@ struct Reading {
   const ksi::CacheFile::NodeRow* row;  // null: the file does not define the node
   int64_t node;
   ksi::Keys keys;
-  bool goodKeys;  // of the node's number and kinds
+  bool goodKeys;  // of the node's number and kinds, and texts that can be asked for
   int64_t status;
   int type;  // SQLite's, of the answer
   std::span<const std::byte> value;
@@ -29,10 +30,15 @@ struct Reading {
   std::string Name() const;
 };
 
-// Opens a cache file for looking into it; fails with an Error that says what is wrong.
+// Does something with each of some cache files. What is wrong with one is said, and the others have
+// their turn. Gives the exit status: 0 if `visit` was content with all.
+int ForEachFile(const std::vector<std::string>& fileNames,
+                const std::function<bool(const std::string& fileName)>& visit);
+
+// Opens a cache file for looking into it; fails with a DataError that says what is wrong.
 std::unique_ptr<ksi::CacheFile> OpenCacheFile(const std::string& fileName);
 
-// All readings, by keys and then by node. Fails with an Error on damage.
+// All readings, by keys and then by node. Fails with a DataError on damage.
 void ForEachReading(const ksi::CacheFile& file, const std::function<void(const Reading&)>& visit);
 
 // The rows of one list: position (-1: not a number) and the statement, of which column 1 is the

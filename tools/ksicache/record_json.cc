@@ -74,8 +74,8 @@ Json FieldToJson(const ksi::Field& field, std::span<const std::byte> record) {
   return json;
 }
 
-void NumberFromJson(const ksi::Field& field, const Json& json, const std::string& where,
-                    std::byte* at) {
+void FieldFromJson(const ksi::Field& field, const Json& json, const std::string& where,
+                   std::byte* at) {
   const int bits = 8 * field.width;
   uint64_t number = 0;
   bool good = false;
@@ -141,6 +141,19 @@ std::string TextFromJson(const Json& json, const std::string& where) {
   return text;
 }
 
+std::string PlainTextFromJson(const Json& json, const std::string& where) {
+  std::string text = TextFromJson(json, where);
+  if (text.find('\0') != std::string::npos) throw DataError(where + ": holds a NUL");
+  return text;
+}
+
+int64_t NumberFromJson(const Json& json, const std::string& where) {
+  const bool fits =
+      json.is_number_integer() && !(json.is_number_unsigned() && json.get<uint64_t>() > INT64_MAX);
+  if (!fits) throw DataError(where + ": is not a whole number of 64 bits");
+  return json.get<int64_t>();
+}
+
 Json RecordToJson(const ksi::Node& node, std::span<const std::byte> record) {
   Json json = Json::object();
   for (const ksi::Field& field : node.fields) json[field.name] = FieldToJson(field, record);
@@ -164,7 +177,7 @@ std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json) {
       continue;
     }
     if (field != node.fields.end()) {
-      NumberFromJson(*field, value, where, record.data() + field->offset);
+      FieldFromJson(*field, value, where, record.data() + field->offset);
       continue;
     }
     bool found = false;

@@ -25,6 +25,11 @@ using Json = nlohmann::ordered_json;
 Json TextToJson(std::string_view text);
 // Fails with a DataError that starts with `where`.
 std::string TextFromJson(const Json& json, const std::string& where);
+// The same of a text that has no NUL.
+std::string PlainTextFromJson(const Json& json, const std::string& where);
+
+// A whole number of 64 bits, signed. Fails likewise.
+int64_t NumberFromJson(const Json& json, const std::string& where);
 
 Json RecordToJson(const ksi::Node& node, std::span<const std::byte> record);
 

@@ -19,7 +19,7 @@
 #include "knvlibs/linux/linux_source.h"
 #include "knvlibs/node_table.h"
 #include "tools/ksicache/cache_writer.h"
-#include "tools/ksicache/commands.h"
+#include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/progress.h"
@@ -147,7 +147,16 @@ class Walk {
       writer_.AddFailure(node, ksi::Kind::kList, keys, status);
       return;
     }
-    writer_.AddList(node, keys, instances);
+    std::vector<ksi::Key> entries(instances.Count());
+    for (size_t i = 0; i < entries.size(); ++i) {
+      entries[i].kind = instances.Kind(i);
+      if (entries[i].kind == ksi::KeyKind::kNumber) {
+        entries[i].number = static_cast<int64_t>(instances.Number(i));
+      } else {
+        entries[i].text = instances.Text(i);
+      }
+    }
+    writer_.AddList(node, keys, entries);
 
     // An instance stands below the object that lists it, such as a client's remap type, or for
     // itself, such as a group's child group.
@@ -205,23 +214,40 @@ void CheckRoot(const std::string& root) {
   }
 }
 
-}  // namespace
+constexpr Option kRoot = {"root", "DIR", "capture the host whose files are recorded below DIR"};
+constexpr const Option* kOptions[] = {&kForce, &kMode, &kRoot};
 
-int Capture(const Options& options) {
-  if (options.arguments.size() != 1) throw UsageError("capture takes one file");
-  const std::string& fileName = options.arguments[0];
-  CheckRoot(options.root);
-  CacheWriter writer(fileName, options.force);
-  ksi::LinuxSource source(options.root);
+int Capture(const CommandLine& line) {
+  const std::string& fileName = line.arguments[0];
+  const std::string* given = line.ValueOf(kRoot);
+  const std::string root = given == nullptr ? "/" : *given;
+  CheckRoot(root);
+  CacheWriter writer(fileName, line.Has(kForce), ModeOf(line));
+  ksi::LinuxSource source(root);
   const std::string taken = Now();
   Walk(source, writer).Run();
   const ksi::Definitions definitions = source.KernelDefinitions();
   const std::string host = HostName(source.Host());
   writer.Commit({std::string(definitions.signature), std::string(definitions.built), host, taken});
-  Print(fileName + ": " + std::to_string(writer.Values()) + " values and " +
-        std::to_string(writer.Lists()) + " lists of " + Printable(host) + ", " +
-        std::to_string(writer.Failures()) + " reads failed\n");
+  PrintLine(fileName + ": " + std::to_string(writer.Values()) + " values and " +
+            std::to_string(writer.Lists()) + " lists of " + host);
   return 0;
 }
+
+}  // namespace
+
+const Command kCapture = {
+    .name = "capture",
+    .arguments = "FILE",
+    .summary = "record every node and instance of this Linux host in FILE",
+    .help = R"(Records every node and every instance of this Linux host in FILE. What a user may
+not read fails with its status, and so it does in the file; the superuser sees
+most.
+)",
+    .options = kOptions,
+    .fewest = 1,
+    .most = 1,
+    .run = Capture,
+};
 
 }  // namespace ksicache

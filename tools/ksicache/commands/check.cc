@@ -1,9 +1,13 @@
 // check: says all that is wrong with a cache file, and where.
-#include <algorithm>
+#include <optional>
+#include <set>
 #include <string>
+#include <utility>
 
-#include "tools/ksicache/commands.h"
-#include "tools/ksicache/error.h"
+#include "knvlibs/cache_format.h"
+#include "knvlibs/node_table.h"
+#include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/group_tree.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/reading_walk.h"
 
@@ -22,13 +26,14 @@ class Checker {
     CheckSignature();
     CheckNodes();
     ForEachReading(file_, [&](const Reading& reading) { CheckReading(reading); });
+    CheckGroupTree();
     CheckStrayInstances();
     return problems_;
   }
 
  private:
   void Report(const std::string& what) {
-    Print(fileName_ + ": " + what + "\n");
+    PrintLine(fileName_ + ": " + what);
     ++problems_;
   }
   void Report(const Reading& reading, const std::string& what) {
@@ -40,7 +45,7 @@ class Checker {
     int code = rows.Prepare(file_.Handle(), "PRAGMA integrity_check(20)");
     while (code == SQLITE_OK || code == SQLITE_ROW) {
       code = rows.Step();
-      if (code == SQLITE_ROW && rows.Text(0) != "ok") Report(Printable(rows.Text(0)));
+      if (code == SQLITE_ROW && rows.Text(0) != "ok") Report(std::string(rows.Text(0)));
     }
     if (code != SQLITE_DONE) Report(sqlite3_errmsg(file_.Handle()));
   }
@@ -54,8 +59,13 @@ class Checker {
   }
 
   void CheckNodes() {
+    std::set<std::pair<const ksi::Node*, ksi::Kind>> seen;
     for (const ksi::CacheFile::NodeRow& row : file_.NodeRows()) {
-      if (row.node == nullptr) Report("there is no node " + Printable(row.path));
+      if (row.node == nullptr) {
+        Report("there is no node " + row.path);
+      } else if (!seen.emplace(row.node, row.kind).second) {
+        Report("node " + row.path + " is there twice");
+      }
     }
   }
 
@@ -89,26 +99,50 @@ class Checker {
     if (reading.type != SQLITE_INTEGER || reading.count < 0) {
       return Report(reading, "has no number of instances");
     }
-    const int entryType = ksi::KindOf(reading.row->node->entries) == ksi::KeyKind::kNumber
-                              ? SQLITE_INTEGER
-                              : SQLITE_TEXT;
-    int64_t count = 0;
+    uint64_t count = 0;
     instances_.ForEach(reading, [&](int64_t position, const ksi::Statement& row) {
-      if (position != count) {
+      if (position < 0 || static_cast<uint64_t>(position) != count) {
         Report(reading, "has entry " + std::to_string(position) + " where entry " +
                             std::to_string(count) + " has to be");
       }
-      count = position + 1;
-      if (row.Type(1) != entryType) {
-        Report(reading, "entry " + std::to_string(position) + " is no " +
-                            (entryType == SQLITE_INTEGER ? "number" : "text"));
-      } else if (entryType == SQLITE_TEXT && row.Text(1).find('\0') != std::string_view::npos) {
-        Report(reading, "entry " + std::to_string(position) + " holds a NUL");
-      }
+      // A count of what is there, so that one gap is said once.
+      count = static_cast<uint64_t>(position) + 1;
+      CheckEntry(reading, position, row);
     });
-    if (count != reading.count) {
+    if (count != static_cast<uint64_t>(reading.count)) {
       Report(reading,
              "has " + std::to_string(count) + " entries and says " + std::to_string(reading.count));
+    }
+  }
+
+  void CheckEntry(const Reading& reading, int64_t position, const ksi::Statement& row) {
+    const ksi::Node& node = *reading.row->node;
+    const std::string entry = "entry " + std::to_string(position);
+    if (ksi::KindOf(node.entries) == ksi::KeyKind::kNumber) {
+      if (row.Type(1) != SQLITE_INTEGER) return Report(reading, entry + " is no number");
+      if (ksi::IdOf(node) == ksi::node::sched_groups_members_groups) {
+        CheckGroup(reading, row.Number(1));
+      }
+    } else if (row.Type(1) != SQLITE_TEXT) {
+      Report(reading, entry + " is no text");
+    } else if (row.Text(1).find('\0') != std::string_view::npos) {
+      Report(reading, entry + " holds a NUL");
+    } else if (row.Text(1).size() > ksi::cache::kLongestText) {
+      Report(reading,
+             entry + " is longer than " + std::to_string(ksi::cache::kLongestText) + " bytes");
+    }
+  }
+
+  void CheckGroup(const Reading& reading, int64_t group) {
+    const std::optional<int64_t> other = groups_.Add(reading.keys[0].number, group);
+    if (!other) return;
+    Report(reading, "has group " + std::to_string(group) + ", which group " +
+                        std::to_string(*other) + " has already");
+  }
+
+  void CheckGroupTree() {
+    for (const int64_t group : groups_.Circles()) {
+      Report("group " + std::to_string(group) + " stands below itself");
     }
   }
 
@@ -118,7 +152,8 @@ class Checker {
     int code = rows.Prepare(file_.Handle(),
                             "SELECT count(*) FROM instance AS i WHERE NOT EXISTS(SELECT 1 FROM "
                             "reading AS r WHERE r.key1 = i.key1 AND r.key2 = i.key2 AND "
-                            "r.node = i.node AND r.status = 0)");
+                            "r.node = i.node AND r.status = 0 AND typeof(r.answer) = "
+                            "'integer')");
     if (code == SQLITE_OK) code = rows.Step();
     if (code != SQLITE_ROW) return Report(sqlite3_errmsg(file_.Handle()));
     if (rows.Number(0) != 0) {
@@ -129,16 +164,31 @@ class Checker {
   const std::string& fileName_;
   const ksi::CacheFile& file_;
   InstanceWalk instances_;
+  GroupTree groups_;
   size_t problems_ = 0;
 };
 
+int Check(const CommandLine& line) {
+  return ForEachFile(line.arguments, [](const std::string& fileName) {
+    return Checker(fileName, *OpenCacheFile(fileName)).Run() == 0;
+  });
+}
+
 }  // namespace
 
-int Check(const Options& options) {
-  if (options.arguments.size() != 1) throw UsageError("check takes one file");
-  const std::string& fileName = options.arguments[0];
-  const std::unique_ptr<ksi::CacheFile> file = OpenCacheFile(fileName);
-  return Checker(fileName, *file).Run() == 0 ? 0 : 1;
-}
+const Command kCheck = {
+    .name = "check",
+    .arguments = "FILE...",
+    .summary = "say what is wrong with each FILE",
+    .help = R"(Says all that is wrong with each FILE: its integrity as a database, nodes that
+this version does not know, records of the wrong size, gaps in lists, groups that
+stand in two places or below themselves, and a signature that is not that of
+this version. Says nothing of a file that is whole.
+)",
+    .options = {},
+    .fewest = 1,
+    .most = Command::kAnyNumber,
+    .run = Check,
+};
 
 }  // namespace ksicache

@@ -3,22 +3,28 @@
 #include <set>
 #include <string>
 
-#include "tools/ksicache/commands.h"
+#include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/node_names.h"
 #include "tools/ksicache/output.h"
+#include "tools/ksicache/printable.h"
 #include "tools/ksicache/reading_walk.h"
 #include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 namespace {
 
+constexpr Option kJson = {"json", nullptr, "dump as JSON"};
+
+std::string Spelled(const Json& json) { return PrintableJson(json.dump()); }
+
 class Dumper {
  public:
-  Dumper(const ksi::CacheFile& file, const Options& options)
-      : file_(file), instances_(file), json_(options.json) {
-    for (size_t i = 1; i < options.arguments.size(); ++i) {
-      const ksi::Node* node = ksi::FindNode(options.arguments[i]);
-      if (node == nullptr) throw UsageError("there is no node " + options.arguments[i]);
+  Dumper(const ksi::CacheFile& file, const CommandLine& line)
+      : file_(file), instances_(file), json_(line.Has(kJson)) {
+    for (size_t i = 1; i < line.arguments.size(); ++i) {
+      const ksi::Node* node = ksi::FindNode(line.arguments[i]);
+      if (node == nullptr) throw UsageError(WhyNoNode(line.arguments[i]));
       only_.insert(node);
     }
   }
@@ -42,14 +48,19 @@ class Dumper {
     const ksi::CacheFile::Capture& capture = file_.GetCapture();
     if (!json_) {
       if (!only_.empty()) return;
-      Print("host       " + Printable(capture.host) + "\n");
-      Print("taken      " + capture.taken + "\n");
+      PrintLine("host       " + capture.host);
+      PrintLine("taken      " + capture.taken);
       return;
     }
-    Print("{\n  \"ksiCache\": 1,\n  \"host\": " + TextToJson(capture.host).dump() +
-          ",\n  \"taken\": " + TextToJson(capture.taken).dump() +
-          ",\n  \"built\": " + TextToJson(capture.built).dump() +
-          ",\n  \"signature\": " + TextToJson(capture.signature).dump() + ",\n  \"readings\": [");
+    Print("{\n  \"ksiCache\": 1,\n  \"host\": " + Spelled(TextToJson(capture.host)) +
+          ",\n  \"taken\": " + Spelled(TextToJson(capture.taken)) +
+          ",\n  \"built\": " + Spelled(TextToJson(capture.built)) +
+          ",\n  \"signature\": " + Spelled(TextToJson(capture.signature)) + ",\n  \"readings\": [");
+  }
+
+  static void PrintName(const Reading& reading) {
+    PrintLine("");
+    PrintLine(reading.Name());
   }
 
   void Complain(const Reading& reading, const std::string& what) {
@@ -87,7 +98,7 @@ class Dumper {
     }
     const Json line = {{"node", reading.row->path}, {"keys", keys}, {member, answer}};
     Print(first_ ? "\n    " : ",\n    ");
-    Print(line.dump());
+    Print(Spelled(line));
     first_ = false;
   }
 
@@ -96,7 +107,8 @@ class Dumper {
     if (json_) {
       PrintJson(reading, "status", status);
     } else {
-      Print("\n" + reading.Name() + "\n    failed with " + status + "\n");
+      PrintName(reading);
+      PrintLine("    failed with " + status);
     }
   }
 
@@ -106,7 +118,7 @@ class Dumper {
       PrintJson(reading, "value", RecordToJson(node, reading.value));
       return;
     }
-    Print("\n" + reading.Name() + "\n");
+    PrintName(reading);
     size_t width = 0;
     for (const ksi::Field& field : node.fields) {
       width = std::max(width, std::string_view(field.name).size());
@@ -115,16 +127,16 @@ class Dumper {
       std::string line = field.name;
       line.resize(width, ' ');
       if (field.type == ksi::FieldType::kText) {
-        line += "  " + Printable(TextOf(field, reading.value));
+        line += "  " + std::string(TextOf(field, reading.value));
       } else {
         const std::string number = NumberToText(field, reading.value);
         line += "  " + std::string(20 - std::min<size_t>(20, number.size()), ' ') + number;
         if (*field.unit != '\0') line += std::string(" ") + field.unit;
       }
-      Print("    " + line + "\n");
+      PrintLine("    " + line);
     }
     ForEachUnused(node, reading.value, [](const std::string& name, const std::string& hex) {
-      Print("    " + name + "  " + hex + "\n");
+      PrintLine("    " + name + "  " + hex);
     });
   }
 
@@ -146,10 +158,9 @@ class Dumper {
     } else if (json_) {
       PrintJson(reading, "instances", entries);
     } else {
-      Print("\n" + reading.Name() + "\n");
+      PrintName(reading);
       for (const Json& entry : entries) {
-        Print("    " + (entry.is_string() ? Printable(entry.get<std::string>()) : entry.dump()) +
-              "\n");
+        PrintLine("    " + (entry.is_string() ? entry.get<std::string>() : entry.dump()));
       }
     }
   }
@@ -162,12 +173,27 @@ class Dumper {
   size_t complaints_ = 0;
 };
 
+constexpr const Option* kOptions[] = {&kJson};
+
+int Dump(const CommandLine& line) {
+  return ForEachFile({line.arguments[0]}, [&line](const std::string& fileName) {
+    return Dumper(*OpenCacheFile(fileName), line).Run() == 0;
+  });
+}
+
 }  // namespace
 
-int Dump(const Options& options) {
-  if (options.arguments.empty()) throw UsageError("dump takes a file");
-  const std::unique_ptr<ksi::CacheFile> file = OpenCacheFile(options.arguments[0]);
-  return Dumper(*file, options).Run() == 0 ? 0 : 1;
-}
+const Command kDump = {
+    .name = "dump",
+    .arguments = "FILE [NODE...]",
+    .summary = "show what FILE holds, of all nodes or of those named",
+    .help = R"(Shows what FILE holds, each field of each record with its unit, of all nodes or
+of those named, such as sched/groups/groupName.
+)",
+    .options = kOptions,
+    .fewest = 1,
+    .most = Command::kAnyNumber,
+    .run = Dump,
+};
 
 }  // namespace ksicache

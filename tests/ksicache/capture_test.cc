@@ -1,0 +1,59 @@
+// capture.
+#include "knvlibs/cache_source.h"
+#include "tests/knvlibs/host_tree.h"
+#include "tests/ksicache/ksicache_fixture.h"
+
+namespace ksi {
+namespace {
+
+TEST_F(Ksicache, CaptureRecordsAHost) {
+  const HostTree host;
+  host.Write("/proc/sys/kernel/hostname", "recorded.example.org\n");
+  host.Write("/proc/meminfo", "MemTotal: 1000 kB\n");
+  const harness::Result result = Run({"capture", Path("a.ksi"), "--root", host.Root()});
+  EXPECT_EQ(result.status, 0) << result.err;
+  EXPECT_EQ(result.out.find(Path("a.ksi") + ": "), 0u);
+  EXPECT_NE(result.out.find(" of recorded.example.org\n"), result.out.npos) << result.out;
+  EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
+  // What cannot be read is recorded as such.
+  const std::string dump = Output({"dump", "--json", Path("a.ksi"), "memory/comprehensive",
+                                   "sched/globalStats/memory/stateTransitions"});
+  EXPECT_NE(dump.find(R"({"node":"memory/comprehensive","keys":[],"status":"0xbad0003"})"),
+            dump.npos)
+      << dump;
+  for (const char* state : {"high", "clear", "soft", "hard", "low"}) {
+    EXPECT_NE(dump.find("\"keys\":[\"" + std::string(state) + "\"],\"value\":{\"up\":0,"),
+              dump.npos)
+        << state;
+  }
+  const std::string taken = dump.substr(dump.find("\"taken\": \"") + 10, 20);
+  EXPECT_EQ(taken[10], 'T');
+  EXPECT_EQ(taken[19], 'Z');
+}
+
+// A host answers from its capture as it does itself.
+TEST_F(Ksicache, CaptureHasAllThatTheHostTells) {
+  const std::string root = RecordedHost("kvm-two-nodes");
+  const harness::Result result = Run({"capture", Path("a.ksi"), "--root", root});
+  ASSERT_EQ(result.status, 0) << result.err;
+  EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
+  std::unique_ptr<CacheSource> cache;
+  ASSERT_EQ(CacheSource::Open(Path("a.ksi").c_str(), &cache), kOk);
+  LinuxSource host(root);
+  EXPECT_EQ(HostText(*cache), HostText(host));
+}
+
+TEST_F(Ksicache, CaptureTakesNoOtherDirectoryForAHost) {
+  ExpectFailure({"capture", Path("a.ksi"), "--root", Path("")},
+                Path("") + ": is not the root of a Linux host: it has no proc/meminfo");
+  EXPECT_TRUE(directory_.Names().empty());
+}
+
+TEST_F(Ksicache, CaptureOfThisMachineIsAGoodFile) {
+  const harness::Result result = Run({"capture", Path("a.ksi")});
+  EXPECT_EQ(result.status, 0) << result.err;
+  EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
+}
+
+}  // namespace
+}  // namespace ksi

@@ -1,0 +1,206 @@
+// info and dump.
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/source.h"
+#include "tests/ksicache/ksicache_fixture.h"
+
+namespace ksi {
+namespace {
+
+TEST_F(Ksicache, FilesThatCannotBeRead) {
+  ExpectFailure({"info", Path("none")}, Path("none") + ": no such file");
+  ExpectFailure({"dump", Path("")}, Path("") + ": is a directory");
+  ExpectFailure({"check", "/dev/null"}, "/dev/null: not a cache file");
+  WriteSmallHost(Path("host.ksi"));
+  RunSql(Path("host.ksi"), "CREATE VIEW v AS SELECT 1");
+  ExpectFailure({"check", Path("host.ksi")},
+                Path("host.ksi") + ": damaged: it has more than the tables of a cache file");
+  RunSql(Path("host.ksi"), "PRAGMA user_version = 9");
+  ExpectFailure({"info", Path("host.ksi")}, Path("host.ksi") + ": made by a newer version");
+}
+
+TEST_F(Ksicache, InfoTellsWhatAFileIs) {
+  WriteSmallHost(Path("host.ksi"));
+  const std::string own(kDefinitions.signature);
+  const std::string size = std::to_string(FileContent(Path("host.ksi")).size());
+  EXPECT_EQ(Output({"info", Path("host.ksi")}),
+            "file       " + Path("host.ksi") +
+                "\nhost       test.example.org\ntaken      2026-11-21T10:00:00Z\nsize       " +
+                size + " bytes, schema 1\nbuilt      " + std::string(kDefinitions.built) +
+                "\nsignature  " + own +
+                "\nvalues     8\nlists      5, with 6 instances\nabsent     0\n"
+                "refused    1: sched/groups/groupName [9] (0xbad005a)\n"
+                "failed     1: sched/groups/members/groups [9] (0xbad000a)\n");
+  const std::string other = "00112233445566778899aabbccddeeff";
+  RunSql(Path("host.ksi"), "UPDATE capture SET signature = '" + other + "'");
+  EXPECT_NE(Output({"info", Path("host.ksi")})
+                .find("signature  " + other + ", not " + own + " of this version\n"),
+            std::string::npos);
+}
+
+TEST_F(Ksicache, InfoTellsFailedReadsApart) {
+  WriteSmallHost(Path("host.ksi"));
+  const std::string update = "UPDATE reading SET answer = NULL, status = ";
+  RunSql(Path("host.ksi"),
+         update + std::to_string(KSI_STATUS_NOT_FOUND) + " WHERE key1 = 0; " + update +
+             std::to_string(KSI_STATUS_NO_HANDLER) + " WHERE key1 = ''; " + update +
+             std::to_string(KSI_STATUS_READ_ERROR) + " WHERE key1 = 7 OR key1 = 9");
+  const std::string info = Output({"info", Path("host.ksi")});
+  EXPECT_NE(info.find("values     2\nlists      1, with 2 instances\nabsent     6\nrefused    0\n"
+                      "failed     6: sched/groups/groupName [7] (0xbad000b), "
+                      "sched/groups/groupFlags [7] (0xbad000b), "
+                      "sched/groups/members/groups [7] (0xbad000b) and 3 more\n"),
+            info.npos)
+      << info;
+}
+
+TEST_F(Ksicache, InfoBelievesNoCountOfADamagedFile) {
+  WriteSmallHost(Path("host.ksi"));
+  RunSql(Path("host.ksi"),
+         "UPDATE reading SET answer = 9223372036854775807 WHERE typeof(answer) = 'integer'");
+  EXPECT_NE(
+      Output({"info", Path("host.ksi")}).find("lists      5, with 9223372036854775807 instances\n"),
+      std::string::npos);
+}
+
+TEST_F(Ksicache, InfoShowsTheGoodOnesOfSeveralFiles) {
+  WriteSmallHost(Path("host.ksi"));
+  const std::string one = Output({"info", Path("host.ksi")});
+  EXPECT_EQ(Output({"info", Path("host.ksi"), Path("host.ksi")}), one + "\n" + one);
+  const harness::Result result = Run({"info", Path("none"), Path("host.ksi"), "/dev/null"});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.out, one);
+  EXPECT_EQ(result.err, "ksicache: " + Path("none") +
+                            ": no such file\nksicache: /dev/null: not a cache file\n");
+}
+
+TEST_F(Ksicache, DumpShowsDecodedFields) {
+  WriteSmallHost(Path("host.ksi"));
+  EXPECT_EQ(Output({"dump", Path("host.ksi"), "sched/memClients/remapTypes",
+                    "sched/groups/groupName", "sched/groups/groupFlags"}),
+            R"(
+sched/groups/groupName [0]
+    text  host
+
+sched/groups/groupFlags [0]
+    groupFlags                  0x64 bits
+
+sched/groups/groupName [7]
+    text  web
+
+sched/groups/groupFlags [7]
+    groupFlags                  0x6b bits
+
+sched/groups/groupName [9]
+    failed with 0xbad005a
+
+sched/groups/groupFlags [9]
+    groupFlags                  0x6d bits
+
+sched/memClients/remapTypes [30]
+    small
+    large
+
+sched/memClients/remapTypes [30] [large]
+    added                    no value pages
+    filtered                        0 pages
+    prepared                        0 pages
+    staged                          0 pages
+    canceled                        0 pages
+    remapped                        0 pages
+    cUnprepared                     0 pages
+    cPrepared                       0 pages
+    cStaged                         0 pages
+
+sched/memClients/remapTypes [30] [small]
+    added                           5 pages
+    filtered                        0 pages
+    prepared                        0 pages
+    staged                          0 pages
+    canceled                        0 pages
+    remapped                        0 pages
+    cUnprepared                     0 pages
+    cPrepared                       0 pages
+    cStaged                         0 pages
+)");
+}
+
+TEST_F(Ksicache, DumpAsJson) {
+  WriteSmallHost(Path("host.ksi"));
+  const std::string dump = Output({"dump", "--json", Path("host.ksi"), "sched/groups/groupName",
+                                   "sched/groups/members/groups", "system/heaps"});
+  EXPECT_EQ(dump.substr(dump.find("  \"readings\"")),
+            R"(  "readings": [
+    {"node":"sched/groups/groupName","keys":[0],"value":{"text":"host"}},
+    {"node":"sched/groups/members/groups","keys":[0],"instances":[9,7]},
+    {"node":"sched/groups/groupName","keys":[7],"value":{"text":"web"}},
+    {"node":"sched/groups/members/groups","keys":[7],"instances":[]},
+    {"node":"sched/groups/groupName","keys":[9],"status":"0xbad005a"},
+    {"node":"sched/groups/members/groups","keys":[9],"status":"0xbad000a"},
+    {"node":"system/heaps","keys":[],"instances":["main",""]}
+  ]
+}
+)");
+}
+
+TEST_F(Ksicache, DumpNamesNodesThatThereAreNot) {
+  WriteSmallHost(Path("host.ksi"));
+  const auto expect = [this](const std::string& name, const std::string& message) {
+    ExpectFailure({"dump", Path("host.ksi"), "system/heaps", name}, message, 2);
+  };
+  expect("system/piles", "there is no node system/piles; is it system/heaps?");
+  expect("groupname", "there is no node groupname; is it sched/groups/groupName?");
+  expect("sched/group/groupFlags",
+         "there is no node sched/group/groupFlags; is it sched/groups/groupFlags?");
+  expect("zzz", "there is no node zzz");
+  expect("", "there is no node ");
+  expect(std::string(1000, 'x'), "there is no node " + std::string(1000, 'x'));
+}
+
+TEST_F(Ksicache, DumpNamesTheNodesBelowAName) {
+  WriteSmallHost(Path("host.ksi"));
+  const std::string message =
+      "sched/groups/stats is no node, but below it are sched/groups/stats/capacity "
+      "sched/groups/stats/memoryStats";
+  ExpectFailure({"dump", Path("host.ksi"), "sched/groups/stats"}, message, 2);
+  ExpectFailure({"dump", Path("host.ksi"), "sched/groups/stats/"}, message, 2);
+  // What is both is a node.
+  EXPECT_EQ(Output({"dump", Path("host.ksi"), "memory/pmem/volumes"}), "\nmemory/pmem/volumes\n");
+}
+
+TEST_F(Ksicache, DumpEscapesWhatATerminalMightObey) {
+  WriteSmallHost(Path("host.ksi"));
+  RunSql(Path("host.ksi"),
+         "UPDATE instance SET entry = CAST(x'1b5b6dc29be280aeff' AS TEXT) "
+         "WHERE position = 0 AND key1 = ''; "
+         "UPDATE instance SET entry = CAST(x'c3a9e2808bf3a08081c29b' AS TEXT) "
+         "WHERE position = 1 AND key1 = ''");
+  EXPECT_EQ(Output({"dump", Path("host.ksi"), "system/heaps"}),
+            "\nsystem/heaps\n    {\"hex\":\"1b5b6dc29be280aeff\"}\n"
+            "    \xc3\xa9\\xe2\\x80\\x8b\\xf3\\xa0\\x80\\x81\\xc2\\x9b\n");
+  const std::string json = Output({"dump", "--json", Path("host.ksi"), "system/heaps"});
+  EXPECT_NE(json.find("\"instances\":[{\"hex\":\"1b5b6dc29be280aeff\"},"
+                      "\"\xc3\xa9\\u200b\\udb40\\udc01\\u009b\"]}"),
+            json.npos)
+      << json;
+  // Nothing is lost by it.
+  WriteContent(Path("host.json"), json);
+  Output({"load", Path("host.json"), Path("again.ksi")});
+  EXPECT_EQ(Output({"dump", "--json", Path("again.ksi")}), json);
+}
+
+TEST_F(Ksicache, DumpGoesOnAfterWhatItCannotShow) {
+  WriteSmallHost(Path("host.ksi"));
+  RunSql(Path("host.ksi"),
+         "UPDATE reading SET answer = zeroblob(3) WHERE key1 = 7 AND typeof(answer) = 'blob'; "
+         "DELETE FROM instance WHERE key1 = 0 AND position = 0");
+  const harness::Result result = Run({"dump", "--json", Path("host.ksi")});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err,
+            "ksicache: sched/groups/members/groups [0]: is a list with gaps\n"
+            "ksicache: sched/groups/groupName [7]: has 3 bytes, its record 64\n"
+            "ksicache: sched/groups/groupFlags [7]: has 3 bytes, its record 4\n");
+  EXPECT_NE(result.out.find(R"("keys":[9])"), result.out.npos);
+}
+
+}  // namespace
+}  // namespace ksi

@@ -1,0 +1,19 @@
+// The commands of ksicache, in the order of its help.
+#ifndef TOOLS_KSICACHE_COMMANDS_COMMANDS_H_
+#define TOOLS_KSICACHE_COMMANDS_COMMANDS_H_
+
+#include "tools/ksicache/command.h"
+
+namespace ksicache {
+
+extern const Command kCapture;
+extern const Command kInfo;
+extern const Command kDump;
+extern const Command kLoad;
+extern const Command kCheck;
+
+inline constexpr const Command* kCommands[] = {&kCapture, &kInfo, &kDump, &kLoad, &kCheck};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_COMMANDS_COMMANDS_H_

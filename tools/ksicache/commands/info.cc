@@ -1,0 +1,102 @@
+// info: what cache files are, in a few lines each.
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <limits>
+
+#include "knvlibs/cache_format.h"
+#include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/failures.h"
+#include "tools/ksicache/output.h"
+#include "tools/ksicache/reading_walk.h"
+
+namespace ksicache {
+namespace {
+
+struct Contents {
+  size_t values = 0;
+  size_t lists = 0;
+  int64_t instances = 0;
+  Failures failures;
+};
+
+// A damaged file may say that its lists have any number of instances.
+int64_t Sum(int64_t a, int64_t b) {
+  int64_t sum = 0;
+  return __builtin_add_overflow(a, b, &sum) ? std::numeric_limits<int64_t>::max() : sum;
+}
+
+Contents ContentsOf(const ksi::CacheFile& file) {
+  Contents contents;
+  ForEachReading(file, [&](const Reading& reading) {
+    if (reading.status != ksi::kOk) {
+      contents.failures.Add(reading.Name(), reading.status);
+    } else if (reading.row != nullptr && reading.row->kind == ksi::Kind::kList) {
+      ++contents.lists;
+      contents.instances = Sum(contents.instances, std::max<int64_t>(reading.count, 0));
+    } else {
+      ++contents.values;
+    }
+  });
+  return contents;
+}
+
+int64_t SizeOf(const std::string& fileName) {
+  struct stat status = {};
+  if (stat(fileName.c_str(), &status) != 0) throw SystemError(fileName, errno);
+  return status.st_size;
+}
+
+void PrintCapture(const ksi::CacheFile::Capture& capture, const std::string& fileName) {
+  const bool own = capture.signature == ksi::kDefinitions.signature;
+  PrintLine("file       " + fileName);
+  PrintLine("host       " + capture.host);
+  PrintLine("taken      " + capture.taken);
+  PrintLine("size       " + std::to_string(SizeOf(fileName)) + " bytes, schema " +
+            std::to_string(ksi::cache::kSchemaVersion));
+  PrintLine("built      " + capture.built);
+  PrintLine("signature  " + capture.signature +
+            (own ? "" : ", not " + std::string(ksi::kDefinitions.signature) + " of this version"));
+}
+
+void PrintContents(const Contents& contents) {
+  PrintLine("values     " + std::to_string(contents.values));
+  PrintLine("lists      " + std::to_string(contents.lists) + ", with " +
+            std::to_string(contents.instances) + " instances");
+  PrintLine("absent     " + std::to_string(contents.failures.absent.Count()));
+  PrintLine("refused    " + contents.failures.refused.Text());
+  PrintLine("failed     " + contents.failures.failed.Text());
+}
+
+int Info(const CommandLine& line) {
+  bool first = true;
+  return ForEachFile(line.arguments, [&first](const std::string& fileName) {
+    const std::unique_ptr<ksi::CacheFile> file = OpenCacheFile(fileName);
+    const Contents contents = ContentsOf(*file);
+    if (!first) PrintLine("");
+    first = false;
+    PrintCapture(file->GetCapture(), fileName);
+    PrintContents(contents);
+    return true;
+  });
+}
+
+}  // namespace
+
+const Command kInfo = {
+    .name = "info",
+    .arguments = "FILE...",
+    .summary = "say which host a FILE is of, when it was taken and what it holds",
+    .help = R"(Says which host each FILE is of, when it was taken, what definitions it was made
+with and how much it holds: values, lists, and the reads that failed. "absent"
+are those of nodes that the host, or a thing on it, does not have; "refused"
+those that whoever captured it had not the rights for; "failed" all others.
+)",
+    .options = {},
+    .fewest = 1,
+    .most = Command::kAnyNumber,
+    .run = Info,
+};
+
+}  // namespace ksicache

@@ -1,0 +1,33 @@
+#include "tools/ksicache/failures.h"
+
+#include <knvlibs/ksi_status.h>
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+
+void FailedReads::Add(const std::string& name, int64_t status) {
+  if (count_++ < kMostNamed)
+    first_.push_back(name + " (" + Hex(static_cast<uint64_t>(status)) + ")");
+}
+
+std::string FailedReads::Text() const {
+  std::string text = std::to_string(count_);
+  for (const std::string& name : first_) text += (&name == &first_.front() ? ": " : ", ") + name;
+  if (count_ > first_.size()) text += " and " + std::to_string(count_ - first_.size()) + " more";
+  return text;
+}
+
+void Failures::Add(const std::string& name, int64_t status) {
+  switch (status) {
+    case KSI_STATUS_NOT_FOUND:
+    case KSI_STATUS_NO_HANDLER:
+    case KSI_STATUS_INVALID_NODE:
+      return absent.Add(name, status);
+    case KSI_STATUS_PERMISSION_DENIED:
+      return refused.Add(name, status);
+    default:
+      return failed.Add(name, status);
+  }
+}
+
+}  // namespace ksicache

@@ -1,0 +1,95 @@
+#include "tools/ksicache/help.h"
+
+#include <algorithm>
+#include <string_view>
+#include <vector>
+
+#include "tools/ksicache/commands/commands.h"
+
+namespace ksicache {
+namespace {
+
+constexpr std::string_view kPurpose = R"(
+Captures, shows, makes and checks KSI cache files, which `tally -c FILE` reads
+instead of the host it runs on.
+)";
+
+constexpr std::string_view kExitStatus = R"(
+Exit status: 0 if all went well, 1 if something failed or check found something
+wrong, 2 if the command line is wrong.
+)";
+
+constexpr Option kHelpOption = {"help", nullptr, "show this message"};
+constexpr Option kVersionOption = {"version", nullptr, "show the version"};
+
+using Options = std::vector<const Option*>;
+
+// Those of all commands, each once.
+Options AllOptions() {
+  Options all;
+  for (const Command* command : kCommands) {
+    for (const Option* option : command->options) {
+      if (std::ranges::find(all, option) == all.end()) all.push_back(option);
+    }
+  }
+  return all;
+}
+
+// "--root DIR"
+std::string Spelling(const Option& option) {
+  const std::string name = std::string("--") + option.name;
+  return option.value == nullptr ? name : name + " " + option.value;
+}
+
+std::string OptionList(const Options& options) {
+  size_t width = 0;
+  for (const Option* option : options) width = std::max(width, Spelling(*option).size());
+  std::string list = "\nOptions:\n";
+  for (const Option* option : options) {
+    std::string spelling = Spelling(*option);
+    spelling.resize(width, ' ');
+    list += (option == &kHelpOption ? "  -h, " : "      ") + spelling + "  " + option->help + "\n";
+  }
+  return list;
+}
+
+std::string CommandList() {
+  size_t width = 0;
+  for (const Command* command : kCommands) {
+    width = std::max(width, std::string_view(command->name).size());
+  }
+  std::string list = "\nCommands:\n";
+  for (const Command* command : kCommands) {
+    std::string name = command->name;
+    name.resize(width, ' ');
+    list += "  " + name + "  " + command->summary + "\n";
+  }
+  return list;
+}
+
+}  // namespace
+
+std::string UsageOf(const Command& command) {
+  std::string usage = std::string("ksicache ") + command.name + " " + command.arguments;
+  for (const Option* option : command.options) usage += " [" + Spelling(*option) + "]";
+  return usage;
+}
+
+std::string Help() {
+  std::string text;
+  for (const Command* command : kCommands) {
+    text += (text.empty() ? "Usage: " : "       ") + UsageOf(*command) + "\n";
+  }
+  Options options = AllOptions();
+  options.insert(options.end(), {&kHelpOption, &kVersionOption});
+  text += kPurpose;
+  return text + CommandList() + OptionList(options) + std::string(kExitStatus);
+}
+
+std::string HelpOf(const Command& command) {
+  Options options(command.options.begin(), command.options.end());
+  options.push_back(&kHelpOption);
+  return "Usage: " + UsageOf(command) + "\n\n" + command.help + OptionList(options);
+}
+
+}  // namespace ksicache

@@ -1,0 +1,213 @@
+#include "tools/ksicache/new_file.h"
+
+#include <fcntl.h>
+#include <signal.h>
+#include <stdio.h>
+#include <sys/random.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <charconv>
+#include <cstdint>
+
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+// While a file stands under a name that is not its own, no signal ends the process.
+class WithoutSignals {
+ public:
+  WithoutSignals() {
+    sigset_t all;
+    sigfillset(&all);
+    sigprocmask(SIG_SETMASK, &all, &before_);
+  }
+  WithoutSignals(const WithoutSignals&) = delete;
+  WithoutSignals& operator=(const WithoutSignals&) = delete;
+  ~WithoutSignals() { sigprocmask(SIG_SETMASK, &before_, nullptr); }
+
+ private:
+  sigset_t before_ = {};
+};
+
+std::string RandomEntry() {
+  uint64_t number = 0;
+  static_cast<void>(getrandom(&number, sizeof number, 0));  // a name that is taken is refused
+  return ".ksicache." + Hex(number).substr(2);
+}
+
+std::string DirectoryOf(const std::string& path) {
+  const size_t slash = path.rfind('/');
+  return slash == std::string::npos ? "." : path.substr(0, slash + 1);
+}
+
+std::string EntryOf(const std::string& path) {
+  const size_t slash = path.rfind('/');
+  return slash == std::string::npos ? path : path.substr(slash + 1);
+}
+
+Error Exists(const std::string& name) {
+  return Error{name + ": exists already (--force replaces it)"};
+}
+
+// A name of an open file in a directory, which goes with its owner as long as it is that file's.
+class TemporaryEntry {
+ public:
+  TemporaryEntry(int directory, std::string name, int file)
+      : directory_(directory), name_(std::move(name)), file_(file) {}
+  TemporaryEntry(const TemporaryEntry&) = delete;
+  TemporaryEntry& operator=(const TemporaryEntry&) = delete;
+  ~TemporaryEntry() {
+    if (IsOwn()) unlinkat(directory_, name_.c_str(), 0);
+  }
+
+  // rename(2), but only where nothing stands if `replace` is false.
+  int RenameTo(const std::string& target, bool replace) const {
+    if (!IsOwn()) {
+      errno = ESTALE;
+      return -1;
+    }
+    if (!replace) {
+      const int result =
+          renameat2(directory_, name_.c_str(), directory_, target.c_str(), RENAME_NOREPLACE);
+      // Not every file system knows how; that nothing stood there was seen at the start.
+      if (result == 0 || (errno != EINVAL && errno != ENOSYS)) return result;
+    }
+    return renameat(directory_, name_.c_str(), directory_, target.c_str());
+  }
+
+ private:
+  bool IsOwn() const {
+    struct stat named = {};
+    struct stat open = {};
+    return fstatat(directory_, name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 &&
+           fstat(file_, &open) == 0 && named.st_dev == open.st_dev && named.st_ino == open.st_ino;
+  }
+
+  int directory_;
+  std::string name_;
+  int file_;
+};
+
+}  // namespace
+
+Descriptor::~Descriptor() { Reset(-1); }
+
+void Descriptor::Reset(int fd) {
+  if (fd_ >= 0) close(fd_);
+  fd_ = fd;
+}
+
+mode_t ModeOf(const CommandLine& line) {
+  const std::string* text = line.ValueOf(kMode);
+  if (text == nullptr) return NewFile::kMode;
+  unsigned mode = 0;
+  const char* end = text->data() + text->size();
+  const auto [rest, error] = std::from_chars(text->data(), end, mode, 8);
+  if (error != std::errc() || rest != end || mode > 0777) {
+    throw UsageError("--mode takes up to 0777, in octal digits, such as 0640");
+  }
+  return mode;
+}
+
+NewFile::NewFile(std::string target, bool replace, mode_t mode)
+    : name_(std::move(target)), replace_(replace), mode_(mode), standardOutput_(name_ == "-") {
+  if (standardOutput_) {
+    name_ = "standard output";
+    if (isatty(STDOUT_FILENO) == 1) throw Error(name_ + ": is a terminal");
+    return;
+  }
+  entry_ = EntryOf(name_);
+  directory_.Reset(open(DirectoryOf(name_).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!directory_) throw SystemError(name_, errno);
+  CheckTarget();
+  OpenUnnamed();
+}
+
+void NewFile::CheckTarget() const {
+  if (entry_.empty()) throw SystemError(name_, EISDIR);
+  struct stat info = {};
+  if (fstatat(directory_.Get(), entry_.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) return;
+  if (S_ISDIR(info.st_mode)) throw SystemError(name_, EISDIR);
+  if (!replace_) throw Exists(name_);
+  // A device is more than its name.
+  if (!S_ISREG(info.st_mode) && !S_ISLNK(info.st_mode)) {
+    throw Error(name_ + ": is not a file, and not replaced");
+  }
+}
+
+void NewFile::OpenUnnamed() {
+  unnamed_.Reset(openat(directory_.Get(), ".", O_TMPFILE | O_WRONLY | O_CLOEXEC, kMode));
+  if (unnamed_) return;
+  const bool unknown = errno == EOPNOTSUPP || errno == EISDIR || errno == EINVAL;
+  if (!unknown || faccessat(directory_.Get(), ".", W_OK | X_OK, AT_EACCESS) != 0) {
+    throw SystemError(name_, errno);
+  }
+}
+
+void NewFile::Fill(int fd, std::span<const std::byte> content) const {
+  while (!content.empty()) {
+    const ssize_t written = write(fd, content.data(), content.size());
+    if (written < 0 && errno != EINTR) throw SystemError(name_ + ": cannot write", errno);
+    if (written > 0) content = content.subspan(static_cast<size_t>(written));
+  }
+  if (standardOutput_) return;
+  if (fchmod(fd, mode_) != 0 || fsync(fd) != 0) throw SystemError(name_ + ": cannot write", errno);
+}
+
+void NewFile::Commit(std::span<const std::byte> content) {
+  if (standardOutput_) return Fill(STDOUT_FILENO, content);
+  if (unnamed_) Fill(unnamed_.Get(), content);
+  if (!unnamed_ || !CommitUnnamed()) CommitNamed(content);
+  SyncDirectory();
+}
+
+// Whether the unnamed file has got a name; errno says why not.
+bool NewFile::LinkUnnamed(const std::string& entry) const {
+  const std::string file = "/proc/self/fd/" + std::to_string(unnamed_.Get());
+  return linkat(AT_FDCWD, file.c_str(), directory_.Get(), entry.c_str(), AT_SYMLINK_FOLLOW) == 0;
+}
+
+// False if unnamed files get no names here: there is no /proc, or the file system refuses.
+bool NewFile::CommitUnnamed() const {
+  if (LinkUnnamed(entry_)) return true;
+  if (errno != EEXIST) return false;
+  if (!replace_) throw Exists(name_);
+  // No call links a file in the place of another, but one renames it there.
+  const WithoutSignals here;
+  const std::string entry = RandomEntry();
+  if (!LinkUnnamed(entry)) return false;
+  Rename(entry, unnamed_.Get());
+  return true;
+}
+
+void NewFile::CommitNamed(std::span<const std::byte> content) const {
+  const WithoutSignals here;
+  const std::string entry = RandomEntry();
+  const Descriptor file(openat(directory_.Get(), entry.c_str(),
+                               O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kMode));
+  if (!file) throw SystemError(name_, errno);
+  const TemporaryEntry temporary(directory_.Get(), entry, file.Get());
+  Fill(file.Get(), content);
+  Rename(entry, file.Get());
+}
+
+// Gives the file its own name for this one, which goes in any case.
+void NewFile::Rename(const std::string& entry, int fd) const {
+  const TemporaryEntry temporary(directory_.Get(), entry, fd);
+  if (temporary.RenameTo(entry_, replace_) == 0) return;
+  if (errno == EEXIST) throw Exists(name_);
+  throw SystemError(name_, errno);
+}
+
+// The name is on the disk when its directory is.
+void NewFile::SyncDirectory() const {
+  const Descriptor directory(openat(directory_.Get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (directory && fsync(directory.Get()) == 0) return;
+  // Some file systems cannot sync a directory.
+  if (errno != EINVAL && errno != EACCES) throw SystemError(name_, errno);
+}
+
+}  // namespace ksicache
