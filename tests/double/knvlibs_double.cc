@@ -12,6 +12,8 @@
 //   list NODE KEYS [ENTRY...]       instances: 5, 'name', or !STATUS for one that cannot be read
 //   count NODE KEYS NUMBER          how many instances their list says it has
 //   status NODE KEYS STATUS         a read that fails
+//   others STATUS                   what every read fails with that has no statement; without this
+//                                   one, such a read is a misuse
 //   fail NUMBER STATUS              the NUMBER-th (from 1) of all fallible calls fails
 //   fail OPERATION NUMBER STATUS    the NUMBER-th call of one operation fails
 //
@@ -213,6 +215,7 @@ class Double {
     if (status != statuses_.end()) return status->second;
     const auto answer = answers.find(read);
     if (answer == answers.end()) {
+      if (othersStatus_ != 0) return othersStatus_;
       Misuse("the scenario has no answer: " + read);
       return KSI_STATUS_NOT_FOUND;
     }
@@ -243,6 +246,10 @@ class Double {
     }
     if (verb == "cache" && count == 2) {
       cacheStatus_ = StatusOf(words[1]);
+      return true;
+    }
+    if (verb == "others" && count == 2) {
+      othersStatus_ = StatusOf(words[1]);
       return true;
     }
     if (verb == "fail" && (count == 3 || count == 4)) {
@@ -297,6 +304,7 @@ class Double {
   std::string appBuild_ = "Nov 21 2026 10:00:00";
   uint32_t signatureStatus_ = 0;
   uint32_t cacheStatus_ = 0;
+  uint32_t othersStatus_ = 0;
   std::unordered_map<std::string, std::string> values_;
   std::unordered_map<std::string, std::vector<Entry>> instances_;
   std::unordered_map<std::string, uint32_t> statuses_;

@@ -61,6 +61,10 @@ Scenario& Scenario::Fails(std::string_view node, const Items& keys, uint32_t sta
   return Statement("status " + Read(node, keys) + " " + script::Status(status));
 }
 
+Scenario& Scenario::OthersFail(uint32_t status) {
+  return Statement("others " + script::Status(status));
+}
+
 Scenario& Scenario::FailCall(int number, uint32_t status) {
   return Statement("fail " + std::to_string(number) + " " + script::Status(status));
 }

@@ -63,6 +63,10 @@ class Scenario {
   // A read of a value or of instances that fails.
   Scenario& Fails(std::string_view node, const Items& keys, uint32_t status);
 
+  // All reads that have no statement fail so, and fail no test: for programs that read all there
+  // is.
+  Scenario& OthersFail(uint32_t status);
+
   // The `number`-th fallible call from 1, or that of one operation ("Create", "AddInt", "Get",
   // ...), fails; one that makes a list returns none.
   Scenario& FailCall(int number, uint32_t status);

@@ -202,5 +202,14 @@ TEST_F(Installed, HeadersAndToolsAreWhereTheyAreExpected) {
   EXPECT_TRUE(fs::exists(root_ / "usr/bin/ksicache"));
 }
 
+TEST_F(Installed, KsicacheReadsThroughTheLibrary) {
+  Program ksicache = BuiltTally({});
+  ksicache.path = root_ / "usr/bin/ksicache";
+  ksicache.args = {"ksicache", "capture", "-"};
+  const Result result = RunProgram(ksicache);
+  EXPECT_EQ(result.status, 0) << result.err;
+  EXPECT_TRUE(result.out.starts_with("SQLite format 3"));
+}
+
 }  // namespace
 }  // namespace harness

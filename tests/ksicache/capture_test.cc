@@ -1,4 +1,9 @@
 // capture.
+#include <sys/stat.h>
+
+#include <cstring>
+#include <utility>
+
 #include "knvlibs/cache_source.h"
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/ksicache_fixture.h"
@@ -11,8 +16,11 @@ TEST_F(Ksicache, CaptureRecordsAHost) {
   host.Write("/proc/sys/kernel/hostname", "recorded.example.org\n");
   host.Write("/proc/meminfo", "MemTotal: 1000 kB\n");
   const harness::Result result = Run({"capture", Path("a.ksi"), "--root", host.Root()});
-  EXPECT_EQ(result.status, 0) << result.err;
+  // A meminfo that lacks most is no healthy host's.
+  EXPECT_EQ(result.status, 1);
   EXPECT_EQ(result.out.find(Path("a.ksi") + ": "), 0u);
+  EXPECT_NE(result.out.find("\nfailed     3: sched/groups/stats/memoryStats [0] (0xbad0099 "),
+            result.out.npos);
   EXPECT_NE(result.out.find(" of recorded.example.org\n"), result.out.npos) << result.out;
   EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
   // What cannot be read is recorded as such.
@@ -47,6 +55,28 @@ TEST_F(Ksicache, CaptureTakesNoOtherDirectoryForAHost) {
   ExpectFailure({"capture", Path("a.ksi"), "--root", Path("")},
                 Path("") + ": is not the root of a Linux host: it has no proc/meminfo");
   EXPECT_TRUE(directory_.Names().empty());
+}
+
+TEST_F(Ksicache, CaptureTakesTheNameOfAHostFromAFileAlone) {
+  const auto name = [this](const HostTree& host) {
+    const harness::Result result =
+        Run({"capture", "--force", Path("a.ksi"), "--root", host.Root()});
+    const size_t at = result.out.find(" of ") + strlen(" of ");
+    return result.out.substr(at, result.out.find('\n') - at);
+  };
+  const HostTree host;
+  host.Write("/proc/meminfo", "MemTotal: 1000 kB\n");
+  EXPECT_EQ(name(host), "unknown");
+  for (const auto& [content, expected] :
+       {std::pair("a", "a"), std::pair("a\nb\n", "a"), std::pair("\n", "unknown"),
+        std::pair("\x1b]0;x\n", "\\x1b]0;x")}) {
+    host.Write("/proc/sys/kernel/hostname", content);
+    EXPECT_EQ(name(host), expected);
+  }
+  const std::string file = host.Root() + "/proc/sys/kernel/hostname";
+  ASSERT_EQ(unlink(file.c_str()), 0);
+  ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
+  EXPECT_EQ(name(host), "unknown");
 }
 
 TEST_F(Ksicache, CaptureOfThisMachineIsAGoodFile) {

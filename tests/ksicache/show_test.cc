@@ -28,8 +28,8 @@ TEST_F(Ksicache, InfoTellsWhatAFileIs) {
                 size + " bytes, schema 1\nbuilt      " + std::string(kDefinitions.built) +
                 "\nsignature  " + own +
                 "\nvalues     8\nlists      5, with 6 instances\nabsent     0\n"
-                "refused    1: sched/groups/groupName [9] (0xbad005a)\n"
-                "failed     1: sched/groups/members/groups [9] (0xbad000a)\n");
+                "refused    1: sched/groups/groupName [9] (0xbad005a Permission denied)\n"
+                "failed     1: sched/groups/members/groups [9] (0xbad000a I/O error)\n");
   const std::string other = "00112233445566778899aabbccddeeff";
   RunSql(Path("host.ksi"), "UPDATE capture SET signature = '" + other + "'");
   EXPECT_NE(Output({"info", Path("host.ksi")})
@@ -46,9 +46,9 @@ TEST_F(Ksicache, InfoTellsFailedReadsApart) {
              std::to_string(KSI_STATUS_READ_ERROR) + " WHERE key1 = 7 OR key1 = 9");
   const std::string info = Output({"info", Path("host.ksi")});
   EXPECT_NE(info.find("values     2\nlists      1, with 2 instances\nabsent     6\nrefused    0\n"
-                      "failed     6: sched/groups/groupName [7] (0xbad000b), "
-                      "sched/groups/groupFlags [7] (0xbad000b), "
-                      "sched/groups/members/groups [7] (0xbad000b) and 3 more\n"),
+                      "failed     6: sched/groups/groupName [7] (0xbad000b Read error), "
+                      "sched/groups/groupFlags [7] (0xbad000b Read error), "
+                      "sched/groups/members/groups [7] (0xbad000b Read error) and 3 more\n"),
             info.npos)
       << info;
 }

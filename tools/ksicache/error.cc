@@ -3,6 +3,9 @@
 #include <array>
 #include <charconv>
 #include <cstring>
+#include <iterator>
+
+#include <knvlibs/ksi_status_text.h>
 
 namespace ksicache {
 
@@ -14,6 +17,16 @@ std::string Hex(uint64_t number) {
   std::array<char, 18> text = {'0', 'x'};
   const auto [end, error] = std::to_chars(text.data() + 2, text.data() + text.size(), number, 16);
   return {text.data(), end};
+}
+
+std::string StatusText(ksi::Status status) {
+  static constexpr const char* kTexts[] = {
+#define TEXT(row, text) text,
+      KSI_STATUS_TEXTS(TEXT)
+#undef TEXT
+  };
+  const size_t row = status - KSI_STATUS_BASE;
+  return Hex(status) + (row < std::size(kTexts) ? std::string(" ") + kTexts[row] : "");
 }
 
 std::string NameOf(std::string_view path, const ksi::Keys& keys) {

@@ -40,6 +40,9 @@ Error SystemError(const std::string& fileName, int error);
 // "0xbad0003"
 std::string Hex(uint64_t number);
 
+// "0xbad0003 Not found", without the words if there are none.
+std::string StatusText(ksi::Status status);
+
 // "sched/groups/groupName [5]"
 std::string NameOf(std::string_view path, const ksi::Keys& keys);
 

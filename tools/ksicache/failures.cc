@@ -6,8 +6,9 @@
 namespace ksicache {
 
 void FailedReads::Add(const std::string& name, int64_t status) {
-  if (count_++ < kMostNamed)
-    first_.push_back(name + " (" + Hex(static_cast<uint64_t>(status)) + ")");
+  if (count_++ < kMostNamed) {
+    first_.push_back(name + " (" + StatusText(static_cast<ksi::Status>(status)) + ")");
+  }
 }
 
 std::string FailedReads::Text() const {

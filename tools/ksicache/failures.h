@@ -16,7 +16,7 @@ class FailedReads {
 
   size_t Count() const { return count_; }
 
-  // "12: sched/groups/groupName [5] (0xbad005a), ... and 9 more", or "0"
+  // "12: sched/groups/groupName [5] (0xbad005a Permission denied), ... and 9 more", or "0"
   std::string Text() const;
 
  private:

@@ -1,0 +1,74 @@
+// Records all that a library tells of its host.
+//
+// The host is walked object by object, an object being what a path of keys selects: the host
+// itself, a group, a client, a remap type of a client. Of each, every node that takes such keys is
+// read and listed, and the instances so found are the objects to come. A read that fails is
+// recorded with its status, so that nothing stops a capture and a captured host answers as it did.
+#ifndef TOOLS_KSICACHE_HOST_WALK_H_
+#define TOOLS_KSICACHE_HOST_WALK_H_
+
+#include <array>
+#include <compare>
+#include <cstdint>
+#include <set>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "knvlibs/catalogue.h"
+#include "knvlibs/source.h"
+#include "tools/ksicache/cache_writer.h"
+#include "tools/ksicache/failures.h"
+#include "tools/ksicache/host_library.h"
+
+namespace ksicache {
+
+class HostWalk {
+ public:
+  HostWalk(HostLibrary& host, CacheWriter& writer) : host_(host), writer_(writer) {}
+
+  void Run();
+
+  const Failures& GetFailures() const { return failures_; }
+
+  // Whether anything was read that is not nothing: a figure that is not 0, an instance.
+  bool FoundAnything() const { return foundAnything_; }
+
+ private:
+  // A key of an object, with what it names.
+  struct ObjectKey {
+    ksi::Instance instance = ksi::Instance::kNone;
+    int64_t number = 0;
+    std::string text;
+
+    friend auto operator<=>(const ObjectKey&, const ObjectKey&) = default;
+  };
+  using Object = std::array<ObjectKey, ksi::kMaxKeys>;
+
+  static ksi::Keying KeyingOf(const Object& object);
+  static ksi::Keys KeysOf(const Object& object);
+
+  void Find(const Object& object);
+  void FindNumber(ksi::Instance instance, int64_t number);
+  void FindText(ksi::Instance instance, std::string_view text);
+  void FindInValue(const ksi::Node& node, ksi::Buffer record);
+  void FindInList(const ksi::Node& node, const Object& object,
+                  const std::vector<ksi::Key>& entries);
+  void FindMemNodeOf(std::string_view buddy);
+
+  void Read(const Object& object);
+  void ReadValue(const ksi::Node& node, const ksi::Keys& keys);
+  void ReadList(const ksi::Node& node, const ksi::Keys& keys, const Object& object);
+  void AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys, ksi::Status status);
+
+  HostLibrary& host_;
+  CacheWriter& writer_;
+  Failures failures_;
+  bool foundAnything_ = false;
+  std::vector<Object> toRead_;
+  std::set<Object> found_;
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_HOST_WALK_H_
