@@ -1,5 +1,7 @@
 // What a command is. Each stands in a file of its own, described there once: the usage, the help
-// and the reading of the command line derive from these descriptions.
+// and the reading of the command line derive from these descriptions. A new one is its file, its
+// line in commands/commands.h and CMakeLists.txt, its section in docs/ksicache.8 and its
+// completions.
 #ifndef TOOLS_KSICACHE_COMMAND_H_
 #define TOOLS_KSICACHE_COMMAND_H_
 

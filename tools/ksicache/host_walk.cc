@@ -135,12 +135,13 @@ void HostWalk::FindInList(const ksi::Node& node, const Object& object,
   if (depth < ksi::kMaxKeys) below.at[depth] = node.entries;
   const bool isBelow = !(below == node.listKeys) && IsKeying(below);
   // The last one found is read next, so the order is kept by going backwards.
-  for (auto entry = entries.rbegin(); entry != entries.rend(); ++entry) {
+  for (size_t i = entries.size(); i-- > 0;) {
+    const ksi::Key& entry = entries[i];
     Object found;
     if (isBelow) found = object;
-    found[isBelow ? depth : 0] = {node.entries, entry->number, std::string(entry->text)};
+    found[isBelow ? depth : 0] = {node.entries, entry.number, std::string(entry.text)};
     Find(found);
-    if (node.entries == ksi::Instance::kBuddy) FindMemNodeOf(entry->text);
+    if (node.entries == ksi::Instance::kBuddy) FindMemNodeOf(entry.text);
   }
 }
 
