@@ -15,7 +15,7 @@ constexpr uint64_t kNoValue = UINT64_MAX;
 
 // Reads the word of -u, in any case; no text means kb. `allowBytes`: "b" is a word too. An unknown
 // word is kBadParameter, after its message.
-Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit);
+[[nodiscard]] Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit);
 
 // The unit's name for the title block.
 const char* UnitTitle(DisplayUnit unit);

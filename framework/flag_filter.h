@@ -20,7 +20,8 @@ extern const FlagName uwTypeNames[];     // of user worlds: a part of the group 
 
 // Turns a ':'-separated list of flag names into a mask; no text means every flag, or for an
 // exclusion filter none. An unknown name is kBadParameter after its message, with mask 0.
-Status ParseFlagFilter(const char* text, const FlagName* table, uint32_t& mask, bool isExclusion);
+[[nodiscard]] Status ParseFlagFilter(const char* text, const FlagName* table, uint32_t& mask,
+                                     bool isExclusion);
 
 // The names of a mask's flags in table order, "(all)" or "(none)".
 NameWriter FormatFlagMask(uint32_t mask, const FlagName* table);

@@ -2,12 +2,14 @@
 #ifndef FRAMEWORK_PARAM_LIST_H_
 #define FRAMEWORK_PARAM_LIST_H_
 
+#include <concepts>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <utility>
+#include <optional>
 
 #include <knvlibs/ksi.h>
+#include "framework/complaint.h"
 #include "framework/status.h"
 
 namespace tally {
@@ -19,15 +21,18 @@ struct ParamListDestroyer {
 // Owns a parameter or instance list and destroys it once. Null when it could not be made.
 using ParamList = std::unique_ptr<KSI_ParamList, ParamListDestroyer>;
 
-// A key that selects one instance on one level of the tree.
+// A key that selects one instance on one level of the tree. Signed numbers are widened with their
+// sign.
 class Key {
  public:
   Key() = default;
-  Key(uint64_t number) : number_(number), kind_(Kind::number) {}
+  template <std::integral Number>
+  Key(Number number) : number_(static_cast<uint64_t>(number)), kind_(Kind::number) {}
   Key(const char* text) : text_(text), kind_(Kind::text) {}
 
   bool given() const { return kind_ != Kind::none; }
-  Status AddTo(KSI_ParamList* list) const {
+
+  [[nodiscard]] Status AddTo(KSI_ParamList* list) const {
     return kind_ == Kind::text ? KSI_ParamListAddString(list, text_)
                                : KSI_ParamListAddInt(list, number_);
   }
@@ -40,9 +45,6 @@ class Key {
   Kind kind_ = Kind::none;
 };
 
-// Where a keyed read failed; each reader has its own words for each.
-enum class ReadStep : uint8_t { create, addFirstKey, addSecondKey, read };
-
 // The parameter list of one read, and what becomes of its keys.
 struct KeyList {
   int capacity;
@@ -51,56 +53,68 @@ struct KeyList {
   bool removeKeys = false;  // take the keys out again before the list is destroyed
 };
 
-// Calls `read` with a list made of the keys and destroys the list, whatever the status. A failure
-// is worded by `words(step, status)`.
-template <class Read, class Words>
-Status KeyedRead(const KeyList& keys, Read read, Words words) {
-  ParamList list(KSI_ParamListCreate(1, keys.capacity));
-  if (!list) {
-    words(ReadStep::create, kFailure);
-    return kFailure;
+// What a reader says of each step that can fail.
+struct ReaderTexts {
+  Complaint create = {};
+  Complaint firstKey = {};
+  Complaint secondKey = {};
+  Complaint read = {};
+};
+
+// Makes the list of a read; kFailure when there is no list. Inline, as what reads with it: where
+// the keys are known there is nothing to ask.
+[[nodiscard]] inline Status MakeKeys(const KeyList& keys, const ReaderTexts& texts,
+                                     ParamList& list) {
+  list.reset(KSI_ParamListCreate(1, keys.capacity));
+  if (!list) return texts.create.Of(kFailure);
+  if (keys.first.given()) {
+    if (Status status = texts.firstKey.Of(keys.first.AddTo(list.get()))) return status;
   }
-  int added = 0;
-  for (const auto& [key, step] : {std::pair{keys.first, ReadStep::addFirstKey},
-                                  std::pair{keys.second, ReadStep::addSecondKey}}) {
-    if (!key.given()) continue;
-    if (Status status = key.AddTo(list.get())) {
-      words(step, status);
-      return status;
-    }
-    ++added;
+  if (keys.second.given()) {
+    if (Status status = texts.secondKey.Of(keys.second.AddTo(list.get()))) return status;
   }
-  const Status status = read(list.get());
+  return kSuccess;
+}
+
+// Destroys the list of a read.
+inline void DropKeys(const KeyList& keys, ParamList& list) {
   if (keys.removeKeys) {
-    for (; added > 0; --added) KSI_ParamListRemoveLastParam(list.get());
+    if (keys.second.given()) KSI_ParamListRemoveLastParam(list.get());
+    if (keys.first.given()) KSI_ParamListRemoveLastParam(list.get());
   }
   list.reset();
-  if (status != kSuccess) words(ReadStep::read, status);
-  return status;
 }
 
-// Reads one record of `node`.
-template <class Record, class Words>
-Status KeyedGet(uint16_t node, const KeyList& keys, Record& record, Words words) {
-  return KeyedRead(
-      keys, [&](KSI_ParamList* list) { return KSI_Get(node, list, &record, sizeof record); },
-      words);
+// Calls `read` with a list made of the keys and destroys the list, whatever the status.
+template <class Read>
+[[nodiscard]] Status KeyedRead(const KeyList& keys, const ReaderTexts& texts, Read read) {
+  ParamList list;
+  if (Status status = MakeKeys(keys, texts, list)) return status;
+  const Status status = read(list.get());
+  DropKeys(keys, list);
+  return texts.read.Of(status);
 }
 
-// Lists the instances of `node` for `keys` (null: no keys).
-inline Status ListInstances(uint16_t node, KSI_ParamList* keys, ParamList& instances) {
-  KSI_ParamList* made = nullptr;
-  const Status status = KSI_GetInstanceListAlloc(node, keys, &made);
-  if (status == kSuccess) instances.reset(made);
-  return status;
+// Reads the record of `node` for the keys: `size` bytes, the record's size.
+[[nodiscard]] inline Status ReadRecord(uint16_t node, const KeyList& keys, const ReaderTexts& texts,
+                                       void* buffer, size_t size) {
+  return KeyedRead(keys, texts,
+                   [&](KSI_ParamList* list) { return KSI_Get(node, list, buffer, size); });
 }
+
+template <class Record>
+[[nodiscard]] Status ReadRecord(uint16_t node, const KeyList& keys, const ReaderTexts& texts,
+                                Record& record) {
+  return ReadRecord(node, keys, texts, &record, sizeof record);
+}
+
+// Lists the instances of `node` for `keys` (null: no keys). A `hint` is how many to expect.
+[[nodiscard]] Status ListInstances(uint16_t node, KSI_ParamList* keys, ParamList& instances,
+                                   std::optional<uint32_t> hint = {});
 
 // The same for keys of a list of their own.
-template <class Words>
-Status KeyedList(uint16_t node, const KeyList& keys, ParamList& instances, Words words) {
-  return KeyedRead(
-      keys, [&](KSI_ParamList* list) { return ListInstances(node, list, instances); }, words);
-}
+[[nodiscard]] Status ListInstances(uint16_t node, const KeyList& keys, const ReaderTexts& texts,
+                                   ParamList& instances, std::optional<uint32_t> hint = {});
 
 }  // namespace tally
 

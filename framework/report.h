@@ -31,7 +31,7 @@ class ReportContextBase {
 
   // Settles unit, filters and columns. On failure the report ends with the status; the sink has
   // been told nothing.
-  Status Settle(const ReportOptions& options);
+  [[nodiscard]] Status Settle(const ReportOptions& options);
 
   const ReportOptions& options() const { return options_; }
   const FlagFilter& filter() const { return filter_; }
@@ -143,7 +143,7 @@ struct Report {
 };
 
 // What an entry does: runs the report with the options of the command line, as a table or as CSV.
-Status PrintReport(const Report& report, int argc, char** argv);
+[[nodiscard]] Status PrintReport(const Report& report, int argc, char** argv);
 
 }  // namespace tally
 

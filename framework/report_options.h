@@ -52,7 +52,8 @@ struct ReportOptions {
 // Goes on with the scan of the command line where the front end stopped. Options that the report
 // does not take are passed over. A level that is no number above 0 is kBadParameter after its
 // message; one that is too deep becomes the deepest after its message.
-Status ParseReportOptions(const ReportFrame& frame, int argc, char** argv, ReportOptions& options);
+[[nodiscard]] Status ParseReportOptions(const ReportFrame& frame, int argc, char** argv,
+                                        ReportOptions& options);
 
 }  // namespace tally
 

@@ -1,6 +1,5 @@
 #include "framework/text_sink.h"
 
-#include <algorithm>
 #include <cstdio>
 
 namespace tally {
@@ -8,17 +7,18 @@ namespace tally {
 void TextSink::Begin(const Heading& heading) {
   heading_ = heading;
   shown_.resize(heading.columns.size());
+  kept_.clear();
   converted_.clear();
   for (size_t i = 0; i < heading.figures.size(); ++i) {
-    if (!heading.figures[i].IsShownAsItIs(heading.unit)) converted_.push_back(i);
+    (heading.figures[i].IsShownAsItIs(heading.unit) ? kept_ : converted_).push_back(i);
   }
 }
 
 void TextSink::Row(RowKind kind, std::span<const Cell> cells) {
   if (!converted_.empty()) {
-    std::ranges::copy(cells, shown_.begin());
+    for (const size_t i : kept_) shown_[i] = cells[i];
     for (const size_t i : converted_) {
-      shown_[i] = heading_.figures[i].Shown(cells[i], heading_.unit);
+      shown_[i] = heading_.figures[i].toUnit(cells[i].number(), heading_.unit);
     }
     cells = shown_;
   }

@@ -27,8 +27,10 @@ class TextSink : public Sink {
  private:
   bool csvMode_;
   Heading heading_ = {};
-  std::vector<size_t> converted_;  // the places of the figures that are not shown as they are
-  std::vector<Cell> shown_;        // the row at hand, in the display unit
+  // The places of the figures that are shown as they are, and those of the others.
+  std::vector<size_t> kept_;
+  std::vector<size_t> converted_;
+  std::vector<Cell> shown_;  // the row at hand, in the display unit
 };
 
 }  // namespace tally

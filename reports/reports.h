@@ -17,21 +17,21 @@ std::span<const Report* const> Reports();
 // The report called `name`, in any case; null when there is none.
 const Report* FindReport(const char* name);
 
-Status TallyGroupStats(int argc, char** argv);
-Status TallyVMStats(int argc, char** argv);
-Status TallyUWStats(int argc, char** argv);
-Status TallyPShareStats(int argc, char** argv);
-Status TallyPShareHintStats(int argc, char** argv);
-Status TallySwapStats(int argc, char** argv);
-Status TallyBuddyStats(int argc, char** argv);
-Status TallyCompStats(int argc, char** argv);
-Status TallyLPoolStats(int argc, char** argv);
-Status TallyHeapStats(int argc, char** argv);
-Status TallyGuestStats(int argc, char** argv);
-Status TallyZipStats(int argc, char** argv);
-Status TallyLPageStats(int argc, char** argv);
-Status TallyAsyncRemapStats(int argc, char** argv);
-Status TallyPMemStats(int argc, char** argv);
+[[nodiscard]] Status TallyGroupStats(int argc, char** argv);
+[[nodiscard]] Status TallyVMStats(int argc, char** argv);
+[[nodiscard]] Status TallyUWStats(int argc, char** argv);
+[[nodiscard]] Status TallyPShareStats(int argc, char** argv);
+[[nodiscard]] Status TallyPShareHintStats(int argc, char** argv);
+[[nodiscard]] Status TallySwapStats(int argc, char** argv);
+[[nodiscard]] Status TallyBuddyStats(int argc, char** argv);
+[[nodiscard]] Status TallyCompStats(int argc, char** argv);
+[[nodiscard]] Status TallyLPoolStats(int argc, char** argv);
+[[nodiscard]] Status TallyHeapStats(int argc, char** argv);
+[[nodiscard]] Status TallyGuestStats(int argc, char** argv);
+[[nodiscard]] Status TallyZipStats(int argc, char** argv);
+[[nodiscard]] Status TallyLPageStats(int argc, char** argv);
+[[nodiscard]] Status TallyAsyncRemapStats(int argc, char** argv);
+[[nodiscard]] Status TallyPMemStats(int argc, char** argv);
 
 extern const Report groupStats;
 extern const Report vmStats;

@@ -7,7 +7,6 @@
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
 #include "framework/param_list.h"
-#include "framework/return_status.h"
 #include "reports/clients/client_report.h"
 #include "reports/reports.h"
 
@@ -54,46 +53,44 @@ constexpr Column<RemapRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
-// A failure is known by its function and number; the number does not move with the source.
-Status WarnAt(const char* function, unsigned number, Status status) {
-  Warning("%s:%u failure: %s\n", function, number, KNV_ReturnStatusToString(status));
-  return status;
-}
-
-// A memory client's id is signed and widened with its sign.
-Key ClientKey(int32_t client) { return static_cast<uint64_t>(int64_t{client}); }
+constexpr ReaderTexts kRecordTexts = {
+    .firstKey = {Style::message, "TallyAsyncRemapGetStats:137 failure"},
+    .secondKey = {Style::message, "TallyAsyncRemapGetStats:138 failure"},
+    .read = {Style::message, "TallyAsyncRemapGetStats:140 failure"},
+};
+constexpr ReaderTexts kTypeListTexts = {
+    .firstKey = {Style::message, "TallyAsyncRemapReportCallbackInt:303 failure"},
+    .read = {Style::message, "TallyAsyncRemapReportCallbackInt:305 failure"},
+};
+constexpr Complaint kTypeName = {Style::message, "TallyAsyncRemapReportCallbackInt:308 failure"};
+constexpr Complaint kType = {Style::message, "TallyAsyncRemapReportCallbackInt:310 failure"};
+constexpr ReaderTexts kClientListTexts = {
+    .firstKey = {Style::message, "TallyAsyncRemapReportCallback:394 failure"},
+    .read = {Style::message, "TallyAsyncRemapReportCallback:396 failure"},
+};
+constexpr Complaint kClientId = {Style::message, "TallyAsyncRemapReportCallback:401 failure"};
+constexpr Complaint kClient = {Style::message, "TallyAsyncRemapReportCallback:403 failure"};
 
 Status TallyAsyncRemapGetStats(int32_t client, const char* type, KSI_RemapType& pages) {
-  return KeyedGet(KSI_NODE_sched_memClients_remapTypes,
-                  {.capacity = 2, .first = ClientKey(client), .second = type}, pages,
-                  [](ReadStep step, Status status) {
-                    constexpr const char* kFunction = "TallyAsyncRemapGetStats";
-                    if (step == ReadStep::addFirstKey) WarnAt(kFunction, 137, status);
-                    if (step == ReadStep::addSecondKey) WarnAt(kFunction, 138, status);
-                    if (step == ReadStep::read) WarnAt(kFunction, 140, status);
-                  });
+  return ReadRecord(KSI_NODE_sched_memClients_remapTypes,
+                    {.capacity = 2, .first = client, .second = type}, kRecordTexts, pages);
 }
 
 // Prints the rows of one memory client.
 Status TallyAsyncRemapReportCallbackInt(ReportContext<RemapRow>& context, RemapRow& row) {
-  constexpr const char* kFunction = "TallyAsyncRemapReportCallbackInt";
   ParamList types;
-  if (Status failed = KeyedList(KSI_NODE_sched_memClients_remapTypes,
-                                {.capacity = 1, .first = ClientKey(row.grpLeader)}, types,
-                                [](ReadStep step, Status status) {
-                                  if (step == ReadStep::addFirstKey) WarnAt(kFunction, 303, status);
-                                  if (step == ReadStep::read) WarnAt(kFunction, 305, status);
-                                })) {
-    return failed;
+  if (Status status =
+          ListInstances(KSI_NODE_sched_memClients_remapTypes,
+                        {.capacity = 1, .first = row.grpLeader}, kTypeListTexts, types)) {
+    return status;
   }
-
   const uint32_t count = KSI_ParamListUsedCount(types.get());
   for (uint32_t i = 0; i < count; ++i) {
-    if (Status status = KSI_ParamListGetString(types.get(), i, &row.type)) {
-      return WarnAt(kFunction, 308, status);
+    if (Status status = kTypeName.Of(KSI_ParamListGetString(types.get(), i, &row.type))) {
+      return status;
     }
-    if (Status status = TallyAsyncRemapGetStats(row.grpLeader, row.type, row.pages)) {
-      return WarnAt(kFunction, 310, status);
+    if (Status status = kType.Of(TallyAsyncRemapGetStats(row.grpLeader, row.type, row.pages))) {
+      return status;
     }
     context.PrintRow(row);
   }
@@ -103,38 +100,28 @@ Status TallyAsyncRemapReportCallbackInt(ReportContext<RemapRow>& context, RemapR
 // Prints the rows of one user world's memory clients.
 Status TallyAsyncRemapReportCallback(uint64_t gid, uint32_t /*childCount*/, int /*csvMode*/,
                                      void* opaque) {
-  constexpr const char* kFunction = "TallyAsyncRemapReportCallback";
+  auto& context = *static_cast<ReportContext<RemapRow>*>(opaque);
   uint32_t flags = 0;
   KSI_GroupName name;
-  Status status = kSuccess;
-  if ((status = Tally_GroupGetFlags(gid, flags)) || (flags & KSI_GROUP_USER_WORLD) == 0) {
-    return status;
-  }
-  if ((status = Tally_GroupGetName(gid, name))) return status;
+  if (Status status = Tally_GroupGetFlags(gid, flags)) return status;
+  if ((flags & KSI_GROUP_USER_WORLD) == 0) return kSuccess;
+  if (Status status = Tally_GroupGetName(gid, name)) return status;
 
   ParamList clients;
-  if ((status = KeyedList(KSI_NODE_sched_groups_members_memClients, {.capacity = 1, .first = gid},
-                          clients, [](ReadStep step, Status failed) {
-                            if (step == ReadStep::addFirstKey) WarnAt(kFunction, 394, failed);
-                            if (step == ReadStep::read) WarnAt(kFunction, 396, failed);
-                          }))) {
+  if (Status status = ListInstances(KSI_NODE_sched_groups_members_memClients,
+                                    {.capacity = 1, .first = gid}, kClientListTexts, clients)) {
     return status;
   }
-
   RemapRow row;
-  // One character less than the field: the row's name was made for a terminator.
   row.name = FixedText(name.text).substr(0, sizeof name.text - 1);
   const uint32_t count = KSI_ParamListUsedCount(clients.get());
   for (uint32_t i = 0; i < count; ++i) {
     uint32_t client = 0;
-    if ((status = KSI_ParamListGetUInt32(clients.get(), i, &client))) {
-      return WarnAt(kFunction, 401, status);
+    if (Status status = kClientId.Of(KSI_ParamListGetUInt32(clients.get(), i, &client))) {
+      return status;
     }
     row.grpLeader = static_cast<int32_t>(client);
-    if ((status = TallyAsyncRemapReportCallbackInt(*static_cast<ReportContext<RemapRow>*>(opaque),
-                                                   row))) {
-      return WarnAt(kFunction, 403, status);
-    }
+    if (Status status = kClient.Of(TallyAsyncRemapReportCallbackInt(context, row))) return status;
   }
   return kSuccess;
 }

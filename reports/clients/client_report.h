@@ -25,15 +25,7 @@ struct Client {
 
 // Reads which client leads the group `groupId`: its name, its parent group and its world group.
 // The status of what failed, after its message.
-Status ReadClient(uint64_t groupId, Client& client);
-
-// Reads a record of a memory client; a failure is worded with the reader's name.
-template <class Record>
-Status ReadClientRecord(const char* reader, int32_t clientId, uint16_t node, Record& record) {
-  const Status status = Tally_MemClientKsiGet(clientId, node, &record, sizeof record);
-  if (status != kSuccess) Warning("%s() failure, error code: %u\n", reader, status);
-  return status;
-}
+[[nodiscard]] Status ReadClient(uint64_t groupId, Client& client);
 
 // The host memory that a virtual machine or user world consumes, in kilobytes. Wraps like the
 // kernel's own sums.
@@ -66,13 +58,14 @@ constexpr Column<Row> kWorldGrpColumn = Id("worldGrp", "World group ID",
 // goes on into its children; one of which anything cannot be read gives none either and is passed
 // over with all below it. `kRead` reads what the report shows beside the client.
 template <class Row, Status (*kRead)(uint64_t groupId, Row& row)>
-Status VisitVirtualMachine(uint64_t groupId, uint32_t /*childCount*/, int /*csvMode*/,
-                           void* context) {
+[[nodiscard]] Status VisitVirtualMachine(uint64_t groupId, uint32_t /*childCount*/, int /*csvMode*/,
+                                         void* context) {
   Row row;
   uint32_t flags = 0;
-  Status status = kSuccess;
-  if ((status = Tally_GroupGetFlags(groupId, flags)) || (flags & KSI_GROUP_VM) == 0) return status;
-  if ((status = ReadClient(groupId, row.client)) || (status = kRead(groupId, row))) return status;
+  if (Status status = Tally_GroupGetFlags(groupId, flags)) return status;
+  if ((flags & KSI_GROUP_VM) == 0) return kSuccess;
+  if (Status status = ReadClient(groupId, row.client)) return status;
+  if (Status status = kRead(groupId, row)) return status;
   static_cast<ReportContext<Row>*>(context)->PrintRow(row);
   return kSuccess;
 }
@@ -80,9 +73,10 @@ Status VisitVirtualMachine(uint64_t groupId, uint32_t /*childCount*/, int /*csvM
 // Runs a report whose visitor prints the rows. The Total row and the closing lines are printed even
 // when the walk failed; its status is the report's.
 template <class Row>
-Status RunClientReport(const ReportFrame& frame,
-                       std::type_identity_t<std::span<const Column<Row>>> columns,
-                       GroupVisitor visitor, const ReportOptions& options, Sink& sink) {
+[[nodiscard]] Status RunClientReport(const ReportFrame& frame,
+                                     std::type_identity_t<std::span<const Column<Row>>> columns,
+                                     GroupVisitor visitor, const ReportOptions& options,
+                                     Sink& sink) {
   ReportContext<Row> context(frame, columns, sink);
   if (Status status = context.Settle(options)) return status;
   context.Begin();

@@ -42,9 +42,11 @@ constexpr Column<GuestStatsRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr Complaint kRead = {Style::code, "TallyGuestGetStats() failure"};
+
 Status ReadGuestStats(uint64_t /*gid*/, GuestStatsRow& row) {
-  return ReadClientRecord("TallyGuestGetStats", row.client.worldGrp,
-                          KSI_NODE_sched_memClients_tally_guest, row.guest);
+  return ReadClientRecord(kRead, row.client.worldGrp, KSI_NODE_sched_memClients_tally_guest,
+                          row.guest);
 }
 
 constexpr GroupVisitor TallyGuestStatsGroup = VisitVirtualMachine<GuestStatsRow, ReadGuestStats>;

@@ -51,14 +51,11 @@ constexpr Column<LPageStatsRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr Complaint kRead = {Style::code, "TallyLPageGetLPageStats() failure"};
+
 Status ReadLPageStats(uint64_t /*gid*/, LPageStatsRow& row) {
-  Status status = kSuccess;
-  if ((status = Tally_GetVmmLeaderID(row.client.worldGrp, row.vmmLeader)) ||
-      (status = ReadClientRecord("TallyLPageGetLPageStats", row.vmmLeader,
-                                 KSI_NODE_memory_lpage_vmLPage, row.lpage))) {
-    return status;
-  }
-  return kSuccess;
+  if (Status status = Tally_GetVmmLeaderID(row.client.worldGrp, row.vmmLeader)) return status;
+  return ReadClientRecord(kRead, row.vmmLeader, KSI_NODE_memory_lpage_vmLPage, row.lpage);
 }
 
 constexpr GroupVisitor TallyLPageStatsGroup = VisitVirtualMachine<LPageStatsRow, ReadLPageStats>;

@@ -88,17 +88,18 @@ constexpr Column<SwapStatsRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr Complaint kSwapRead = {Style::code, "TallySwapGetSwapStats() failure"};
+constexpr Complaint kTallyRead = {Style::code, "TallyVMGetVMMStats() failure"};
+
 // The swapping is read before the tally here, the other way round from vm-stats.
 Status ReadSwapStats(uint64_t /*gid*/, SwapStatsRow& row) {
-  Status status = kSuccess;
-  if ((status = Tally_GetVmmLeaderID(row.client.worldGrp, row.vmmLeader)) ||
-      (status = ReadClientRecord("TallySwapGetSwapStats", row.vmmLeader,
-                                 KSI_NODE_sched_memClients_swapInfo, row.swap)) ||
-      (status = ReadClientRecord("TallyVMGetVMMStats", row.client.worldGrp,
-                                 KSI_NODE_sched_memClients_tally_vmm, row.vmm))) {
+  if (Status status = Tally_GetVmmLeaderID(row.client.worldGrp, row.vmmLeader)) return status;
+  if (Status status = ReadClientRecord(kSwapRead, row.vmmLeader, KSI_NODE_sched_memClients_swapInfo,
+                                       row.swap)) {
     return status;
   }
-  return kSuccess;
+  return ReadClientRecord(kTallyRead, row.client.worldGrp, KSI_NODE_sched_memClients_tally_vmm,
+                          row.vmm);
 }
 
 constexpr GroupVisitor TallySwapStatsGroup = VisitVirtualMachine<SwapStatsRow, ReadSwapStats>;

@@ -100,18 +100,19 @@ constexpr Column<UWStatsRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr Complaint kTallyRead = {Style::code, "TallyUWGetUWStats() failure"};
+
 Status TallyUWStatsGroup(uint64_t gid, uint32_t /*childCount*/, int /*csvMode*/, void* opaque) {
   auto& context = *static_cast<ReportContext<UWStatsRow>*>(opaque);
   UWStatsRow row;
   uint32_t flags = 0;
-  Status status = kSuccess;
-  if ((status = Tally_GroupGetFlags(gid, flags))) return status;
+  if (Status status = Tally_GroupGetFlags(gid, flags)) return status;
   if ((flags & KSI_GROUP_USER_WORLD) == 0 || !context.filter().Passes(flags)) return kSuccess;
   row.type = flags & (KSI_GROUP_VM | KSI_GROUP_USER_WORLD);
   row.typeNames = FormatFlagMask(row.type, uwTypeNames);
-  if ((status = ReadClient(gid, row.client)) ||
-      (status = ReadClientRecord("TallyUWGetUWStats", row.client.worldGrp,
-                                 KSI_NODE_sched_memClients_tally_uw, row.uw))) {
+  if (Status status = ReadClient(gid, row.client)) return status;
+  if (Status status = ReadClientRecord(kTallyRead, row.client.worldGrp,
+                                       KSI_NODE_sched_memClients_tally_uw, row.uw)) {
     return status;
   }
   context.PrintRow(row);

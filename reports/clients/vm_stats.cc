@@ -116,18 +116,21 @@ constexpr Column<VMStatsRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr Complaint kTallyRead = {Style::code, "TallyVMGetVMMStats() failure"};
+constexpr Complaint kSwapRead = {Style::code, "TallyVMGetSwapStats() failure"};
+
 Status ReadVMStats(uint64_t gid, VMStatsRow& row) {
-  Status status = kSuccess;
-  if ((status = Tally_GroupGetVMMAlloc(gid, row.allocation)) ||
-      (status = ReadClientRecord("TallyVMGetVMMStats", row.client.worldGrp,
-                                 KSI_NODE_sched_memClients_tally_vmm, row.vmm)) ||
-      (status = Tally_GetVmmLeaderID(row.client.worldGrp, row.vmmLeader)) ||
-      (status = ReadClientRecord("TallyVMGetSwapStats", row.vmmLeader,
-                                 KSI_NODE_sched_memClients_swapInfo, row.swap)) ||
-      (status = TallyGroupGetMemoryStats(gid, row.memory))) {
+  if (Status status = Tally_GroupGetVMMAlloc(gid, row.allocation)) return status;
+  if (Status status = ReadClientRecord(kTallyRead, row.client.worldGrp,
+                                       KSI_NODE_sched_memClients_tally_vmm, row.vmm)) {
     return status;
   }
-  return kSuccess;
+  if (Status status = Tally_GetVmmLeaderID(row.client.worldGrp, row.vmmLeader)) return status;
+  if (Status status = ReadClientRecord(kSwapRead, row.vmmLeader, KSI_NODE_sched_memClients_swapInfo,
+                                       row.swap)) {
+    return status;
+  }
+  return TallyGroupGetMemoryStats(gid, row.memory);
 }
 
 constexpr GroupVisitor TallyVMStatsGroup = VisitVirtualMachine<VMStatsRow, ReadVMStats>;

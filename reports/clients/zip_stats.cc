@@ -54,9 +54,11 @@ constexpr Column<ZipStatsRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr Complaint kRead = {Style::code, "TallyZipGetZipStats() failure"};
+
 Status ReadZipStats(uint64_t /*gid*/, ZipStatsRow& row) {
-  return ReadClientRecord("TallyZipGetZipStats", row.client.worldGrp,
-                          KSI_NODE_sched_memClients_memzipInfo, row.zip);
+  return ReadClientRecord(kRead, row.client.worldGrp, KSI_NODE_sched_memClients_memzipInfo,
+                          row.zip);
 }
 
 constexpr GroupVisitor TallyZipStatsGroup = VisitVirtualMachine<ZipStatsRow, ReadZipStats>;

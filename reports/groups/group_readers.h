@@ -13,23 +13,36 @@
 namespace tally {
 
 // Reads a record of a group. The status of the read itself is the caller's to word.
-Status TallyGroupKsiGet(uint64_t groupId, uint16_t node, void* buffer, size_t size);
+[[nodiscard]] Status TallyGroupKsiGet(uint64_t groupId, uint16_t node, void* buffer, size_t size);
 
 // Reads a record of a memory client; ids are widened with their sign. The status of the read itself
 // is the caller's to word.
-Status Tally_MemClientKsiGet(int32_t clientId, uint16_t node, void* buffer, size_t size);
+[[nodiscard]] Status Tally_MemClientKsiGet(int32_t clientId, uint16_t node, void* buffer,
+                                           size_t size);
 
-Status Tally_GroupGetName(uint64_t groupId, KSI_GroupName& name);
-Status Tally_GroupGetTag(uint64_t groupId, KSI_GroupTag& tag);
-Status Tally_GroupGetParentID(uint64_t groupId, int64_t& parentId);
-Status Tally_GroupGetFlags(uint64_t groupId, uint32_t& flags);
-Status Tally_GroupGetAlloc(uint64_t groupId, KSI_GroupAllocation& allocation);
-Status TallyGroupGetCapacity(uint64_t groupId, KSI_GroupCapacity& capacity);
-Status TallyGroupGetMemoryStats(uint64_t groupId, KSI_GroupMemoryStats& stats);
+// Read a record of a group or of a memory client; `complaint` words the status of the read.
+template <class Record>
+[[nodiscard]] Status ReadGroupRecord(const Complaint& complaint, uint64_t groupId, uint16_t node,
+                                     Record& record) {
+  return complaint.Of(TallyGroupKsiGet(groupId, node, &record, sizeof record));
+}
+template <class Record>
+[[nodiscard]] Status ReadClientRecord(const Complaint& complaint, int32_t clientId, uint16_t node,
+                                      Record& record) {
+  return complaint.Of(Tally_MemClientKsiGet(clientId, node, &record, sizeof record));
+}
+
+[[nodiscard]] Status Tally_GroupGetName(uint64_t groupId, KSI_GroupName& name);
+[[nodiscard]] Status Tally_GroupGetTag(uint64_t groupId, KSI_GroupTag& tag);
+[[nodiscard]] Status Tally_GroupGetParentID(uint64_t groupId, int64_t& parentId);
+[[nodiscard]] Status Tally_GroupGetFlags(uint64_t groupId, uint32_t& flags);
+[[nodiscard]] Status Tally_GroupGetAlloc(uint64_t groupId, KSI_GroupAllocation& allocation);
+[[nodiscard]] Status TallyGroupGetCapacity(uint64_t groupId, KSI_GroupCapacity& capacity);
+[[nodiscard]] Status TallyGroupGetMemoryStats(uint64_t groupId, KSI_GroupMemoryStats& stats);
 
 // The world group that leads a virtual machine's or user world's group; kBadParameter, without a
 // message, for any other group.
-Status Tally_GroupGetGroupLeaderID(uint64_t groupId, int32_t& leader);
+[[nodiscard]] Status Tally_GroupGetGroupLeaderID(uint64_t groupId, int32_t& leader);
 
 // A virtual machine's allocation in kilobytes: reservation and limit are those of its VMM.
 struct VmmAlloc {
@@ -41,17 +54,20 @@ struct VmmAlloc {
 
 // Puts a virtual machine's allocation together from its group and the group's first child flagged
 // "vmm"; kNotFound, without a message, when there is no such child.
-Status Tally_GroupGetVMMAlloc(uint64_t groupId, VmmAlloc& record);
+[[nodiscard]] Status Tally_GroupGetVMMAlloc(uint64_t groupId, VmmAlloc& record);
 
-Status Tally_MemClientGetTotalCommonStats(int32_t clientId, KSI_CommonTally& stats);
+[[nodiscard]] Status Tally_MemClientGetTotalCommonStats(int32_t clientId, KSI_CommonTally& stats);
 
 // The leader of the VMM of a virtual machine's world group.
-Status Tally_GetVmmLeaderID(int32_t clientId, int32_t& vmmLeader);
+[[nodiscard]] Status Tally_GetVmmLeaderID(int32_t clientId, int32_t& vmmLeader);
 
-// Lists a group's child groups. Messages begin with the `caller`; one of a list that cannot be read
-// names the `listCall`.
-Status ListChildGroups(const char* caller, const char* listCall, uint64_t groupId,
-                       ParamList& children);
+// A list for a group's id that cannot be made; all readers share the message.
+constexpr Complaint kGroupListNotMade = {Style::plain,
+                                         "TallyGroupKsiGet: KSI_ParamListCreate() failure"};
+
+// Lists a group's child groups.
+[[nodiscard]] Status ListChildGroups(const ReaderTexts& texts, uint64_t groupId,
+                                     ParamList& children);
 
 }  // namespace tally
 

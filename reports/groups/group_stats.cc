@@ -232,20 +232,20 @@ void GroupContext::PrintTags() {
 Status TallyGroupStatsGroup(uint64_t gid, uint32_t childCount, int /*csvMode*/, void* opaque) {
   GroupContext& context = *static_cast<GroupContext*>(opaque);
   GroupRow row;
-  Status status = kSuccess;
-  if ((status = Tally_GroupGetFlags(gid, row.flags))) return status;
+  if (Status status = Tally_GroupGetFlags(gid, row.flags)) return status;
   if (!context.filter().Passes(row.flags)) return kSuccess;
   row.gid = gid;
   row.nChild = static_cast<int32_t>(childCount);
-  if ((status = Tally_GroupGetName(gid, row.name)) || (status = Tally_GroupGetTag(gid, row.tag)) ||
-      (status = Tally_GroupGetParentID(gid, row.parGid)) ||
-      (status = Tally_GroupGetAlloc(gid, row.allocation)) ||
-      (status = TallyGroupGetCapacity(gid, row.capacity)) ||
-      (status = TallyGroupGetMemoryStats(gid, row.stats))) {
-    return status;
-  }
+  if (Status status = Tally_GroupGetName(gid, row.name)) return status;
+  if (Status status = Tally_GroupGetTag(gid, row.tag)) return status;
+  if (Status status = Tally_GroupGetParentID(gid, row.parGid)) return status;
+  if (Status status = Tally_GroupGetAlloc(gid, row.allocation)) return status;
+  if (Status status = TallyGroupGetCapacity(gid, row.capacity)) return status;
+  if (Status status = TallyGroupGetMemoryStats(gid, row.stats)) return status;
   row.flagNames = FormatFlagMask(row.flags, groupFlagNames);
-  if (context.options().tags && (status = context.AddToTag(row))) return status;
+  if (context.options().tags) {
+    if (Status status = context.AddToTag(row)) return status;
+  }
   context.PrintRow(row);
   return kSuccess;
 }

@@ -4,14 +4,20 @@
 #include "reports/groups/group_readers.h"
 
 namespace tally {
+namespace {
+
+constexpr ReaderTexts kChildTexts = {
+    .create = kGroupListNotMade,
+    .firstKey = {Style::message, "TallyTraverseGroups: KSI_ParamListAddInt() failure"},
+    .read = {Style::message, "TallyTraverseGroups: KSI_GetInstanceListAlloc failure"},
+};
+
+}  // namespace
 
 Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
                            GroupVisitor visitor, void* context) {
   ParamList children;
-  if (Status status = ListChildGroups("TallyTraverseGroups", "KSI_GetInstanceListAlloc",
-                                      startGroupId, children)) {
-    return status;
-  }
+  if (Status status = ListChildGroups(kChildTexts, startGroupId, children)) return status;
   const uint32_t childCount = KSI_ParamListUsedCount(children.get());
   const Status visited = visitor(startGroupId, childCount, mode, context);
   if (visited != kSuccess || levels == 1) return visited;
@@ -21,7 +27,9 @@ Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
     int64_t child = 0;
     listed = KSI_ParamListGetInt64(children.get(), i, &child);
     if (listed != kSuccess) continue;
-    TallyTraverseGroups(static_cast<uint64_t>(child), levels - 1, mode, visitor, context);
+    // What failed below has been said and ends nothing else.
+    static_cast<void>(
+        TallyTraverseGroups(static_cast<uint64_t>(child), levels - 1, mode, visitor, context));
   }
   return listed;
 }

@@ -16,8 +16,8 @@ using GroupVisitor = Status (*)(uint64_t groupId, uint32_t childCount, int mode,
 // kernel's order, `levels` levels deep with the start group as the first. A failure below the start
 // group is reported and passes over that subtree only; the walk returns that of the start group.
 // REQUIRES: levels > 0.
-Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
-                           GroupVisitor visitor, void* context);
+[[nodiscard]] Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
+                                         GroupVisitor visitor, void* context);
 
 }  // namespace tally
 

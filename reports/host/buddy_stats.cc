@@ -10,6 +10,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <span>
+#include <string>
 #include <utility>
 
 #include <knvlibs/ksi_nodes.h>
@@ -106,34 +107,32 @@ static_assert(IsSound(kColumns));
 
 // The NUMA node of a memory node.
 Status TallyMemNode2NUMANode(uint32_t memNode, uint32_t& numaNode) {
+  const std::string number = std::to_string(memNode);
+  const std::string keyOf = "memNode " + number;
+  const std::string path = "/memory/memNodes/" + number;
+  const ReaderTexts texts = {
+      .create = {Style::plain, "TallyMemNode2NUMANode: KSI_ParamListCreate() failure"},
+      .firstKey = {Style::listNotMade, keyOf.c_str()},
+      .read = {Style::errorReading, path.c_str()},
+  };
   KSI_MemNode record = {};
-  const Status status = KeyedGet(
-      KSI_NODE_memory_memNodes, {.capacity = 1, .first = memNode}, record,
-      [memNode](ReadStep step, Status failed) {
-        if (step == ReadStep::create) {
-          Warning("TallyMemNode2NUMANode: KSI_ParamListCreate() failure\n");
-        } else if (step == ReadStep::read) {
-          Warning("Error %#x while reading /memory/memNodes/%u", failed, memNode);
-        } else {
-          Warning("The param list for memNode %u could not be created: %#x", memNode, failed);
-        }
-      });
+  const Status status =
+      ReadRecord(KSI_NODE_memory_memNodes, {.capacity = 1, .first = memNode}, texts, record);
   numaNode = record.numaNode;
   return status;
 }
 
 Status TallyBuddyGetStats(BuddyRow& row) {
-  return KeyedGet(KSI_NODE_system_buddy_comprehensive, {.capacity = 1, .first = row.name},
-                  row.stats, [&row](ReadStep step, Status failed) {
-                    if (step == ReadStep::create) {
-                      Warning("TallyBuddyGetStats: KSI_ParamListCreate() failure\n");
-                    } else if (step == ReadStep::read) {
-                      Warning("Error %#x while reading %s/comprehensive", failed, row.name);
-                    } else {
-                      Warning("The param list for buddy %s could not be created: %#x", row.name,
-                              failed);
-                    }
-                  });
+  const std::string name = row.name;
+  const std::string keyOf = "buddy " + name;
+  const std::string path = name + "/comprehensive";
+  const ReaderTexts texts = {
+      .create = {Style::plain, "TallyBuddyGetStats: KSI_ParamListCreate() failure"},
+      .firstKey = {Style::listNotMade, keyOf.c_str()},
+      .read = {Style::errorReading, path.c_str()},
+  };
+  return ReadRecord(KSI_NODE_system_buddy_comprehensive, {.capacity = 1, .first = name.c_str()},
+                    texts, row.stats);
 }
 
 // Fills a row from an allocator's name, which is cut to the row's field.

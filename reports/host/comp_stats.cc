@@ -7,8 +7,8 @@
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "framework/param_list.h"
 #include "framework/report.h"
-#include "reports/host/host_record.h"
 #include "reports/reports.h"
 
 namespace tally {
@@ -85,21 +85,26 @@ constexpr Column<CompRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr ReaderTexts kMemMapTexts = {
+    .create = {Style::plain, "TallyCompGetMemMapStats: KSI_ParamListCreate() failure"},
+};
+constexpr ReaderTexts kGlobalTexts = {
+    .create = {Style::plain, "TallyCompGetGlobalTally: KSI_ParamListCreate() failure"},
+};
+
 Status TallyCompGetMemMapStats(CompRow& row) {
-  return ReadHostRecord("TallyCompGetMemMapStats", KSI_NODE_memory_comprehensive, {.capacity = 1},
-                        row.memory);
+  return ReadRecord(KSI_NODE_memory_comprehensive, {.capacity = 1}, kMemMapTexts, row.memory);
 }
 
 Status TallyCompGetGlobalTally(CompRow& row) {
-  constexpr const char* kStep = "TallyCompGetGlobalTally";
-  if (Status status = ReadHostRecord(kStep, KSI_NODE_sched_globalStats_memory_tally,
-                                     {.capacity = 1}, row.tally)) {
+  if (Status status = ReadRecord(KSI_NODE_sched_globalStats_memory_tally, {.capacity = 1},
+                                 kGlobalTexts, row.tally)) {
     return status;
   }
   for (uint32_t state = kHigh; state < kUnknown; ++state) {
-    if (Status status = ReadHostRecord(kStep, KSI_NODE_sched_globalStats_memory_stateTransitions,
-                                       {.capacity = 2, .first = memStateNames[state]},
-                                       row.transitions[state])) {
+    if (Status status = ReadRecord(KSI_NODE_sched_globalStats_memory_stateTransitions,
+                                   {.capacity = 2, .first = memStateNames[state]}, kGlobalTexts,
+                                   row.transitions[state])) {
       return status;
     }
   }

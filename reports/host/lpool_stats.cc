@@ -76,55 +76,37 @@ static_assert(IsSound(kColumns));
 
 using LPoolContext = ReportContext<LPoolRow>;
 
-// Reads a pool; failures are worded with the reader's name, but a failed read always with the
-// virtual machines' one.
-Status ReadPool(const char* reader, uint16_t node, const KeyList& keys, KSI_LargePagePool& pool) {
-  return KeyedGet(node, keys, pool, [reader](ReadStep step, Status status) {
-    switch (step) {
-      case ReadStep::create:
-        Warning("%s: KSI_ParamListCreate() failure\n", reader);
-        break;
-      case ReadStep::addFirstKey:
-        Warning("%s: KSI_ParamListAddInt() failure, error code: %u\n", reader, status);
-        break;
-      case ReadStep::addSecondKey:
-        Warning("%s: KSI_ParamListAddString() failure, error code: %u\n", reader, status);
-        break;
-      case ReadStep::read:
-        Warning("TallyGetVmPoolStats() failure, error code: %u\n", status);
-        break;
-    }
-  });
-}
+constexpr ReaderTexts kPSharePoolTexts = {
+    .create = {Style::plain, "TallyGetPSharePoolStats: KSI_ParamListCreate() failure"},
+    .firstKey = {Style::code, "TallyGetPSharePoolStats: KSI_ParamListAddInt() failure"},
+    .read = {Style::code, "TallyGetVmPoolStats() failure"},
+};
+constexpr ReaderTexts kVmPoolTexts = {
+    .create = {Style::plain, "TallyGetVmPoolStats: KSI_ParamListCreate() failure"},
+    .firstKey = {Style::code, "TallyGetVmPoolStats: KSI_ParamListAddInt() failure"},
+    .secondKey = {Style::code, "TallyGetVmPoolStats: KSI_ParamListAddString() failure"},
+    .read = {Style::code, "TallyGetVmPoolStats() failure"},
+};
+constexpr ReaderTexts kVmPoolListTexts = {
+    .create = {Style::plain, "TallyTraverseLPools: KSI_ParamListCreate() failure"},
+    .firstKey = {Style::code, "TallyTraverseLPools: KSI_ParamListAddInt() failure"},
+    .read = {Style::plain, "TallyTraverseLPools: KSI_GetInstanceListAllocHint() failure"},
+};
 
 Status TallyGetPSharePoolStats(uint32_t node, KSI_LargePagePool& pool) {
-  return ReadPool("TallyGetPSharePoolStats", KSI_NODE_memory_lpage_nodeList_psharePool,
-                  {.capacity = 1, .first = node}, pool);
+  return ReadRecord(KSI_NODE_memory_lpage_nodeList_psharePool, {.capacity = 1, .first = node},
+                    kPSharePoolTexts, pool);
 }
 
 Status TallyGetVmPoolStats(uint32_t node, const char* vmName, KSI_LargePagePool& pool) {
-  return ReadPool("TallyGetVmPoolStats", KSI_NODE_memory_lpage_nodeList_vmPools,
-                  {.capacity = 2, .first = node, .second = vmName}, pool);
+  return ReadRecord(KSI_NODE_memory_lpage_nodeList_vmPools,
+                    {.capacity = 2, .first = node, .second = vmName}, kVmPoolTexts, pool);
 }
 
 Status ListVmPools(uint32_t node, uint32_t hint, ParamList& names) {
-  const auto list = [&](KSI_ParamList* keys) {
-    KSI_ParamList* made = nullptr;
-    const Status status =
-        KSI_GetInstanceListAllocHint(KSI_NODE_memory_lpage_nodeList_vmPools, keys, hint, &made);
-    if (status == kSuccess) names.reset(made);
-    return status;
-  };
-  const auto words = [](ReadStep step, Status status) {
-    if (step == ReadStep::create) {
-      Warning("TallyTraverseLPools: KSI_ParamListCreate() failure\n");
-    } else if (step == ReadStep::read) {
-      Warning("TallyTraverseLPools: KSI_GetInstanceListAllocHint() failure\n");
-    } else {
-      Warning("TallyTraverseLPools: KSI_ParamListAddInt() failure, error code: %u\n", status);
-    }
-  };
-  const Status status = KeyedRead({.capacity = 2, .first = node}, list, words);
+  const Status status =
+      ListInstances(KSI_NODE_memory_lpage_nodeList_vmPools, {.capacity = 2, .first = node},
+                    kVmPoolListTexts, names, hint);
   return status == kSuccess ? kSuccess : kFailure;
 }
 

@@ -79,8 +79,8 @@ constexpr Column<RegionRow> kRegionColumns[] = {
     Text("regionUuid", "Region UUID", [](const RegionRow& row) { return row.regionUuid; }).Wide(40),
     Bytes("size", "Region memory size", [](const RegionRow& row) { return row.region.size; })
         .Wide(14),
-    Code("reserved", "Reserved 2M blocks",
-         [](const RegionRow& row) { return row.region.reserved; }),
+    Count("reserved", "Reserved 2M blocks",
+          [](const RegionRow& row) { return row.region.reserved; }),
     Text("flags", "Flags", [](const RegionRow& row) { return row.flagNames.text(); }).Wide(40),
 };
 static_assert(IsSound(kRegionColumns));
@@ -104,44 +104,47 @@ KeyList RegionKeys(const char* volume, const char* region) {
   return {.capacity = 3, .first = volume, .second = region, .removeKeys = true};
 }
 
-// The words of a reader: for what failed before the library was asked to read and, with
-// `readFailure`, for the read itself.
-auto WordsOf(const char* reader, const char* readFailure = nullptr) {
-  return [reader, readFailure](ReadStep step, Status) {
-    if (step == ReadStep::create) {
-      Warning("%s: KSI_ParamListCreate failure\n", reader);
-    } else if (step != ReadStep::read) {
-      Warning("%s: KSI_ParamListAddString failure\n", reader);
-    } else if (readFailure != nullptr) {
-      Warning("%s: %s\n", reader, readFailure);
-    }
-  };
-}
+constexpr ReaderTexts kVolumeTexts = {
+    .create = {Style::plain, "PMemGetVolumeInfo: KSI_ParamListCreate failure"},
+    .firstKey = {Style::plain, "PMemGetVolumeInfo: KSI_ParamListAddString failure"},
+};
+constexpr ReaderTexts kRegionStoreTexts = {
+    .create = {Style::plain, "PMemGetRegionStoreInfo: KSI_ParamListCreate failure"},
+    .firstKey = {Style::plain, "PMemGetRegionStoreInfo: KSI_ParamListAddString failure"},
+};
+constexpr Complaint kRegionStoreRead = {Style::plain, "PMemGetRegionStoreInfo: KSI_Get failure"};
+constexpr ReaderTexts kRegionListTexts = {
+    .create = {Style::plain, "PMemRegionsReport: KSI_ParamListCreate failure"},
+    .firstKey = {Style::plain, "PMemRegionsReport: KSI_ParamListAddString failure"},
+};
+constexpr Complaint kRegionKey = {Style::plain, "GetRegionsInfo: KSI_ParamListAddString failure"};
+constexpr ReaderTexts kRegionTexts = {
+    .create = {Style::plain, "GetRegionsInfo: KSI_ParamListCreate failure"},
+    .firstKey = kRegionKey,
+    .secondKey = kRegionKey,
+    .read = {Style::plain, "GetRegionsInfo: KSI_Get failure"},
+};
 
 // A volume's own record only tells that the volume is there.
 Status PMemGetVolumeInfo(const char* volume) {
   KSI_PmemVolume record;
-  return KeyedGet(KSI_NODE_memory_pmem_volumes_info, VolumeKey(volume), record,
-                  WordsOf("PMemGetVolumeInfo"));
+  return ReadRecord(KSI_NODE_memory_pmem_volumes_info, VolumeKey(volume), kVolumeTexts, record);
 }
 
 Status PMemGetRegionStoreInfo(const char* volume, VolumeRow& row) {
-  constexpr const char* kReader = "PMemGetRegionStoreInfo";
-  const auto read = [&row](KSI_ParamList* list) {
-    if (Status status = KSI_Get(KSI_NODE_memory_pmem_volumes_regionStore_info, list, &row.store,
-                                sizeof row.store)) {
-      Warning("%s: KSI_Get failure\n", kReader);
+  return KeyedRead(VolumeKey(volume), kRegionStoreTexts, [&row](KSI_ParamList* list) {
+    if (Status status = kRegionStoreRead.Of(KSI_Get(KSI_NODE_memory_pmem_volumes_regionStore_info,
+                                                    list, &row.store, sizeof row.store))) {
       return status;
     }
     return KSI_Get(KSI_NODE_memory_pmem_volumes_regionStore_isClean, list, &row.isClean,
                    sizeof row.isClean);
-  };
-  return KeyedRead(VolumeKey(volume), read, WordsOf(kReader));
+  });
 }
 
 Status GetRegionsInfo(const char* volume, const char* region, KSI_PmemRegion& record) {
-  return KeyedGet(KSI_NODE_memory_pmem_volumes_regionStore_regions_info, RegionKeys(volume, region),
-                  record, WordsOf("GetRegionsInfo", "KSI_Get failure"));
+  return ReadRecord(KSI_NODE_memory_pmem_volumes_regionStore_regions_info,
+                    RegionKeys(volume, region), kRegionTexts, record);
 }
 
 // Calls `print` with each name of a list until it fails; `failure` words a name that cannot be
@@ -201,8 +204,8 @@ void PMemRegionsReport(ReportContext<RegionRow>& context) {
   constexpr char kNameFailure[] = "PMemRegionsReport: KSI_ParamListGetString failure\n";
   ForEachVolume(kNameFailure, [&](const char* volume) {
     ParamList regions;
-    if (KeyedList(KSI_NODE_memory_pmem_volumes_regionStore_regions, VolumeKey(volume), regions,
-                  WordsOf("PMemRegionsReport")) != kSuccess) {
+    if (ListInstances(KSI_NODE_memory_pmem_volumes_regionStore_regions, VolumeKey(volume),
+                      kRegionListTexts, regions) != kSuccess) {
       return false;
     }
     return ForEachName(regions, kNameFailure,

@@ -5,8 +5,8 @@
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "framework/param_list.h"
 #include "framework/report.h"
-#include "reports/host/host_record.h"
 #include "reports/reports.h"
 
 namespace tally {
@@ -38,12 +38,15 @@ constexpr Column<HintRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr ReaderTexts kTexts = {
+    .create = {Style::plain, "TallyPShareHintGetStats: KSI_ParamListCreate() failure"},
+};
+
 Status Run(const ReportOptions& options, Sink& sink) {
   ReportContext<HintRow> context(kFrame, kColumns, sink);
   if (Status status = context.Settle(options)) return status;
   KSI_PshareStats stats;
-  if (Status status = ReadHostRecord("TallyPShareHintGetStats", KSI_NODE_memory_pshare_stats,
-                                     {.capacity = 1}, stats)) {
+  if (Status status = ReadRecord(KSI_NODE_memory_pshare_stats, {.capacity = 1}, kTexts, stats)) {
     return status;
   }
   context.SelectColumns();

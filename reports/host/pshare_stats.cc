@@ -4,8 +4,8 @@
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "framework/param_list.h"
 #include "framework/report.h"
-#include "reports/host/host_record.h"
 #include "reports/reports.h"
 
 namespace tally {
@@ -35,12 +35,15 @@ constexpr Column<KSI_PshareStats> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+constexpr ReaderTexts kTexts = {
+    .create = {Style::plain, "TallyPShareGetStats: KSI_ParamListCreate() failure"},
+};
+
 Status Run(const ReportOptions& options, Sink& sink) {
   ReportContext<KSI_PshareStats> context(kFrame, kColumns, sink);
   if (Status status = context.Settle(options)) return status;
   KSI_PshareStats row;
-  if (Status status = ReadHostRecord("TallyPShareGetStats", KSI_NODE_memory_pshare_stats,
-                                     {.capacity = 1}, row)) {
+  if (Status status = ReadRecord(KSI_NODE_memory_pshare_stats, {.capacity = 1}, kTexts, row)) {
     return status;
   }
   context.Begin({{"Peak chain length", row.peakChainLength},
