@@ -1,17 +1,62 @@
 #include "knvlibs/linux/linux_source.h"
 
-#include "knvlibs/linux/handlers.h"
+#include <array>
+
+#include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
+namespace {
+
+#define KSI_COUNT(...) +1
+constexpr size_t kNodes = 1 KSI_NODES(KSI_COUNT);  // node::kInvalid is the first
+#undef KSI_COUNT
+
+// The readers of each node; null where Linux has no answer.
+std::array<Reader, kNodes> Joined() {
+  std::array<Reader, kNodes> readers;
+  for (const ReaderTable& table : ReaderTables()) {
+    for (const Reader& reader : table) {
+      Reader& joined = readers[reader.node];
+      if (reader.value != nullptr) joined.value = reader.value;
+      if (reader.list != nullptr) joined.list = reader.list;
+    }
+  }
+  return readers;
+}
+
+const Reader& ReaderOf(const Node& node) {
+  static const std::array<Reader, kNodes> readers = Joined();
+  return readers[IdOf(node)];
+}
+
+}  // namespace
+
+std::span<const ReaderTable> ReaderTables() {
+  static const ReaderTable tables[] = {kBuddyReaders,         kGroupReaders,  kHeapReaders,
+                                       kHugePageReaders,      kKsmReaders,    kMemoryNodeReaders,
+                                       kMemoryReaders,        kNvdimmReaders, kUserWorldReaders,
+                                       kVirtualMachineReaders};
+  return tables;
+}
+
+void LinuxSource::BeginQuestion(ReadingSpan::Question question, const Keys& keys) {
+  if (span_.Begins(question, keys, host_.Now())) host_.BeginReading();
+}
 
 Status LinuxSource::Value(const Node& node, const Keys& keys, Buffer record) {
-  const ValueHandler handler = HandlersOf(IdOf(node)).value;
-  return handler == nullptr ? KSI_STATUS_NO_HANDLER : handler(host_, keys, record);
+  BeginQuestion({IdOf(node), false}, keys);
+  const ValueReader read = ReaderOf(node).value;
+  const Status status = read == nullptr ? KSI_STATUS_NO_HANDLER : read(host_, keys, record);
+  span_.Answered(host_.Now());
+  return status;
 }
 
 Status LinuxSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
-  const ListHandler handler = HandlersOf(IdOf(node)).list;
-  return handler == nullptr ? KSI_STATUS_NO_HANDLER : handler(host_, keys, instances);
+  BeginQuestion({IdOf(node), true}, keys);
+  const ListReader read = ReaderOf(node).list;
+  const Status status = read == nullptr ? KSI_STATUS_NO_HANDLER : read(host_, keys, instances);
+  span_.Answered(host_.Now());
+  return status;
 }
 
 }  // namespace ksi

@@ -5,16 +5,19 @@
 #include <string>
 
 #include "knvlibs/linux/host/host.h"
+#include "knvlibs/linux/reading_span.h"
 #include "knvlibs/source.h"
 
 namespace ksi {
 
 class LinuxSource : public Source {
  public:
-  explicit LinuxSource(std::string root) : host_(std::move(root)) {}
+  explicit LinuxSource(std::string root, LinuxHost::Clock clock = std::chrono::steady_clock::now)
+      : host_(std::move(root), clock) {}
 
-  Status Value(const Node& node, const Keys& keys, Buffer record) override;
-  Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
+  [[nodiscard]] Status Value(const Node& node, const Keys& keys, Buffer record) override;
+  [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
+  void Refresh() override { span_.End(); }
 
   // The library is built for the host it runs on: its own definitions are the kernel's.
   Definitions KernelDefinitions() const override { return kDefinitions; }
@@ -22,7 +25,10 @@ class LinuxSource : public Source {
   const LinuxHost& Host() const { return host_; }
 
  private:
+  void BeginQuestion(ReadingSpan::Question question, const Keys& keys);
+
   LinuxHost host_;
+  ReadingSpan span_;
 };
 
 }  // namespace ksi

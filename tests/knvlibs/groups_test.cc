@@ -296,10 +296,11 @@ TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
                              KSI_STATUS_NOT_FOUND;
     _exit(isRight ? 0 : 1);
   };
-  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0),
-              "^/proc/PID/status: not permitted for some processes: they are left out\n"
-              "/proc/100/smaps_rollup: not permitted, as for other processes: figures that take a "
-              "walk of their memory have no value\n$");
+  EXPECT_EXIT(
+      asNobody(), testing::ExitedWithCode(0),
+      "^/proc/PID/status: not permitted for some processes: they are left out\n"
+      "/proc/100/smaps_rollup: not permitted: figures that take a walk of a process's memory "
+      "have no value where it is not\n$");
 }
 
 TEST_F(GroupsTest, ALockedCgroupIsDeniedAndNoZero) {

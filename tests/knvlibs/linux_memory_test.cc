@@ -256,8 +256,8 @@ TEST_F(LinuxMemory, FilesThatAreMissingOrLockedAreAStatus) {
   }
   const LinuxHost nowhere(tree_.Root() + "/none");
   std::string content;
-  EXPECT_EQ(nowhere.Read("/proc/meminfo", &content), KSI_STATUS_NOT_FOUND);
-  EXPECT_EQ(LinuxHost(tree_.Root()).Read("/proc", &content), KSI_STATUS_IS_A_DIRECTORY);
+  EXPECT_EQ(nowhere.Read("/proc/meminfo", content), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(LinuxHost(tree_.Root()).Read("/proc", content), KSI_STATUS_IS_A_DIRECTORY);
 }
 
 }  // namespace

@@ -122,7 +122,7 @@ TEST(LiveGroupsTest, GroupsAreTheCgroupsAndProcessesThatOthersCount) {
 TEST(LiveGroupsTest, ACgroupHasTheFiguresOfItsFiles) {
   LinuxHost host("/");
   const GroupTree* tree = nullptr;
-  ASSERT_EQ(GroupTree::Get(host, &tree), kOk);
+  ASSERT_EQ(GroupTree::Get(host, tree), kOk);
   if (!tree->Cgroups().Exists()) GTEST_SKIP() << "this machine has no cgroups";
   LinuxSource source("/");
   for (const int64_t id : GetIds(source, "sched/groups/members/groups", {int64_t{0}})) {

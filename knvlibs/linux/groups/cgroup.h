@@ -8,7 +8,7 @@
 #include <string_view>
 #include <vector>
 
-#include "knvlibs/linux/host/figures.h"
+#include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/host/host.h"
 #include "knvlibs/status.h"
 
@@ -18,32 +18,29 @@ namespace ksi {
 // its directory.
 constexpr std::string_view kRecordedCgroupId = "cgroup.id";
 
-// A limit that is not set.
-constexpr uint64_t kNoLimit = kNoValue;
-
-// The statistics of one cgroup and all below it, in KB; all ones where the kernel does not tell,
-// as it does for no cgroup that has no memory controller.
-struct CgroupMemory {
-  uint64_t current = kNoValue;
-  uint64_t peak = kNoValue;
-  uint64_t swapped = kNoValue;
-  uint64_t peakWithSwap = kNoValue;  // of current and swapped together
-  uint64_t kernel = kNoValue;        // spent by the kernel for the cgroup
-  uint64_t active = kNoValue;        // on the lists of pages in use
+// What the memory controller charges to one cgroup and all below it, in KB. Nothing is told of a
+// cgroup that has no memory controller.
+struct MemcgUsage {
+  Figure current;
+  Figure peak;
+  Figure swap;
+  Figure peakWithSwap;  // of current and swap together
+  Figure kernel;        // spent by the kernel for the cgroup
+  Figure active;        // on the lists of pages in use
 };
 
-// What swapping, compression and huge pages have done for one cgroup, which only version 2 tells:
-// otherwise all ones. KB, or times.
-struct CgroupEvents {
-  uint64_t swapCached = kNoValue;
-  uint64_t swappedIn = kNoValue;
-  uint64_t swappedOut = kNoValue;
-  uint64_t zswapPool = kNoValue;
-  uint64_t zswapped = kNoValue;
-  uint64_t zswapIn = kNoValue;
-  uint64_t zswapOut = kNoValue;
-  uint64_t zswapLimit = kNoLimit;
-  uint64_t hugePagesMade = kNoValue;  // times
+// What swapping, compression and huge pages have done for one cgroup, which only version 2 tells.
+// KB, or times.
+struct MemcgEvents {
+  Figure swapcached;
+  Figure swpin;
+  Figure swpout;
+  Figure zswapPool;
+  Figure zswapped;
+  Figure zswpin;
+  Figure zswpout;
+  Figure zswapMax;  // none is no limit
+  Figure thpAlloc;  // times
 };
 
 class CgroupHierarchy {
@@ -67,32 +64,39 @@ class CgroupHierarchy {
     std::string name;
     uint64_t inode = 0;
   };
-  Status List(const LinuxHost& host, std::string_view path, int64_t* id,
-              std::vector<Child>* children) const;
+  [[nodiscard]] Status List(const LinuxHost& host, std::string_view path, int64_t& id,
+                            std::vector<Child>& children) const;
 
   // The processes that are in the cgroup itself.
-  Status ReadProcesses(const LinuxHost& host, std::string_view path,
-                       std::vector<int32_t>* pids) const;
+  [[nodiscard]] Status ReadProcesses(const LinuxHost& host, std::string_view path,
+                                     std::vector<int32_t>& pids) const;
 
-  // What is reserved, and the limit, in KB. A cgroup that has no memory controller has neither.
-  // These fail with KSI_STATUS_NOT_FOUND if the cgroup is gone.
-  Status ReadReservation(const LinuxHost& host, std::string_view path, uint64_t* reserved) const;
-  Status ReadLimit(const LinuxHost& host, std::string_view path, uint64_t* limit) const;
-  Status ReadMemory(const LinuxHost& host, std::string_view path, CgroupMemory* memory) const;
-  Status ReadEvents(const LinuxHost& host, std::string_view path, CgroupEvents* events) const;
+  // What is reserved, and the limit, in KB; none is "max". A cgroup that has no memory controller
+  // has no reservation, 0, and no limit. These fail with KSI_STATUS_NOT_FOUND if the cgroup is
+  // gone.
+  [[nodiscard]] Status ReadReservation(const LinuxHost& host, std::string_view path,
+                                       Figure& reserved) const;
+  [[nodiscard]] Status ReadLimit(const LinuxHost& host, std::string_view path, Figure& limit) const;
+  [[nodiscard]] Status ReadUsage(const LinuxHost& host, std::string_view path,
+                                 MemcgUsage& usage) const;
+  [[nodiscard]] Status ReadEvents(const LinuxHost& host, std::string_view path,
+                                  MemcgEvents& events) const;
 
  private:
   enum class Version : uint8_t { kNone, k1, k2 };
 
   std::string FileOf(std::string_view path, std::string_view name) const;
 
-  // A file that is bytes, or "max"; in KB, `missing` if there is none.
-  Status ReadAmount(const LinuxHost& host, std::string_view path, std::string_view name,
-                    uint64_t missing, uint64_t* amount) const;
-  Status ReadStatistics(const LinuxHost& host, std::string_view path, Figures* figures) const;
-  Status CheckExists(const LinuxHost& host, std::string_view path) const;
-  Status ReadMemory1(const LinuxHost& host, std::string_view path, CgroupMemory* memory) const;
-  Status ReadMemory2(const LinuxHost& host, std::string_view path, CgroupMemory* memory) const;
+  // A file that is bytes, or "max", which is none; in KB, `missing` if there is no file.
+  [[nodiscard]] Status ReadAmount(const LinuxHost& host, std::string_view path,
+                                  std::string_view name, Figure missing, Figure& amount) const;
+  [[nodiscard]] Status ReadStat(const LinuxHost& host, std::string_view path,
+                                FigureFile& stat) const;
+  [[nodiscard]] Status CheckExists(const LinuxHost& host, std::string_view path) const;
+  [[nodiscard]] Status ReadUsage1(const LinuxHost& host, std::string_view path,
+                                  MemcgUsage& usage) const;
+  [[nodiscard]] Status ReadUsage2(const LinuxHost& host, std::string_view path,
+                                  MemcgUsage& usage) const;
 
   Version version_ = Version::kNone;
   std::string mount_;

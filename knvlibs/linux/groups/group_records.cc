@@ -1,38 +1,29 @@
 // What a group is and what it uses: the nodes below sched/groups. docs/linux-host.md says where
 // each figure comes from and why.
-#include <algorithm>
-#include <cstring>
-
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/cgroup.h"
 #include "knvlibs/linux/groups/groups.h"
-#include "knvlibs/linux/handlers.h"
-#include "knvlibs/linux/host/figures.h"
-#include "knvlibs/linux/host/recent.h"
+#include "knvlibs/linux/host/figure_file.h"
+#include "knvlibs/linux/reader_tables.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
 
 constexpr int64_t kUnlimited = -1;
 
-// Lets `read` answer for the group that the keys name.
-template <class Reader>
-Status OfGroup(const LinuxHost& host, const Keys& keys, Reader&& read) {
-  const GroupTree* tree = nullptr;
-  const Status status = GroupTree::Get(host, &tree);
+Status FindGroup(const LinuxHost& host, const Keys& keys, const GroupTree*& tree,
+                 const Group*& group) {
+  const Status status = GroupTree::Get(host, tree);
   if (status != kOk) return status;
-  const Group* group = tree->Find(keys[0].number);
-  return group == nullptr ? KSI_STATUS_NOT_FOUND : read(*tree, *group);
+  group = tree->Find(keys[0].number);
+  return group == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
 // A text that is cut where the field ends.
 template <size_t size>
 void CopyText(std::string_view text, char (&field)[size]) {
   text.copy(field, size);
-}
-
-int64_t SignedLimit(uint64_t limit) {
-  return limit == kNoLimit ? kUnlimited : static_cast<int64_t>(limit);
 }
 
 // The cgroup whose settings hold for a group, null if none do: its own, and for a virtual machine
@@ -45,10 +36,11 @@ const Group* SettingsOf(const GroupTree& tree, const Group& group) {
   return group.kind == Group::Kind::kCgroup && group.id != kRootGroup ? &group : nullptr;
 }
 
+// What is reserved, and the limit: none for no limit.
 Status ReadSettings(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                    uint64_t* reserved, uint64_t* limit) {
-  *reserved = 0;
-  *limit = kNoLimit;
+                    Figure& reserved, Figure& limit) {
+  reserved = 0;
+  limit.reset();
   const Group* settings = SettingsOf(tree, group);
   if (settings == nullptr) return kOk;
   const Status status = tree.ReadReservation(host, *settings, reserved);
@@ -57,14 +49,13 @@ Status ReadSettings(const LinuxHost& host, const GroupTree& tree, const Group& g
 
 // What is reserved for the cgroups below a group, in KB.
 Status ReadReservedBelow(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                         uint64_t* reserved) {
-  *reserved = 0;
+                         Figure& reserved) {
+  reserved = 0;
   for (const size_t index : group.children) {
-    const Group& child = tree.At(index);
-    uint64_t part = 0;
-    const Status status = tree.ReadReservation(host, child, &part);
+    Figure part;
+    const Status status = tree.ReadReservation(host, tree.At(index), part);
     if (status != kOk) return status;
-    *reserved = SumOf(*reserved, part);
+    reserved = SumOf({reserved, part});
   }
   return kOk;
 }
@@ -72,239 +63,237 @@ Status ReadReservedBelow(const LinuxHost& host, const GroupTree& tree, const Gro
 // What of a group's reservation holds against those around it. Without any on the way up there is
 // nothing to work out; else only the kernel knows.
 Status ReadEffectiveReservation(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                                uint64_t* effective) {
-  *effective = 0;
+                                Figure& effective) {
+  effective = 0;
   for (const Group* at = &group; at->parent != Group::kNone; at = &tree.At(at->parent)) {
-    uint64_t reserved = 0;
-    const Status status = tree.ReadReservation(host, *at, &reserved);
+    Figure reserved;
+    const Status status = tree.ReadReservation(host, *at, reserved);
     if (status != kOk) return status;
-    if (reserved != 0) *effective = kNoValue;
+    if (reserved != 0u) effective.reset();
   }
   return kOk;
 }
 
-// /proc/meminfo, for the rows of one report.
-struct Meminfo {
-  Figures figures;
-
-  static Status Read(const LinuxHost& host, Meminfo* meminfo) {
-    return meminfo->figures.ReadMeminfo(host);
-  }
-};
-
-Status GetMeminfo(const LinuxHost& host, const Figures** figures) {
-  const Meminfo* meminfo = nullptr;
-  const Status status = host.Keep<Recent<Meminfo>>().Get(host, Meminfo::Read, &meminfo);
-  if (status == kOk) *figures = &meminfo->figures;
-  return status;
-}
-
-Status ReadRoot(const Figures& meminfo, KSI_GroupMemoryStats* record) {
+Status ReadRoot(const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
   uint64_t total = 0;
   uint64_t free = 0;
   uint64_t kernel = 0;
-  Status status = meminfo.Require("MemTotal", &total);
-  if (status == kOk) status = meminfo.Require("MemFree", &free);
-  if (status == kOk) status = ReadKernelHeap(meminfo, &kernel);
+  Status status = meminfo.Require("MemTotal", total);
+  if (status == kOk) status = meminfo.Require("MemFree", free);
+  if (status == kOk) status = ReadKernelHeap(meminfo, kernel);
   if (status != kOk) return status;
 
-  record->consumed = DifferenceOf(total, free);
-  record->memSize = record->consumed +
-                    DifferenceOf(meminfo.FindOr("SwapTotal", 0), meminfo.FindOr("SwapFree", 0));
-  record->consumedPeak = kNoValue;
-  record->memSizePeak = kNoValue;
-  record->ovhd = kernel;
-  record->touched = meminfo.FindOr("Active", kNoValue);
+  record.consumed = Less(total, free);
+  record.memSize =
+      record.consumed + Less(meminfo.FindOr("SwapTotal", 0), meminfo.FindOr("SwapFree", 0));
+  record.consumedPeak = FieldOf(std::nullopt);
+  record.memSizePeak = FieldOf(std::nullopt);
+  record.ovhd = kernel;
+  record.touched = FieldOf(meminfo.Find("Active"));
   return kOk;
 }
 
-Status ReadKernel(const Figures& meminfo, KSI_GroupMemoryStats* record) {
+Status ReadKernel(const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
   uint64_t kernel = 0;
-  const Status status = ReadKernelHeap(meminfo, &kernel);
-  record->consumed = kernel;
-  record->memSize = kernel;
-  record->consumedPeak = kNoValue;
-  record->memSizePeak = kNoValue;
-  record->touched = kNoValue;
+  const Status status = ReadKernelHeap(meminfo, kernel);
+  record.consumed = kernel;
+  record.memSize = kernel;
+  record.consumedPeak = FieldOf(std::nullopt);
+  record.memSizePeak = FieldOf(std::nullopt);
+  record.touched = FieldOf(std::nullopt);
   return status;
 }
 
 Status ReadCgroup(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                  const Figures& meminfo, KSI_GroupMemoryStats* record) {
-  CgroupMemory memory;
-  const Status status = tree.Cgroups().ReadMemory(host, group.path, &memory);
+                  const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
+  MemcgUsage usage;
+  const Status status = tree.Cgroups().ReadUsage(host, group.path, usage);
   if (status != kOk) return status;
   // Kernels that do not account for swap, and hosts that have none.
-  if (memory.current != kNoValue && meminfo.FindOr("SwapTotal", 0) == 0) {
-    memory.swapped = 0;
-    memory.peakWithSwap = memory.peak;
+  if (usage.current && meminfo.FindOr("SwapTotal", 0) == 0) {
+    usage.swap = 0;
+    usage.peakWithSwap = usage.peak;
   }
-  record->consumed = memory.current;
-  record->consumedPeak = memory.peak;
-  record->memSize = SumOf(memory.current, memory.swapped);
-  record->memSizePeak = memory.peakWithSwap;
-  record->ovhd = memory.kernel;
-  record->touched = memory.active;
+  record.consumed = FieldOf(usage.current);
+  record.consumedPeak = FieldOf(usage.peak);
+  record.memSize = FieldOf(SumOf({usage.current, usage.swap}));
+  record.memSizePeak = FieldOf(usage.peakWithSwap);
+  record.ovhd = FieldOf(usage.kernel);
+  record.touched = FieldOf(usage.active);
   return kOk;
 }
 
-void FillProcess(const GroupTree& tree, const Group& group, KSI_GroupMemoryStats* record) {
+void FillProcess(const GroupTree& tree, const Group& group, KSI_GroupMemoryStats& record) {
   const Process& process = tree.ProcessOf(group);
-  record->consumed = process.Mapped();
-  // The kernel keeps no peak of the huge pages.
-  record->consumedPeak = process.hugePages == 0 ? process.peakResident : kNoValue;
-  record->memSize = process.addressSpace;
-  record->memSizePeak = process.peakAddressSpace;
-  record->ovhd = process.pageTables;
+  record.consumed = FieldOf(process.Mapped());
+  // The kernel keeps no peak of hugetlb.
+  record.consumedPeak = FieldOf(process.hugetlb == 0u ? process.vmHwm : std::nullopt);
+  record.memSize = FieldOf(process.vmSize);
+  record.memSizePeak = FieldOf(process.vmPeak);
+  record.ovhd = FieldOf(process.vmPte);
   // Only a walk of all its page tables tells.
-  record->touched = kNoValue;
+  record.touched = FieldOf(std::nullopt);
   if (group.virtualMachine == Group::kNone) return;
   const QemuCommandLine& line = tree.VirtualMachineOf(group).commandLine;
-  record->memSize = line.memory;
-  record->memSizePeak = line.memory == line.maxMemory ? line.memory : kNoValue;
-}
-
-Status AnswerAllocation(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                        Buffer buffer) {
-  uint64_t reserved = 0;
-  uint64_t limit = 0;
-  const Status status = ReadSettings(host, tree, group, &reserved, &limit);
-  if (status != kOk) return status;
-  KSI_GroupAllocation record = {};
-  record.min = static_cast<int64_t>(reserved);
-  record.max = SignedLimit(limit);
-  record.minLimit = kUnlimited;
-  return Answer(buffer, record);
-}
-
-Status AnswerCapacity(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                      Buffer buffer) {
-  uint64_t own = 0;
-  uint64_t limit = 0;
-  uint64_t below = 0;
-  Status status = ReadSettings(host, tree, group, &own, &limit);
-  if (status == kOk) status = ReadReservedBelow(host, tree, group, &below);
-  // What there is to reserve at the top is the whole host, if there are reservations.
-  if (status == kOk && group.id == kRootGroup && tree.Cgroups().HasReservations()) {
-    const Figures* meminfo = nullptr;
-    status = GetMeminfo(host, &meminfo);
-    if (status == kOk) status = meminfo->Require("MemTotal", &own);
-  }
-  if (status != kOk) return status;
-  KSI_GroupCapacity record = {};
-  record.conResv = below;
-  record.availResv = DifferenceOf(own, below);
-  return Answer(buffer, record);
+  record.memSize = FieldOf(line.memory);
+  record.memSizePeak = FieldOf(line.memory == line.maxMemory ? line.memory : std::nullopt);
 }
 
 Status ReadUse(const LinuxHost& host, const GroupTree& tree, const Group& group,
-               KSI_GroupMemoryStats* record) {
+               KSI_GroupMemoryStats& record) {
   if (group.IsProcess()) {
     FillProcess(tree, group, record);
     return kOk;
   }
-  const Figures* meminfo = nullptr;
-  const Status status = GetMeminfo(host, &meminfo);
+  const FigureFile* meminfo = nullptr;
+  const Status status = host.Kept().meminfo.Get(host, meminfo);
   if (status != kOk) return status;
   if (group.kind == Group::Kind::kKernel) return ReadKernel(*meminfo, record);
   return group.id == kRootGroup ? ReadRoot(*meminfo, record)
                                 : ReadCgroup(host, tree, group, *meminfo, record);
 }
 
-Status AnswerMemoryStats(const LinuxHost& host, const GroupTree& tree, const Group& group,
-                         Buffer buffer) {
-  KSI_GroupMemoryStats record = {};
-  uint64_t reserved = 0;
-  uint64_t limit = 0;
-  uint64_t effective = 0;
-  uint64_t saved = 0;
-  Status status = ReadUse(host, tree, group, &record);
-  if (status == kOk) status = ReadSettings(host, tree, group, &reserved, &limit);
-  if (status == kOk) status = ReadEffectiveReservation(host, tree, group, &effective);
-  if (status == kOk) status = tree.ReadSharedSaved(host, group, &saved);
+Status ReadGroupMemoryStats(const LinuxHost& host, const Keys& keys, KSI_GroupMemoryStats& record) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  Figure reserved;
+  Figure limit;
+  Figure effective;
+  Figure saved;
+  Status status = FindGroup(host, keys, tree, group);
+  if (status == kOk) status = ReadUse(host, *tree, *group, record);
+  if (status == kOk) status = ReadSettings(host, *tree, *group, reserved, limit);
+  if (status == kOk) status = ReadEffectiveReservation(host, *tree, *group, effective);
+  if (status == kOk) status = tree->ReadSharedSaved(host, *group, saved);
   if (status != kOk) return status;
 
-  record.bMin = reserved;
-  record.bMax = limit;
-  record.eMin = effective;
-  record.eMinPeak = effective;
-  record.sharedSaved = saved;
+  record.bMin = FieldOf(reserved);
+  record.bMax = FieldOf(limit);
+  record.eMin = FieldOf(effective);
+  record.eMinPeak = FieldOf(effective);
+  record.sharedSaved = FieldOf(saved);
   // Nothing holds a group's threads back for the sake of memory.
   record.throttlePct = 100;
-  return Answer(buffer, record);
+  return kOk;
 }
 
-}  // namespace
-
-Status ReadGroupName(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree&, const Group& group) {
-    KSI_GroupName record = {};
-    CopyText(group.name, record.text);
-    return Answer(buffer, record);
-  });
+Status ReadGroupAllocation(const LinuxHost& host, const Keys& keys, KSI_GroupAllocation& record) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  Figure reserved;
+  Figure limit;
+  Status status = FindGroup(host, keys, tree, group);
+  if (status == kOk) status = ReadSettings(host, *tree, *group, reserved, limit);
+  if (status != kOk) return status;
+  record.min = FieldOf<int64_t>(reserved);
+  // All ones is no limit here.
+  record.max = FieldOf<int64_t>(limit);
+  record.minLimit = kUnlimited;
+  return kOk;
 }
 
-Status ReadGroupTag(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree&, const Group& group) {
-    KSI_GroupTag record = {};
-    CopyText(UnitType(group.path), record.text);
-    return Answer(buffer, record);
-  });
+Status ReadGroupCapacity(const LinuxHost& host, const Keys& keys, KSI_GroupCapacity& record) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  Figure own;
+  Figure limit;
+  Figure below;
+  Status status = FindGroup(host, keys, tree, group);
+  if (status == kOk) status = ReadSettings(host, *tree, *group, own, limit);
+  if (status == kOk) status = ReadReservedBelow(host, *tree, *group, below);
+  // What there is to reserve at the top is the whole host, if there are reservations.
+  if (status == kOk && group->id == kRootGroup && tree->Cgroups().HasReservations()) {
+    const FigureFile* meminfo = nullptr;
+    status = host.Kept().meminfo.Get(host, meminfo);
+    if (status == kOk) status = meminfo->Require("MemTotal", own.emplace());
+  }
+  if (status != kOk) return status;
+  record.conResv = FieldOf(below);
+  record.availResv = FieldOf(DifferenceOf(own, below));
+  return kOk;
 }
 
-Status ReadParentGroupID(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    // The root is its own parent: there is no other.
-    return Answer(buffer, group.parent == Group::kNone ? group.id : tree.At(group.parent).id);
-  });
+Status ReadGroupName(const LinuxHost& host, const Keys& keys, KSI_GroupName& record) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  const Status status = FindGroup(host, keys, tree, group);
+  if (status == kOk) CopyText(group->name, record.text);
+  return status;
 }
 
-Status ReadGroupFlags(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys,
-                 [&](const GroupTree&, const Group& group) { return Answer(buffer, group.flags); });
+Status ReadGroupTag(const LinuxHost& host, const Keys& keys, KSI_GroupTag& record) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  const Status status = FindGroup(host, keys, tree, group);
+  if (status == kOk) CopyText(UnitType(group->path), record.text);
+  return status;
 }
 
-Status ReadGroupLeaderID(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    return group.IsProcess() ? Answer(buffer, tree.ProcessOf(group).pid) : KSI_STATUS_NOT_FOUND;
-  });
+Status ReadParentGroupID(const LinuxHost& host, const Keys& keys, int64_t& id) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  const Status status = FindGroup(host, keys, tree, group);
+  if (status != kOk) return status;
+  // The root is its own parent: there is no other.
+  id = group->parent == Group::kNone ? group->id : tree->At(group->parent).id;
+  return kOk;
 }
 
-Status ReadGroupAllocation(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    return AnswerAllocation(host, tree, group, buffer);
-  });
+Status ReadGroupFlags(const LinuxHost& host, const Keys& keys, uint32_t& flags) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  const Status status = FindGroup(host, keys, tree, group);
+  if (status == kOk) flags = group->flags;
+  return status;
 }
 
-Status ReadGroupCapacity(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    return AnswerCapacity(host, tree, group, buffer);
-  });
-}
-
-Status ReadGroupMemoryStats(const LinuxHost& host, const Keys& keys, Buffer buffer) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    return AnswerMemoryStats(host, tree, group, buffer);
-  });
+Status ReadGroupLeaderID(const LinuxHost& host, const Keys& keys, int32_t& pid) {
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  const Status status = FindGroup(host, keys, tree, group);
+  if (status != kOk) return status;
+  if (!group->IsProcess()) return KSI_STATUS_NOT_FOUND;
+  pid = tree->ProcessOf(*group).pid;
+  return kOk;
 }
 
 Status ListChildGroups(const LinuxHost& host, const Keys& keys, ParamList& instances) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    instances.Reserve(group.children.size());
-    Status status = kOk;
-    for (const size_t child : group.children) {
-      if (status == kOk) status = instances.AddNumber(static_cast<uint64_t>(tree.At(child).id));
-    }
-    return status;
-  });
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  Status status = FindGroup(host, keys, tree, group);
+  if (status != kOk) return status;
+  instances.Reserve(group->children.size());
+  for (const size_t child : group->children) {
+    if (status == kOk) status = instances.AddNumber(static_cast<uint64_t>(tree->At(child).id));
+  }
+  return status;
 }
 
 Status ListGroupClients(const LinuxHost& host, const Keys& keys, ParamList& instances) {
-  return OfGroup(host, keys, [&](const GroupTree& tree, const Group& group) {
-    // The monitor is no client beside its virtual machine.
-    if (!group.IsProcess() || group.kind == Group::Kind::kVmm) return kOk;
-    return instances.AddNumber(static_cast<uint64_t>(tree.ProcessOf(group).pid));
-  });
+  const GroupTree* tree = nullptr;
+  const Group* group = nullptr;
+  const Status status = FindGroup(host, keys, tree, group);
+  if (status != kOk) return status;
+  // The monitor is no client beside its virtual machine.
+  if (!group->IsProcess() || group->kind == Group::Kind::kVmm) return kOk;
+  return instances.AddNumber(static_cast<uint64_t>(tree->ProcessOf(*group).pid));
 }
+
+constexpr Reader kReaders[] = {
+    ValueOf<node::sched_groups_groupName, ReadGroupName>(),
+    ValueOf<node::sched_groups_groupTag, ReadGroupTag>(),
+    ValueOf<node::sched_groups_parentGroupID, ReadParentGroupID>(),
+    ValueOf<node::sched_groups_groupFlags, ReadGroupFlags>(),
+    ValueOf<node::sched_groups_groupLeaderID, ReadGroupLeaderID>(),
+    ValueOf<node::sched_groups_memAllocationInKB, ReadGroupAllocation>(),
+    ValueOf<node::sched_groups_stats_capacity, ReadGroupCapacity>(),
+    ValueOf<node::sched_groups_stats_memoryStats, ReadGroupMemoryStats>(),
+    ListOf<node::sched_groups_members_groups>(ListChildGroups),
+    ListOf<node::sched_groups_members_memClients>(ListGroupClients),
+};
+
+}  // namespace
+
+constinit const ReaderTable kGroupReaders = kReaders;
 
 }  // namespace ksi

@@ -4,8 +4,8 @@
 
 #include <knvlibs/ksi.h>
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/host/recent.h"
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
@@ -15,7 +15,7 @@ std::string WithoutEscapes(std::string_view name) {
   std::string plain;
   while (!name.empty()) {
     uint64_t code = 0;
-    if (name.starts_with("\\x") && name.size() >= 4 && ParseHex(name.substr(2, 2), &code)) {
+    if (name.starts_with("\\x") && name.size() >= 4 && ParseHex(name.substr(2, 2), code)) {
       plain.push_back(static_cast<char>(code));
       name.remove_prefix(4);
     } else {
@@ -72,22 +72,22 @@ std::string_view UnitType(std::string_view cgroupName) {
   return {};
 }
 
-Status GroupTree::Get(const LinuxHost& host, const GroupTree** tree) {
-  return host.Keep<Recent<GroupTree>>().Get(host, GroupTree::Read, tree);
+Status GroupTree::Get(const LinuxHost& host, const GroupTree*& tree) {
+  return host.Kept().groups.Get(host, tree);
 }
 
-Status GroupTree::Read(const LinuxHost& host, GroupTree* tree) {
-  Status status = tree->AddCgroups(host);
-  if (status == kOk) status = tree->AddProcesses(host);
+Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
+  Status status = tree.AddCgroups(host);
+  if (status == kOk) status = tree.AddProcesses(host);
   if (status != kOk) return status;
-  tree->FindOwnCgroups();
-  for (Group& group : tree->groups_) {
+  tree.FindOwnCgroups();
+  for (Group& group : tree.groups_) {
     if (group.children.empty()) group.flags |= KSI_GROUP_LEAF;
   }
-  tree->reserved_.resize(tree->groups_.size());
-  tree->sharedSaved_.resize(tree->processes_.size());
-  tree->cgroupOfPid_.clear();
-  tree->byPath_.clear();
+  tree.reserved_.resize(tree.groups_.size());
+  tree.sharedSaved_.resize(tree.processes_.size());
+  tree.cgroupOfPid_.clear();
+  tree.byPath_.clear();
   return kOk;
 }
 
@@ -125,7 +125,7 @@ Status GroupTree::AddCgroups(const LinuxHost& host) {
     int64_t id = groups_[self].id;
     std::vector<CgroupHierarchy::Child> children;
     // A cgroup that has gone since stays as one without children.
-    if (cgroups_.List(host, path, &id, &children) != kOk) continue;
+    if (cgroups_.List(host, path, id, children) != kOk) continue;
     if (self != 0 && id != groups_[self].id) {
       byId_.erase(groups_[self].id);
       byId_.emplace(id, self);
@@ -144,7 +144,7 @@ Status GroupTree::AddCgroups(const LinuxHost& host) {
 
     std::vector<int32_t> pids;
     // What cannot be listed here, each process tells of itself.
-    if (cgroups_.ReadProcesses(host, path, &pids) != kOk) continue;
+    if (cgroups_.ReadProcesses(host, path, pids) != kOk) continue;
     for (const int32_t pid : pids) cgroupOfPid_.emplace(pid, self);
   }
   return kOk;
@@ -155,30 +155,30 @@ size_t GroupTree::CgroupOf(const LinuxHost& host, int32_t pid) const {
   if (listed != cgroupOfPid_.end()) return listed->second;
   if (!cgroups_.Exists()) return 0;
   std::string path;
-  if (ReadCgroupPath(host, pid, cgroups_.Controller(), &path) != kOk) return 0;
+  if (ReadCgroupPath(host, pid, cgroups_.Controller(), path) != kOk) return 0;
   const auto found = byPath_.find(path);
   return found == byPath_.end() ? 0 : found->second;
 }
 
 Status GroupTree::AddProcesses(const LinuxHost& host) {
   std::vector<int32_t> pids;
-  Status status = ListProcesses(host, &pids);
+  Status status = ListProcesses(host, pids);
   if (status != kOk) return status;
 
   processes_.reserve(pids.size());
   for (const int32_t pid : pids) {
     Process process;
-    status = ReadProcess(host, pid, &process);
+    status = ReadProcess(host, pid, process);
     if (status == KSI_STATUS_PERMISSION_DENIED && host.First("status denied")) {
       Warning("/proc/PID/status: not permitted for some processes: they are left out\n");
     }
-    if (status != kOk || process.isKernelThread || process.hasEnded) continue;
+    if (status != kOk || process.isKernelThread || process.isZombie) continue;
 
     const size_t index = processes_.size();
     const size_t cgroup = CgroupOf(host, pid);
     std::vector<std::string> words;
     // QEMU is never a single thread; most others are and need not be asked.
-    if (process.threads > 1 && ReadCommandLine(host, pid, &words) == kOk && IsQemu(words)) {
+    if (process.threads > 1 && ReadCommandLine(host, pid, words) == kOk && IsQemu(words)) {
       processes_.push_back(std::move(process));
       AddVirtualMachine(cgroup, index, ParseQemuCommandLine(words));
       continue;
@@ -269,39 +269,38 @@ const VirtualMachine* GroupTree::FindVirtualMachine(int64_t pid) const {
 }
 
 Status GroupTree::ReadReservation(const LinuxHost& host, const Group& group,
-                                  uint64_t* reserved) const {
-  *reserved = 0;
+                                  Figure& reserved) const {
+  reserved = 0;
   if (group.kind != Group::Kind::kCgroup || group.id == kRootGroup) return kOk;
-  std::optional<uint64_t>& known = reserved_[static_cast<size_t>(&group - groups_.data())];
+  std::optional<Figure>& known = reserved_[static_cast<size_t>(&group - groups_.data())];
   if (!known) {
     const Status status = cgroups_.ReadReservation(host, group.path, reserved);
     if (status != kOk) return status;
-    known = *reserved;
+    known = reserved;
   }
-  *reserved = *known;
+  reserved = *known;
   return kOk;
 }
 
-Status GroupTree::ReadSharedSaved(const LinuxHost& host, const Group& group,
-                                  uint64_t* saved) const {
-  *saved = 0;
+Status GroupTree::ReadSharedSaved(const LinuxHost& host, const Group& group, Figure& saved) const {
+  saved = 0;
   if (group.IsProcess()) {
-    std::optional<uint64_t>& known = sharedSaved_[group.process];
+    std::optional<Figure>& known = sharedSaved_[group.process];
     if (!known) {
       ProcessKsm ksm;
-      const Status status = ReadProcessKsm(host, ProcessOf(group).pid, &ksm);
+      const Status status = ReadProcessKsm(host, ProcessOf(group).pid, ksm);
       if (status != kOk) return status;
       known = ksm.Saved();
     }
-    *saved = *known;
+    saved = *known;
     return kOk;
   }
   for (const size_t child : group.children) {
-    uint64_t part = 0;
-    const Status status = ReadSharedSaved(host, groups_[child], &part);
+    Figure part;
+    const Status status = ReadSharedSaved(host, groups_[child], part);
     if (status == KSI_STATUS_NOT_FOUND) continue;  // it has ended since
     if (status != kOk) return status;
-    *saved = SumOf(*saved, part);
+    saved = SumOf({saved, part});
   }
   return kOk;
 }

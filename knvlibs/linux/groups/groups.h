@@ -70,10 +70,10 @@ struct VirtualMachine {
 class GroupTree {
  public:
   // Scans /proc and the cgroups once.
-  static Status Read(const LinuxHost& host, GroupTree* tree);
+  [[nodiscard]] static Status Read(const LinuxHost& host, GroupTree& tree);
 
-  // The tree of this moment, for the length of a report.
-  static Status Get(const LinuxHost& host, const GroupTree** tree);
+  // The tree of this reading.
+  [[nodiscard]] static Status Get(const LinuxHost& host, const GroupTree*& tree);
 
   // Null if there is no such group, process or virtual machine.
   const Group* Find(int64_t id) const;
@@ -89,14 +89,16 @@ class GroupTree {
   const CgroupHierarchy& Cgroups() const { return cgroups_; }
 
   // What is reserved for a group itself, in KB.
-  Status ReadReservation(const LinuxHost& host, const Group& group, uint64_t* reserved) const;
+  [[nodiscard]] Status ReadReservation(const LinuxHost& host, const Group& group,
+                                       Figure& reserved) const;
 
-  // What page sharing saves of the memory of a group's processes.
-  Status ReadSharedSaved(const LinuxHost& host, const Group& group, uint64_t* saved) const;
+  // What page sharing saves of the memory of a group's processes, in KB.
+  [[nodiscard]] Status ReadSharedSaved(const LinuxHost& host, const Group& group,
+                                       Figure& saved) const;
 
  private:
-  Status AddCgroups(const LinuxHost& host);
-  Status AddProcesses(const LinuxHost& host);
+  [[nodiscard]] Status AddCgroups(const LinuxHost& host);
+  [[nodiscard]] Status AddProcesses(const LinuxHost& host);
   size_t Add(size_t parent, Group group);
   size_t CgroupOf(const LinuxHost& host, int32_t pid) const;
   void AddVirtualMachine(size_t parent, size_t process, QemuCommandLine commandLine);
@@ -110,8 +112,8 @@ class GroupTree {
   std::vector<VirtualMachine> virtualMachines_;
   std::unordered_map<int64_t, size_t> byId_;
   // What has been asked for, of each group and of each process.
-  mutable std::vector<std::optional<uint64_t>> reserved_;
-  mutable std::vector<std::optional<uint64_t>> sharedSaved_;
+  mutable std::vector<std::optional<Figure>> reserved_;
+  mutable std::vector<std::optional<Figure>> sharedSaved_;
 
   // Only while the tree grows.
   std::unordered_map<int32_t, size_t> cgroupOfPid_;

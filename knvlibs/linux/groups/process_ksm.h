@@ -9,18 +9,21 @@
 
 namespace ksi {
 
-// KB, all ones where it cannot be told.
+// KB.
 struct ProcessKsm {
-  uint64_t merged = 0;     // in pages that stand for several, which count as resident
-  uint64_t zeroPages = 0;  // in place of which the kernel's zero page is mapped, which does not
+  Figure merged = 0;     // in pages that stand for several, which count as resident
+  Figure zeroPages = 0;  // in place of which the kernel's zero page is mapped, which does not
 
   // By the kernel's own reckoning.
-  uint64_t Saved() const { return SumOf(merged, zeroPages); }
+  Figure Saved() const { return SumOf({merged, zeroPages}); }
 };
+
+// Whether there is a page on the host that is shared.
+[[nodiscard]] Status ReadIsSharing(const LinuxHost& host, bool& isSharing);
 
 // Where nothing is shared on the whole host this reads no file of the process; else it fails with
 // KSI_STATUS_NOT_FOUND if the process is gone.
-Status ReadProcessKsm(const LinuxHost& host, int32_t pid, ProcessKsm* ksm);
+[[nodiscard]] Status ReadProcessKsm(const LinuxHost& host, int32_t pid, ProcessKsm& ksm);
 
 }  // namespace ksi
 

@@ -12,37 +12,38 @@
 
 namespace ksi {
 
-// KB, all ones where it cannot be told.
-struct WalkedMemory {
-  uint64_t resident = kNoValue;  // without huge pages of the pool
-  uint64_t referenced = kNoValue;
-  uint64_t privateClean = kNoValue;
-  uint64_t privateDirty = kNoValue;
-  uint64_t anonymousHuge = kNoValue;
-  uint64_t sharedHuge = kNoValue;  // transparent, in shared memory
-  uint64_t poolHuge = 0;           // of the pool
-  uint64_t swapped = kNoValue;
-  uint64_t locked = kNoValue;
+// KB, by the names of the file.
+struct Smaps {
+  Figure rss;  // without hugetlb
+  Figure referenced;
+  Figure privateClean;
+  Figure privateDirty;
+  Figure anonHugePages;
+  Figure shmemPmdMapped;
+  Figure hugetlb = 0;  // shared and private
+  Figure swap;
+  Figure locked;
 
-  void Add(const WalkedMemory& other);
+  void Add(const Smaps& other);
 };
 
 struct Mapping {
   uint64_t start = 0;
   uint64_t end = 0;
   bool isWritable = false;
-  // Not for the children of the process, which is how QEMU maps the memory of its guest.
-  bool isNotInherited = false;
+  // Not copied to children ("dc" of VmFlags), which is how QEMU maps the memory of its guest.
+  bool isDontCopy = false;
   std::string name;  // of the file, or "[heap]" and the like
-  WalkedMemory memory;
+  Smaps smaps;
 };
 
-// What may not be read, which is told once, is all ones, as is what the kernel does not offer.
+// What may not be read, which is told once, has no figures, as has what the kernel does not offer.
 // Both fail with KSI_STATUS_NOT_FOUND if the process is gone.
-Status ReadWalkedMemory(const LinuxHost& host, int32_t pid, WalkedMemory* memory);
+[[nodiscard]] Status ReadSmapsRollup(const LinuxHost& host, int32_t pid, Smaps& smaps);
 
 // The same of each mapping; no mappings if they may not be read.
-Status ReadMappings(const LinuxHost& host, int32_t pid, std::vector<Mapping>* mappings);
+[[nodiscard]] Status ReadMappings(const LinuxHost& host, int32_t pid,
+                                  std::vector<Mapping>& mappings);
 
 }  // namespace ksi
 

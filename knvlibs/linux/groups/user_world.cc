@@ -1,10 +1,8 @@
 // A user world is a process. docs/linux-host.md says where each figure comes from and why.
-#include <algorithm>
-
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/smaps.h"
-#include "knvlibs/linux/handlers.h"
+#include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
 namespace {
@@ -12,73 +10,78 @@ namespace {
 constexpr int64_t kUnlimited = -1;
 
 // Fails with KSI_STATUS_NOT_FOUND if there is no such client.
-Status FindClient(const LinuxHost& host, const Keys& keys, const GroupTree** tree,
-                  const Group** group) {
+Status FindClient(const LinuxHost& host, const Keys& keys, const GroupTree*& tree,
+                  const Group*& group) {
   const Status status = GroupTree::Get(host, tree);
   if (status != kOk) return status;
-  *group = (*tree)->FindClient(keys[0].number);
-  return *group == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
+  group = tree->FindClient(keys[0].number);
+  return group == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
-// A limit in KB as the record has it; one that is too large for the field limits nothing.
-int32_t NarrowLimit(int64_t limit) {
-  return limit > INT32_MAX ? static_cast<int32_t>(kUnlimited) : static_cast<int32_t>(limit);
-}
-
-}  // namespace
-
-Status ReadUwTally(const LinuxHost& host, const Keys& keys, Buffer buffer) {
+Status ReadUwTally(const LinuxHost& host, const Keys& keys, KSI_UwTally& record) {
   const GroupTree* tree = nullptr;
   const Group* group = nullptr;
-  Status status = FindClient(host, keys, &tree, &group);
+  Status status = FindClient(host, keys, tree, group);
   if (status != kOk) return status;
   if (group->kind != Group::Kind::kUserWorld) return KSI_STATUS_NOT_FOUND;
 
   const Process& process = tree->ProcessOf(*group);
-  int64_t limit = kUnlimited;
-  uint64_t saved = 0;
-  WalkedMemory walked;
-  status = ReadAddressSpaceLimit(host, process.pid, &limit);
-  if (status == kOk) status = tree->ReadSharedSaved(host, *group, &saved);
-  if (status == kOk) status = ReadWalkedMemory(host, process.pid, &walked);
+  Figure limit;
+  Figure saved;
+  Smaps smaps;
+  status = ReadAddressSpaceLimit(host, process.pid, limit);
+  if (status == kOk) status = tree->ReadSharedSaved(host, *group, saved);
+  if (status == kOk) status = ReadSmapsRollup(host, process.pid, smaps);
   if (status != kOk) return status;
 
-  KSI_UwTally record = {};
+  const Figure onlySwapTakes = SumOf({process.rssAnon, process.rssShmem});
   record.max = kUnlimited;
   record.minLimit = kUnlimited;
-  record.memSizeLimit = NarrowLimit(limit);
-  record.memSize = process.addressSpace;
-  record.touched = walked.referenced;
-  record.mapped = process.Mapped();
-  record.sharedSaved = saved;
-  record.memBStore = SumOf(process.anonymous, process.shared);
-  record.swapBStore = process.swapped;
-  record.swappable = DifferenceOf(SumOf(walked.privateClean, walked.privateDirty), walked.locked);
-  record.pinned = SumOf(walked.locked, process.hugePages);
-  record.cow = kNoValue;
-  record.pageable = SumOf(process.anonymous, process.shared);
-  record.pageableUnacct = process.file;
-  record.swapped = process.swapped;
-  record.shm = process.shared;
-  return Answer(buffer, record);
+  // All ones is no limit here; one that is too large for the field limits nothing.
+  record.memSizeLimit = FieldOf<int32_t>(limit);
+  record.memSize = FieldOf(process.vmSize);
+  record.touched = FieldOf(smaps.referenced);
+  record.mapped = FieldOf(process.Mapped());
+  record.sharedSaved = FieldOf(saved);
+  record.memBStore = FieldOf(onlySwapTakes);
+  record.swapBStore = FieldOf(process.vmSwap);
+  record.swappable =
+      FieldOf(DifferenceOf(SumOf({smaps.privateClean, smaps.privateDirty}), smaps.locked));
+  record.pinned = FieldOf(SumOf({smaps.locked, process.hugetlb}));
+  record.cow = FieldOf(std::nullopt);
+  record.pageable = FieldOf(onlySwapTakes);
+  record.pageableUnacct = FieldOf(process.rssFile);
+  record.swapped = FieldOf(process.vmSwap);
+  record.shm = FieldOf(process.rssShmem);
+  return kOk;
 }
 
-Status ReadCommonTally(const LinuxHost& host, const Keys& keys, Buffer buffer) {
+Status ReadCommonTally(const LinuxHost& host, const Keys& keys, KSI_CommonTally& /*record*/) {
   const GroupTree* tree = nullptr;
   const Group* group = nullptr;
-  const Status status = FindClient(host, keys, &tree, &group);
-  return status == kOk ? Answer(buffer, KSI_CommonTally{}) : status;
+  return FindClient(host, keys, tree, group);
 }
 
 // Linux moves pages at once, when it moves them: no client has a type of remapping that waits.
 Status ListRemapTypes(const LinuxHost& host, const Keys& keys, ParamList& /*instances*/) {
   const GroupTree* tree = nullptr;
   const Group* group = nullptr;
-  return FindClient(host, keys, &tree, &group);
+  return FindClient(host, keys, tree, group);
 }
 
-Status ReadRemapType(const LinuxHost& /*host*/, const Keys& /*keys*/, Buffer /*buffer*/) {
+Status ReadRemapType(const LinuxHost& /*host*/, const Keys& /*keys*/, KSI_RemapType& /*record*/) {
   return KSI_STATUS_NOT_FOUND;
 }
+
+constexpr Reader kReaders[] = {
+    ValueOf<node::sched_memClients_tally_totalCommon, ReadCommonTally>(),
+    ValueOf<node::sched_memClients_tally_uw, ReadUwTally>(),
+    ListOf<node::sched_memClients_remapTypes>(ListRemapTypes),
+    ValueOf<node::sched_memClients_remapTypes, ReadRemapType>(),
+};
+
+}  // namespace
+
+constinit const ReaderTable kUserWorldReaders = kReaders;
 
 }  // namespace ksi

@@ -21,10 +21,10 @@ struct SlabCache {
 };
 
 // From /proc/slabinfo, in its order.
-Status ReadSlabinfo(const LinuxHost& host, std::vector<SlabCache>* caches);
+[[nodiscard]] Status ReadSlabinfo(const LinuxHost& host, std::vector<SlabCache>& caches);
 
 // From /sys/kernel/slab, by name. This takes a handful of files for each cache.
-Status ReadSlabDirectory(const LinuxHost& host, std::vector<SlabCache>* caches);
+[[nodiscard]] Status ReadSlabDirectory(const LinuxHost& host, std::vector<SlabCache>& caches);
 
 }  // namespace ksi
 

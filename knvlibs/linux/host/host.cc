@@ -5,10 +5,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
 
 #include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
@@ -58,11 +60,15 @@ std::string WithoutLastSlash(std::string path) {
 
 }  // namespace
 
-LinuxHost::LinuxHost(std::string root)
+LinuxHost::LinuxHost(std::string root, Clock clock)
     : root_(WithoutLastSlash(std::move(root))),
-      pageKB_(static_cast<uint64_t>(sysconf(_SC_PAGESIZE)) / 1024) {}
+      clock_(clock),
+      pageKB_(static_cast<uint64_t>(sysconf(_SC_PAGESIZE)) / 1024),
+      reading_(std::make_unique<Reading>()) {}
 
-Status LinuxHost::Read(std::string_view file, std::string* content) const {
+LinuxHost::~LinuxHost() = default;
+
+Status LinuxHost::Read(std::string_view file, std::string& content) const {
   std::string path = root_;
   path += file;
   // Without O_NONBLOCK a FIFO in a recorded tree would hold the program up.
@@ -71,65 +77,86 @@ Status LinuxHost::Read(std::string_view file, std::string* content) const {
 
   // Kernel files have no size to ask for: grow until a read comes back empty.
   size_t length = 0;
-  content->resize(16384);
+  content.resize(16384);
   for (;;) {
-    const ssize_t count = read(fd.get(), content->data() + length, content->size() - length);
+    const ssize_t count = read(fd.get(), content.data() + length, content.size() - length);
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return StatusOfErrno(errno);
     if (count == 0) break;
     length += static_cast<size_t>(count);
-    if (length == content->size()) {
+    if (length == content.size()) {
       if (length >= kLargestFile) return KSI_STATUS_READ_ERROR;
-      content->resize(2 * length);
+      content.resize(2 * length);
     }
   }
-  content->resize(length);
+  content.resize(length);
   return kOk;
 }
 
-Status LinuxHost::ReadNumber(std::string_view file, uint64_t* number) const {
+Status LinuxHost::ReadNumber(std::string_view file, uint64_t& number) const {
   std::string content;
-  const Status status = Read(file, &content);
+  const Status status = Read(file, content);
   if (status != kOk) return status;
   Lines lines(content);
   std::string_view line;
-  if (!lines.Next(&line) || !ParseNumber(line, number) || lines.Next(&line)) {
+  if (!lines.Next(line) || !ParseNumber(line, number) || lines.Next(line)) {
     return NotUnderstood(file, 1);
   }
   return kOk;
 }
 
-Status LinuxHost::List(std::string_view directory, std::vector<Entry>* entries) const {
+Status LinuxHost::ReadNumberIfAny(std::string_view file, Figure& figure) const {
+  uint64_t number = 0;
+  const Status status = ReadNumber(file, number);
+  figure = status == kOk ? Figure(number) : std::nullopt;
+  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
+}
+
+Status LinuxHost::ReadLink(std::string_view link, std::string& target) const {
+  std::string path = root_;
+  path += link;
+  std::array<char, 4096> text;
+  const ssize_t length = readlink(path.c_str(), text.data(), text.size());
+  if (length < 0) return StatusOfErrno(errno);
+  target.assign(text.data(), static_cast<size_t>(length));
+  return kOk;
+}
+
+Status LinuxHost::List(std::string_view directory, std::vector<Entry>& entries) const {
   std::string path = root_;
   path += directory;
   const Directory stream(opendir(path.c_str()));
   if (stream.get() == nullptr) return StatusOfErrno(errno);
 
-  entries->clear();
+  entries.clear();
   for (;;) {
     errno = 0;
     const dirent* entry = readdir(stream.get());
     if (entry == nullptr) return errno == 0 ? kOk : StatusOfErrno(errno);
     const std::string_view name = entry->d_name;
     if (name == "." || name == "..") continue;
-    entries->push_back({std::string(name), entry->d_ino, IsDirectory(stream.get(), *entry)});
+    entries.push_back({std::string(name), entry->d_ino, IsDirectory(stream.get(), *entry)});
   }
 }
 
 Status LinuxHost::List(std::string_view directory, Entries wanted,
-                       std::vector<std::string>* names) const {
+                       std::vector<std::string>& names) const {
   std::vector<Entry> entries;
-  const Status status = List(directory, &entries);
+  const Status status = List(directory, entries);
   if (status != kOk) return status;
 
-  names->clear();
+  names.clear();
   for (Entry& entry : entries) {
     if (entry.name.starts_with('.')) continue;
     if (wanted == Entries::kDirectories && !entry.isDirectory) continue;
-    names->push_back(std::move(entry.name));
+    names.push_back(std::move(entry.name));
   }
   return kOk;
 }
+
+bool LinuxHost::First(std::string_view what) const { return reading_->told.emplace(what).second; }
+
+void LinuxHost::BeginReading() { reading_ = std::make_unique<Reading>(); }
 
 Status LinuxHost::NotUnderstoodOnce(std::string_view kind, std::string_view file,
                                     size_t line) const {

@@ -6,43 +6,50 @@
 namespace ksi {
 namespace {
 
-bool Parse(std::string_view text, int base, uint64_t* number) {
+bool Parse(std::string_view text, int base, uint64_t& number) {
   const char* end = text.data() + text.size();
   uint64_t value = 0;
   const auto [stop, error] = std::from_chars(text.data(), end, value, base);
   if (error != std::errc() || stop != end) return false;
-  *number = value;
+  number = value;
   return true;
 }
 
 }  // namespace
 
-bool Lines::Next(std::string_view* line) {
+bool Lines::Next(std::string_view& line) {
   if (rest_.empty()) return false;
   const size_t end = std::min(rest_.find('\n'), rest_.size());
-  *line = rest_.substr(0, end);
+  line = rest_.substr(0, end);
   rest_.remove_prefix(std::min(end + 1, rest_.size()));
   ++number_;
   return true;
 }
 
-std::string_view TakeWord(std::string_view* text) {
+std::string_view TakeWord(std::string_view& text) {
   constexpr std::string_view kBlanks = " \t";
-  text->remove_prefix(std::min(text->find_first_not_of(kBlanks), text->size()));
-  const size_t end = std::min(text->find_first_of(kBlanks), text->size());
-  const std::string_view word = text->substr(0, end);
-  text->remove_prefix(end);
+  text.remove_prefix(std::min(text.find_first_not_of(kBlanks), text.size()));
+  const size_t end = std::min(text.find_first_of(kBlanks), text.size());
+  const std::string_view word = text.substr(0, end);
+  text.remove_prefix(end);
   return word;
 }
 
-bool TakePrefix(std::string_view* text, std::string_view prefix) {
-  if (!text->starts_with(prefix)) return false;
-  text->remove_prefix(prefix.size());
+bool TakePrefix(std::string_view& text, std::string_view prefix) {
+  if (!text.starts_with(prefix)) return false;
+  text.remove_prefix(prefix.size());
   return true;
 }
 
-bool ParseNumber(std::string_view text, uint64_t* number) { return Parse(text, 10, number); }
+bool ParseNumber(std::string_view text, uint64_t& number) { return Parse(text, 10, number); }
 
-bool ParseHex(std::string_view text, uint64_t* number) { return Parse(text, 16, number); }
+bool ParseHex(std::string_view text, uint64_t& number) { return Parse(text, 16, number); }
+
+std::string Printable(std::string_view name) {
+  std::string printable(name);
+  std::ranges::replace_if(
+      printable, [](char c) { return (c >= 0 && c < ' ') || c == '\x7f'; }, '?');
+  return printable;
+}
 
 }  // namespace ksi

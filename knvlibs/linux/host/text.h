@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <string>
 #include <string_view>
 
 namespace ksi {
@@ -14,7 +15,7 @@ class Lines {
   explicit Lines(std::string_view text) : rest_(text) {}
 
   // The next line without its newline; false after the last.
-  bool Next(std::string_view* line);
+  bool Next(std::string_view& line);
 
   // The number of the line that Next gave last; the first is 1.
   size_t Number() const { return number_; }
@@ -25,14 +26,17 @@ class Lines {
 };
 
 // Takes the next word, up to blanks, off `text`; empty if there is none.
-std::string_view TakeWord(std::string_view* text);
+std::string_view TakeWord(std::string_view& text);
 
 // Takes `prefix` off the start of `text`; false if it does not stand there.
-bool TakePrefix(std::string_view* text, std::string_view prefix);
+bool TakePrefix(std::string_view& text, std::string_view prefix);
 
 // The whole of `text` as a number; false if it is anything else or does not fit.
-bool ParseNumber(std::string_view text, uint64_t* number);
-bool ParseHex(std::string_view text, uint64_t* number);
+bool ParseNumber(std::string_view text, uint64_t& number);
+bool ParseHex(std::string_view text, uint64_t& number);
+
+// `name` with '?' for the bytes that a terminal would take for commands.
+std::string Printable(std::string_view name);
 
 }  // namespace ksi
 

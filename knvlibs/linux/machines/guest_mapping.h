@@ -11,14 +11,15 @@
 
 namespace ksi {
 
+// No figures if it cannot be found among the mappings of the process, or they may not be read.
 struct GuestMapping {
-  uint64_t size = kNoValue;  // KB
-  WalkedMemory memory;
+  Figure size;  // KB
+  Smaps smaps;
+  // QEMU has made its machine: there is memory that it keeps from its children.
+  bool isMade = false;
 };
-
-// All ones if it cannot be found among the mappings of process `pid`, or they may not be read.
-Status ReadGuestMapping(const LinuxHost& host, int32_t pid, const QemuCommandLine& line,
-                        GuestMapping* guest);
+[[nodiscard]] Status ReadGuestMapping(const LinuxHost& host, int32_t pid,
+                                      const QemuCommandLine& line, GuestMapping& guest);
 
 }  // namespace ksi
 

@@ -6,18 +6,20 @@
 #include <string>
 #include <vector>
 
-#include "knvlibs/linux/host/host.h"
+#include "knvlibs/linux/host/figure.h"
 
 namespace ksi {
 
 struct QemuCommandLine {
   std::string name;  // -name; may be empty
-  // KB; all ones where the command line does not tell.
-  uint64_t memory = kNoValue;     // what the machine starts with, -m, and the modules plugged in
-  uint64_t maxMemory = kNoValue;  // with all modules it has room for, maxmem=
+  // KB.
+  Figure memory;     // what the machine starts with, -m, and the modules plugged in
+  Figure maxMemory;  // with all modules it has room for, maxmem=
   // The sizes of the blocks that this memory is made of, in KB.
-  std::vector<uint64_t> blocks;
+  std::vector<Figure> blocks;
   std::string monitor;  // path of the socket that answers QMP; may be empty
+  // QEMU makes its machine only when that socket has had its first client.
+  bool waitsForClient = false;
   bool hasBalloon = false;
   std::string balloon;  // id of the balloon device; may be empty
 };

@@ -1,111 +1,21 @@
 #include "knvlibs/linux/machines/qmp.h"
 
-#include <fcntl.h>
-#include <poll.h>
-#include <sys/socket.h>
-#include <sys/un.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
-#include <chrono>
-#include <cstring>
 #include <memory>
 #include <optional>
+#include <string>
 #include <string_view>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/json.h"
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/linux/machines/channel.h"
+#include "knvlibs/linux/machines/listener.h"
+#include "knvlibs/linux/machines/monitor_socket.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
-
-using Clock = std::chrono::steady_clock;
-
-constexpr std::chrono::milliseconds kPatience{250};
-
-// What all monitors together may keep a report waiting for nothing.
-struct PatienceLeft {
-  Clock::duration value = 4 * kPatience;
-};
-
-// The other side of a conversation in lines.
-class Channel {
- public:
-  Channel() = default;
-  Channel(const Channel&) = delete;
-  Channel& operator=(const Channel&) = delete;
-  virtual ~Channel() = default;
-
-  virtual bool Send(std::string_view line) = 0;
-  virtual bool Receive(std::string* line) = 0;
-};
-
-class SocketChannel : public Channel {
- public:
-  explicit SocketChannel(Clock::duration patience) : deadline_(Clock::now() + patience) {}
-  ~SocketChannel() override {
-    if (fd_ >= 0) close(fd_);
-  }
-
-  // Connects if it is process `pid` that listens there: a command line may name any socket.
-  bool Connect(const std::string& path, int32_t pid) {
-    sockaddr_un address = {};
-    address.sun_family = AF_UNIX;
-    if (path.size() >= sizeof address.sun_path) return false;
-    std::memcpy(address.sun_path, path.data(), path.size());
-    fd_ = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
-    if (fd_ < 0) return false;
-    if (connect(fd_, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-      return false;
-    }
-    ucred listener = {};
-    socklen_t size = sizeof listener;
-    return getsockopt(fd_, SOL_SOCKET, SO_PEERCRED, &listener, &size) == 0 && listener.pid == pid;
-  }
-
-  bool Send(std::string_view line) override {
-    std::string text(line);
-    text += '\n';
-    // A line fits into the socket's buffer, unless nobody reads.
-    return send(fd_, text.data(), text.size(), MSG_NOSIGNAL) == static_cast<ssize_t>(text.size());
-  }
-
-  bool Receive(std::string* line) override {
-    for (;;) {
-      const size_t end = received_.find('\n');
-      if (end != std::string::npos) {
-        *line = received_.substr(0, end);
-        received_.erase(0, end + 1);
-        return true;
-      }
-      constexpr size_t kLongest = size_t{1} << 20;
-      if (received_.size() > kLongest || !WaitForMore()) return false;
-    }
-  }
-
- private:
-  bool WaitForMore() {
-    for (;;) {
-      char buffer[4096];
-      const ssize_t count = recv(fd_, buffer, sizeof buffer, 0);
-      if (count > 0) {
-        received_.append(buffer, static_cast<size_t>(count));
-        return true;
-      }
-      if (count == 0 || (errno != EAGAIN && errno != EINTR)) return false;
-      const auto left =
-          std::chrono::duration_cast<std::chrono::milliseconds>(deadline_ - Clock::now());
-      if (left.count() <= 0) return false;
-      pollfd wait = {fd_, POLLIN, 0};
-      poll(&wait, 1, static_cast<int>(left.count()));
-    }
-  }
-
-  int fd_ = -1;
-  Clock::time_point deadline_;
-  std::string received_;
-};
 
 class RecordedChannel : public Channel {
  public:
@@ -113,10 +23,10 @@ class RecordedChannel : public Channel {
 
   bool Send(std::string_view /*line*/) override { return true; }
 
-  bool Receive(std::string* line) override {
+  bool Receive(std::string& line) override {
     std::string_view next;
-    if (!lines_.Next(&next)) return false;
-    *line = next;
+    if (!lines_.Next(next)) return false;
+    line = next;
     return true;
   }
 
@@ -129,38 +39,37 @@ class RecordedChannel : public Channel {
 std::optional<Json> Ask(Channel& channel, std::string_view command) {
   if (!channel.Send(command)) return std::nullopt;
   std::string line;
-  while (channel.Receive(&line)) {
+  while (channel.Receive(line)) {
     std::optional<Json> answer = ParseJson(line);
     if (!answer) return std::nullopt;
-    if (answer->Find("return") != nullptr || answer->Find("error") != nullptr) return answer;
+    if (FindMember(&*answer, "return") != nullptr || FindMember(&*answer, "error") != nullptr) {
+      return answer;
+    }
   }
   return std::nullopt;
 }
 
 // The member of this name, in KB, of an object that may be missing.
-uint64_t KBOf(const Json* object, std::string_view name) {
-  const Json* member = object == nullptr ? nullptr : object->Find(name);
-  const std::optional<uint64_t> bytes = member == nullptr ? std::nullopt : member->Unsigned();
+Figure KBOf(const Json* object, std::string_view name) {
+  const Figure bytes = NumberOf(FindMember(object, name));
   // QEMU too writes all ones for what the guest does not tell.
-  return bytes && *bytes != kNoValue ? *bytes / 1024 : kNoValue;
+  return bytes == kNoValue ? std::nullopt : QuotientOf(bytes, 1024);
 }
 
-void AskForBalloon(Channel& channel, GuestMemory* memory) {
+void AskForBalloon(Channel& channel, GuestMemory& memory) {
   const std::optional<Json> answer = Ask(channel, R"({"execute":"query-balloon"})");
   if (!answer) return;
-  if (const Json* result = answer->Find("return")) {
-    memory->balloon = GuestMemory::Balloon::kActive;
-    memory->actual = KBOf(result, "actual");
-  } else if (const Json* error = answer->Find("error")) {
-    const Json* kind = error->Find("class");
-    if (kind != nullptr && kind->Text() != nullptr && *kind->Text() == "DeviceNotActive") {
-      memory->balloon = GuestMemory::Balloon::kNone;
-    }
+  if (const Json* result = FindMember(&*answer, "return")) {
+    memory.balloon = GuestMemory::Balloon::kActive;
+    memory.actual = KBOf(result, "actual");
+    return;
   }
+  const std::string* kind = TextOf(FindMember(FindMember(&*answer, "error"), "class"));
+  if (kind != nullptr && *kind == "DeviceNotActive") memory.balloon = GuestMemory::Balloon::kNone;
 }
 
 // Figures that the guest sends now and then, if somebody has asked it to.
-void AskForStatistics(Channel& channel, const std::string& balloon, GuestMemory* memory) {
+void AskForStatistics(Channel& channel, const std::string& balloon, GuestMemory& memory) {
   // An id of other characters would not stand in a path, and could end the text.
   constexpr std::string_view kIdCharacters =
       "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-._";
@@ -168,50 +77,69 @@ void AskForStatistics(Channel& channel, const std::string& balloon, GuestMemory*
   const std::optional<Json> answer =
       Ask(channel, R"({"execute":"qom-get","arguments":{"path":"/machine/peripheral/)" + balloon +
                        R"(","property":"guest-stats"}})");
-  const Json* result = answer ? answer->Find("return") : nullptr;
-  const Json* update = result == nullptr ? nullptr : result->Find("last-update");
-  if (update == nullptr || update->Unsigned().value_or(0) == 0) return;
-  const Json* statistics = result->Find("stats");
-  memory->total = KBOf(statistics, "stat-total-memory");
-  memory->available = KBOf(statistics, "stat-available-memory");
-}
-
-std::unique_ptr<Channel> Open(const LinuxHost& host, int32_t pid, const std::string& path) {
-  if (!host.IsThisMachine()) {
-    std::string text;
-    if (host.Read(path, &text) != kOk) return nullptr;
-    return std::make_unique<RecordedChannel>(std::move(text));
-  }
-  const Clock::duration patience =
-      std::min<Clock::duration>(kPatience, host.Keep<PatienceLeft>().value);
-  auto channel = std::make_unique<SocketChannel>(patience);
-  if (patience <= Clock::duration::zero() || !channel->Connect(path, pid)) return nullptr;
-  return channel;
+  const Json* result = answer ? FindMember(&*answer, "return") : nullptr;
+  if (NumberOf(FindMember(result, "last-update")).value_or(0) == 0) return;
+  const Json* statistics = FindMember(result, "stats");
+  memory.total = KBOf(statistics, "stat-total-memory");
+  memory.available = KBOf(statistics, "stat-available-memory");
 }
 
 // Whether a monitor greets and takes questions.
-bool Greet(const LinuxHost& host, Channel& channel) {
-  const Clock::time_point start = Clock::now();
+bool Greet(Channel& channel) {
   std::string greeting;
-  if (!channel.Receive(&greeting)) {
-    host.Keep<PatienceLeft>().value -= Clock::now() - start;
-    return false;
-  }
+  if (!channel.Receive(greeting)) return false;
   const std::optional<Json> hello = ParseJson(greeting);
-  return hello && hello->Find("QMP") != nullptr &&
+  return hello && FindMember(&*hello, "QMP") != nullptr &&
          Ask(channel, R"({"execute":"qmp_capabilities"})").has_value();
+}
+
+void Converse(Channel& channel, const QemuCommandLine& line, GuestMemory& memory) {
+  if (!Greet(channel)) return;
+  AskForBalloon(channel, memory);
+  AskForStatistics(channel, line.balloon, memory);
+}
+
+void AskRecorded(const LinuxHost& host, const QemuCommandLine& line, GuestMemory& memory) {
+  std::string text;
+  if (host.Read(line.monitor, text) != kOk) return;
+  RecordedChannel channel(std::move(text));
+  Converse(channel, line, memory);
+}
+
+void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, GuestMemory& memory) {
+  auto& left = host.Kept().monitorTime;
+  if (left <= left.zero()) {
+    if (host.First("monitors")) {
+      Warning("virtual machines: no time left to ask all of them: their balloons have no value\n");
+    }
+    return;
+  }
+  const LinuxHost::TimePoint start = host.Now();
+  const auto patience = std::min<std::chrono::steady_clock::duration>(kMonitorPatience, left);
+  MonitorSocket socket(host.TimeSource(), start + patience);
+  // Where the listener cannot be looked up, the connection tells who it is.
+  if (Listens(host, pid, line.monitor).value_or(true) && socket.Connect(line.monitor, pid)) {
+    Converse(socket, line, memory);
+  }
+  left -= host.Now() - start;
 }
 
 }  // namespace
 
-GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuCommandLine& line) {
+GuestMemory UnaskedGuest(const QemuCommandLine& line) {
   GuestMemory memory;
   if (!line.hasBalloon) memory.balloon = GuestMemory::Balloon::kNone;
+  return memory;
+}
+
+GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuCommandLine& line) {
+  GuestMemory memory = UnaskedGuest(line);
   if (line.monitor.empty()) return memory;
-  const std::unique_ptr<Channel> channel = Open(host, pid, line.monitor);
-  if (channel == nullptr || !Greet(host, *channel)) return memory;
-  AskForBalloon(*channel, &memory);
-  AskForStatistics(*channel, line.balloon, &memory);
+  if (host.IsThisMachine()) {
+    AskLive(host, pid, line, memory);
+  } else {
+    AskRecorded(host, line, memory);
+  }
   return memory;
 }
 

@@ -4,26 +4,33 @@
 #ifndef KNVLIBS_LINUX_MACHINES_QMP_H_
 #define KNVLIBS_LINUX_MACHINES_QMP_H_
 
+#include <chrono>
 #include <cstdint>
-#include <string>
 
 #include "knvlibs/linux/host/host.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 
 namespace ksi {
 
-// What a monitor tells of its guest. KB, all ones where it cannot be told.
+// What one monitor may take, and all monitors of a reading together.
+constexpr std::chrono::milliseconds kMonitorPatience{250};
+constexpr std::chrono::seconds kMonitorTime{1};
+
+// What a monitor tells of its guest. KB.
 struct GuestMemory {
   enum class Balloon : uint8_t { kNone, kActive, kUnknown };
 
   Balloon balloon = Balloon::kUnknown;
-  uint64_t actual = kNoValue;     // what the balloon leaves to the guest
-  uint64_t total = kNoValue;      // as the guest counts
-  uint64_t available = kNoValue;  // without its having to swap
+  Figure actual;     // what the balloon leaves to the guest
+  Figure total;      // as the guest counts
+  Figure available;  // without its having to swap
 };
 
-// Asks the monitor that the command line of process `pid` names. Never takes longer than a quarter
-// of a second, and all that do not answer a second together; what is not answered is not told.
+// What is known without asking: whether there is a balloon at all.
+GuestMemory UnaskedGuest(const QemuCommandLine& line);
+
+// Asks the monitor that the command line of process `pid` names, if it is that process that listens
+// there. What is not answered in time is not told.
 GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuCommandLine& line);
 
 }  // namespace ksi

@@ -1,5 +1,5 @@
-// /proc/buddyinfo: the free pages of each zone of each memory node, by the size of their buffers;
-// /proc/zoneinfo for what the zone manages in all.
+#include "knvlibs/linux/memory/buddyinfo.h"
+
 #include <algorithm>
 #include <array>
 #include <bit>
@@ -8,12 +8,11 @@
 #include <string_view>
 #include <vector>
 
-#include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/handlers.h"
-#include "knvlibs/linux/host/recent.h"
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/memory/memory_nodes.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
+#include "knvlibs/linux/reader_tables.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
@@ -22,12 +21,6 @@ constexpr std::string_view kFile = "/proc/buddyinfo";
 
 // Readers of the list have room for so many names.
 constexpr size_t kMaxBuddies = 99;
-
-struct Buddy {
-  std::string name;
-  KSI_BuddyStats stats;
-};
-using Buddies = std::vector<Buddy>;
 
 // How a zone is called in the name of its buddy: "memmap-", the memory node in two digits, '-' and
 // this. A name has at most 15 characters. Low memory, which old devices need, starts with "lo" and
@@ -45,19 +38,19 @@ const char* NameOfZone(std::string_view zone) {
 }
 
 // Reads "Node 0, zone   Normal   2042   4237 ..." : free buffers of one page, two, four ...
-bool ParseLine(std::string_view line, uint64_t* node, std::string_view* zone,
-               std::vector<uint64_t>* free) {
-  if (!TakePrefix(&line, "Node ")) return false;
-  std::string_view number = TakeWord(&line);
+bool ParseLine(std::string_view line, uint64_t& node, std::string_view& zone,
+               std::vector<uint64_t>& free) {
+  if (!TakePrefix(line, "Node ")) return false;
+  std::string_view number = TakeWord(line);
   if (!number.ends_with(',')) return false;
   number.remove_suffix(1);
-  if (!ParseNumber(number, node) || TakeWord(&line) != "zone") return false;
-  *zone = TakeWord(&line);
-  free->clear();
-  for (std::string_view word = TakeWord(&line); !word.empty(); word = TakeWord(&line)) {
-    if (!ParseNumber(word, &free->emplace_back())) return false;
+  if (!ParseNumber(number, node) || TakeWord(line) != "zone") return false;
+  zone = TakeWord(line);
+  free.clear();
+  for (std::string_view word = TakeWord(line); !word.empty(); word = TakeWord(line)) {
+    if (!ParseNumber(word, free.emplace_back())) return false;
   }
-  return !free->empty() && free->size() < 64;
+  return !free.empty() && free.size() < 64;
 }
 
 KSI_BuddyStats StatsOf(const std::vector<uint64_t>& free, uint64_t managed, uint64_t pageKB) {
@@ -74,51 +67,17 @@ KSI_BuddyStats StatsOf(const std::vector<uint64_t>& free, uint64_t managed, uint
     buffers[size] += free[order] << (first + order - size);
   }
   for (size_t size = 0; size < buffers.size(); ++size) {
-    stats.buffers[size].free = FigureOf<uint32_t>(buffers[size]);
+    stats.buffers[size].free = FieldOf<uint32_t>(buffers[size]);
   }
   // Linux does not keep the sizes of buffers in use.
-  const uint64_t usedPages = managed - std::min(managed, freePages);
-  stats.buffers[0].used = FigureOf<uint32_t>(usedPages << first);
+  const uint64_t usedPages = Less(managed, freePages);
+  stats.buffers[0].used = FieldOf<uint32_t>(usedPages << first);
   return stats;
 }
 
-Status ReadBuddies(const LinuxHost& host, Buddies* buddies) {
-  std::string content;
-  std::vector<Zone> zones;
-  const MemoryNodes* nodes = nullptr;
-  Status status = FindMemoryNodes(host, &nodes);
-  if (status == kOk) status = host.Read(kFile, &content);
-  if (status == kOk) status = ReadZones(host, &zones);
-  if (status != kOk) return status;
-
-  Lines lines(content);
-  std::string_view line;
-  std::vector<uint64_t> free;
-  while (lines.Next(&line) && buddies->size() < kMaxBuddies) {
-    uint64_t numaNode = 0;
-    std::string_view zoneName;
-    if (!ParseLine(line, &numaNode, &zoneName, &free)) return NotUnderstood(kFile, lines.Number());
-    const char* suffix = NameOfZone(zoneName);
-    if (suffix == nullptr) return NotUnderstood(kFile, lines.Number());
-
-    // Memory may have come or gone since the other files were read.
-    const std::optional<size_t> node = nodes->Of(numaNode);
-    const auto zone = std::ranges::find_if(
-        zones, [&](const Zone& z) { return z.node == numaNode && z.name == zoneName; });
-    if (!node || zone == zones.end()) continue;
-
-    std::array<char, 40> name;
-    (void)std::snprintf(name.data(), name.size(), "memmap-%02zu-%s", *node, suffix);
-    buddies->push_back({name.data(), StatsOf(free, zone->managed, host.PageKB())});
-  }
-  return lines.Number() > 0 ? kOk : NotUnderstood(kFile, 1);
-}
-
-}  // namespace
-
 Status ListBuddies(const LinuxHost& host, const Keys& /*keys*/, ParamList& instances) {
   const Buddies* buddies = nullptr;
-  Status status = host.Keep<Recent<Buddies>>().GetNew(host, ReadBuddies, &buddies);
+  Status status = host.Kept().buddies.Get(host, buddies);
   if (status != kOk) return status;
   for (const Buddy& buddy : *buddies) {
     status = instances.AddText(buddy.name);
@@ -127,12 +86,55 @@ Status ListBuddies(const LinuxHost& host, const Keys& /*keys*/, ParamList& insta
   return kOk;
 }
 
-Status ReadBuddy(const LinuxHost& host, const Keys& keys, Buffer buffer) {
+Status ReadBuddy(const LinuxHost& host, const Keys& keys, KSI_BuddyStats& record) {
   const Buddies* buddies = nullptr;
-  const Status status = host.Keep<Recent<Buddies>>().Get(host, ReadBuddies, &buddies);
+  const Status status = host.Kept().buddies.Get(host, buddies);
   if (status != kOk) return status;
   const auto buddy = std::ranges::find(*buddies, keys[0].text, &Buddy::name);
-  return buddy == buddies->end() ? KSI_STATUS_NOT_FOUND : Answer(buffer, buddy->stats);
+  if (buddy == buddies->end()) return KSI_STATUS_NOT_FOUND;
+  record = buddy->stats;
+  return kOk;
+}
+
+constexpr Reader kReaders[] = {
+    ListOf<node::system_buddy>(ListBuddies),
+    ValueOf<node::system_buddy_comprehensive, ReadBuddy>(),
+};
+
+}  // namespace
+
+constinit const ReaderTable kBuddyReaders = kReaders;
+
+Status ReadBuddies(const LinuxHost& host, Buddies& buddies) {
+  std::string content;
+  const Zones* zones = nullptr;
+  const MemoryNodes* nodes = nullptr;
+  Status status = FindMemoryNodes(host, nodes);
+  if (status == kOk) status = host.Read(kFile, content);
+  if (status == kOk) status = host.Kept().zones.Get(host, zones);
+  if (status != kOk) return status;
+
+  Lines lines(content);
+  std::string_view line;
+  std::vector<uint64_t> free;
+  while (lines.Next(line) && buddies.size() < kMaxBuddies) {
+    uint64_t numaNode = 0;
+    std::string_view zoneName;
+    if (!ParseLine(line, numaNode, zoneName, free)) return NotUnderstood(kFile, lines.Number());
+    const char* suffix = NameOfZone(zoneName);
+    if (suffix == nullptr) return NotUnderstood(kFile, lines.Number());
+
+    // Memory may have come or gone since the other files were read.
+    const std::optional<size_t> node = nodes->Of(numaNode);
+    const auto zone = std::ranges::find_if(
+        *zones, [&](const Zone& z) { return z.node == numaNode && z.name == zoneName; });
+    if (!node || zone == zones->end()) continue;
+
+    std::array<char, 40> name;
+    (void)std::snprintf(name.data(), name.size(), "memmap-%02zu-%s", *node, suffix);
+    buddies.push_back({name.data(), StatsOf(free, zone->managed, host.PageKB())});
+  }
+  return lines.Number() > 0 ? kOk : NotUnderstood(kFile, 1);
 }
 
 }  // namespace ksi

@@ -6,9 +6,9 @@
 #include <vector>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/handlers.h"
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/memory/memory_nodes.h"
+#include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
 namespace {
@@ -17,49 +17,47 @@ constexpr std::string_view kDirectoryPrefix = "hugepages-";
 constexpr std::string_view kPoolPrefix = "huge-";
 
 // Where the pools of a memory node lie.
-Status FindPools(const LinuxHost& host, int64_t key, std::string* directory) {
+Status FindPools(const LinuxHost& host, int64_t key, std::string& directory) {
   const MemoryNodes* nodes = nullptr;
   size_t node = 0;
-  Status status = FindMemoryNodes(host, &nodes);
-  if (status == kOk) status = FindMemoryNode(*nodes, key, &node);
+  Status status = FindMemoryNodes(host, nodes);
+  if (status == kOk) status = FindMemoryNode(*nodes, key, node);
   if (status != kOk) return status;
-  *directory = nodes->numa ? "/sys/devices/system/node/node" +
-                                 std::to_string(nodes->numaNodes[node]) + "/hugepages"
-                           : "/sys/kernel/mm/hugepages";
+  directory = nodes->numa ? "/sys/devices/system/node/node" +
+                                std::to_string(nodes->numaNodes[node]) + "/hugepages"
+                          : "/sys/kernel/mm/hugepages";
   return kOk;
 }
 
 // The page size in "hugepages-2048kB" or "huge-2048kB".
-bool ParseSize(std::string_view name, std::string_view prefix, uint64_t* sizeKB) {
-  if (!TakePrefix(&name, prefix) || !name.ends_with("kB")) return false;
+bool ParseSize(std::string_view name, std::string_view prefix, uint64_t& sizeKB) {
+  if (!TakePrefix(name, prefix) || !name.ends_with("kB")) return false;
   name.remove_suffix(2);
   return ParseNumber(name, sizeKB);
 }
 
-}  // namespace
-
-Status ReadPsharePool(const LinuxHost& host, const Keys& keys, Buffer buffer) {
+Status ReadPsharePool(const LinuxHost& host, const Keys& keys, KSI_LargePagePool& /*record*/) {
   const MemoryNodes* nodes = nullptr;
   size_t node = 0;
-  Status status = FindMemoryNodes(host, &nodes);
-  if (status == kOk) status = FindMemoryNode(*nodes, keys[0].number, &node);
+  Status status = FindMemoryNodes(host, nodes);
+  if (status == kOk) status = FindMemoryNode(*nodes, keys[0].number, node);
   // Linux shares pages wherever they lie and keeps no large pages for it.
-  return status == kOk ? Answer(buffer, KSI_LargePagePool{}) : status;
+  return status;
 }
 
 Status ListPools(const LinuxHost& host, const Keys& keys, ParamList& instances) {
   std::string directory;
   std::vector<std::string> names;
-  Status status = FindPools(host, keys[0].number, &directory);
+  Status status = FindPools(host, keys[0].number, directory);
   if (status != kOk) return status;
-  status = host.List(directory, LinuxHost::Entries::kDirectories, &names);
+  status = host.List(directory, LinuxHost::Entries::kDirectories, names);
   // A kernel without huge pages has no pool of them.
   if (status == KSI_STATUS_NOT_FOUND) return kOk;
   if (status != kOk) return status;
 
   std::vector<uint64_t> sizes;
   for (const std::string& name : names) {
-    if (!ParseSize(name, kDirectoryPrefix, &sizes.emplace_back())) {
+    if (!ParseSize(name, kDirectoryPrefix, sizes.emplace_back())) {
       return NameNotUnderstood(directory, name);
     }
   }
@@ -71,27 +69,36 @@ Status ListPools(const LinuxHost& host, const Keys& keys, ParamList& instances) 
   return kOk;
 }
 
-Status ReadPool(const LinuxHost& host, const Keys& keys, Buffer buffer) {
+Status ReadPool(const LinuxHost& host, const Keys& keys, KSI_LargePagePool& record) {
   std::string directory;
   uint64_t sizeKB = 0;
-  Status status = FindPools(host, keys[0].number, &directory);
+  Status status = FindPools(host, keys[0].number, directory);
   if (status != kOk) return status;
-  if (!ParseSize(keys[1].text, kPoolPrefix, &sizeKB)) return KSI_STATUS_NOT_FOUND;
+  if (!ParseSize(keys[1].text, kPoolPrefix, sizeKB)) return KSI_STATUS_NOT_FOUND;
 
   directory += '/';
   directory += kDirectoryPrefix;
   directory += std::to_string(sizeKB) + "kB/";
   uint64_t pages = 0;
   uint64_t free = 0;
-  status = host.ReadNumber(directory + "nr_hugepages", &pages);
-  if (status == kOk) status = host.ReadNumber(directory + "free_hugepages", &free);
+  status = host.ReadNumber(directory + "nr_hugepages", pages);
+  if (status == kOk) status = host.ReadNumber(directory + "free_hugepages", free);
   if (status != kOk) return status;
 
   // A huge page is handed out whole, never in small pages, so none of the counters moves.
-  KSI_LargePagePool record = {};
-  record.nrLPages = FigureOf<uint32_t>(pages * sizeKB / 2048);
-  record.nrFreeSPages = FigureOf<uint32_t>(free * (sizeKB / 4));
-  return Answer(buffer, record);
+  record.nrLPages = FieldOf<uint32_t>(pages * sizeKB / 2048);
+  record.nrFreeSPages = FieldOf<uint32_t>(free * (sizeKB / 4));
+  return kOk;
 }
+
+constexpr Reader kReaders[] = {
+    ValueOf<node::memory_lpage_nodeList_psharePool, ReadPsharePool>(),
+    ListOf<node::memory_lpage_nodeList_vmPools>(ListPools),
+    ValueOf<node::memory_lpage_nodeList_vmPools, ReadPool>(),
+};
+
+}  // namespace
+
+constinit const ReaderTable kHugePageReaders = kReaders;
 
 }  // namespace ksi

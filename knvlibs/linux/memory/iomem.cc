@@ -6,27 +6,29 @@
 
 namespace ksi {
 
-std::optional<uint64_t> IomemSize(const LinuxHost& host, std::string_view name) {
+Figure IomemSize(const LinuxHost& host, std::string_view name) {
   std::string content;
-  if (host.Read("/proc/iomem", &content) != kOk) return std::nullopt;
+  if (host.Read("/proc/iomem", content) != kOk) return std::nullopt;
 
   // "  01000000-02209987 : Kernel code"
-  std::optional<uint64_t> size;
+  bool isTold = false;
+  Figure size = 0;
   Lines lines(content);
   std::string_view line;
-  while (lines.Next(&line)) {
-    const std::string_view range = TakeWord(&line);
-    if (!TakePrefix(&line, " : ") || line != name) continue;
+  while (lines.Next(line)) {
+    const std::string_view range = TakeWord(line);
+    if (!TakePrefix(line, " : ") || line != name) continue;
     const size_t dash = range.find('-');
     uint64_t first = 0;
     uint64_t last = 0;
-    if (dash == range.npos || !ParseHex(range.substr(0, dash), &first) ||
-        !ParseHex(range.substr(dash + 1), &last) || last <= first) {
+    if (dash == range.npos || !ParseHex(range.substr(0, dash), first) ||
+        !ParseHex(range.substr(dash + 1), last) || last <= first) {
       return std::nullopt;
     }
-    size = size.value_or(0) + (last - first + 1);
+    isTold = true;
+    size = SumOf({size, last - first, 1});
   }
-  return size;
+  return isTold ? size : std::nullopt;
 }
 
 }  // namespace ksi

@@ -2,8 +2,6 @@
 #ifndef KNVLIBS_LINUX_MEMORY_IOMEM_H_
 #define KNVLIBS_LINUX_MEMORY_IOMEM_H_
 
-#include <cstdint>
-#include <optional>
 #include <string_view>
 
 #include "knvlibs/linux/host/host.h"
@@ -12,7 +10,7 @@ namespace ksi {
 
 // The size in bytes of all ranges of this name; none where the file cannot be read, or hides the
 // addresses as it does from ordinary users.
-std::optional<uint64_t> IomemSize(const LinuxHost& host, std::string_view name);
+Figure IomemSize(const LinuxHost& host, std::string_view name);
 
 }  // namespace ksi
 

@@ -3,73 +3,64 @@
 #include <string_view>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/handlers.h"
+#include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
 namespace {
 
 constexpr std::string_view kDirectory = "/sys/kernel/mm/ksm/";
 
-Status ReadFigure(const LinuxHost& host, std::string_view name, uint64_t* figure) {
-  std::string file(kDirectory);
-  file += name;
-  return host.ReadNumber(file, figure);
-}
-
-// A figure that not every kernel has, `otherwise` where it does not.
-Status ReadFigureOr(const LinuxHost& host, std::string_view name, uint64_t otherwise,
-                    uint64_t* figure) {
-  const Status status = ReadFigure(host, name, figure);
-  if (status != KSI_STATUS_NOT_FOUND) return status;
-  *figure = otherwise;
-  return kOk;
-}
+std::string FileOf(std::string_view name) { return std::string(kDirectory).append(name); }
 
 // Client pages that are mapped to the kernel's zero page instead of a page of their own.
-Status ReadZeroPages(const LinuxHost& host, uint64_t* pages) {
-  const Status status = ReadFigure(host, "ksm_zero_pages", pages);
-  if (status != KSI_STATUS_NOT_FOUND) return status;
+Status ReadZeroPages(const LinuxHost& host, Figure& pages) {
+  Status status = host.ReadNumberIfAny(FileOf("ksm_zero_pages"), pages);
+  if (status != kOk || pages) return status;
   // Kernels before 6.6 do this too if they are told to, and do not count.
-  uint64_t used = 0;
-  const Status usedStatus = ReadFigureOr(host, "use_zero_pages", 0, &used);
-  *pages = used == 0 ? 0 : kNoValue;
-  return usedStatus;
+  Figure used;
+  status = host.ReadNumberIfAny(FileOf("use_zero_pages"), used);
+  if (used.value_or(0) == 0) pages = 0;
+  return status;
 }
 
-}  // namespace
-
-Status ReadPshareStats(const LinuxHost& host, const Keys& /*keys*/, Buffer buffer) {
-  KSI_PshareStats record = {};
+Status ReadPshareStats(const LinuxHost& host, const Keys& /*keys*/, KSI_PshareStats& record) {
   uint64_t shared = 0;
-  Status status = ReadFigure(host, "pages_shared", &shared);
+  Status status = host.ReadNumber(FileOf("pages_shared"), shared);
   // A kernel without page sharing has shared nothing.
-  if (status == KSI_STATUS_NOT_FOUND) return Answer(buffer, record);
+  if (status == KSI_STATUS_NOT_FOUND) return kOk;
 
   uint64_t sharing = 0;
-  uint64_t zero = 0;
   uint64_t scans = 0;
-  uint64_t scanned = 0;
-  if (status == kOk) status = ReadFigure(host, "pages_sharing", &sharing);
-  if (status == kOk) status = ReadFigure(host, "full_scans", &scans);
-  if (status == kOk) status = ReadFigureOr(host, "pages_scanned", 0, &scanned);
-  if (status == kOk) status = ReadZeroPages(host, &zero);
+  Figure scanned;
+  Figure zero;
+  if (status == kOk) status = host.ReadNumber(FileOf("pages_sharing"), sharing);
+  if (status == kOk) status = host.ReadNumber(FileOf("full_scans"), scans);
+  if (status == kOk) status = host.ReadNumberIfAny(FileOf("pages_scanned"), scanned);
+  if (status == kOk) status = ReadZeroPages(host, zero);
   if (status != kOk) return status;
 
   // The kernel counts what is shared now, not what ever was: that can be told only of a scanner
   // that has not done anything yet. Which page has one reference left, only if there are no others.
-  const bool neverScanned = scans == 0 && scanned == 0 && shared == 0;
+  const bool neverScanned = scans == 0 && scanned.value_or(0) == 0 && shared == 0;
+  const Figure everShared = neverScanned ? Figure(0) : std::nullopt;
   const uint64_t pages4K = host.PageKB() / 4;
-  const auto in4K = [&](uint64_t pages) { return pages == kNoValue ? pages : pages * pages4K; };
-  const uint64_t zeroIfTold = zero == kNoValue ? 0 : zero;
+  const auto in4K = [&](Figure pages) { return FieldOf(ProductOf(pages, pages4K)); };
+  const uint64_t zeroIfTold = zero.value_or(0);
 
-  record.cow = in4K(shared + sharing + zeroIfTold);
-  record.cow1 = in4K(sharing == 0 ? shared : kNoValue);
+  record.cow = in4K(SumOf({shared, sharing, zeroIfTold}));
+  record.cow1 = in4K(sharing == 0 ? Figure(shared) : std::nullopt);
   record.zero = in4K(zero);
   record.used = in4K(shared);
-  record.reclaimed = in4K(sharing + zeroIfTold);
-  record.totAdd = neverScanned ? 0 : kNoValue;
-  record.totRemove = neverScanned ? 0 : kNoValue;
-  return Answer(buffer, record);
+  record.reclaimed = in4K(SumOf({sharing, zeroIfTold}));
+  record.totAdd = FieldOf(everShared);
+  record.totRemove = FieldOf(everShared);
+  return kOk;
 }
+
+constexpr Reader kReaders[] = {ValueOf<node::memory_pshare_stats, ReadPshareStats>()};
+
+}  // namespace
+
+constinit const ReaderTable kKsmReaders = kReaders;
 
 }  // namespace ksi

@@ -1,20 +1,20 @@
 // The host's memory as a whole: how it is divided and how short it is. docs/linux-host.md says
 // where each figure comes from and why.
 #include <algorithm>
-#include <array>
-#include <vector>
+#include <iterator>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/linux/handlers.h"
-#include "knvlibs/linux/host/figures.h"
+#include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/memory/iomem.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
+#include "knvlibs/linux/reader_tables.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
 
 // All zones together, in pages.
-Zone SumOf(const std::vector<Zone>& zones) {
+Zone TotalOf(const Zones& zones) {
   Zone sum;
   for (const Zone& zone : zones) {
     sum.free += zone.free;
@@ -37,99 +37,103 @@ uint32_t StateOf(const Zone& sum) {
   return state;
 }
 
-uint64_t Less(uint64_t value, uint64_t part) { return value - std::min(value, part); }
+// Low memory that the kernel keeps from the page allocator, in pages.
+uint64_t ReservedLowOf(const Zones& zones) {
+  uint64_t reserved = 0;
+  for (const Zone& zone : zones) {
+    if (zone.IsLow()) reserved += Less(zone.present, zone.managed);
+  }
+  return reserved;
+}
 
 // What the kernel uses on behalf of files (`cache`) and what processes use (`processes`), in KB.
-Status ReadConsumed(const Figures& meminfo, uint64_t* cache, uint64_t* processes) {
+Status ReadConsumed(const FigureFile& meminfo, uint64_t& cache, uint64_t& processes) {
   uint64_t buffers = 0;
   uint64_t cached = 0;
   uint64_t anonymous = 0;
-  Status status = meminfo.Require("Buffers", &buffers);
-  if (status == kOk) status = meminfo.Require("Cached", &cached);
-  if (status == kOk) status = meminfo.Require("AnonPages", &anonymous);
+  Status status = meminfo.Require("Buffers", buffers);
+  if (status == kOk) status = meminfo.Require("Cached", cached);
+  if (status == kOk) status = meminfo.Require("AnonPages", anonymous);
   if (status != kOk) return status;
 
-  const uint64_t shared = meminfo.FindOr("Shmem", 0);
-  const uint64_t hugeKB = meminfo.FindOr("Hugepagesize", 0);
-  const uint64_t hugeUsed =
+  const uint64_t shmem = meminfo.FindOr("Shmem", 0);
+  const uint64_t hugepageKB = meminfo.FindOr("Hugepagesize", 0);
+  const uint64_t hugepages =
       Less(meminfo.FindOr("HugePages_Total", 0), meminfo.FindOr("HugePages_Free", 0));
-  *cache = buffers + Less(cached, shared);
-  *processes = anonymous + shared + hugeUsed * hugeKB;
+  cache = buffers + Less(cached, shmem);
+  processes = anonymous + shmem + hugepages * hugepageKB;
   return kOk;
 }
 
-}  // namespace
-
-Status ReadComprehensive(const LinuxHost& host, const Keys& /*keys*/, Buffer buffer) {
-  Figures meminfo;
-  Figures vmstat;
-  std::vector<Zone> zones;
-  Status status = meminfo.ReadMeminfo(host);
-  if (status == kOk) status = vmstat.ReadVmstat(host);
-  if (status == kOk) status = ReadZones(host, &zones);
-  if (status != kOk) return status;
-
+Status ReadComprehensive(const LinuxHost& host, const Keys& /*keys*/, KSI_Comprehensive& record) {
+  const FigureFile* meminfo = nullptr;
+  const Zones* zones = nullptr;
+  FigureFile vmstat;
+  Status status = host.Kept().meminfo.Get(host, meminfo);
+  if (status == kOk) status = FigureFile::ReadVmstat(host, vmstat);
+  if (status == kOk) status = host.Kept().zones.Get(host, zones);
   uint64_t total = 0;
   uint64_t free = 0;
   uint64_t heap = 0;
   uint64_t cache = 0;
   uint64_t processes = 0;
-  status = meminfo.Require("MemTotal", &total);
-  if (status == kOk) status = meminfo.Require("MemFree", &free);
-  if (status == kOk) status = ReadKernelHeap(meminfo, &heap);
-  if (status == kOk) status = ReadConsumed(meminfo, &cache, &processes);
+  if (status == kOk) status = meminfo->Require("MemTotal", total);
+  if (status == kOk) status = meminfo->Require("MemFree", free);
+  if (status == kOk) status = ReadKernelHeap(*meminfo, heap);
+  if (status == kOk) status = ReadConsumed(*meminfo, cache, processes);
   if (status != kOk) return status;
 
-  const Zone sum = SumOf(zones);
-  uint64_t reservedLow = 0;
-  for (const Zone& zone : zones) {
-    if (zone.IsLow()) reservedLow += Less(zone.present, zone.managed);
-  }
-  const std::optional<uint64_t> code = IomemSize(host, "Kernel code");
-  const std::optional<uint64_t> memmap = vmstat.Find("nr_memmap_pages");
-
-  KSI_Comprehensive record = {};
+  const Zone sum = TotalOf(*zones);
+  const Figure memmap =
+      SumOf({vmstat.Find("nr_memmap_pages"), vmstat.FindOr("nr_memmap_boot_pages", 0)});
   record.total = sum.present * host.PageKB();
   record.managedByMemMap = total;
   record.reliableMem = 0;
-  record.discarded = meminfo.FindOr("HardwareCorrupted", 0);
+  record.discarded = meminfo->FindOr("HardwareCorrupted", 0);
   record.critical = sum.min * host.PageKB();
-  record.buddyOvhd =
-      memmap ? (*memmap + vmstat.FindOr("nr_memmap_boot_pages", 0)) * host.PageKB() : kNoValue;
-  record.kernelCode = code ? *code / 1024 : kNoValue;
+  record.buddyOvhd = FieldOf(ProductOf(memmap, host.PageKB()));
+  record.kernelCode = FieldOf(QuotientOf(IomemSize(host, "Kernel code"), 1024));
   record.dataAndHeap = heap;
   record.knvClientConsumed = cache;
   record.otherConsumed = processes;
-  record.rsvdLow = reservedLow * host.PageKB();
+  record.rsvdLow = ReservedLowOf(*zones) * host.PageKB();
   record.free = free;
-  return Answer(buffer, record);
+  return kOk;
 }
 
-Status ReadGlobalTally(const LinuxHost& host, const Keys& /*keys*/, Buffer buffer) {
-  Figures meminfo;
-  std::vector<Zone> zones;
-  Status status = meminfo.ReadMeminfo(host);
-  if (status == kOk) status = ReadZones(host, &zones);
+Status ReadGlobalTally(const LinuxHost& host, const Keys& /*keys*/, KSI_GlobalTally& record) {
+  const FigureFile* meminfo = nullptr;
+  const Zones* zones = nullptr;
   uint64_t total = 0;
   uint64_t heap = 0;
-  if (status == kOk) status = meminfo.Require("MemTotal", &total);
-  if (status == kOk) status = ReadKernelHeap(meminfo, &heap);
+  Status status = host.Kept().meminfo.Get(host, meminfo);
+  if (status == kOk) status = host.Kept().zones.Get(host, zones);
+  if (status == kOk) status = meminfo->Require("MemTotal", total);
+  if (status == kOk) status = ReadKernelHeap(*meminfo, heap);
   if (status != kOk) return status;
 
-  const Zone sum = SumOf(zones);
-  KSI_GlobalTally record = {};
+  const Zone sum = TotalOf(*zones);
   record.managedByMemSched = Less(total, heap);
   record.minFree = sum.high * host.PageKB();
   record.memState = StateOf(sum);
-  return Answer(buffer, record);
+  return kOk;
 }
 
-Status ReadStateTransitions(const LinuxHost& /*host*/, const Keys& keys, Buffer buffer) {
-  if (std::ranges::find(kMemoryStates, keys[0].text) == std::end(kMemoryStates)) {
-    return KSI_STATUS_NOT_FOUND;
-  }
+Status ReadStateTransitions(const LinuxHost& /*host*/, const Keys& keys,
+                            KSI_StateTransitions& /*record*/) {
+  const bool isState = std::ranges::find(kMemoryStates, keys[0].text) != std::end(kMemoryStates);
   // Linux has no memory states and so never left one.
-  return Answer(buffer, KSI_StateTransitions{});
+  return isState ? kOk : KSI_STATUS_NOT_FOUND;
 }
+
+constexpr Reader kReaders[] = {
+    ValueOf<node::memory_comprehensive, ReadComprehensive>(),
+    ValueOf<node::sched_globalStats_memory_tally, ReadGlobalTally>(),
+    ValueOf<node::sched_globalStats_memory_stateTransitions, ReadStateTransitions>(),
+};
+
+}  // namespace
+
+constinit const ReaderTable kMemoryReaders = kReaders;
 
 }  // namespace ksi

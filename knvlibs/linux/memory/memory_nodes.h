@@ -26,11 +26,13 @@ struct MemoryNodes {
   std::optional<size_t> Of(uint64_t numaNode) const;
 };
 
-// The memory nodes, as lately read.
-Status FindMemoryNodes(const LinuxHost& host, const MemoryNodes** nodes);
+[[nodiscard]] Status ReadMemoryNodes(const LinuxHost& host, MemoryNodes& nodes);
+
+// The memory nodes of this reading.
+[[nodiscard]] Status FindMemoryNodes(const LinuxHost& host, const MemoryNodes*& nodes);
 
 // The memory node that a key asks for.
-Status FindMemoryNode(const MemoryNodes& nodes, int64_t key, size_t* node);
+[[nodiscard]] Status FindMemoryNode(const MemoryNodes& nodes, int64_t key, size_t& node);
 
 }  // namespace ksi
 

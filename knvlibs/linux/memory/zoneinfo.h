@@ -26,7 +26,9 @@ struct Zone {
   bool IsLow() const { return name.starts_with("DMA"); }
 };
 
-Status ReadZones(const LinuxHost& host, std::vector<Zone>* zones);
+using Zones = std::vector<Zone>;
+
+[[nodiscard]] Status ReadZones(const LinuxHost& host, Zones& zones);
 
 }  // namespace ksi
 

@@ -1,7 +1,6 @@
 // What a QEMU command line and its monitor tell of a virtual machine.
 #include <gtest/gtest.h>
 
-#include "knvlibs/linux/host/json.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 #include "knvlibs/linux/machines/qmp.h"
 #include "tests/knvlibs/host_tree.h"
@@ -37,9 +36,9 @@ TEST(QemuCommandLineTest, MemoryHasManyForms) {
   EXPECT_EQ(Parse({"-m", "1G,slots=4,maxmem=4294967296B"}).maxMemory, 4 * kGB);
   EXPECT_EQ(Parse({"-m", "1G"}).maxMemory, kGB);
   for (const char* strange : {"", "x", "4X", "-4", "1.5G", "99999999999999999999", "16777216E"}) {
-    EXPECT_EQ(Parse({"-m", strange}).memory, kNoValue) << strange;
+    EXPECT_EQ(Parse({"-m", strange}).memory, std::nullopt) << strange;
   }
-  EXPECT_EQ(Parse({"-m"}).memory, kNoValue);
+  EXPECT_EQ(Parse({"-m"}).memory, std::nullopt);
   EXPECT_TRUE(Parse({}).blocks.empty());
 }
 
@@ -48,19 +47,19 @@ TEST(QemuCommandLineTest, BackendsAreNodesOrModules) {
       Parse({"-m", "4G", "-object", "memory-backend-ram,id=a,size=1G", "-object",
              R"({"qom-type":"memory-backend-memfd","id":"b","size":3221225472})"});
   EXPECT_EQ(nodes.memory, 4 * kGB);
-  EXPECT_EQ(nodes.blocks, (std::vector<uint64_t>{kGB, 3 * kGB}));
+  EXPECT_EQ(nodes.blocks, (std::vector<Figure>{kGB, 3 * kGB}));
 
   const QemuCommandLine module =
       Parse({"-m", "4G,maxmem=8G", "-object", "memory-backend-ram,id=a,size=1G", "-device",
              R"({"driver":"pc-dimm","id":"d","memdev":"a"})"});
   EXPECT_EQ(module.memory, 5 * kGB);
   EXPECT_EQ(module.maxMemory, 8 * kGB);
-  EXPECT_EQ(module.blocks, (std::vector<uint64_t>{4 * kGB, kGB}));
+  EXPECT_EQ(module.blocks, (std::vector<Figure>{4 * kGB, kGB}));
 
   const QemuCommandLine persistent = Parse(
       {"-m", "4G", "-object", "memory-backend-file,id=n,size=1G", "-device", "nvdimm,memdev=n"});
   EXPECT_EQ(persistent.memory, 4 * kGB);
-  EXPECT_EQ(persistent.blocks, (std::vector<uint64_t>{4 * kGB}));
+  EXPECT_EQ(persistent.blocks, (std::vector<Figure>{4 * kGB}));
 }
 
 TEST(QemuCommandLineTest, NamesMayHaveCommas) {
@@ -78,22 +77,6 @@ TEST(QemuCommandLineTest, MonitorsAreNamedInThreeWays) {
   EXPECT_EQ(Parse({"-chardev", "socket,id=m,fd=33", "-mon", "m,mode=control"}).monitor, "");
   EXPECT_EQ(Parse({"-qmp", "unix:here,server=on"}).monitor, "");
   EXPECT_EQ(Parse({"-qmp", "tcp:localhost:4444"}).monitor, "");
-}
-
-TEST(JsonTest, ReadsWhatIsOneValueAndNothingElse) {
-  const auto json =
-      ParseJson(R"( {"a": [1, {"b": "x\"\u0041\n"}], "c": -1, "d": null, "e": true} )");
-  ASSERT_TRUE(json);
-  EXPECT_EQ(json->Find("c")->Unsigned(), std::nullopt);
-  const auto& elements = std::get<Json::Elements>(json->Find("a")->value);
-  EXPECT_EQ(elements[0].Unsigned(), 1u);
-  EXPECT_EQ(*elements[1].Find("b")->Text(), "x\"A\n");
-  EXPECT_EQ(elements[1].Find("missing"), nullptr);
-  for (const char* broken :
-       {"", "{", "{\"a\"}", "[1,]", "{}x", "\"open", "\"\\q\"", "\"\\u12\"", "tru", "{\"a\":1,}"}) {
-    EXPECT_FALSE(ParseJson(broken)) << broken;
-  }
-  EXPECT_FALSE(ParseJson(std::string(100000, '[')));
 }
 
 class QmpTest : public testing::Test {
@@ -120,7 +103,7 @@ TEST_F(QmpTest, TellsTheBalloonAndTheGuest) {
   EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kActive);
   EXPECT_EQ(memory.actual, 1024u);
   EXPECT_EQ(memory.total, 4u);
-  EXPECT_EQ(memory.available, kNoValue);
+  EXPECT_EQ(memory.available, std::nullopt);
 }
 
 TEST_F(QmpTest, StatisticsThatWereNeverSentAreNone) {
@@ -128,7 +111,7 @@ TEST_F(QmpTest, StatisticsThatWereNeverSentAreNone) {
                                  "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": "
                                  "{\"stat-total-memory\": 4096}, \"last-update\": 0}}\n");
   EXPECT_EQ(memory.actual, 1024u);
-  EXPECT_EQ(memory.total, kNoValue);
+  EXPECT_EQ(memory.total, std::nullopt);
 }
 
 TEST_F(QmpTest, WithoutABalloonDeviceThereIsNone) {
@@ -144,7 +127,7 @@ TEST_F(QmpTest, WhatAnswersOtherwiseTellsNothing) {
         std::string("{\"QMP\": {}}\n")}) {
     const GuestMemory memory = Ask(text);
     EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kUnknown) << text;
-    EXPECT_EQ(memory.actual, kNoValue) << text;
+    EXPECT_EQ(memory.actual, std::nullopt) << text;
   }
 }
 

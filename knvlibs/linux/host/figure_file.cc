@@ -1,0 +1,83 @@
+#include "knvlibs/linux/host/figure_file.h"
+
+#include <algorithm>
+
+#include <knvlibs/ksi.h>
+#include "knvlibs/linux/host/text.h"
+
+namespace ksi {
+
+Status FigureFile::ReadMeminfo(const LinuxHost& host, FigureFile& meminfo) {
+  meminfo.file_ = "/proc/meminfo";
+  const Status status = host.Read(meminfo.file_, meminfo.content_);
+  if (status != kOk) return status;
+
+  // "MemTotal:       24684092 kB", "HugePages_Free:        0"
+  meminfo.lines_.clear();
+  Lines lines(meminfo.content_);
+  std::string_view text;
+  while (lines.Next(text)) {
+    Line line{TakeWord(text), 0};
+    const std::string_view value = TakeWord(text);
+    const std::string_view unit = TakeWord(text);
+    if (!line.name.ends_with(':') || !ParseNumber(value, line.value) ||
+        (unit != "kB" && !unit.empty()) || !TakeWord(text).empty()) {
+      return NotUnderstood(meminfo.file_, lines.Number());
+    }
+    line.name.remove_suffix(1);
+    meminfo.lines_.push_back(line);
+  }
+  return kOk;
+}
+
+Status FigureFile::ReadVmstat(const LinuxHost& host, FigureFile& vmstat) {
+  return vmstat.ReadPairs(host, "/proc/vmstat");
+}
+
+Status FigureFile::ReadPairs(const LinuxHost& host, std::string_view file) {
+  file_ = file;
+  const Status status = host.Read(file_, content_);
+  if (status != kOk) return status;
+
+  lines_.clear();
+  Lines lines(content_);
+  std::string_view text;
+  while (lines.Next(text)) {
+    Line line{TakeWord(text), 0};
+    if (!ParseNumber(TakeWord(text), line.value) || !TakeWord(text).empty()) {
+      return host.NotUnderstoodOnce(file.substr(file.rfind('/') + 1), file_, lines.Number());
+    }
+    lines_.push_back(line);
+  }
+  return kOk;
+}
+
+Figure FigureFile::Find(std::string_view name) const {
+  const auto found = std::ranges::find(lines_, name, &Line::name);
+  if (found == lines_.end()) return std::nullopt;
+  return found->value;
+}
+
+Status FigureFile::Require(std::string_view name, uint64_t& value) const {
+  const Figure found = Find(name);
+  if (!found) {
+    Warning("%s: %.*s is missing\n", file_.c_str(), static_cast<int>(name.size()), name.data());
+    return KSI_STATUS_INVALID_METADATA;
+  }
+  value = *found;
+  return kOk;
+}
+
+Status ReadKernelHeap(const FigureFile& meminfo, uint64_t& heap) {
+  uint64_t slab = 0;
+  uint64_t pageTables = 0;
+  uint64_t vmalloc = 0;
+  Status status = meminfo.Require("Slab", slab);
+  if (status == kOk) status = meminfo.Require("PageTables", pageTables);
+  if (status == kOk) status = meminfo.Require("VmallocUsed", vmalloc);
+  heap = slab + pageTables + vmalloc + meminfo.FindOr("SecPageTables", 0) +
+         meminfo.FindOr("Percpu", 0);
+  return status;
+}
+
+}  // namespace ksi

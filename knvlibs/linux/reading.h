@@ -1,0 +1,43 @@
+// What has been read of a host for one report: the parts that answer for many instances, so that a
+// report's rows are of one moment, and what it costs and tells once.
+#ifndef KNVLIBS_LINUX_READING_H_
+#define KNVLIBS_LINUX_READING_H_
+
+#include <chrono>
+#include <functional>
+#include <set>
+#include <string>
+
+#include "knvlibs/linux/groups/groups.h"
+#include "knvlibs/linux/groups/process_ksm.h"
+#include "knvlibs/linux/heaps/heaps.h"
+#include "knvlibs/linux/host/figure_file.h"
+#include "knvlibs/linux/host/once.h"
+#include "knvlibs/linux/machines/qmp.h"
+#include "knvlibs/linux/memory/buddyinfo.h"
+#include "knvlibs/linux/memory/memory_nodes.h"
+#include "knvlibs/linux/memory/zoneinfo.h"
+#include "knvlibs/linux/pmem/nvdimm.h"
+
+namespace ksi {
+
+struct Reading {
+  Once<FigureFile, FigureFile::ReadMeminfo> meminfo;
+  Once<Zones, ReadZones> zones;
+  Once<MemoryNodes, ReadMemoryNodes> memoryNodes;
+  Once<Buddies, ReadBuddies> buddies;
+  Once<Heaps, ReadHeaps> heaps;
+  Once<NvdimmDevices, ReadNvdimmDevices> nvdimms;
+  Once<bool, ReadIsSharing> isSharing;
+  Once<GroupTree, GroupTree::Read> groups;
+
+  // What is left of the time that monitors may take.
+  std::chrono::steady_clock::duration monitorTime = kMonitorTime;
+
+  // What has been said (LinuxHost::First).
+  std::set<std::string, std::less<>> told;
+};
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_LINUX_READING_H_

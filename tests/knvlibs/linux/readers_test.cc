@@ -1,0 +1,46 @@
+// The tables that bind readers to nodes.
+#include <gtest/gtest.h>
+
+#include <map>
+
+#include "knvlibs/catalogue.h"
+#include "knvlibs/linux/linux_source.h"
+#include "knvlibs/linux/reader_tables.h"
+#include "tests/knvlibs/host_tree.h"
+
+namespace ksi {
+namespace {
+
+TEST(ReadersTest, EachQuestionHasOneReader) {
+  std::map<uint16_t, int> values;
+  std::map<uint16_t, int> lists;
+  for (const ReaderTable& table : ReaderTables()) {
+    for (const Reader& reader : table) {
+      values[reader.node] += reader.value != nullptr ? 1 : 0;
+      lists[reader.node] += reader.list != nullptr ? 1 : 0;
+    }
+  }
+  for (const Node& node : Catalogue()) {
+    EXPECT_EQ(values[IdOf(node)], node.HasValue() ? 1 : 0) << node.path;
+    EXPECT_EQ(lists[IdOf(node)], node.HasList() ? 1 : 0) << node.path;
+  }
+}
+
+TEST(ReadersTest, WhatHasNoReaderIsAStatus) {
+  const HostTree tree;
+  LinuxSource source(tree.Root());
+  ParamList list(ParamList::kNoLimit);
+  EXPECT_EQ(source.Value(*FindNode("system/heaps"), Keys(), Buffer()), KSI_STATUS_NO_HANDLER);
+  EXPECT_EQ(source.Instances(*FindNode("memory/memInfo"), Keys(), list), KSI_STATUS_NO_HANDLER);
+}
+
+TEST(ReadersTest, ABufferOfAnotherSizeIsNotFilled) {
+  const HostTree tree;
+  LinuxSource source(tree.Root());
+  std::byte buffer[4] = {};
+  EXPECT_EQ(source.Value(*FindNode("memory/pshare/stats"), Keys(), buffer),
+            KSI_STATUS_LENGTH_MISMATCH);
+}
+
+}  // namespace
+}  // namespace ksi
