@@ -194,5 +194,25 @@ TEST(LiveGroupsTest, AGuestIsAVirtualMachine) {
   }
 }
 
+TEST(LiveGroupsTest, AGuestThatWaitsForItsFirstClientIsNotReleased) {
+  if (std::system("command -v qemu-system-x86_64 >/dev/null") != 0) {
+    GTEST_SKIP() << "this machine has no QEMU";
+  }
+  const HostTree directory;
+  const std::string socket = directory.Root() + "/monitor";
+  const Child guest({"qemu-system-x86_64", "-name", "guest=tally-waits", "-accel", "tcg", "-M",
+                     "pc", "-m", "64", "-display", "none", "-serial", "none", "-monitor", "none",
+                     "-device", "virtio-balloon-pci", "-qmp", "unix:" + socket + ",server=on"});
+  for (int i = 0; i < 100 && access(socket.c_str(), F_OK) != 0; ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  }
+  const harness::Result run = TallyLive({"-r", "vm-stats", "-q", "-s", "name:memSize:ballooned"});
+  EXPECT_NE(run.out.find("tally-waits,65536,18446744073709551615\n"), std::string::npos) << run.out;
+  // It would have its memory at once.
+  std::this_thread::sleep_for(std::chrono::seconds(1));
+  const std::string smaps = "/proc/" + std::to_string(guest.Pid()) + "/smaps";
+  EXPECT_EQ(Shell("grep -c '^VmFlags:.* dc' " + smaps), "0\n");
+}
+
 }  // namespace
 }  // namespace ksi

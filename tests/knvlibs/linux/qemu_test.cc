@@ -1,6 +1,11 @@
 // What a QEMU command line and its monitor tell of a virtual machine.
 #include <gtest/gtest.h>
 
+#include <string>
+#include <vector>
+
+#include <knvlibs/ksi_records.h>
+#include "knvlibs/linux/linux_source.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 #include "knvlibs/linux/machines/qmp.h"
 #include "tests/knvlibs/host_tree.h"
@@ -79,6 +84,30 @@ TEST(QemuCommandLineTest, MonitorsAreNamedInThreeWays) {
   EXPECT_EQ(Parse({"-qmp", "tcp:localhost:4444"}).monitor, "");
 }
 
+TEST(QemuCommandLineTest, AServerWaitsForItsFirstClientUnlessItIsToldNotTo) {
+  const struct {
+    const char* options;
+    bool waits;
+  } kCases[] = {{",server=on", true},
+                {",server", true},
+                {",server=on,wait=on", true},
+                {",server=on,wait=off", false},
+                {",server=on,wait=no", false},
+                {",server,nowait", false},
+                {",server=on,nowait", false},
+                {",server=off", false},
+                {"", false},
+                {",server=yes,wait=true", true}};
+  for (const auto& [options, waits] : kCases) {
+    const std::string socket = std::string("/run/q") + options;
+    EXPECT_EQ(Parse({"-qmp", "unix:" + socket}).waitsForClient, waits) << options;
+    const QemuCommandLine device =
+        Parse({"-chardev", "socket,id=m,path=" + socket, "-mon", "chardev=m,mode=control"});
+    EXPECT_EQ(device.monitor, "/run/q") << options;
+    EXPECT_EQ(device.waitsForClient, waits) << options;
+  }
+}
+
 class QmpTest : public testing::Test {
  protected:
   GuestMemory Ask(const std::string& text) {
@@ -130,6 +159,38 @@ TEST_F(QmpTest, WhatAnswersOtherwiseTellsNothing) {
     EXPECT_EQ(memory.actual, std::nullopt) << text;
   }
 }
+
+// A QEMU that makes its machine when its monitor has had a client.
+class WaitingMachineTest : public testing::Test {
+ protected:
+  WaitingMachineTest() {
+    tree_.Write("/proc/100/status",
+                "Name:\tqemu\nState:\tS\nPPid:\t1\nThreads:\t2\nVmSize:\t9 kB\n");
+    std::string words;
+    for (const char* word : {"qemu-kvm", "-m", "1", "-qmp", "unix:/run/q,server=on", "-device",
+                             "virtio-balloon,id=b"}) {
+      words.append(word).push_back('\0');
+    }
+    tree_.Write("/proc/100/cmdline", words);
+    tree_.Write("/run/q", "{\"QMP\": {}}\n{\"return\": {}}\n{\"return\": {\"actual\": 524288}}\n");
+  }
+
+  // 0, 1, or all ones where nobody was asked.
+  int BalloonWith(const std::string& flags) {
+    tree_.Write("/proc/100/smaps",
+                "100000-200000 rw-p 0 00:00 0\nRss: 4 kB\nVmFlags: " + flags + "\n");
+    LinuxSource source(tree_.Root());
+    KSI_VmmTally tally = {};
+    EXPECT_EQ(GetValue(source, "sched/memClients/tally/vmm", {int64_t{100}}, &tally), kOk);
+    return tally.balloonActive;
+  }
+
+  HostTree tree_;
+};
+
+TEST_F(WaitingMachineTest, IsNotReleased) { EXPECT_EQ(BalloonWith("rd wr mr"), 255); }
+
+TEST_F(WaitingMachineTest, IsAskedOnceItIsMade) { EXPECT_EQ(BalloonWith("rd wr mr dc"), 1); }
 
 }  // namespace
 }  // namespace ksi
