@@ -26,7 +26,7 @@ struct Layout {
   {#name, unit, meaning, offset, sizeof(type), TypeOf<type>(unit)},
 #define TEXT(offset, size, name, meaning) {#name, "", meaning, offset, size, FieldType::kText},
 #define GAP(offset, size)
-#define ONE(...) +1
+#define ONE(...) +1  // NOLINT(bugprone-macro-parentheses): a term
 #define RECORD(record, size)                                                              \
   constexpr std::array<Field, 0 KSI_RECORD_##record(ONE, ONE, GAP)> k##record##Fields = { \
       {KSI_RECORD_##record(FIELD, TEXT, GAP)}};                                           \

@@ -142,7 +142,7 @@ void Warning(const char *format, ...);
 /* Receives the whole text of a diagnostic, whatever its length; it lives until the handler returns.
  * The handler runs in the thread that says it, in the midst of a read maybe: it calls no operation
  * of the library and returns. */
-typedef void (*KSI_DiagnosticHandler)(void* context, const char* text);
+typedef void (*KSI_DiagnosticHandler)(void* context, const char* text); /* NOLINT: C */
 
 /* Gives all later diagnostics of the process to `handler`, with `context`. NULL: to standard error
  * again. A diagnostic that another thread is saying may still go to the handler before. */

@@ -41,7 +41,7 @@
   STATE(4, LOW, "low", "Low")
 
 enum {
-#define KSI_STATE(number, identifier, name, title) KSI_MEMORY_STATE_##identifier = number,
+#define KSI_STATE(number, identifier, name, title) KSI_MEMORY_STATE_##identifier = (number),
   KSI_MEMORY_STATES(KSI_STATE)
 #undef KSI_STATE
 };
@@ -486,7 +486,7 @@ enum {
 KSI_RECORDS(KSI_STRUCT)
 
 /* A buddy allocator. */
-#define KSI_COUNT(size) +1
+#define KSI_COUNT(size) +1 /* NOLINT(bugprone-macro-parentheses): a term */
 enum { KSI_BUDDY_SIZES = 0 KSI_BUDDY_SIZE_TABLE(KSI_COUNT) };
 struct KSI_BuddyStats {
   uint8_t unused0[8];
@@ -507,7 +507,7 @@ KSI_NUMBERS(KSI_NUMBER)
 enum {
   KSI_SIZE_None = 0,
   KSI_SIZE_BuddyStats = 236,
-#define KSI_SIZE(record, size) KSI_SIZE_##record = size,
+#define KSI_SIZE(record, size) KSI_SIZE_##record = (size),
   KSI_RECORDS(KSI_SIZE)
 #undef KSI_SIZE
 #define KSI_SIZE(record, type, name, unit, meaning) KSI_SIZE_##record = sizeof(type),

@@ -368,7 +368,7 @@
 /* clang-format on */
 
 enum {
-#define KSI_TEXT(row, message) +1
+#define KSI_TEXT(row, message) +1 /* NOLINT(bugprone-macro-parentheses): a term */
   KSI_STATUS_TEXT_COUNT = 0 KSI_STATUS_TEXTS(KSI_TEXT)
 #undef KSI_TEXT
 };
