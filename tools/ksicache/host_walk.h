@@ -8,11 +8,11 @@
 #define TOOLS_KSICACHE_HOST_WALK_H_
 
 #include <array>
-#include <compare>
 #include <cstdint>
 #include <set>
 #include <string>
 #include <string_view>
+#include <tuple>
 #include <vector>
 
 #include "knvlibs/catalogue.h"
@@ -41,7 +41,9 @@ class HostWalk {
     int64_t number = 0;
     std::string text;
 
-    friend auto operator<=>(const ObjectKey&, const ObjectKey&) = default;
+    friend bool operator<(const ObjectKey& a, const ObjectKey& b) {
+      return std::tie(a.instance, a.number, a.text) < std::tie(b.instance, b.number, b.text);
+    }
   };
   using Object = std::array<ObjectKey, ksi::kMaxKeys>;
 

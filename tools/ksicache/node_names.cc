@@ -14,10 +14,10 @@ namespace {
 size_t Distance(std::string_view a, std::string_view b) {
   std::vector<size_t> row(b.size() + 1);
   std::iota(row.begin(), row.end(), 0);
-  for (size_t i = 0; i < a.size(); ++i) {
+  for (const char c : a) {
     size_t before = row[0]++;
     for (size_t j = 0; j < b.size(); ++j) {
-      const size_t changed = before + (a[i] == b[j] ? 0 : 1);
+      const size_t changed = before + (c == b[j] ? 0 : 1);
       before = row[j + 1];
       row[j + 1] = std::min({changed, before + 1, row[j] + 1});
     }
