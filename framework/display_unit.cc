@@ -1,6 +1,7 @@
 #include "framework/display_unit.h"
 
 #include <knvlibs/ksi.h>
+#include <knvlibs/ksi_records.h>
 #include "framework/name_list.h"
 
 namespace tally {
@@ -49,7 +50,7 @@ uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit) {
 }
 
 uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit) {
-  return kilobytes == kNoValue ? kNoValue : ShiftKilobytes(kilobytes, unit);
+  return kilobytes == KSI_NO_VALUE ? KSI_NO_VALUE : ShiftKilobytes(kilobytes, unit);
 }
 
 uint64_t FromPages(uint64_t pages, DisplayUnit unit) { return ShiftKilobytes(pages * 4, unit); }

@@ -10,9 +10,6 @@ namespace tally {
 
 enum class DisplayUnit : uint8_t { mb = 3, kb = 4, pg = 5, b = 6 };
 
-// The kernel's word for "no value" or "unlimited". Shown as it is in every unit.
-constexpr uint64_t kNoValue = UINT64_MAX;
-
 // Reads the word of -u, in any case; no text means kb. `allowBytes`: "b" is a word too. An unknown
 // word is kBadParameter, after its message.
 [[nodiscard]] Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit);
@@ -26,7 +23,7 @@ using Conversion = uint64_t (*)(uint64_t value, DisplayUnit unit);
 // From kilobytes, shifting only.
 uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit);
 
-// From kilobytes; kNoValue stays.
+// From kilobytes; KSI_NO_VALUE stays.
 uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit);
 
 // From 4 KB pages. They become kilobytes first, so the two top bits are lost.

@@ -28,9 +28,8 @@ struct UWStatsRow {
 
 // A limit of so many kilobytes and more stands for none: it is that of a page count, 0xFFFFFFFC.
 uint64_t LimitOrNone(int64_t kilobytes) {
-  constexpr uint64_t kNoLimit = 0x3FFFFFFF0;
   const auto limit = static_cast<uint64_t>(kilobytes);
-  return limit >= kNoLimit ? kNoValue : limit;
+  return limit >= KSI_UW_NO_LIMIT ? KSI_NO_VALUE : limit;
 }
 
 // Neither type nor name has a cell in the Total row: it bears no label.

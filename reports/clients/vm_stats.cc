@@ -36,7 +36,7 @@ uint64_t FromSigned32Kilobytes(uint64_t kilobytes, DisplayUnit unit) {
     return static_cast<uint64_t>(static_cast<int32_t>(value));
   };
   const uint64_t value = narrow(kilobytes);
-  return value == kNoValue ? kNoValue : narrow(ShiftKilobytes(value, unit));
+  return value == KSI_NO_VALUE ? KSI_NO_VALUE : narrow(ShiftKilobytes(value, unit));
 }
 
 // A negative limit is none.

@@ -62,8 +62,7 @@ struct GroupColumn : Column<GroupRow> {
 
 // A limit above so many kilobytes stands for none.
 int64_t LimitOrNone(int64_t kilobytes) {
-  constexpr int64_t kLargestLimit = 0xFFFFFFFFF0;
-  return kilobytes > kLargestLimit ? -1 : kilobytes;
+  return kilobytes > KSI_GROUP_LARGEST_LIMIT ? -1 : kilobytes;
 }
 
 constexpr GroupColumn kColumns[] = {
@@ -207,7 +206,7 @@ Status GroupContext::AddToTag(const GroupRow& row) {
         slot->figures[i] = figure;
         break;
       case InTag::noLimit:
-        slot->figures[i] = kNoValue;
+        slot->figures[i] = KSI_NO_VALUE;
         break;
     }
   }

@@ -5,6 +5,8 @@
 // keeps and the state are sched/globalStats/memory/tally; the entries into a state are counted from
 // sched/globalStats/memory/stateTransitions, which tells for each state how often it was left.
 
+#include <iterator>
+
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
 #include "framework/param_list.h"
@@ -20,22 +22,26 @@ constexpr ReportFrame kFrame = {
     .options = "s:u:vq",
 };
 
+#define NAME(number, identifier, name, title) name,
+#define TITLE(number, identifier, name, title) title,
 // The memory states from best to worst; the last one stands for any other.
-enum MemState : uint32_t { kHigh, kClear, kSoft, kHard, kLow, kUnknown };
-
-constexpr const char* memStateNames[] = {"high", "clear", "soft", "hard", "low", "unknown"};
-constexpr const char* kMemStateTitles[] = {"High", "Clear", "Soft", "Hard", "Low", "Unknown"};
+constexpr const char* memStateNames[] = {KSI_MEMORY_STATES(NAME) "unknown"};
+constexpr const char* kMemStateTitles[] = {KSI_MEMORY_STATES(TITLE) "Unknown"};
+#undef NAME
+#undef TITLE
+constexpr uint32_t kMemStates = std::size(memStateNames) - 1;
 
 struct CompRow {
   KSI_Comprehensive memory;
   KSI_GlobalTally tally;
-  KSI_StateTransitions transitions[kUnknown];
+  KSI_StateTransitions transitions[kMemStates];
 };
 
 // Entries into a state: down from the better one and up from the worse one.
-uint32_t Entries(const CompRow& row, MemState state) {
-  uint32_t entries = state == kHigh ? 1 : row.transitions[state - 1].down;  // a host starts high
-  if (state != kLow) entries += row.transitions[state + 1].up;
+uint32_t Entries(const CompRow& row, uint32_t state) {
+  uint32_t entries =
+      state == KSI_MEMORY_STATE_HIGH ? 1 : row.transitions[state - 1].down;  // a host starts high
+  if (state != KSI_MEMORY_STATE_LOW) entries += row.transitions[state + 1].up;
   return entries;
 }
 
@@ -67,19 +73,19 @@ constexpr Column<CompRow> kColumns[] = {
     Kilobytes("free", "Available (Free) physical memory",
               [](const CompRow& row) { return row.memory.free; }),
     Count("numHigh", "Num times host in high state",
-          [](const CompRow& row) { return Entries(row, kHigh); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_HIGH); }),
     Count("numClear", "Num times host in clear state",
-          [](const CompRow& row) { return Entries(row, kClear); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_CLEAR); }),
     Count("numSoft", "Num times host in soft state",
-          [](const CompRow& row) { return Entries(row, kSoft); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_SOFT); }),
     Count("numHard", "Num of times host in hard state",
-          [](const CompRow& row) { return Entries(row, kHard); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_HARD); }),
     Count("numLow", "Num of times host in low state",
-          [](const CompRow& row) { return Entries(row, kLow); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_LOW); }),
     Text("memState", "Current memory state",
          [](const CompRow& row) {
            const uint32_t state = row.tally.memState;
-           return kMemStateTitles[state < kUnknown ? state : kUnknown];
+           return kMemStateTitles[state < kMemStates ? state : kMemStates];
          })
         .Wide(7),
 };
@@ -101,7 +107,7 @@ Status TallyCompGetGlobalTally(CompRow& row) {
                                  kGlobalTexts, row.tally)) {
     return status;
   }
-  for (uint32_t state = kHigh; state < kUnknown; ++state) {
+  for (uint32_t state = 0; state < kMemStates; ++state) {
     if (Status status = ReadRecord(KSI_NODE_sched_globalStats_memory_stateTransitions,
                                    {.capacity = 2, .first = memStateNames[state]}, kGlobalTexts,
                                    row.transitions[state])) {

@@ -1,6 +1,7 @@
 #include "framework/display_unit.h"
 
 #include <gtest/gtest.h>
+#include <knvlibs/ksi_records.h>
 
 #include <string>
 
@@ -85,7 +86,7 @@ TEST(FromKilobytes, ShiftsWithoutASign) {
 TEST(FromKilobytes, KeepsNoValueInEveryUnit) {
   for (const DisplayUnit unit :
        {DisplayUnit::mb, DisplayUnit::kb, DisplayUnit::pg, DisplayUnit::b}) {
-    EXPECT_EQ(FromKilobytes(kNoValue, unit), UINT64_MAX);
+    EXPECT_EQ(FromKilobytes(KSI_NO_VALUE, unit), UINT64_MAX);
   }
 }
 

@@ -1,0 +1,152 @@
+#include "framework/column.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace tally {
+namespace {
+
+struct Row {
+  uint64_t memory;
+  uint32_t times;
+  int32_t balance;
+  uint8_t share;
+  bool flag;
+  const char* text;
+};
+
+constexpr auto kMemory = [](const Row& row) { return row.memory; };
+constexpr auto kTimes = [](const Row& row) { return row.times; };
+constexpr auto kBalance = [](const Row& row) { return row.balance; };
+constexpr auto kShare = [](const Row& row) { return row.share; };
+constexpr auto kFlag = [](const Row& row) { return row.flag; };
+constexpr auto kText = [](const Row& row) { return row.text; };
+
+// Each table is judged when it is compiled, as those of the reports are.
+template <class... Columns>
+consteval bool Sound(const Columns&... columns) {
+  const Column<Row> table[] = {columns...};
+  return IsSound(table);
+}
+
+static_assert(Sound(Kilobytes("memory", "", kMemory), Count("times", "", kTimes),
+                    Text("text", "", kText).Total(kLabel), Flag("flag", "", kFlag)));
+
+// Two columns of one name, which -s could not tell apart.
+static_assert(!Sound(Count("times", "", kTimes), Count("times", "", kTimes)));
+static_assert(!Sound(Count("times", "", kTimes), Count("TIMES", "", kTimes)));
+// Names that -s or a line of CSV could not hold.
+static_assert(!Sound(Count("", "", kTimes)));
+static_assert(!Sound(Count("a:b", "", kTimes)));
+static_assert(!Sound(Count("a,b", "", kTimes)));
+// Conversions that there are not, ...
+static_assert(!Sound(Count("times", "", kTimes).As("ul")));
+static_assert(!Sound(Count("times", "", kTimes).As("lu")));
+static_assert(!Sound(Count("times", "", kTimes).As("x")));
+static_assert(!Sound(Count("times", "", kTimes).As("")));
+// ... that are another type's, ...
+static_assert(!Sound(Count("times", "", kTimes).As("s")));
+static_assert(!Sound(Count("times", "", kTimes).As("c")));
+static_assert(!Sound(Text("text", "", kText).As("Lu")));
+static_assert(!Sound(Text("text", "", kText).As("c")));
+static_assert(!Sound(Flag("flag", "", kFlag).As("u")));
+// ... or that would cut the figure.
+static_assert(!Sound(Kilobytes("memory", "", kMemory).As("u")));
+static_assert(!Sound(Kilobytes("memory", "", kMemory).As("d")));
+static_assert(Sound(Count("times", "", kTimes).As("Lu")));
+static_assert(Sound(Count("balance", "", kBalance).As("Ld")));
+static_assert(Sound(Flag("flag", "", kFlag).As("s")));
+// Totals that there cannot be.
+static_assert(!Sound(Text("text", "", kText).Total(kSum)));
+static_assert(!Sound(Count("times", "", kTimes).Total(kLabel)));
+
+constexpr Column<Row> kColumns[] = {
+    Kilobytes("memory", "Memory", kMemory),
+    Count("times", "Times", kTimes).Wide(7).As("Lu").Total(kBlank).Fixed(),
+    Flag("flag", "A flag", kFlag),
+};
+
+static_assert(PlaceOf(kColumns, "memory") == 0);
+static_assert(PlaceOf(kColumns, "flag") == 2);
+
+TEST(Column, HoldsItsDescription) {
+  const ColumnDesc& memory = kColumns[0].desc;
+  EXPECT_STREQ(memory.name, "memory");
+  EXPECT_STREQ(memory.description, "Memory");
+  EXPECT_EQ(memory.width, 10);
+  EXPECT_STREQ(memory.conversion, "Lu");
+  EXPECT_EQ(memory.summable, 1);
+  EXPECT_EQ(memory.fixed, 0);
+  EXPECT_EQ(memory.selected, 1);
+
+  const ColumnDesc& times = kColumns[1].desc;
+  EXPECT_EQ(times.width, 7);
+  EXPECT_STREQ(times.conversion, "Lu");
+  EXPECT_EQ(times.summable, 0);
+  EXPECT_EQ(times.fixed, 1);
+}
+
+TEST(Column, IsPrintedAsItsFiguresTypeIs) {
+  EXPECT_STREQ(Count("a", "", kMemory).desc.conversion, "Lu");
+  EXPECT_STREQ(Count("a", "", kTimes).desc.conversion, "u");
+  EXPECT_STREQ(Count("a", "", kBalance).desc.conversion, "d");
+  EXPECT_STREQ(Count("a", "", kShare).desc.conversion, "u");
+  EXPECT_STREQ(Kilobytes("a", "", kTimes).desc.conversion, "Lu");
+  EXPECT_STREQ(Kilobytes("a", "", kBalance).desc.conversion, "Ld");
+  EXPECT_STREQ(Flag("a", "", kFlag).desc.conversion, "c");
+  EXPECT_STREQ(Text("a", "", kText).desc.conversion, "s");
+}
+
+TEST(Column, TakesItsFigureFromTheRow) {
+  const Row row = {
+      .memory = 4096, .times = 3, .balance = -2, .share = 1, .flag = true, .text = "word"};
+  EXPECT_EQ(kColumns[0].value(row).number(), 4096U);
+  EXPECT_EQ(Count("a", "", kBalance).value(row).number(), UINT64_MAX - 1);
+  EXPECT_EQ(Text("a", "", kText).value(row).text(), "word");
+  EXPECT_EQ(kColumns[2].value(row).number(), 1U);
+  EXPECT_EQ(kColumns[2].value(row).text(), "y");
+}
+
+TEST(Figure, HasNoValueWhenAllItsBitsAreOnes) {
+  EXPECT_TRUE(Count("a", "", kMemory).figure.IsNone(UINT64_MAX));
+  EXPECT_FALSE(Count("a", "", kMemory).figure.IsNone(UINT32_MAX));
+  EXPECT_TRUE(Count("a", "", kTimes).figure.IsNone(UINT32_MAX));
+  EXPECT_FALSE(Count("a", "", kTimes).figure.IsNone(UINT32_MAX - 1));
+  EXPECT_TRUE(Count("a", "", kBalance).figure.IsNone(-1));
+  EXPECT_TRUE(Count("a", "", kShare).figure.IsNone(UINT8_MAX));
+  EXPECT_FALSE(Flag("a", "", kFlag).figure.IsNone(Cell::YesNo(true)));
+  EXPECT_FALSE(Text("a", "", kText).figure.IsNone(Cell("")));
+}
+
+TEST(Figure, IsShownInTheUnit) {
+  const auto shown = [](const Column<Row>& column, uint64_t figure, DisplayUnit unit) {
+    return column.figure.Shown(figure, unit).number();
+  };
+  EXPECT_EQ(shown(Kilobytes("a", "", kMemory), 2048, DisplayUnit::mb), 2U);
+  EXPECT_EQ(shown(Kilobytes("a", "", kMemory), UINT64_MAX, DisplayUnit::mb), UINT64_MAX);
+  EXPECT_EQ(shown(Pages("a", "", kMemory), 3, DisplayUnit::kb), 12U);
+  EXPECT_EQ(shown(Pages("a", "", kMemory), UINT64_MAX, DisplayUnit::kb), UINT64_MAX - 3);
+  EXPECT_EQ(shown(Bytes("a", "", kMemory), 8191, DisplayUnit::pg), 1U);
+  EXPECT_EQ(shown(Bytes("a", "", kMemory), 8191, DisplayUnit::b), 8191U);
+  EXPECT_EQ(shown(Count("a", "", kMemory), 2048, DisplayUnit::mb), 2048U);
+}
+
+// What is not shown as it is takes a turn through Shown; nothing else may differ there.
+TEST(Figure, KnowsWhenItIsShownAsItIs) {
+  for (const DisplayUnit unit : {DisplayUnit::mb, DisplayUnit::kb, DisplayUnit::pg}) {
+    for (const Column<Row>& column :
+         {Column<Row>(Kilobytes("a", "", kMemory)), Column<Row>(Pages("a", "", kMemory)),
+          Column<Row>(Bytes("a", "", kMemory)), Column<Row>(Count("a", "", kMemory))}) {
+      if (!column.figure.IsShownAsItIs(unit)) continue;
+      for (const uint64_t figure : {uint64_t{0}, uint64_t{4097}, UINT64_MAX}) {
+        EXPECT_EQ(column.figure.Shown(figure, unit).number(), figure);
+      }
+    }
+  }
+  EXPECT_TRUE(Kilobytes("a", "", kMemory).figure.IsShownAsItIs(DisplayUnit::kb));
+  EXPECT_FALSE(Kilobytes("a", "", kMemory).figure.IsShownAsItIs(DisplayUnit::mb));
+}
+
+}  // namespace
+}  // namespace tally
