@@ -9,7 +9,7 @@
 namespace tally {
 namespace {
 
-// Longest mask that -s looks at.
+// sic: C4
 constexpr size_t kMaskLimit = 128;
 
 // The line being made: its memory is used again for the next one.
@@ -68,7 +68,7 @@ class Line {
       end_ += size;
       return;
     }
-    // printf's rule for a negative field width: the absolute value, left-justified.
+    // sic: C5
     const int field = width - carry_;
     const auto wanted = static_cast<size_t>(field < 0 ? -field : field);
     const size_t padding = wanted > size ? wanted - size : 0;
@@ -131,6 +131,7 @@ void ApplyColumnSelection(ColumnDesc* table, const char* mask) {
     if (mask != nullptr && !column->fixed && !MaskContains(mask, column->name)) {
       column->selected = 0;
     }
+    // sic: C6
     column->width =
         static_cast<uint8_t>(std::max<size_t>(std::strlen(column->name), column->width));
   }

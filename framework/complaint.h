@@ -10,10 +10,11 @@ namespace tally {
 
 // How a complaint tells the status.
 enum class Style : uint8_t {
-  silent,        // says nothing
-  plain,         // "TEXT\n"
-  code,          // "TEXT, error code: 3134980099\n"
-  message,       // "TEXT: Not found\n"
+  silent,   // says nothing
+  plain,    // "TEXT\n"
+  code,     // "TEXT, error code: 3134980099\n"
+  message,  // "TEXT: Not found\n"
+  // sic: C9
   listNotMade,   // "The param list for TEXT could not be created: 0xbad0003"
   errorReading,  // "Error 0xbad0003 while reading TEXT"
 };

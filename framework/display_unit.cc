@@ -53,6 +53,7 @@ uint64_t FromKilobytes(uint64_t kilobytes, DisplayUnit unit) {
   return kilobytes == KSI_NO_VALUE ? KSI_NO_VALUE : ShiftKilobytes(kilobytes, unit);
 }
 
+// sic: C8
 uint64_t FromPages(uint64_t pages, DisplayUnit unit) { return ShiftKilobytes(pages * 4, unit); }
 
 uint64_t FromBytes(uint64_t bytes, DisplayUnit unit) {

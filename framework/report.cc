@@ -85,6 +85,7 @@ void ReportContextBase::AddUpCells() {
   if (!frame_.totalRow) return;
   ++rows_;
   for (size_t i = 0; i < cells_.size(); ++i) {
+    // sic: C7
     const bool known = figures_[i].inTotal != InTotal::knownSum || !figures_[i].IsNone(cells_[i]);
     if (known) totals_[i] += cells_[i].number();
   }

@@ -41,6 +41,7 @@ Status ParseLevels(LevelCheck check, const char* text, uint32_t& levels) {
   }
   const bool belowZero = check == LevelCheck::asSigned && static_cast<int32_t>(levels) < 0;
   if (levels > kMaxLevels && !belowZero) {
+    // sic: C3
     Warning("Specified level %s too high, reseting to %d\n", text, static_cast<int>(kMaxLevels));
     levels = kMaxLevels;
   }

@@ -15,7 +15,7 @@
 namespace tally {
 namespace {
 
-// The short -f takes a word and ignores it, the long --force takes none: scripts depend on both.
+// sic: C1
 constexpr char kShortOptions[] = "f:c:r:h";
 constexpr option kLongOptions[] = {
     {"force", no_argument, nullptr, 'f'},

@@ -5,7 +5,7 @@
 namespace tally {
 namespace {
 
-// Scripts compare this text: its slips of typing and the order of its reports stay.
+// sic: C2
 constexpr char kUsage[] =
     "Usage: %s [-hf] [-c <cacheFile>] -r <reportType> [report specific options]\n"
     "   -h, --help                Show this message\n"

@@ -16,6 +16,7 @@ namespace {
 constexpr ReportFrame kFrame = {
     .title = "ASYNC_REMAP STATS",
     .ruleLength = 43,
+    // sic: C26
     .options = "g:s:u:vq",
     .totalRow = true,
 };
@@ -27,7 +28,7 @@ struct RemapRow {
   KSI_RemapType pages;
 };
 
-// No identity column has a cell in the Total row: it bears no label.
+// sic: C23
 constexpr Column<RemapRow> kColumns[] = {
     Text("name", "Group name", [](const RemapRow& row) { return row.name; }).Wide(27),
     Id("grpLeader", "Group leader ID", [](const RemapRow& row) { return row.grpLeader; }),
@@ -53,6 +54,7 @@ constexpr Column<RemapRow> kColumns[] = {
 };
 static_assert(IsSound(kColumns));
 
+// sic: C24
 constexpr ReaderTexts kRecordTexts = {
     .firstKey = {Style::message, "TallyAsyncRemapGetStats:137 failure"},
     .secondKey = {Style::message, "TallyAsyncRemapGetStats:138 failure"},
@@ -113,7 +115,7 @@ Status TallyAsyncRemapReportCallback(uint64_t gid, uint32_t /*childCount*/, int 
     return status;
   }
   RemapRow row;
-  row.name = FixedText(name.text).substr(0, sizeof name.text - 1);
+  row.name = FixedText(name.text).substr(0, sizeof name.text - 1);  // sic: C25
   const uint32_t count = KSI_ParamListUsedCount(clients.get());
   for (uint32_t i = 0; i < count; ++i) {
     uint32_t client = 0;

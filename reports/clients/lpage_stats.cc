@@ -23,6 +23,7 @@ struct LPageStatsRow {
   KSI_VmLargePages lpage;
 };
 
+// sic: C22
 constexpr Column<LPageStatsRow> kColumns[] = {
     NameColumn<LPageStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<LPageStatsRow>,

@@ -26,6 +26,7 @@ struct SwapStatsRow {
   KSI_VmmTally vmm;
 };
 
+// sic: C19
 constexpr Column<SwapStatsRow> kColumns[] = {
     NameColumn<SwapStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<SwapStatsRow>,
@@ -35,6 +36,7 @@ constexpr Column<SwapStatsRow> kColumns[] = {
          [](const SwapStatsRow& row) { return row.swap.isSwapping != 0; }),
     Text("CurSwapper", "knv or vmm swapper currently active",
          [](const SwapStatsRow& row) { return row.swap.curSwapper == 0 ? "vmm" : "knv"; }),
+    // sic: C20
     Kilobytes("cacheUsage", "Swap slot cache usage",
               [](const SwapStatsRow& row) { return row.swap.cacheUsage; })
         .Total(kBlank),

@@ -32,7 +32,7 @@ uint64_t LimitOrNone(int64_t kilobytes) {
   return limit >= KSI_UW_NO_LIMIT ? KSI_NO_VALUE : limit;
 }
 
-// Neither type nor name has a cell in the Total row: it bears no label.
+// sic: C17
 constexpr Column<UWStatsRow> kColumns[] = {
     Text("type", "Type of user-world (uw: stand-alone, vm: VM-based)",
          [](const UWStatsRow& row) { return row.typeNames.text(); })
@@ -58,6 +58,7 @@ constexpr Column<UWStatsRow> kColumns[] = {
               [](const UWStatsRow& row) { return row.uw.totalResv; }),
     Kilobytes("pinnedResv", "Memory reserved for pinning purposes",
               [](const UWStatsRow& row) { return row.uw.pinnedResv; }),
+    // sic: C18
     Kilobytes("memSizeLimit", "Limit on virtual address-space size",
               [](const UWStatsRow& row) { return row.uw.memSizeLimit; })
         .Total(kBlank),

@@ -30,7 +30,7 @@ struct VMStatsRow {
   KSI_GroupMemoryStats memory;
 };
 
-// The allocation's figures are kept in 32 bits, signed; -1 stays.
+// sic: C16
 uint64_t FromSigned32Kilobytes(uint64_t kilobytes, DisplayUnit unit) {
   const auto narrow = [](uint64_t value) {
     return static_cast<uint64_t>(static_cast<int32_t>(value));

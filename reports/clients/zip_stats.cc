@@ -45,6 +45,7 @@ constexpr Column<ZipStatsRow> kColumns[] = {
     Count("nrFreeQuarter", "Total free quarter pages",
           [](const ZipStatsRow& row) { return row.zip.nrFreeQuarter; })
         .As("Lu"),
+    // sic: C21
     Microseconds("avgZipTime", "Average compression time in usec",
                  [](const ZipStatsRow& row) { return row.zip.avgZipTime; })
         .Total(kMean),

@@ -11,6 +11,7 @@ KeyList IdList(Id id) {
   return {.capacity = 2, .first = id, .removeKeys = true};
 }
 
+// sic: C10
 constexpr ReaderTexts kGroupTexts = {
     .create = kGroupListNotMade,
     .firstKey = {Style::code, "TallyGroupKsiGet: KSI_ParamListAddInt() faiure"},
@@ -21,6 +22,7 @@ constexpr ReaderTexts kClientTexts = {
     .firstKey = {Style::message, "Tally_MemClientKsiGet: KSI_ParamListAddInt() failure"},
 };
 
+// sic: C10
 constexpr ReaderTexts kVmmChildTexts = {
     .create = kGroupListNotMade,
     .firstKey = {Style::message, "Tally_GroupGetVMMAlloc: KSI_ParamListAddInt() failure"},

@@ -43,11 +43,12 @@ struct GroupRow {
 };
 
 // What a tag's row shows in a column.
+// sic: C13
 enum class InTag : uint8_t {
   slot,  // of the tag itself: its texts, and 1 as its id
   zero,
   sum,       // of the groups with the tag
-  sumTwice,  // each group counts double
+  sumTwice,  // each group counts double; sic: C12
   last,      // the last group's figure
   noLimit,   // -1
 };
@@ -131,6 +132,7 @@ constexpr GroupColumn kColumns[] = {
     Kilobytes("bActive", "Base activeness", [](const GroupRow& row) { return row.stats.bActive; }),
     Kilobytes("sharedSaved", "Estimate of memory savings from page sharing",
               [](const GroupRow& row) { return row.stats.sharedSaved; }),
+    // sic: C11
     {Kilobytes("mps", "Memory per share (KB)", [](const GroupRow& row) { return row.stats.mps; })
          .Wide(20),
      InTag::noLimit},
@@ -179,7 +181,7 @@ TagSlot* GroupContext::FindSlot(std::string_view tag) {
   TagSlot& slot = slots_.emplace_back();
   const std::string text(tag);
   Str_Strcpy(slot.name.text, text.c_str(), sizeof slot.name.text);
-  // A tag that fills its field loses its last letter here and so gets a slot for each group.
+  // sic: C14
   Str_Strcpy(slot.tag.text, text.c_str(), sizeof slot.tag.text);
   return &slot;
 }
@@ -257,6 +259,7 @@ Status Run(const ReportOptions& options, Sink& sink) {
                                             options.csvMode, TallyGroupStatsGroup, &context);
   context.Rule();
   if (options.tags) {
+    // sic: C15
     context.Note("Virtual tags report");
     context.PrintTags();
     context.Rule();

@@ -50,6 +50,7 @@ constexpr auto kFree = [](const BuddyRow& row) { return row.stats.buffers[kSize]
 template <size_t kSize>
 constexpr auto kUsed = [](const BuddyRow& row) { return row.stats.buffers[kSize].used; };
 
+// sic: C29
 constexpr Column<BuddyRow> kColumns[] = {
     Text("name", "Name of the buddy", [](const BuddyRow& row) { return row.name; })
         .Wide(20)
@@ -136,6 +137,7 @@ Status TallyBuddyGetStats(BuddyRow& row) {
 }
 
 // Fills a row from an allocator's name, which is cut to the row's field.
+// sic: C30
 Status ReadBuddyName(const char* name, BuddyRow& row) {
   std::strncpy(row.name, name, sizeof row.name - 1);
   row.name[sizeof row.name - 1] = '\0';
@@ -177,8 +179,7 @@ bool SortsBefore(const BuddyRow& a, const BuddyRow& b) {
   return node(a) < node(b);
 }
 
-// A selection sort: the order is not a strict one for every set of names, and what it makes of the
-// others is what users know.
+// sic: C31
 void SortBuddies(std::span<BuddyRow> rows) {
   for (size_t place = 0; place < rows.size(); ++place) {
     size_t best = place;

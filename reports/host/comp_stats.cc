@@ -40,11 +40,12 @@ struct CompRow {
 // Entries into a state: down from the better one and up from the worse one.
 uint32_t Entries(const CompRow& row, uint32_t state) {
   uint32_t entries =
-      state == KSI_MEMORY_STATE_HIGH ? 1 : row.transitions[state - 1].down;  // a host starts high
+      state == KSI_MEMORY_STATE_HIGH ? 1 : row.transitions[state - 1].down;  // sic: C33
   if (state != KSI_MEMORY_STATE_LOW) entries += row.transitions[state + 1].up;
   return entries;
 }
 
+// sic: C32
 constexpr Column<CompRow> kColumns[] = {
     Kilobytes("total", "Total physical memory on host",
               [](const CompRow& row) { return row.memory.total; }),

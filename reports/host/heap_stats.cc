@@ -21,11 +21,12 @@ constexpr ReportFrame kFrame = {
     .title = "HEAP STATS",
     .ruleLength = 36,
     .options = "s:u:vq",
-    .longVerbose = 'u',  // --verbose is a -u without a unit: bytes, and no descriptions
+    .longVerbose = 'u',  // sic: C38
     .totalRow = true,
     .allowBytes = true,
 };
 
+// sic: C39
 constexpr Column<KSI_HeapStats> kColumns[] = {
     Text("name", "heap name", [](const KSI_HeapStats& heap) { return FixedText(heap.name); })
         .Wide(35)
@@ -151,14 +152,15 @@ Status Run(const ReportOptions& options, Sink& sink) {
   ReportContext<KSI_HeapStats> context(kFrame, kColumns, sink);
   if (Status status = context.Settle(options)) return status;
   Heaps heaps;
+  // sic: C42
   if (!TallyHeapGetMemMapStats(heaps)) return kSuccess;
   context.Begin();
   for (const KSI_HeapStats& heap : std::span(heaps.records.get(), heaps.count)) {
     context.PrintRow(heap);
   }
-  // What is in use wraps at 32 bits in a heap's row, but not here.
+  // sic: C40
   context.total(kUsed) = context.total(kSize) - context.total(kAvail);
-  // The sum takes the places of two 32-bit figures: the blank cell before it has its low half.
+  // sic: C41
   context.total(kNumRanges) >>= 32;
   context.PrintTotal();
   context.PrintDescriptions();

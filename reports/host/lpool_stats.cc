@@ -27,7 +27,7 @@ struct LPoolRow {
   KSI_LargePagePool pool;
 };
 
-// The peaks are added up like the counters.
+// sic: C34
 constexpr Column<LPoolRow> kColumns[] = {
     Text("name", "Large page pool name", [](const LPoolRow& row) { return row.name; })
         .Wide(15)
@@ -76,6 +76,7 @@ static_assert(IsSound(kColumns));
 
 using LPoolContext = ReportContext<LPoolRow>;
 
+// sic: C35
 constexpr ReaderTexts kPSharePoolTexts = {
     .create = {Style::plain, "TallyGetPSharePoolStats: KSI_ParamListCreate() failure"},
     .firstKey = {Style::code, "TallyGetPSharePoolStats: KSI_ParamListAddInt() failure"},
@@ -125,7 +126,7 @@ Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
     const char* name = nullptr;
     if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) {
       Warning("TallyTraverseLPools: KSI_ParamListGetString() failure\n");
-      // The list is left as it is, the one list that the program does not destroy.
+      // sic: C37
       static_cast<void>(names.release());
       return kFailure;
     }
@@ -135,6 +136,7 @@ Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
   return kSuccess;
 }
 
+// sic: C36
 Status TallyTraverseLPools(LPoolContext& context) {
   KSI_MemInfo memInfo;
   if (KSI_Get(KSI_NODE_memory_memInfo, nullptr, &memInfo, sizeof memInfo) != kSuccess) {

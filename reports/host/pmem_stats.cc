@@ -21,6 +21,7 @@ constexpr ReportFrame kFrame = {
     .ruleLength = 49,
     .options = "l:s:u:vq",
     .defaultLevels = 1,
+    // sic: C43
     .levelCheck = LevelCheck::asSigned,
     .selectColumnsAt = SelectColumnsAt::beforeUnit,
 };
@@ -172,6 +173,7 @@ void ForEachVolume(const char* failure, Print print) {
 }
 
 void PMemRegionStoreReport(ReportContext<VolumeRow>& context) {
+  // sic: C46
   ForEachVolume("PMemRegionStoreReport: KSI_ParamListGetString Failure\n", [&](const char* volume) {
     VolumeRow row = {.uuid = RowUuid(volume), .store = {}, .isClean = 0};
     if (PMemGetVolumeInfo(volume) != kSuccess) {
@@ -220,7 +222,9 @@ Status RunVariant(std::span<const Column<Row>> columns, void (*printRows)(Report
   ReportContext<Row> context(kFrame, columns, sink);
   if (Status status = context.Settle(options)) return status;
   context.Begin();
+  // sic: C44
   context.Rule();
+  // sic: C45
   printRows(context);
   context.Rule();
   context.PrintDescriptions();

@@ -57,6 +57,7 @@ Status Run(const ReportOptions& options, Sink& sink) {
   context.PrintRow({"lpage", stats.lpageHintsAdded, stats.lpageHintsRemoved,
                     stats.lpageHintsAdded - stats.lpageHintsRemoved});
   context.Rule();
+  // sic: C28
   context.PrintTotalRow({"Total", stats.hintsAdded, stats.hintsRemoved, stats.hintsActive});
   context.Rule();
   context.PrintDescriptions();

@@ -15,6 +15,7 @@ constexpr ReportFrame kFrame = {
     .title = "PSHARE STATS",
     .ruleLength = 38,
     .options = "s:u:vq",
+    // sic: C27
     .labelWidth = 17,
 };
 
