@@ -7,32 +7,24 @@
 namespace tally {
 
 Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit) {
-  if (text == nullptr || SameName(text, "kb")) {
+  if (text == nullptr) {
     unit = DisplayUnit::kb;
-  } else if (SameName(text, "mb")) {
-    unit = DisplayUnit::mb;
-  } else if (SameName(text, "pg")) {
-    unit = DisplayUnit::pg;
-  } else if (allowBytes && SameName(text, "b")) {
-    unit = DisplayUnit::b;
-  } else {
-    Warning("Invalid unit specified. Choose from {mb, kb, pg%s}\n", allowBytes ? ", b" : "");
-    return kBadParameter;
+    return kSuccess;
   }
-  return kSuccess;
+  for (const UnitName& name : kUnitNames) {
+    if (!SameName(text, name.word) || (name.unit == DisplayUnit::b && !allowBytes)) continue;
+    unit = name.unit;
+    return kSuccess;
+  }
+  Warning("Invalid unit specified. Choose from {mb, kb, pg%s}\n", allowBytes ? ", b" : "");
+  return kBadParameter;
 }
 
 const char* UnitTitle(DisplayUnit unit) {
-  switch (unit) {
-    case DisplayUnit::mb:
-      return "MB";
-    case DisplayUnit::kb:
-      return "KB";
-    case DisplayUnit::b:
-      return "Bytes";
-    default:
-      return "Page (4K)";
+  for (const UnitName& name : kUnitNames) {
+    if (name.unit == unit) return name.title;
   }
+  return "";
 }
 
 uint64_t ShiftKilobytes(uint64_t kilobytes, DisplayUnit unit) {

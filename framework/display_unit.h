@@ -10,6 +10,19 @@ namespace tally {
 
 enum class DisplayUnit : uint8_t { mb = 3, kb = 4, pg = 5, b = 6 };
 
+// The units in the order of -u's complaint; the last one is for reports that have bytes.
+struct UnitName {
+  DisplayUnit unit;
+  const char* word;   // of -u
+  const char* title;  // in the title block
+};
+constexpr UnitName kUnitNames[] = {
+    {DisplayUnit::mb, "mb", "MB"},
+    {DisplayUnit::kb, "kb", "KB"},
+    {DisplayUnit::pg, "pg", "Page (4K)"},
+    {DisplayUnit::b, "b", "Bytes"},
+};
+
 // Reads the word of -u, in any case; no text means kb. `allowBytes`: "b" is a word too. An unknown
 // word is kBadParameter, after its message.
 [[nodiscard]] Status ParseDisplayUnit(const char* text, bool allowBytes, DisplayUnit& unit);
