@@ -1,5 +1,5 @@
 // Groups and user worlds, from recorded hosts and from files that are out of the ordinary. What
-// each figure is to be is in docs/linux-host.md.
+// each figure is to be is in tally-linux(7).
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>

@@ -1,5 +1,5 @@
 // The nodes of the host as a whole, from recorded hosts and from files that are out of the
-// ordinary. What each figure is to be is in docs/linux-host.md.
+// ordinary. What each figure is to be is in tally-linux(7).
 #include <gtest/gtest.h>
 #include <unistd.h>
 

@@ -1,4 +1,4 @@
-// What a group is and what it uses: the nodes below sched/groups. docs/linux-host.md says where
+// What a group is and what it uses: the nodes below sched/groups. tally-linux(7) says where
 // each figure comes from and why.
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/cgroup.h"

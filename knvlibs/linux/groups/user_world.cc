@@ -1,4 +1,4 @@
-// A user world is a process. docs/linux-host.md says where each figure comes from and why.
+// A user world is a process. tally-linux(7) says where each figure comes from and why.
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/smaps.h"

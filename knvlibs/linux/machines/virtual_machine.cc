@@ -1,4 +1,4 @@
-// A virtual machine is a QEMU process. docs/linux-host.md says where each figure comes from and
+// A virtual machine is a QEMU process. tally-linux(7) says where each figure comes from and
 // why.
 #include <string>
 

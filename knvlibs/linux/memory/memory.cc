@@ -1,4 +1,4 @@
-// The host's memory as a whole: how it is divided and how short it is. docs/linux-host.md says
+// The host's memory as a whole: how it is divided and how short it is. tally-linux(7) says
 // where each figure comes from and why.
 #include <algorithm>
 #include <iterator>
