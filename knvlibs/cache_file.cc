@@ -7,9 +7,11 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 
 #include "knvlibs/cache_format.h"
+#include "knvlibs/cache_vfs.h"
 
 namespace ksi {
 namespace {
@@ -57,39 +59,41 @@ Status CheckHeader(const Header& header, size_t length, uint64_t fileSize) {
 }
 
 // Looks at a file before SQLite does.
-Status CheckFile(const char* fileName) {
+Status CheckFile(int descriptor) {
   struct stat info;
-  if (stat(fileName, &info) != 0) return StatusOfErrno(errno);
-  if (S_ISDIR(info.st_mode)) return KSI_STATUS_IS_A_DIRECTORY;
-  if (!S_ISREG(info.st_mode)) return KSI_STATUS_INVALID_METADATA;
-  const int fd = open(fileName, O_RDONLY | O_CLOEXEC | O_NONBLOCK);
-  if (fd < 0) return StatusOfErrno(errno);
+  if (fstat(descriptor, &info) != 0) return StatusOfErrno(errno);
   Header header = {};
-  const ssize_t length = pread(fd, header.data(), header.size(), 0);
-  const Status status = length < 0 ? StatusOfErrno(errno)
-                                   : CheckHeader(header, static_cast<size_t>(length),
-                                                 static_cast<uint64_t>(info.st_size));
-  close(fd);
-  return status;
+  const ssize_t length = pread(descriptor, header.data(), header.size(), 0);
+  if (length < 0) return StatusOfErrno(errno);
+  return CheckHeader(header, static_cast<size_t>(length), static_cast<uint64_t>(info.st_size));
 }
 
-// The file as a URI that tells SQLite that nobody writes to it.
-std::string UriOf(std::string_view fileName) {
-  std::string uri = fileName.starts_with('/') ? "file://" : "file:";
-  for (const char c : fileName) {
-    constexpr char kDigits[] = "0123456789abcdef";
-    const bool plain = (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') ||
-                       c == '/' || c == '.' || c == '-' || c == '_';
-    if (plain) {
-      uri += c;
-    } else {
-      const auto byte = static_cast<unsigned char>(c);
-      uri += '%';
-      uri += kDigits[byte >> 4];
-      uri += kDigits[byte & 15];
-    }
+Status CheckType(const struct stat& info) {
+  if (S_ISDIR(info.st_mode)) return KSI_STATUS_IS_A_DIRECTORY;
+  return S_ISREG(info.st_mode) ? kOk : KSI_STATUS_INVALID_METADATA;
+}
+
+// The name that SQLite derives those of its journals from: without links.
+std::string RealName(const char* fileName) {
+  struct Free {
+    void operator()(char* text) const { std::free(text); }
+  };
+  const std::unique_ptr<char, Free> real(realpath(fileName, nullptr));
+  return real == nullptr ? fileName : real.get();
+}
+
+// Whether a file holds changes; one that was made invalid starts with a NUL.
+bool HoldsChanges(const std::string& journal) {
+  struct stat info;
+  if (lstat(journal.c_str(), &info) != 0 || !S_ISREG(info.st_mode) || info.st_size == 0) {
+    return false;
   }
-  return uri + "?immutable=1";
+  const int fd = open(journal.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW);
+  if (fd < 0) return true;
+  char first = 0;
+  const ssize_t length = pread(fd, &first, 1, 0);
+  close(fd);
+  return length < 0 || first != '\0';
 }
 
 bool IsDate(std::string_view text) {
@@ -134,17 +138,27 @@ Status StatusOfSqlite(int code) {
   }
 }
 
-Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, std::string* why) {
-  Status status = CheckFile(fileName);
-  if (status != kOk) return status;
+CacheFile::Descriptor::~Descriptor() {
+  if (number_ >= 0) close(number_);
+}
 
+Status CacheFile::Descriptor::Open(const char* fileName) {
+  // A device may do something when it is opened, so what it is comes first; what was opened counts.
+  struct stat info;
+  if (stat(fileName, &info) != 0) return StatusOfErrno(errno);
+  Status status = CheckType(info);
+  if (status != kOk) return status;
+  number_ = open(fileName, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+  if (number_ < 0 || fstat(number_, &info) != 0) return StatusOfErrno(errno);
+  return CheckType(info);
+}
+
+Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, std::string* why) {
   std::unique_ptr<CacheFile> made(new CacheFile);
-  sqlite3* handle = nullptr;
-  const int code =
-      sqlite3_open_v2(UriOf(fileName).c_str(), &handle,
-                      SQLITE_OPEN_READONLY | SQLITE_OPEN_URI | SQLITE_OPEN_NOMUTEX, nullptr);
-  made->database_.reset(handle);
-  status = code == SQLITE_OK ? made->Configure() : made->Failed(code);
+  Status status = made->descriptor_.Open(fileName);
+  if (status == kOk) status = CheckFile(made->descriptor_.Number());
+  if (status == kOk) status = made->CheckChanges(fileName);
+  if (status == kOk) status = made->Connect();
   if (status == kOk) status = made->CheckSchema();
   if (status == kOk) status = made->ReadCapture();
   if (status == kOk) status = made->ReadNodes();
@@ -152,9 +166,27 @@ Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, s
     if (why != nullptr) *why = made->why_;
     return status;
   }
-  sqlite3_progress_handler(handle, 0, nullptr, nullptr);
+  sqlite3_progress_handler(made->Handle(), 0, nullptr, nullptr);
   *file = std::move(made);
   return kOk;
+}
+
+// A cache file is whole from its first moment. Somebody who changes one all the same leaves, until
+// he is done, a part of it in another file, without which figures would be wrong.
+Status CacheFile::CheckChanges(const char* fileName) {
+  const std::string name = RealName(fileName);
+  for (const char* suffix : {"-journal", "-wal"}) {
+    if (HoldsChanges(name + suffix)) {
+      why_ = "changes of it lie beside it in " + name + suffix;
+      return KSI_STATUS_METADATA_READ_ERROR;
+    }
+  }
+  return kOk;
+}
+
+Status CacheFile::Connect() {
+  const int code = OpenDescriptor(descriptor_.Number(), &database_);
+  return code == SQLITE_OK ? Configure() : Failed(code);
 }
 
 Status CacheFile::Failed(int code) {

@@ -37,7 +37,7 @@ class CacheFile {
   //   KSI_STATUS_NOT_FOUND, KSI_STATUS_PERMISSION_DENIED, KSI_STATUS_IS_A_DIRECTORY,
   //   KSI_STATUS_INVALID_METADATA: not a cache file,
   //   KSI_STATUS_MAJOR_VERSION_MISMATCH: of a newer schema,
-  //   KSI_STATUS_METADATA_READ_ERROR: damaged.
+  //   KSI_STATUS_METADATA_READ_ERROR: damaged, or somebody is in the middle of changing it.
   // `why`, if not null, receives what is wrong with a damaged file.
   [[nodiscard]] static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file,
                                    std::string* why = nullptr);
@@ -52,8 +52,25 @@ class CacheFile {
   sqlite3* Handle() const { return database_.get(); }
 
  private:
+  class Descriptor {
+   public:
+    Descriptor() = default;
+    ~Descriptor();
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+
+    // The regular file of this name, without waiting for anybody.
+    Status Open(const char* fileName);
+    int Number() const { return number_; }
+
+   private:
+    int number_ = -1;
+  };
+
   CacheFile() = default;
 
+  [[nodiscard]] Status Connect();
+  [[nodiscard]] Status CheckChanges(const char* fileName);
   [[nodiscard]] Status Configure();
   [[nodiscard]] Status CheckSchema();
   [[nodiscard]] Status ReadCapture();
@@ -61,6 +78,7 @@ class CacheFile {
   [[nodiscard]] Status Failed(int code);
   [[nodiscard]] Status Damaged(const char* why);
 
+  Descriptor descriptor_;  // before the database that reads it
   Database database_;
   std::string why_;
   Capture capture_;

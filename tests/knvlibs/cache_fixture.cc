@@ -117,14 +117,21 @@ void WriteSmallHost(const std::string& fileName) {
   writer.Commit(TestCapture());
 }
 
-void RunSql(const std::string& fileName, const std::string& sql) {
+Database OpenAsOwner(const std::string& fileName) {
   sqlite3* handle = nullptr;
-  ASSERT_EQ(sqlite3_open(fileName.c_str(), &handle), SQLITE_OK);
-  const Database database(handle);
+  EXPECT_EQ(sqlite3_open(fileName.c_str(), &handle), SQLITE_OK);
+  return Database(handle);
+}
+
+void ExecuteSql(sqlite3* database, const std::string& sql) {
   char* message = nullptr;
-  EXPECT_EQ(sqlite3_exec(handle, sql.c_str(), nullptr, nullptr, &message), SQLITE_OK)
+  EXPECT_EQ(sqlite3_exec(database, sql.c_str(), nullptr, nullptr, &message), SQLITE_OK)
       << (message == nullptr ? "" : message) << ": " << sql;
   sqlite3_free(message);
+}
+
+void RunSql(const std::string& fileName, const std::string& sql) {
+  ExecuteSql(OpenAsOwner(fileName).get(), sql);
 }
 
 }  // namespace ksi

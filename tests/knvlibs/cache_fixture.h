@@ -12,6 +12,7 @@
 
 #include "knvlibs/cache_file.h"
 #include "knvlibs/source.h"
+#include "knvlibs/sqlite.h"
 #include "tools/ksicache/cache_writer.h"
 
 namespace ksi {
@@ -56,6 +57,10 @@ CacheFile::Capture TestCapture();
 // A small host: group 0 "host" with the groups 7 and 9, of which 7 is "web" and 9 cannot be read;
 // client 30 with the remap types "large" and "small"; two heaps, no volumes.
 void WriteSmallHost(const std::string& fileName);
+
+// A connection to a file as its owner could have one, and SQL run on it.
+Database OpenAsOwner(const std::string& fileName);
+void ExecuteSql(sqlite3* database, const std::string& sql);
 
 // Runs SQL on a file as its owner could.
 void RunSql(const std::string& fileName, const std::string& sql);

@@ -1,0 +1,20 @@
+// How SQLite reads a cache file: through the descriptor that was looked at, and no other way.
+//
+// SQLite by itself opens a file by its name, which somebody may have given to something else since;
+// it looks for journals, takes locks, and may map the file, so that a file cut short is a signal.
+// Here it only reads. What was written since the file was opened, and what is no longer there, is
+// damage.
+#ifndef KNVLIBS_CACHE_VFS_H_
+#define KNVLIBS_CACHE_VFS_H_
+
+#include "knvlibs/sqlite.h"
+
+namespace ksi {
+
+// Opens the regular file `descriptor`, which must stay open as long as the database. Gives SQLite's
+// result code; `database` is to be asked for its message also on failure.
+int OpenDescriptor(int descriptor, Database* database);
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_CACHE_VFS_H_

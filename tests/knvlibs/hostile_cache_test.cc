@@ -1,0 +1,234 @@
+// Cache files in bad company: in places and states that an honest one is never in.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <knvlibs/ksi_records.h>
+#include "knvlibs/cache_file.h"
+#include "knvlibs/cache_source.h"
+#include "tests/knvlibs/cache_fixture.h"
+
+namespace ksi {
+namespace {
+
+class HostileCache : public testing::Test {
+ protected:
+  void SetUp() override { WriteSmallHost(file_); }
+
+  Status Open(const std::string& fileName) {
+    source_.reset();
+    return CacheSource::Open(fileName.c_str(), &source_);
+  }
+  Status Open() { return Open(file_); }
+
+  Status Flags(int64_t group, uint32_t* flags) {
+    return source_->Value(NodeAt("sched/groups/groupFlags"), MakeKeys({group}),
+                          std::as_writable_bytes(std::span(flags, 1)));
+  }
+
+  void ExpectAnswers() {
+    uint32_t flags = 0;
+    EXPECT_EQ(Flags(7, &flags), kOk);
+    EXPECT_EQ(flags, 107u);
+  }
+
+  TestDirectory directory_;
+  std::string file_ = directory_.Path("host.ksi");
+  std::unique_ptr<CacheSource> source_;
+};
+
+using Strings = std::vector<std::string>;
+
+TEST_F(HostileCache, LockedByAnotherIsReadAllTheSame) {
+  const Database other = OpenAsOwner(file_);
+  ExecuteSql(other.get(), "BEGIN EXCLUSIVE");
+  ASSERT_EQ(Open(), kOk);
+  ExpectAnswers();
+}
+
+// More than SQLite keeps in memory, so that it comes back for what is no longer there.
+void WriteLargeHost(const std::string& fileName) {
+  ksicache::CacheWriter writer(fileName, true);
+  KSI_GroupMemoryStats stats = {};
+  for (int64_t group = 0; group < 20000; ++group) {
+    stats.memSize = static_cast<uint64_t>(group);
+    writer.AddValue(NodeAt("sched/groups/stats/memoryStats"), MakeKeys({group}), BytesOf(stats));
+  }
+  writer.Commit(TestCapture());
+}
+
+TEST_F(HostileCache, InTheMiddleOfAChangeIsDamage) {
+  WriteLargeHost(file_);
+  const Database other = OpenAsOwner(file_);
+  ExecuteSql(other.get(), "PRAGMA cache_size = 10; BEGIN; UPDATE reading SET status = 5");
+  ASSERT_EQ(directory_.Names(), (Strings{"host.ksi", "host.ksi-journal"}));
+  std::unique_ptr<CacheFile> file;
+  std::string why;
+  EXPECT_EQ(CacheFile::Open(file_.c_str(), &file, &why), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(why, "changes of it lie beside it in " + file_ + "-journal");
+  ExecuteSql(other.get(), "ROLLBACK");
+  EXPECT_EQ(Open(), kOk);
+}
+
+TEST_F(HostileCache, BesideAJournalIsLeftAsItIs) {
+  const std::string journal = file_ + "-journal";
+  WriteContent(journal, std::string("\xd9\xd5\x05\xf9 half of a change", 21));
+  EXPECT_EQ(Open(), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(directory_.Names(), (Strings{"host.ksi", "host.ksi-journal"}));
+  EXPECT_EQ(FileContent(journal).size(), 21u);
+}
+
+TEST_F(HostileCache, BesideAJournalThroughALink) {
+  std::filesystem::create_symlink(file_, directory_.Path("link"));
+  ASSERT_EQ(Open(directory_.Path("link")), kOk);
+  ExpectAnswers();
+  WriteContent(file_ + "-journal", "half of a change");
+  EXPECT_EQ(Open(directory_.Path("link")), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(HostileCache, JournalsWithoutChangesAreNone) {
+  const std::string journal = file_ + "-journal";
+  for (const std::string& content : {std::string(), std::string(512, '\0')}) {
+    WriteContent(journal, content);
+    ASSERT_EQ(Open(), kOk);
+    ExpectAnswers();
+  }
+  std::filesystem::remove(journal);
+  ASSERT_EQ(mkfifo(journal.c_str(), 0600), 0);
+  EXPECT_EQ(Open(), kOk);
+  std::filesystem::remove(journal);
+  std::filesystem::create_directory(journal);
+  EXPECT_EQ(Open(), kOk);
+}
+
+TEST_F(HostileCache, WrittenAheadIsReadWhenAllIsInIt) {
+  RunSql(file_, "PRAGMA journal_mode = WAL; UPDATE node SET id = id");
+  ASSERT_EQ(directory_.Names(), Strings{"host.ksi"});
+  ASSERT_EQ(FileContent(file_)[18], 2);
+  ASSERT_EQ(Open(), kOk);
+  ExpectAnswers();
+  EXPECT_EQ(directory_.Names(), Strings{"host.ksi"});
+}
+
+TEST_F(HostileCache, WrittenAheadWithChangesBesideItIsDamage) {
+  const Database other = OpenAsOwner(file_);
+  ExecuteSql(other.get(), "PRAGMA journal_mode = WAL; UPDATE reading SET status = 5");
+  const Strings names = {"host.ksi", "host.ksi-shm", "host.ksi-wal"};
+  ASSERT_EQ(directory_.Names(), names);
+  EXPECT_EQ(Open(), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(directory_.Names(), names);
+}
+
+TEST_F(HostileCache, ReplacedWhileItIsReadStaysTheOneThatWasOpened) {
+  ASSERT_EQ(Open(), kOk);
+  WriteContent(directory_.Path("other"), std::string(65536, 'x'));
+  std::filesystem::rename(directory_.Path("other"), file_);
+  ExpectAnswers();
+  std::filesystem::remove(file_);
+  uint32_t flags = 0;
+  EXPECT_EQ(Flags(9, &flags), kOk);
+  EXPECT_EQ(flags, 109u);
+}
+
+// Reads all groups of the large host; each gives its own figure or fails with the status for
+// damage. Gives the number that did not fail.
+size_t CountAnswers(CacheSource& source) {
+  size_t answers = 0;
+  for (int64_t group = 0; group < 20000; ++group) {
+    KSI_GroupMemoryStats stats = {};
+    const Status status = source.Value(NodeAt("sched/groups/stats/memoryStats"), MakeKeys({group}),
+                                       std::as_writable_bytes(std::span(&stats, 1)));
+    if (status == kOk) {
+      EXPECT_EQ(stats.memSize, static_cast<uint64_t>(group));
+      ++answers;
+    } else {
+      EXPECT_EQ(status, KSI_STATUS_METADATA_READ_ERROR) << group;
+    }
+  }
+  return answers;
+}
+
+TEST_F(HostileCache, TruncatedWhileItIsReadIsDamage) {
+  for (const uintmax_t left : {4'000'000, 4096, 100, 0}) {
+    WriteLargeHost(file_);
+    ASSERT_GT(std::filesystem::file_size(file_), 6'000'000u);
+    ASSERT_EQ(Open(), kOk);
+    ASSERT_EQ(CountAnswers(*source_), 20000u);
+    std::filesystem::resize_file(file_, left);
+    EXPECT_LT(CountAnswers(*source_), 10000u) << left;
+  }
+}
+
+TEST_F(HostileCache, WrittenToWhileItIsReadIsDamage) {
+  WriteLargeHost(file_);
+  std::filesystem::last_write_time(file_, std::filesystem::file_time_type());
+  ASSERT_EQ(Open(), kOk);
+  const int fd = open(file_.c_str(), O_WRONLY);
+  ASSERT_GE(fd, 0);
+  ASSERT_EQ(pwrite(fd, "x", 1, 5'000'000), 1);
+  close(fd);
+  EXPECT_LT(CountAnswers(*source_), 10000u);
+}
+
+TEST_F(HostileCache, InADirectoryWhereNothingCanBeWritten) {
+  ASSERT_EQ(chmod(directory_.Path("").c_str(), 0555), 0);
+  const bool root = geteuid() == 0;
+  if (root) {
+    ASSERT_EQ(chmod(file_.c_str(), 0444), 0);
+    ASSERT_EQ(seteuid(65534), 0);
+  }
+  EXPECT_EQ(Open(), kOk);
+  if (root) {
+    ASSERT_EQ(seteuid(0), 0);
+  }
+  ExpectAnswers();
+  EXPECT_EQ(directory_.Names(), Strings{"host.ksi"});
+  ASSERT_EQ(chmod(directory_.Path("").c_str(), 0755), 0);
+}
+
+TEST_F(HostileCache, LinksThatLeadInCircles) {
+  std::filesystem::create_symlink("b", directory_.Path("a"));
+  std::filesystem::create_symlink("a", directory_.Path("b"));
+  EXPECT_EQ(Open(directory_.Path("a")), KSI_STATUS_IO_ERROR);
+}
+
+TEST_F(HostileCache, PlacesThatAreNoFiles) {
+  const std::string pipe = directory_.Path("pipe");
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  std::filesystem::create_symlink("pipe", directory_.Path("link"));
+  EXPECT_EQ(Open(directory_.Path("link")), KSI_STATUS_INVALID_METADATA);
+  EXPECT_EQ(Open("/dev/null"), KSI_STATUS_INVALID_METADATA);
+  EXPECT_EQ(Open("/proc/self/cmdline"), KSI_STATUS_INVALID_METADATA);
+  EXPECT_EQ(Open(std::string(10000, 'x')), KSI_STATUS_IO_ERROR);
+}
+
+TEST_F(HostileCache, WithoutADescriptorLeft) {
+  const int lowest = dup(0);
+  ASSERT_GE(lowest, 0);
+  close(lowest);
+  rlimit before{};
+  ASSERT_EQ(getrlimit(RLIMIT_NOFILE, &before), 0);
+  rlimit none = before;
+  none.rlim_cur = static_cast<rlim_t>(lowest);
+  ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &none), 0);
+  const Status status = Open();
+  ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &before), 0);
+  EXPECT_EQ(status, KSI_STATUS_IO_ERROR);
+}
+
+// A file of which only the head was made, larger than any capture.
+TEST_F(HostileCache, HolesOfATerabyte) {
+  ASSERT_EQ(truncate(file_.c_str(), off_t{1} << 40), 0);
+  ASSERT_EQ(Open(), kOk);
+  ExpectAnswers();
+}
+
+}  // namespace
+}  // namespace ksi
