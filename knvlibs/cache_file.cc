@@ -28,7 +28,7 @@ constexpr uint32_t kUtf8 = 1;
 
 // A schema that is not the known one may take arbitrarily long to read; the known one takes a few
 // hundred steps.
-constexpr int kMostOpeningSteps = 100000;
+constexpr int64_t kMostOpeningSteps = 100000;
 
 // Twice the nodes of the catalogue, and room for those of a later one.
 constexpr size_t kMostNodeRows = 4096;
@@ -56,16 +56,6 @@ Status CheckHeader(const Header& header, size_t length, uint64_t fileSize) {
     return KSI_STATUS_METADATA_READ_ERROR;
   }
   return kOk;
-}
-
-// Looks at a file before SQLite does.
-Status CheckFile(int descriptor) {
-  struct stat info;
-  if (fstat(descriptor, &info) != 0) return StatusOfErrno(errno);
-  Header header = {};
-  const ssize_t length = pread(descriptor, header.data(), header.size(), 0);
-  if (length < 0) return StatusOfErrno(errno);
-  return CheckHeader(header, static_cast<size_t>(length), static_cast<uint64_t>(info.st_size));
 }
 
 Status CheckType(const struct stat& info) {
@@ -156,7 +146,7 @@ Status CacheFile::Descriptor::Open(const char* fileName) {
 Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, std::string* why) {
   std::unique_ptr<CacheFile> made(new CacheFile);
   Status status = made->descriptor_.Open(fileName);
-  if (status == kOk) status = CheckFile(made->descriptor_.Number());
+  if (status == kOk) status = made->CheckHead();
   if (status == kOk) status = made->CheckChanges(fileName);
   if (status == kOk) status = made->Connect();
   if (status == kOk) status = made->CheckSchema();
@@ -166,9 +156,20 @@ Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, s
     if (why != nullptr) *why = made->why_;
     return status;
   }
-  sqlite3_progress_handler(made->Handle(), 0, nullptr, nullptr);
+  made->limit_.Allow(WorkLimit::StepsFor(made->size_));
   *file = std::move(made);
   return kOk;
+}
+
+// Looks at the file before SQLite does.
+Status CacheFile::CheckHead() {
+  struct stat info;
+  if (fstat(descriptor_.Number(), &info) != 0) return StatusOfErrno(errno);
+  size_ = static_cast<uint64_t>(info.st_size);
+  Header header = {};
+  const ssize_t length = pread(descriptor_.Number(), header.data(), header.size(), 0);
+  if (length < 0) return StatusOfErrno(errno);
+  return CheckHeader(header, static_cast<size_t>(length), size_);
 }
 
 // A cache file is whole from its first moment. Somebody who changes one all the same leaves, until
@@ -190,8 +191,13 @@ Status CacheFile::Connect() {
 }
 
 Status CacheFile::Failed(int code) {
-  why_ = sqlite3_errmsg(database_.get());
+  why_ = ErrorText();
   return StatusOfSqlite(code);
+}
+
+const char* CacheFile::ErrorText() const {
+  return limit_.Exceeded() ? "its pages lead to each other without end"
+                           : sqlite3_errmsg(database_.get());
 }
 
 Status CacheFile::Damaged(const char* why) {
@@ -207,8 +213,8 @@ Status CacheFile::Configure() {
   sqlite3_db_config(database, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
   sqlite3_db_config(database, SQLITE_DBCONFIG_ENABLE_TRIGGER, 0, nullptr);
   sqlite3_db_config(database, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
-  sqlite3_progress_handler(
-      database, kMostOpeningSteps, [](void*) { return 1; }, nullptr);
+  limit_.Watch(database, size_);
+  limit_.Allow(kMostOpeningSteps);
   const int code = sqlite3_exec(database, "PRAGMA cell_size_check=ON", nullptr, nullptr, nullptr);
   return code == SQLITE_OK ? kOk : Failed(code);
 }

@@ -10,6 +10,7 @@
 #include "knvlibs/catalogue.h"
 #include "knvlibs/sqlite.h"
 #include "knvlibs/status.h"
+#include "knvlibs/work_limit.h"
 
 namespace ksi {
 
@@ -51,6 +52,16 @@ class CacheFile {
 
   sqlite3* Handle() const { return database_.get(); }
 
+  // Statements on Handle() end with SQLITE_INTERRUPT when, all together since the file was opened
+  // or since this was called, they did more than a file of this size is worth. Fails with
+  // KSI_STATUS_METADATA_READ_ERROR when that has shown that nothing should be read of it any more.
+  [[nodiscard]] Status BeginRead() { return limit_.BeginAgain() ? kOk : Status{KSI_STATUS_METADATA_READ_ERROR}; }
+
+  // Why the latest statement failed, for people.
+  const char* ErrorText() const;
+
+  uint64_t Size() const { return size_; }
+
  private:
   class Descriptor {
    public:
@@ -60,7 +71,7 @@ class CacheFile {
     Descriptor& operator=(const Descriptor&) = delete;
 
     // The regular file of this name, without waiting for anybody.
-    Status Open(const char* fileName);
+    [[nodiscard]] Status Open(const char* fileName);
     int Number() const { return number_; }
 
    private:
@@ -70,6 +81,7 @@ class CacheFile {
   CacheFile() = default;
 
   [[nodiscard]] Status Connect();
+  [[nodiscard]] Status CheckHead();
   [[nodiscard]] Status CheckChanges(const char* fileName);
   [[nodiscard]] Status Configure();
   [[nodiscard]] Status CheckSchema();
@@ -78,8 +90,11 @@ class CacheFile {
   [[nodiscard]] Status Failed(int code);
   [[nodiscard]] Status Damaged(const char* why);
 
-  Descriptor descriptor_;  // before the database that reads it
+  // Before the database, which uses them.
+  Descriptor descriptor_;
+  WorkLimit limit_;
   Database database_;
+  uint64_t size_ = 0;
   std::string why_;
   Capture capture_;
   std::vector<NodeRow> nodes_;  // in the order of their identifiers

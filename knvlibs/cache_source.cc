@@ -92,6 +92,8 @@ Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& ins
   if (reading->type != SQLITE_INTEGER) return KSI_STATUS_METADATA_READ_ERROR;
   const int64_t count = reading->number;
   if (count == 0) return kOk;
+  status = file_->BeginRead();
+  if (status != kOk) return status;
 
   int64_t position = 0;
   // Many a report lists nothing, so this waits for the first list.
@@ -168,7 +170,9 @@ Status CacheSource::FindObject(const Keys& keys, const Object** object) {
 Status CacheSource::Load(const Keys& keys, Object& object) {
   object.readings.clear();
   object.bytes.clear();
-  Status status = CursorAt(keys) ? kOk : SeekCursor(keys);
+  Status status = file_->BeginRead();
+  if (status != kOk) return status;
+  status = CursorAt(keys) ? kOk : SeekCursor(keys);
   for (; status == kOk && CursorAt(keys); status = StepCursor()) {
     Reading reading{};
     reading.node = cursor_.Number(kNode);
