@@ -9,8 +9,12 @@
 #include <cstring>
 
 #include <knvlibs/ksi.h>
+#include "framework/return_status.h"
 #include "frontend/usage.h"
 #include "reports/reports.h"
+
+// A library that reads no cache files has no need of it.
+#pragma weak KSI_SourceWalkStatus
 
 namespace tally {
 namespace {
@@ -92,6 +96,18 @@ bool CheckVersion() {
   return status == kSuccess;
 }
 
+// Groups of a damaged cache file that contain each other make a walk that is never whole, which the
+// walk itself does not tell.
+bool CheckWalk() {
+  if (KSI_SourceWalkStatus == nullptr) return true;
+  const Status status = KSI_SourceWalkStatus(nullptr);
+  if (status != kSuccess) {
+    Warning("tally: groups contain each other, rows are missing: %s\n",
+            KNV_ReturnStatusToString(status));
+  }
+  return status == kSuccess;
+}
+
 int Run(int argc, char** argv) {
   Options options;
   switch (ParseOptions(argc, argv, options)) {
@@ -111,7 +127,9 @@ int Run(int argc, char** argv) {
     PrintUsage(argv[0]);
     return EXIT_SUCCESS;
   }
-  return options.report->entry(argc, argv) == kSuccess ? EXIT_SUCCESS : EXIT_FAILURE;
+  const Status status = options.report->entry(argc, argv);
+  const bool whole = options.cacheFile == nullptr || CheckWalk();
+  return status == kSuccess && whole ? EXIT_SUCCESS : EXIT_FAILURE;
 }
 
 // Rows that could not be written must not pass for written.

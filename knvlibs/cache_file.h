@@ -55,7 +55,9 @@ class CacheFile {
   // Statements on Handle() end with SQLITE_INTERRUPT when, all together since the file was opened
   // or since this was called, they did more than a file of this size is worth. Fails with
   // KSI_STATUS_METADATA_READ_ERROR when that has shown that nothing should be read of it any more.
-  [[nodiscard]] Status BeginRead() { return limit_.BeginAgain() ? kOk : Status{KSI_STATUS_METADATA_READ_ERROR}; }
+  [[nodiscard]] Status BeginRead() {
+    return limit_.BeginAgain() ? kOk : Status{KSI_STATUS_METADATA_READ_ERROR};
+  }
 
   // Why the latest statement failed, for people.
   const char* ErrorText() const;

@@ -5,6 +5,7 @@
 #include <limits>
 
 #include "knvlibs/cache_format.h"
+#include "knvlibs/node_table.h"
 
 namespace ksi {
 namespace {
@@ -53,9 +54,10 @@ void CacheSource::OwnKey::Take(const Key& key) {
 }
 
 Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* source) {
-  std::unique_ptr<CacheSource> made(new CacheSource);
-  const Status status = CacheFile::Open(fileName, &made->file_);
+  std::unique_ptr<CacheFile> file;
+  const Status status = CacheFile::Open(fileName, &file);
   if (status != kOk) return status;
+  std::unique_ptr<CacheSource> made(new CacheSource(std::move(file)));
 
   for (auto& ids : made->ids_) ids.assign(Catalogue().size(), -1);
   for (const CacheFile::NodeRow& row : made->file_->NodeRows()) {
@@ -85,6 +87,15 @@ Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
 }
 
 Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
+  if (IdOf(node) != ksi::node::sched_groups_members_groups) return List(node, keys, instances);
+  Status status = walk_.Ask(keys[0].number, std::chrono::steady_clock::now());
+  const size_t before = instances.Count();
+  if (status == kOk) status = List(node, keys, instances);
+  if (status == kOk) walk_.Answer(instances, before);
+  return status;
+}
+
+Status CacheSource::List(const Node& node, const Keys& keys, ParamList& instances) {
   const Object* object = nullptr;
   const Reading* reading = nullptr;
   Status status = Find(node, Kind::kList, keys, &object, &reading);

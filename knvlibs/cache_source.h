@@ -11,10 +11,12 @@
 #include <array>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "knvlibs/cache_file.h"
 #include "knvlibs/source.h"
+#include "knvlibs/walk_limit.h"
 
 namespace ksi {
 
@@ -27,6 +29,9 @@ class CacheSource : public Source {
   // captured fails with its status again.
   [[nodiscard]] Status Value(const Node& node, const Keys& keys, Buffer record) override;
   [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
+  // A walk over groups that contain each other fails in time, with KSI_STATUS_METADATA_READ_ERROR.
+  void Refresh() override { walk_.Restart(); }
+  [[nodiscard]] Status WalkStatus() const override { return walk_.WalkStatus(); }
   Definitions KernelDefinitions() const override;
 
  private:
@@ -56,10 +61,12 @@ class CacheSource : public Source {
     std::vector<std::byte> bytes;
   };
 
-  CacheSource() = default;
+  explicit CacheSource(std::unique_ptr<CacheFile> file)
+      : file_(std::move(file)), walk_(file_->Size()) {}
 
   [[nodiscard]] Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
                             const Reading** reading);
+  [[nodiscard]] Status List(const Node& node, const Keys& keys, ParamList& instances);
   [[nodiscard]] Status TakeEntry(const Node& node, ParamList& instances) const;
   [[nodiscard]] Status FindObject(const Keys& keys, const Object** object);
   [[nodiscard]] Status Load(const Keys& keys, Object& object);
@@ -68,6 +75,7 @@ class CacheSource : public Source {
   bool CursorAt(const Keys& keys) const;
 
   std::unique_ptr<CacheFile> file_;
+  WalkLimit walk_;
   // The identifiers that the nodes of the catalogue have in the file, -1: not in it.
   std::array<std::vector<int64_t>, 2> ids_;
 

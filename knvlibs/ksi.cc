@@ -240,6 +240,12 @@ uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source, uint16_t node
   return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(source, node, keys, 0, list); });
 }
 
+uint32_t KSI_SourceWalkStatus(struct KSI_Source* source) {
+  return ksi::Guarded([&] {
+    return ksi::SourceOf(source).Ask([](const ksi::Source& asked) { return asked.WalkStatus(); });
+  });
+}
+
 struct KSI_ParamList* KSI_ParamListCreate(int version, int capacity) {
   return ksi::CreateList(version, capacity, [](size_t room) { return new ksi::ParamList(room); });
 }

@@ -60,6 +60,10 @@ class Source {
   // Forgets what was read: later answers are read anew.
   virtual void Refresh() {}
 
+  // What every list of groups fails with until Refresh or another walk over the groups, if what is
+  // walked over has shown to be no tree.
+  [[nodiscard]] virtual Status WalkStatus() const { return kOk; }
+
   // The definitions of the kernel that answers.
   virtual Definitions KernelDefinitions() const = 0;
 };

@@ -1,0 +1,56 @@
+// How long a walk over the groups of a cache file may be.
+//
+// In a tree each group stands in one place. A dozen groups that list each other are a small file
+// and a walk without end, and to remember who was seen would take memory for each group. So what a
+// walk asks for is counted: with the lists and their entries that a file of this size can hold, it
+// has seen everything more than once.
+#ifndef KNVLIBS_WALK_LIMIT_H_
+#define KNVLIBS_WALK_LIMIT_H_
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+
+#include "knvlibs/param_list.h"
+#include "knvlibs/status.h"
+
+namespace ksi {
+
+class WalkLimit {
+ public:
+  using Time = std::chrono::steady_clock::time_point;
+
+  // The walk after which nobody asks for so long is over.
+  static constexpr std::chrono::seconds kPause{1};
+
+  explicit WalkLimit(uint64_t fileSize) : most_(fileSize / 8 + 2048) {}
+
+  // The groups of `group` are asked for. KSI_STATUS_METADATA_READ_ERROR if that is more than a walk
+  // may take, and from then on for the rest of the walk. A new walk begins after a pause, and when
+  // the first group of this one is asked again and nobody has listed it.
+  [[nodiscard]] Status Ask(int64_t group, Time now);
+
+  // They are the entries of `groups` from the one at `from` on.
+  void Answer(const ParamList& groups, size_t from);
+
+  // Begins a new walk.
+  void Restart() { taken_ = 0; }
+
+  // What all that the walk asks for now fails with.
+  [[nodiscard]] Status WalkStatus() const {
+    return taken_ > most_ ? Status{KSI_STATUS_METADATA_READ_ERROR} : kOk;
+  }
+
+ private:
+  bool Continues(int64_t group, Time now) const;
+
+  uint64_t most_;
+  uint64_t taken_ = 0;  // lists and entries; 0: no walk has begun
+  int64_t first_ = 0;
+  bool firstIsListed_ = false;
+  Time latest_;
+};
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_WALK_LIMIT_H_

@@ -1,0 +1,218 @@
+// Groups of a cache file that contain each other, and those that do not.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "knvlibs/cache_source.h"
+#include "knvlibs/walk_limit.h"
+#include "tests/harness/program.h"
+#include "tests/harness/tally.h"
+#include "tests/knvlibs/cache_fixture.h"
+
+namespace ksi {
+namespace {
+
+using std::chrono::milliseconds;
+
+// A walk in a file without bytes may take 2048 lists and entries.
+class WalkLimitTest : public testing::Test {
+ protected:
+  Status Ask(int64_t group, const std::vector<uint64_t>& groups = {}) {
+    const Status status = limit_.Ask(group, now_);
+    ParamList list(ParamList::kNoLimit);
+    EXPECT_EQ(list.AddNumber(0), kOk);  // of somebody else
+    for (const uint64_t each : groups) EXPECT_EQ(list.AddNumber(each), kOk);
+    if (status == kOk) limit_.Answer(list, 1);
+    return status;
+  }
+
+  // Asks for lists without entries until one fails; gives the number of those that did not.
+  size_t CountToTheEnd(int64_t group) {
+    size_t count = 0;
+    while (count < 10000 && Ask(group) == kOk) ++count;
+    return count;
+  }
+
+  WalkLimit limit_{0};
+  WalkLimit::Time now_{std::chrono::hours(1)};
+};
+
+TEST_F(WalkLimitTest, CountsLists) {
+  EXPECT_EQ(Ask(0), kOk);
+  EXPECT_EQ(CountToTheEnd(1), 2047u);
+  EXPECT_EQ(limit_.WalkStatus(), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(Ask(2), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(WalkLimitTest, CountsEntries) {
+  EXPECT_EQ(Ask(0, std::vector<uint64_t>(2000, 5)), kOk);
+  EXPECT_EQ(CountToTheEnd(1), 47u);
+}
+
+TEST_F(WalkLimitTest, FollowsFromTheSizeOfTheFile) {
+  limit_ = WalkLimit(8000);
+  EXPECT_EQ(Ask(0), kOk);
+  EXPECT_EQ(CountToTheEnd(1), 3047u);
+}
+
+TEST_F(WalkLimitTest, BeginsAgainWithItsFirstGroup) {
+  for (int walk = 0; walk < 10; ++walk) {
+    EXPECT_EQ(Ask(0, {1, 2}), kOk);
+    for (int64_t group = 1; group < 1000; ++group) EXPECT_EQ(Ask(group), kOk);
+  }
+  CountToTheEnd(1);
+  EXPECT_EQ(Ask(0), kOk);
+  EXPECT_EQ(limit_.WalkStatus(), kOk);
+}
+
+TEST_F(WalkLimitTest, GoesOnWithAFirstGroupThatIsListed) {
+  size_t walks = 0;
+  while (walks < 10000 && Ask(0, {1}) == kOk && Ask(1, {0}) == kOk) ++walks;
+  EXPECT_EQ(walks, 512u);
+  EXPECT_EQ(Ask(0), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(WalkLimitTest, BeginsAgainAfterAPause) {
+  EXPECT_EQ(Ask(0), kOk);
+  for (int round = 0; round < 3; ++round) {
+    for (int i = 0; i < 2000; ++i) ASSERT_EQ(Ask(1), kOk);
+    now_ += milliseconds(1000);
+  }
+  EXPECT_EQ(Ask(2), kOk);
+  for (int i = 0; i < 2000; ++i) ASSERT_EQ(Ask(1), kOk);
+  now_ += milliseconds(999);
+  EXPECT_EQ(CountToTheEnd(1), 47u);
+}
+
+TEST_F(WalkLimitTest, StaysAtItsEndHoweverLongItLasts) {
+  EXPECT_EQ(Ask(0), kOk);
+  CountToTheEnd(1);
+  now_ += std::chrono::hours(1);
+  EXPECT_EQ(Ask(1), KSI_STATUS_METADATA_READ_ERROR);
+  limit_.Restart();
+  EXPECT_EQ(limit_.WalkStatus(), kOk);
+  EXPECT_EQ(Ask(1), kOk);
+}
+
+// Files and reports.
+
+class WalkedCache : public testing::Test {
+ protected:
+  // Adds a group with all that group-stats reads.
+  static void AddGroup(ksicache::CacheWriter& writer, int64_t id,
+                       const std::vector<uint64_t>& groups) {
+    const auto add = [&](const char* path) {
+      const Node& node = NodeAt(path);
+      // All bits, for reports that look for one of some.
+      const bool flags = node.path == "sched/groups/groupFlags";
+      const std::vector<std::byte> record(node.recordSize, std::byte(flags ? 255 : 0));
+      writer.AddValue(node, MakeKeys({id}), record);
+    };
+    for (const char* path :
+         {"sched/groups/groupName", "sched/groups/groupTag", "sched/groups/parentGroupID",
+          "sched/groups/groupFlags", "sched/groups/memAllocationInKB",
+          "sched/groups/stats/capacity", "sched/groups/stats/memoryStats"}) {
+      add(path);
+    }
+    ParamList list(ParamList::kNoLimit);
+    for (const uint64_t group : groups) EXPECT_EQ(list.AddNumber(group), kOk);
+    writer.AddList(NodeAt("sched/groups/members/groups"), MakeKeys({id}), list);
+  }
+
+  harness::Result Report(std::vector<std::string> options) {
+    harness::Args args = {"-c", file_, "-r", "group-stats", "-q", "-s", "gid"};
+    args.insert(args.end(), options.begin(), options.end());
+    return harness::RunProgram(harness::BuiltTally(args));
+  }
+
+  static size_t Lines(const std::string& text) {
+    return static_cast<size_t>(std::ranges::count(text, '\n'));
+  }
+
+  // Expects the report to end with some rows and with the message.
+  void ExpectEnd(const std::vector<std::string>& options) {
+    const harness::Result result = Report(options);
+    EXPECT_EQ(result.status, 1);
+    EXPECT_GT(Lines(result.out), 10u);
+    EXPECT_LT(Lines(result.out), 20000u);
+    EXPECT_LT(Lines(result.err), 20000u);
+    EXPECT_NE(result.err.find("tally: groups contain each other, rows are missing: "),
+              std::string::npos);
+  }
+
+  TestDirectory directory_;
+  std::string file_ = directory_.Path("host.ksi");
+};
+
+TEST_F(WalkedCache, GroupsInCirclesEnd) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    AddGroup(writer, 0, {1, 2, 1, 2});
+    AddGroup(writer, 1, {0, 2});
+    AddGroup(writer, 2, {1, 0});
+    writer.Commit(TestCapture());
+  }
+  ExpectEnd({});
+  ExpectEnd({"-l", "1000"});
+  ExpectEnd({"-g", "2"});
+  EXPECT_EQ(Report({"-l", "2"}).status, 0);
+}
+
+TEST_F(WalkedCache, LayersOfGroupsEnd) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    for (int64_t id = 0; id < 12; ++id) {
+      AddGroup(writer, id, std::vector<uint64_t>(50, static_cast<uint64_t>(id) + 1));
+    }
+    AddGroup(writer, 12, {});
+    writer.Commit(TestCapture());
+  }
+  ExpectEnd({});
+}
+
+// A process that moved while the host was captured stands in two groups.
+TEST_F(WalkedCache, GroupsThatMovedAreShownTwice) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    AddGroup(writer, 0, {1, 2});
+    AddGroup(writer, 1, {3});
+    AddGroup(writer, 2, {3});
+    AddGroup(writer, 3, {});
+    writer.Commit(TestCapture());
+  }
+  const harness::Result result = Report({});
+  EXPECT_EQ(result.status, 0);
+  EXPECT_EQ(result.out, "gid\n0\n1\n3\n2\n3\n");
+  EXPECT_EQ(result.err, "");
+}
+
+TEST_F(WalkedCache, LargeHostsAreWalkedOverAgainAndAgain) {
+  constexpr int64_t kGroups = 5000;
+  {
+    ksicache::CacheWriter writer(file_, true);
+    std::vector<uint64_t> groups;
+    for (int64_t id = 1; id <= kGroups; ++id) groups.push_back(static_cast<uint64_t>(id));
+    AddGroup(writer, 0, groups);
+    for (int64_t id = 1; id <= kGroups; ++id) AddGroup(writer, id, {});
+    writer.Commit(TestCapture());
+  }
+  std::unique_ptr<CacheSource> source;
+  ASSERT_EQ(CacheSource::Open(file_.c_str(), &source), kOk);
+  for (int walk = 0; walk < 200; ++walk) {
+    for (int64_t id = 0; id <= kGroups; id += walk == 0 ? 1 : 10) {
+      ParamList list(ParamList::kNoLimit);
+      ASSERT_EQ(source->Instances(NodeAt("sched/groups/members/groups"), MakeKeys({id}), list),
+                kOk);
+    }
+  }
+  EXPECT_EQ(source->WalkStatus(), kOk);
+  EXPECT_EQ(Lines(Report({}).out), 5002u);
+}
+
+}  // namespace
+}  // namespace ksi
