@@ -7,6 +7,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <new>
 
 #include <knvlibs/ksi.h>
 #include "framework/return_status.h"
@@ -132,6 +133,16 @@ int Run(int argc, char** argv) {
   return status == kSuccess && whole ? EXIT_SUCCESS : EXIT_FAILURE;
 }
 
+// Rows that were printed before memory ran out stay.
+int RunGuarded(int argc, char** argv) {
+  try {
+    return Run(argc, argv);
+  } catch (const std::bad_alloc&) {
+    Warning("tally: out of memory\n");
+    return EXIT_FAILURE;
+  }
+}
+
 // Rows that could not be written must not pass for written.
 bool CloseStandardOutput() {
   const bool lostRows = std::ferror(stdout) != 0;
@@ -146,6 +157,6 @@ bool CloseStandardOutput() {
 }  // namespace tally
 
 int main(int argc, char** argv) {
-  const int exitStatus = tally::Run(argc, argv);
+  const int exitStatus = tally::RunGuarded(argc, argv);
   return tally::CloseStandardOutput() ? exitStatus : EXIT_FAILURE;
 }
