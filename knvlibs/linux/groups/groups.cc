@@ -77,8 +77,9 @@ Status GroupTree::Get(const LinuxHost& host, const GroupTree*& tree) {
 }
 
 Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
-  Status status = tree.AddCgroups(host);
-  if (status == kOk) status = tree.AddProcesses(host);
+  tree.AddTop();
+  tree.AddCgroups(host);
+  const Status status = tree.AddProcesses(host);
   if (status != kOk) return status;
   tree.FindOwnCgroups();
   for (Group& group : tree.groups_) {
@@ -100,9 +101,7 @@ size_t GroupTree::Add(size_t parent, Group group) {
   return index;
 }
 
-// Breadth first, so that what is above a group has been added before it.
-Status GroupTree::AddCgroups(const LinuxHost& host) {
-  cgroups_ = CgroupHierarchy::Find(host);
+void GroupTree::AddTop() {
   Group root;
   root.id = kRootGroup;
   root.flags = KSI_GROUP_PREDEFINED;
@@ -115,39 +114,44 @@ Status GroupTree::AddCgroups(const LinuxHost& host) {
   kernel.flags = KSI_GROUP_PREDEFINED | KSI_GROUP_SYSTEM_WORLD | KSI_GROUP_KERNEL_MEMORY;
   kernel.name = "kernel";
   Add(0, std::move(kernel));
-  if (!cgroups_.Exists()) return kOk;
+}
 
-  std::vector<std::string> paths{""};
-  for (size_t i = 0; i < paths.size(); ++i) {
-    const std::string path = paths[i];
-    const auto known = byPath_.find(path);
-    const size_t self = known == byPath_.end() ? 0 : known->second;
-    int64_t id = groups_[self].id;
-    std::vector<CgroupHierarchy::Child> children;
-    // A cgroup that has gone since stays as one without children.
-    if (cgroups_.List(host, path, id, children) != kOk) continue;
-    if (self != 0 && id != groups_[self].id) {
-      byId_.erase(groups_[self].id);
-      byId_.emplace(id, self);
-      groups_[self].id = id;
-    }
-    for (const CgroupHierarchy::Child& child : children) {
-      Group group;
-      group.id = static_cast<int64_t>(child.inode);
-      group.path = path + '/' + child.name;
-      group.flags = CgroupFlags(groups_[self], child.name);
-      group.name = WithoutEscapes(child.name);
-      paths.push_back(group.path);
-      const size_t index = Add(self, std::move(group));
-      byPath_.emplace(paths.back(), index);
-    }
-
+// Breadth first, so that what is above a group has been added before it.
+void GroupTree::AddCgroups(const LinuxHost& host) {
+  cgroups_ = CgroupHierarchy::Find(host);
+  if (!cgroups_.Exists()) return;
+  std::vector<size_t> toList{0};
+  for (size_t i = 0; i < toList.size(); ++i) {
+    AddChildren(host, toList[i], toList);
     std::vector<int32_t> pids;
     // What cannot be listed here, each process tells of itself.
-    if (cgroups_.ReadProcesses(host, path, pids) != kOk) continue;
-    for (const int32_t pid : pids) cgroupOfPid_.emplace(pid, self);
+    if (cgroups_.ReadProcesses(host, groups_[toList[i]].path, pids) != kOk) continue;
+    for (const int32_t pid : pids) cgroupOfPid_.emplace(pid, toList[i]);
   }
-  return kOk;
+}
+
+// Adds the cgroups below one, also to `added`.
+void GroupTree::AddChildren(const LinuxHost& host, size_t self, std::vector<size_t>& added) {
+  const std::string path = groups_[self].path;
+  int64_t id = groups_[self].id;
+  std::vector<CgroupHierarchy::Child> children;
+  // A cgroup that has gone since stays as one without children.
+  if (cgroups_.List(host, path, id, children) != kOk) return;
+  if (self != 0 && id != groups_[self].id) {
+    byId_.erase(groups_[self].id);
+    byId_.emplace(id, self);
+    groups_[self].id = id;
+  }
+  for (const CgroupHierarchy::Child& child : children) {
+    Group group;
+    group.id = static_cast<int64_t>(child.inode);
+    group.path = path + '/' + child.name;
+    group.flags = CgroupFlags(groups_[self], child.name);
+    group.name = WithoutEscapes(child.name);
+    const std::string childPath = group.path;
+    added.push_back(Add(self, std::move(group)));
+    byPath_.emplace(childPath, added.back());
+  }
 }
 
 size_t GroupTree::CgroupOf(const LinuxHost& host, int32_t pid) const {
@@ -172,27 +176,31 @@ Status GroupTree::AddProcesses(const LinuxHost& host) {
     if (status == KSI_STATUS_PERMISSION_DENIED && host.First("status denied")) {
       Warning("/proc/PID/status: not permitted for some processes: they are left out\n");
     }
-    if (status != kOk || process.isKernelThread || process.isZombie) continue;
-
-    const size_t index = processes_.size();
-    const size_t cgroup = CgroupOf(host, pid);
-    std::vector<std::string> words;
-    // QEMU is never a single thread; most others are and need not be asked.
-    if (process.threads > 1 && ReadCommandLine(host, pid, words) == kOk && IsQemu(words)) {
-      processes_.push_back(std::move(process));
-      AddVirtualMachine(cgroup, index, ParseQemuCommandLine(words));
-      continue;
+    if (status == kOk && !process.isKernelThread && !process.isZombie) {
+      AddProcess(host, std::move(process));
     }
-    Group group;
-    group.id = kProcessGroup | pid;
-    group.kind = Group::Kind::kUserWorld;
-    group.flags = KSI_GROUP_USER_WORLD;
-    group.name = process.name;
-    group.process = index;
-    processes_.push_back(std::move(process));
-    Add(cgroup, std::move(group));
   }
   return kOk;
+}
+
+void GroupTree::AddProcess(const LinuxHost& host, Process process) {
+  const int32_t pid = process.pid;
+  const size_t index = processes_.size();
+  const size_t cgroup = CgroupOf(host, pid);
+  processes_.push_back(std::move(process));
+  std::vector<std::string> words;
+  // QEMU is never a single thread; most others are and need not be asked.
+  if (processes_[index].threads > 1 && ReadCommandLine(host, pid, words) == kOk && IsQemu(words)) {
+    AddVirtualMachine(cgroup, index, ParseQemuCommandLine(words));
+    return;
+  }
+  Group group;
+  group.id = kProcessGroup | pid;
+  group.kind = Group::Kind::kUserWorld;
+  group.flags = KSI_GROUP_USER_WORLD;
+  group.name = processes_[index].name;
+  group.process = index;
+  Add(cgroup, std::move(group));
 }
 
 void GroupTree::AddVirtualMachine(size_t parent, size_t process, QemuCommandLine commandLine) {

@@ -97,8 +97,11 @@ class GroupTree {
                                        Figure& saved) const;
 
  private:
-  [[nodiscard]] Status AddCgroups(const LinuxHost& host);
+  void AddTop();
+  void AddCgroups(const LinuxHost& host);
+  void AddChildren(const LinuxHost& host, size_t self, std::vector<size_t>& added);
   [[nodiscard]] Status AddProcesses(const LinuxHost& host);
+  void AddProcess(const LinuxHost& host, Process process);
   size_t Add(size_t parent, Group group);
   size_t CgroupOf(const LinuxHost& host, int32_t pid) const;
   void AddVirtualMachine(size_t parent, size_t process, QemuCommandLine commandLine);

@@ -1,5 +1,7 @@
 #include "knvlibs/linux/memory/zoneinfo.h"
 
+#include <algorithm>
+#include <iterator>
 #include <string_view>
 
 #include "knvlibs/linux/host/text.h"
@@ -30,6 +32,55 @@ bool ParseHeading(std::string_view line, Zone& zone) {
   return !zone.name.empty() && TakeWord(line).empty();
 }
 
+// A zone's own figures start at "  pages free" and end at "protection:". Before them the first zone
+// of a node has the figures of the node, after them come counters and per-CPU lists.
+class ZoneParser {
+ public:
+  explicit ZoneParser(Zones& zones) : zones_(zones) {}
+
+  // False if the line is not understood.
+  bool Take(std::string_view line) {
+    if (line.starts_with("Node ")) return TakeHeading(line);
+    if (place_ == Place::kOutside) return true;
+    std::string_view name = TakeWord(line);
+    if (place_ == Place::kBeforePages) {
+      if (name != "pages") return true;
+      place_ = Place::kInPages;
+      name = TakeWord(line);
+    }
+    return name == "protection:" ? End() : TakeFigure(name, line);
+  }
+
+  // Whether all zones are whole.
+  bool IsDone() const { return place_ == Place::kOutside && !zones_.empty(); }
+
+ private:
+  enum class Place : uint8_t { kOutside, kBeforePages, kInPages };
+
+  bool TakeHeading(std::string_view line) {
+    if (place_ != Place::kOutside || !ParseHeading(line, zones_.emplace_back())) return false;
+    place_ = Place::kBeforePages;
+    seen_ = 0;
+    return true;
+  }
+
+  bool TakeFigure(std::string_view name, std::string_view line) {
+    const auto* const known = std::ranges::find(kNames, name, &Name::text);
+    if (known == std::end(kNames)) return true;
+    seen_ |= 1u << (known - kNames);
+    return ParseNumber(TakeWord(line), zones_.back().*known->figure) && TakeWord(line).empty();
+  }
+
+  bool End() {
+    place_ = Place::kOutside;
+    return seen_ == kAllNames;
+  }
+
+  Zones& zones_;
+  Place place_ = Place::kOutside;
+  unsigned seen_ = 0;  // a bit for each of kNames
+};
+
 }  // namespace
 
 Status ReadZones(const LinuxHost& host, Zones& zones) {
@@ -37,44 +88,13 @@ Status ReadZones(const LinuxHost& host, Zones& zones) {
   const Status status = host.Read(kFile, content);
   if (status != kOk) return status;
 
-  // A zone's own figures start at "  pages free" and end at "protection:". Before them the first
-  // zone of a node has the figures of the node, after them come counters and per-CPU lists.
-  enum class Place : uint8_t { kOutside, kBeforePages, kInPages };
-  Place place = Place::kOutside;
-  unsigned seen = 0;
-  zones.clear();
+  ZoneParser parser(zones);
   Lines lines(content);
   std::string_view line;
   while (lines.Next(line)) {
-    if (line.starts_with("Node ")) {
-      if (place != Place::kOutside || !ParseHeading(line, zones.emplace_back())) {
-        return NotUnderstood(kFile, lines.Number());
-      }
-      place = Place::kBeforePages;
-      seen = 0;
-      continue;
-    }
-    if (place == Place::kOutside) continue;
-    std::string_view name = TakeWord(line);
-    if (place == Place::kBeforePages) {
-      if (name != "pages") continue;
-      place = Place::kInPages;
-      name = TakeWord(line);
-    }
-    if (name == "protection:") {
-      if (seen != kAllNames) return NotUnderstood(kFile, lines.Number());
-      place = Place::kOutside;
-      continue;
-    }
-    for (size_t i = 0; i < std::size(kNames); ++i) {
-      if (name != kNames[i].text) continue;
-      if (!ParseNumber(TakeWord(line), zones.back().*kNames[i].figure) || !TakeWord(line).empty()) {
-        return NotUnderstood(kFile, lines.Number());
-      }
-      seen |= 1u << i;
-    }
+    if (!parser.Take(line)) return NotUnderstood(kFile, lines.Number());
   }
-  return place == Place::kOutside && !zones.empty() ? kOk : NotUnderstood(kFile, lines.Number());
+  return parser.IsDone() ? kOk : NotUnderstood(kFile, lines.Number());
 }
 
 }  // namespace ksi

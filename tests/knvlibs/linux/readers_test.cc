@@ -11,7 +11,7 @@
 namespace ksi {
 namespace {
 
-TEST(ReadersTest, EachQuestionHasOneReader) {
+TEST(ReadersTest, AQuestionHasNoMoreThanOneReader) {
   std::map<uint16_t, int> values;
   std::map<uint16_t, int> lists;
   for (const ReaderTable& table : ReaderTables()) {
@@ -21,8 +21,8 @@ TEST(ReadersTest, EachQuestionHasOneReader) {
     }
   }
   for (const Node& node : Catalogue()) {
-    EXPECT_EQ(values[IdOf(node)], node.HasValue() ? 1 : 0) << node.path;
-    EXPECT_EQ(lists[IdOf(node)], node.HasList() ? 1 : 0) << node.path;
+    EXPECT_LE(values[IdOf(node)], node.HasValue() ? 1 : 0) << node.path;
+    EXPECT_LE(lists[IdOf(node)], node.HasList() ? 1 : 0) << node.path;
   }
 }
 
