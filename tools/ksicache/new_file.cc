@@ -34,7 +34,8 @@ class WithoutSignals {
 
 std::string RandomEntry() {
   uint64_t number = 0;
-  static_cast<void>(getrandom(&number, sizeof number, 0));  // a name that is taken is refused
+  // Any number will do: a name that is taken is refused.
+  if (getrandom(&number, sizeof number, 0) < 0) number = static_cast<uint64_t>(getpid());
   return ".ksicache." + Hex(number).substr(2);
 }
 
