@@ -119,8 +119,10 @@ class WalkedCache : public testing::Test {
           "sched/groups/stats/capacity", "sched/groups/stats/memoryStats"}) {
       add(path);
     }
-    ParamList list(ParamList::kNoLimit);
-    for (const uint64_t group : groups) EXPECT_EQ(list.AddNumber(group), kOk);
+    std::vector<Key> list;
+    for (const uint64_t group : groups) {
+      list.push_back({KeyKind::kNumber, static_cast<int64_t>(group), {}});
+    }
     writer.AddList(NodeAt("sched/groups/members/groups"), MakeKeys({id}), list);
   }
 
