@@ -1,19 +1,15 @@
 #include "knvlibs/linux/linux_source.h"
 
-#include <array>
+#include <vector>
 
 #include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
 namespace {
 
-#define KSI_COUNT(...) +1
-constexpr size_t kNodes = 1 KSI_NODES(KSI_COUNT);  // node::kInvalid is the first
-#undef KSI_COUNT
-
-// The readers of each node; null where Linux has no answer.
-std::array<Reader, kNodes> Joined() {
-  std::array<Reader, kNodes> readers;
+// The readers of each node, by its identifier; null where Linux has no answer.
+std::vector<Reader> Joined() {
+  std::vector<Reader> readers(Catalogue().size() + 1);
   for (const ReaderTable& table : ReaderTables()) {
     for (const Reader& reader : table) {
       Reader& joined = readers[reader.node];
@@ -25,8 +21,9 @@ std::array<Reader, kNodes> Joined() {
 }
 
 const Reader& ReaderOf(const Node& node) {
-  static const std::array<Reader, kNodes> readers = Joined();
-  return readers[IdOf(node)];
+  // Never destroyed: a program may still ask while it ends.
+  static const auto* const readers = new std::vector<Reader>(Joined());
+  return (*readers)[IdOf(node)];
 }
 
 }  // namespace
