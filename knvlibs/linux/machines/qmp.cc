@@ -107,8 +107,8 @@ void AskRecorded(const LinuxHost& host, const QemuCommandLine& line, GuestMemory
 }
 
 void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, GuestMemory& memory) {
-  auto& left = host.Kept().monitorTime;
-  if (left <= left.zero()) {
+  std::chrono::steady_clock::duration& left = host.Kept().monitorTime;
+  if (left <= std::chrono::steady_clock::duration::zero()) {
     if (host.First("monitors")) {
       Warning("virtual machines: no time left to ask all of them: their balloons have no value\n");
     }
