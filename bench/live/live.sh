@@ -1,15 +1,17 @@
-#!/usr/bin/env bash
+#!/bin/bash
 # Times the live reports beside the programs that show the same of this machine, in turn, in one run.
 #
 # Usage: bench/live/live.sh [TALLY [RUNS [PROCESSES]]]     (build/tally, 51 runs of each)
 #
 # PROCESSES is how many processes are started in addition, which sleep meanwhile.
 # Prints the median time of each in milliseconds, and how many lines it printed.
-set -euo pipefail
+source "$(dirname "${BASH_SOURCE[0]}")/../../scripts/setup"
+no_options "$@"
 
 tally=${1:-build/tally}
 runs=${2:-51}
 processes=${3:-0}
+[[ -x $tally ]] || misused "$tally is no program"
 
 # report options | the other program
 pairs=(

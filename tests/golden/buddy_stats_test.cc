@@ -310,7 +310,7 @@ TEST(BuddyStats, LeavesOutWhatCannotBeTold) {
   const std::vector<Name> names = ManyBuddies(70);
   Scenario host = Host(names);
   std::string warnings;
-  for (const uint32_t node : {69, 40, 5}) {
+  for (const uint32_t node : {69U, 40U, 5U}) {
     host.Fails(kMemNodes, {node}, 0xbad0003);
     warnings += "Error 0xbad0003 while reading /memory/memNodes/" + std::to_string(node);
   }

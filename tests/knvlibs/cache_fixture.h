@@ -2,8 +2,11 @@
 #ifndef TESTS_KNVLIBS_CACHE_FIXTURE_H_
 #define TESTS_KNVLIBS_CACHE_FIXTURE_H_
 
+#include <gtest/gtest.h>
+
 #include <cstddef>
 #include <initializer_list>
+#include <memory>
 #include <span>
 #include <string>
 #include <string_view>
@@ -11,6 +14,7 @@
 #include <vector>
 
 #include "knvlibs/cache_file.h"
+#include "knvlibs/cache_source.h"
 #include "knvlibs/source.h"
 #include "knvlibs/sqlite.h"
 #include "tools/ksicache/cache_writer.h"
@@ -57,6 +61,36 @@ CacheFile::Capture TestCapture();
 // A small host: group 0 "host" with the groups 7 and 9, of which 7 is "web" and 9 cannot be read;
 // client 30 with the remap types "large" and "small"; two heaps, no volumes.
 void WriteSmallHost(const std::string& fileName);
+
+// A test on the file of that host, and the source that it makes once it is opened.
+class SmallHostTest : public testing::Test {
+ protected:
+  void SetUp() override { WriteSmallHost(file_); }
+
+  Status Open(const std::string& fileName) {
+    source_.reset();
+    return CacheSource::Open(fileName.c_str(), &source_);
+  }
+  Status Open() { return Open(file_); }
+
+  Status Flags(int64_t group, uint32_t* flags) {
+    return source_->Value(NodeAt("sched/groups/groupFlags"), MakeKeys({group}),
+                          std::as_writable_bytes(std::span(flags, 1)));
+  }
+  Status Flags(int64_t group) {
+    uint32_t flags = 0;
+    return Flags(group, &flags);
+  }
+
+  Status ChildrenOf(int64_t group) {
+    ParamList children(ParamList::kNoLimit);
+    return source_->Instances(NodeAt("sched/groups/members/groups"), MakeKeys({group}), children);
+  }
+
+  TestDirectory directory_;
+  std::string file_ = directory_.Path("host.ksi");
+  std::unique_ptr<CacheSource> source_;
+};
 
 // A connection to a file as its owner could have one, and SQL run on it.
 Database OpenAsOwner(const std::string& fileName);

@@ -31,16 +31,8 @@ namespace {
 // A sanitizer keeps what is freed for a while.
 constexpr bool kSanitized = SANITIZED;
 
-class Cache : public testing::Test {
+class Cache : public SmallHostTest {
  protected:
-  void SetUp() override { WriteSmallHost(file_); }
-
-  Status Open(const std::string& fileName) {
-    source_.reset();
-    return CacheSource::Open(fileName.c_str(), &source_);
-  }
-  Status Open() { return Open(file_); }
-
   // The file after SQL, opened.
   Status OpenAfter(const std::string& sql) {
     RunSql(file_, sql);
@@ -52,20 +44,6 @@ class Cache : public testing::Test {
     return source_->Value(NodeAt(path), MakeKeys(keys),
                           std::as_writable_bytes(std::span(record, 1)));
   }
-
-  Status Flags(int64_t group) {
-    uint32_t flags = 0;
-    return Value("sched/groups/groupFlags", {group}, &flags);
-  }
-
-  Status ChildrenOf(int64_t group) {
-    ParamList children(ParamList::kNoLimit);
-    return source_->Instances(NodeAt("sched/groups/members/groups"), MakeKeys({group}), children);
-  }
-
-  TestDirectory directory_;
-  std::string file_ = directory_.Path("host.ksi");
-  std::unique_ptr<CacheSource> source_;
 };
 
 TEST_F(Cache, AnswersValuesInAnyOrder) {

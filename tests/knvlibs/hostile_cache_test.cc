@@ -18,30 +18,13 @@
 namespace ksi {
 namespace {
 
-class HostileCache : public testing::Test {
+class HostileCache : public SmallHostTest {
  protected:
-  void SetUp() override { WriteSmallHost(file_); }
-
-  Status Open(const std::string& fileName) {
-    source_.reset();
-    return CacheSource::Open(fileName.c_str(), &source_);
-  }
-  Status Open() { return Open(file_); }
-
-  Status Flags(int64_t group, uint32_t* flags) {
-    return source_->Value(NodeAt("sched/groups/groupFlags"), MakeKeys({group}),
-                          std::as_writable_bytes(std::span(flags, 1)));
-  }
-
   void ExpectAnswers() {
     uint32_t flags = 0;
     EXPECT_EQ(Flags(7, &flags), kOk);
     EXPECT_EQ(flags, 107u);
   }
-
-  TestDirectory directory_;
-  std::string file_ = directory_.Path("host.ksi");
-  std::unique_ptr<CacheSource> source_;
 };
 
 using Strings = std::vector<std::string>;
@@ -156,7 +139,7 @@ size_t CountAnswers(CacheSource& source) {
 }
 
 TEST_F(HostileCache, TruncatedWhileItIsReadIsDamage) {
-  for (const uintmax_t left : {4'000'000, 4096, 100, 0}) {
+  for (const uintmax_t left : {4'000'000U, 4096U, 100U, 0U}) {
     WriteLargeHost(file_);
     ASSERT_GT(std::filesystem::file_size(file_), 6'000'000u);
     ASSERT_EQ(Open(), kOk);
