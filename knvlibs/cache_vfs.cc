@@ -114,8 +114,9 @@ int Open(sqlite3_vfs* /*vfs*/, const char* name, sqlite3_file* file, int flags, 
 }
 
 int FullName(sqlite3_vfs* /*vfs*/, const char* name, int room, char* fullName) {
-  if (std::strlen(name) >= static_cast<size_t>(room)) return SQLITE_CANTOPEN;
-  std::strcpy(fullName, name);
+  const size_t size = std::strlen(name) + 1;
+  if (size > static_cast<size_t>(room)) return SQLITE_CANTOPEN;
+  std::memcpy(fullName, name, size);
   return SQLITE_OK;
 }
 

@@ -21,7 +21,7 @@ Figure IomemSize(const LinuxHost& host, std::string_view name) {
     const size_t dash = range.find('-');
     uint64_t first = 0;
     uint64_t last = 0;
-    if (dash == range.npos || !ParseHex(range.substr(0, dash), first) ||
+    if (dash == std::string_view::npos || !ParseHex(range.substr(0, dash), first) ||
         !ParseHex(range.substr(dash + 1), last) || last <= first) {
       return std::nullopt;
     }
