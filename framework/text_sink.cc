@@ -18,7 +18,7 @@ void TextSink::Row(RowKind kind, std::span<const Cell> cells) {
   if (!converted_.empty()) {
     for (const size_t i : kept_) shown_[i] = cells[i];
     for (const size_t i : converted_) {
-      shown_[i] = heading_.figures[i].toUnit(cells[i].number(), heading_.unit);
+      shown_[i] = heading_.figures[i].Shown(cells[i], heading_.unit);
     }
     cells = shown_;
   }
