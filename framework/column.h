@@ -7,8 +7,8 @@
 //             [](const VMStatsRow& row) { return row.vmm.touched; }),
 //
 // The function and the figure's type settle how the figure is converted, printed and added up; what
-// differs is said behind the entry: Count(...).Wide(7).As("d").Total(kBlank). IsSound() is asserted
-// of each table, so that what could not be printed does not compile.
+// differs is said behind the entry: Count(...).Wide(7).As("Lu").Total(kBlank). IsSound() is
+// asserted of each table, so that what could not be printed does not compile.
 #ifndef FRAMEWORK_COLUMN_H_
 #define FRAMEWORK_COLUMN_H_
 
@@ -18,6 +18,7 @@
 #include <cstdint>
 #include <iterator>
 #include <string_view>
+#include <type_traits>
 
 #include "framework/column_table.h"
 #include "framework/display_unit.h"
@@ -58,7 +59,7 @@ constexpr InTotal kMean = InTotal::mean;
 struct Figure {
   Kind kind;
   uint8_t bits;   // of the record's number; 0 for a text
-  bool isSigned;  // the number is
+  bool isSigned;  // the number is printed with a sign
   InTotal inTotal;
   Conversion toUnit;  // null for what is shown as it is
 
@@ -97,10 +98,22 @@ struct Column : ColumnInfo {
     return column;
   }
 
-  // Printed with another conversion than that of the figure's type.
+  // Printed with another conversion of the same sign than that of the figure's type.
   constexpr Column As(const char* conversion) const {
     Column column = *this;
     column.desc.conversion = conversion;
+    return column;
+  }
+
+  // The same where the sign is not that of the figure's type.
+  constexpr Column AsSigned(const char* conversion) const {
+    Column column = As(conversion);
+    column.figure.isSigned = true;
+    return column;
+  }
+  constexpr Column AsUnsigned(const char* conversion) const {
+    Column column = As(conversion);
+    column.figure.isSigned = false;
     return column;
   }
 
@@ -140,6 +153,11 @@ template <class Read>
 using RowOf = typename Signature<decltype(&Read::operator())>::Row;
 template <class Read>
 using ResultOf = typename Signature<decltype(&Read::operator())>::Result;
+
+// Whether a text of the row can still be read when the function that gave it has returned.
+template <class Result>
+concept IsKept = std::same_as<Result, std::string_view> || std::is_pointer_v<Result> ||
+    std::is_lvalue_reference_v<Result>;
 
 // How a number is printed: memory in 64 bits, others as wide as they are.
 template <std::integral Number>
@@ -181,8 +199,9 @@ constexpr auto Number(Kind kind, const char* name, const char* description, InTo
 
 }  // namespace column_internal
 
-// A text that is the row's for as long as the row is.
+// A text that is the row's for as long as the row is; one that the function makes would be gone.
 template <class Read>
+requires column_internal::IsKept<column_internal::ResultOf<Read>>
 constexpr auto Text(const char* name, const char* description, Read /*read*/) {
   using Row = column_internal::RowOf<Read>;
   return column_internal::Make<Row>(
@@ -249,21 +268,44 @@ constexpr auto Bytes(const char* name, const char* description, Read /*read*/) {
   return column_internal::Number<Read>(Kind::bytes, name, description, kSum, FromBytes);
 }
 
+namespace column_internal {
+
+// Whether a label is there and stays on its line.
+constexpr bool IsPrintable(const char* label) {
+  return label != nullptr && std::ranges::all_of(std::string_view(label), [](char letter) {
+           return letter >= ' ' && letter <= '~';
+         });
+}
+
+// Whether -s, the header and a line of CSV can hold a name.
+constexpr bool IsName(const char* name) {
+  return IsPrintable(name) && *name != '\0' &&
+         std::string_view(name).find_first_of(":,\"") == std::string_view::npos;
+}
+
+// Whether the conversion is one of the figure's type and cuts nothing off.
+constexpr bool Prints(std::string_view conversion, const Figure& figure) {
+  if (figure.kind == Kind::text) return conversion == "s";
+  if (figure.kind == Kind::flag) return conversion == "c" || conversion == "s";
+  if (conversion == (figure.isSigned ? "Ld" : "Lu")) return true;
+  return figure.bits <= 32 && conversion == (figure.isSigned ? "d" : "u");
+}
+
+// Whether the Total row can show what the column says.
+constexpr bool CanBeTotal(const Figure& figure) {
+  if (figure.inTotal == kBlank) return true;
+  return (figure.inTotal == kLabel) == (figure.kind == Kind::text);
+}
+
+}  // namespace column_internal
+
 // Whether a column can be printed and added up as it says.
 constexpr bool IsSound(const ColumnInfo& column) {
-  const std::string_view conversion = column.desc.conversion;
-  const bool isText = column.figure.kind == Kind::text;
-  const bool isFlag = column.figure.kind == Kind::flag;
-  const bool isSum = column.desc.summable != 0 && column.figure.inTotal != kLabel;
-  if (std::string_view(column.desc.name).find_first_of(":,\"") != std::string_view::npos)
-    return false;
-  if (isSum && isText) return false;
-  if (column.figure.inTotal == kLabel && !isText) return false;
-  if (conversion == "s") return isText || isFlag;
-  if (conversion == "c") return isFlag;
-  if (isText || isFlag) return false;
-  if (conversion == "u" || conversion == "d") return column.figure.bits <= 32;
-  return conversion == "Lu" || conversion == "Ld";
+  using namespace column_internal;
+  const ColumnDesc& desc = column.desc;
+  return IsName(desc.name) && IsPrintable(desc.description) && desc.width > 0 &&
+         desc.conversion != nullptr && Prints(desc.conversion, column.figure) &&
+         CanBeTotal(column.figure);
 }
 
 // Whether all columns of a table are sound and their names differ, whatever the case.
@@ -273,8 +315,8 @@ constexpr bool IsSound(const ColumnOfRow (&columns)[kCount]) {
     return letter >= 'A' && letter <= 'Z' ? static_cast<char>(letter - 'A' + 'a') : letter;
   };
   for (size_t i = 0; i < kCount; ++i) {
+    if (!IsSound(columns[i])) return false;
     const std::string_view name = columns[i].desc.name;
-    if (name.empty() || !IsSound(columns[i])) return false;
     for (size_t other = 0; other < i; ++other) {
       if (std::ranges::equal(name, std::string_view(columns[other].desc.name), {}, lower, lower))
         return false;

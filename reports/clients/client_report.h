@@ -48,7 +48,7 @@ template <class Row>
 constexpr Column<Row> kParSchedGroupColumn =
     Id("parSchedGroup", "Parent scheduler group ID", [](const Row& row) {
       return row.client.parSchedGroup;
-    }).As("Lu");
+    }).AsUnsigned("Lu");
 
 template <class Row>
 constexpr Column<Row> kWorldGrpColumn = Id("worldGrp", "World group ID",

@@ -30,14 +30,14 @@ constexpr Column<GuestStatsRow> kColumns[] = {
     kWorldGrpColumn<GuestStatsRow>,
     Kilobytes("memTotal", "Total memory",
               [](const GuestStatsRow& row) { return row.guest.memTotal; })
-        .As("Ld")
+        .AsSigned("Ld")
         .Total(kKnownSum),
     Count("lpageTotal", "Total large pages available for guest apps",
           [](const GuestStatsRow& row) { return static_cast<int32_t>(row.guest.lpageTotal); })
         .Total(kKnownSum),
     Kilobytes("memNeeded", "Memory required by current workload",
               [](const GuestStatsRow& row) { return row.guest.memNeeded; })
-        .As("Ld")
+        .AsSigned("Ld")
         .Total(kKnownSum),
 };
 static_assert(IsSound(kColumns));

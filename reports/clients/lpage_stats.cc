@@ -28,7 +28,7 @@ constexpr Column<LPageStatsRow> kColumns[] = {
     NameColumn<LPageStatsRow>("Virtual machine name").Wide(20).Total(kLabel),
     kSchedGrpColumn<LPageStatsRow>,
     kParSchedGroupColumn<LPageStatsRow>,
-    kWorldGrpColumn<LPageStatsRow>.As("u"),
+    kWorldGrpColumn<LPageStatsRow>.AsUnsigned("u"),
     Count("nrBackings", "Current number of lpage backings",
           [](const LPageStatsRow& row) { return row.lpage.nrBackings; }),
     Count("nrAllocSuccess", "Number of lpage mapping attempts succeeded",

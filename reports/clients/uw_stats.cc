@@ -45,11 +45,11 @@ constexpr Column<UWStatsRow> kColumns[] = {
               [](const UWStatsRow& row) { return row.uw.min; }),
     Kilobytes("max", "Configured memory limit",
               [](const UWStatsRow& row) { return LimitOrNone(row.uw.max); })
-        .As("Ld")
+        .AsSigned("Ld")
         .Total(kBlank),
     Kilobytes("minLimit", "Configured memory reservation limit",
               [](const UWStatsRow& row) { return LimitOrNone(row.uw.minLimit); })
-        .As("Ld")
+        .AsSigned("Ld")
         .Total(kBlank),
     Count("shares", "Configured memory shares", [](const UWStatsRow& row) { return row.uw.shares; })
         .As("Ld")

@@ -34,21 +34,21 @@ constexpr Column<KSI_HeapStats> kColumns[] = {
         .Fixed(),
     Code("dynGrow", "dynamically growable", [](const KSI_HeapStats& heap) { return heap.dynGrow; })
         .Wide(12)
-        .As("d"),
+        .AsSigned("d"),
     Count("lowerLimit", "lower limit", [](const KSI_HeapStats& heap) { return heap.lowerLimit; })
         .Wide(7)
-        .As("d")
+        .AsSigned("d")
         .Total(kBlank),
     Count("upperLimit", "upper limit", [](const KSI_HeapStats& heap) { return heap.upperLimit; })
         .Wide(7)
-        .As("d")
+        .AsSigned("d")
         .Total(kBlank),
     Code("reserved", "reserved", [](const KSI_HeapStats& heap) { return heap.reserved; })
         .Wide(7)
-        .As("d"),
+        .AsSigned("d"),
     Count("numRanges", "num ranges", [](const KSI_HeapStats& heap) { return heap.numRanges; })
         .Wide(7)
-        .As("d"),
+        .AsSigned("d"),
     Bytes("dlMallocOvdh", "DL malloc overhead",
           [](const KSI_HeapStats& heap) { return heap.dlMallocOvdh; }),
     Bytes("used", "current used", [](const KSI_HeapStats& heap) { return heap.size - heap.avail; }),
@@ -59,17 +59,17 @@ constexpr Column<KSI_HeapStats> kColumns[] = {
     Percent("pctFreeOfCur", "% free of current",
             [](const KSI_HeapStats& heap) { return heap.pctFreeOfCur; })
         .Wide(12)
-        .As("d"),
+        .AsSigned("d"),
     Bytes("maxAvail", "max available", [](const KSI_HeapStats& heap) { return heap.maxAvail; })
         .Wide(12),
     Percent("pctFreeOfMax", "% free of max",
             [](const KSI_HeapStats& heap) { return heap.pctFreeOfMax; })
         .Wide(7)
-        .As("d"),
+        .AsSigned("d"),
     Percent("lowPctFreeOfMax", "lowest % free of max",
             [](const KSI_HeapStats& heap) { return heap.lowPctFreeOfMax; })
         .Wide(12)
-        .As("d"),
+        .AsSigned("d"),
     Count("numSuccAllocs", "number of succeeded allocations",
           [](const KSI_HeapStats& heap) { return heap.numSuccAllocs; })
         .Total(kBlank),

@@ -40,26 +40,63 @@ static_assert(!Sound(Count("times", "", kTimes), Count("TIMES", "", kTimes)));
 static_assert(!Sound(Count("", "", kTimes)));
 static_assert(!Sound(Count("a:b", "", kTimes)));
 static_assert(!Sound(Count("a,b", "", kTimes)));
+static_assert(!Sound(Count("a\"b", "", kTimes)));
+static_assert(!Sound(Count(nullptr, "", kTimes)));
+// Labels that would not stay on their line.
+static_assert(!Sound(Count("a\n", "", kTimes)));
+static_assert(!Sound(Count("a\x1b", "", kTimes)));
+static_assert(!Sound(Count("a\x7f", "", kTimes)));
+static_assert(!Sound(Count("a\xe9", "", kTimes)));
+static_assert(!Sound(Count("a", "one\ntwo", kTimes)));
+static_assert(!Sound(Count("a", nullptr, kTimes)));
+// A column without room.
+static_assert(!Sound(Count("a", "", kTimes).Wide(0)));
+static_assert(Sound(Count("a b~", "one two", kTimes).Wide(1)));
 // Conversions that there are not, ...
 static_assert(!Sound(Count("times", "", kTimes).As("ul")));
 static_assert(!Sound(Count("times", "", kTimes).As("lu")));
 static_assert(!Sound(Count("times", "", kTimes).As("x")));
 static_assert(!Sound(Count("times", "", kTimes).As("")));
+static_assert(!Sound(Count("times", "", kTimes).As(nullptr)));
 // ... that are another type's, ...
 static_assert(!Sound(Count("times", "", kTimes).As("s")));
 static_assert(!Sound(Count("times", "", kTimes).As("c")));
 static_assert(!Sound(Text("text", "", kText).As("Lu")));
 static_assert(!Sound(Text("text", "", kText).As("c")));
 static_assert(!Sound(Flag("flag", "", kFlag).As("u")));
+// ... that have another sign, unless it is said, ...
+static_assert(!Sound(Count("times", "", kTimes).As("d")));
+static_assert(!Sound(Count("times", "", kTimes).As("Ld")));
+static_assert(!Sound(Count("balance", "", kBalance).As("u")));
+static_assert(!Sound(Count("balance", "", kBalance).As("Lu")));
+static_assert(!Sound(Kilobytes("memory", "", kMemory).As("Ld")));
+static_assert(Sound(Count("times", "", kTimes).AsSigned("d")));
+static_assert(Sound(Kilobytes("memory", "", kMemory).AsSigned("Ld")));
+static_assert(Sound(Count("balance", "", kBalance).AsUnsigned("Lu")));
+static_assert(!Sound(Count("times", "", kTimes).AsSigned("u")));
+static_assert(!Sound(Count("balance", "", kBalance).AsUnsigned("d")));
 // ... or that would cut the figure.
 static_assert(!Sound(Kilobytes("memory", "", kMemory).As("u")));
-static_assert(!Sound(Kilobytes("memory", "", kMemory).As("d")));
+static_assert(!Sound(Kilobytes("memory", "", kMemory).AsSigned("d")));
 static_assert(Sound(Count("times", "", kTimes).As("Lu")));
 static_assert(Sound(Count("balance", "", kBalance).As("Ld")));
 static_assert(Sound(Flag("flag", "", kFlag).As("s")));
 // Totals that there cannot be.
 static_assert(!Sound(Text("text", "", kText).Total(kSum)));
 static_assert(!Sound(Count("times", "", kTimes).Total(kLabel)));
+
+// A text is the row's own, not one that is gone when the column has it.
+template <class Read>
+constexpr bool kCanBeText = requires(Read read) {
+  Text("text", "", read);
+};
+constexpr auto kMadeText = [](const Row& row) { return std::string(row.text); };
+constexpr auto kOwnText = [](const Row& row) -> const auto& { return row.text; };
+constexpr auto kView = [](const Row& row) { return std::string_view(row.text); };
+static_assert(!kCanBeText<decltype(kMadeText)>);
+static_assert(kCanBeText<decltype(kOwnText)>);
+static_assert(kCanBeText<decltype(kView)>);
+static_assert(kCanBeText<decltype(kText)>);
 
 constexpr Column<Row> kColumns[] = {
     Kilobytes("memory", "Memory", kMemory),
