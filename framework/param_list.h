@@ -116,6 +116,25 @@ template <class Record>
 [[nodiscard]] Status ListInstances(uint16_t node, const KeyList& keys, const ReaderTexts& texts,
                                    ParamList& instances, std::optional<uint32_t> hint = {});
 
+// Calls `take` with each of the first `count` names of a list until one fails. A name that cannot
+// be fetched fails after its complaint.
+template <class Take>
+[[nodiscard]] Status ForEachName(const ParamList& names, uint32_t count,
+                                 const Complaint& notFetched, Take take) {
+  for (uint32_t i = 0; i < count; ++i) {
+    const char* name = nullptr;
+    if (Status status = notFetched.Of(KSI_ParamListGetString(names.get(), i, &name))) return status;
+    if (Status status = take(name)) return status;
+  }
+  return kSuccess;
+}
+
+// The same for all names of a list.
+template <class Take>
+[[nodiscard]] Status ForEachName(const ParamList& names, const Complaint& notFetched, Take take) {
+  return ForEachName(names, KSI_ParamListUsedCount(names.get()), notFetched, take);
+}
+
 }  // namespace tally
 
 #endif  // FRAMEWORK_PARAM_LIST_H_

@@ -86,17 +86,14 @@ Status TallyAsyncRemapReportCallbackInt(ReportContext<RemapRow>& context, RemapR
                         {.capacity = 1, .first = row.grpLeader}, kTypeListTexts, types)) {
     return status;
   }
-  const uint32_t count = KSI_ParamListUsedCount(types.get());
-  for (uint32_t i = 0; i < count; ++i) {
-    if (Status status = kTypeName.Of(KSI_ParamListGetString(types.get(), i, &row.type))) {
-      return status;
-    }
-    if (Status status = kType.Of(TallyAsyncRemapGetStats(row.grpLeader, row.type, row.pages))) {
+  return ForEachName(types, kTypeName, [&](const char* type) {
+    row.type = type;
+    if (Status status = kType.Of(TallyAsyncRemapGetStats(row.grpLeader, type, row.pages))) {
       return status;
     }
     context.PrintRow(row);
-  }
-  return kSuccess;
+    return kSuccess;
+  });
 }
 
 // Prints the rows of one user world's memory clients.

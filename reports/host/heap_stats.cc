@@ -101,59 +101,60 @@ struct Heaps {
   size_t count = 0;
 };
 
-// Reads the heaps; false, after its message, when anything but a single heap was missing.
-bool TallyHeapGetMemMapStats(Heaps& heaps) {
-  ParamList names;
-  if (ListInstances(KSI_NODE_system_heaps, nullptr, names) != kSuccess) {
-    Warning("TallyHeapGetMemMapStats: KSI_GetInstanceListAlloc() for heapList failure\n");
-    return false;
-  }
-  const uint32_t count = KSI_ParamListUsedCount(names.get());
-  if (count == 0) {
-    Warning("TallyHeapGetMemMapStats: KSI_ParamListUsedCount() returned 0\n");
-    return true;
-  }
-  heaps.records.reset(new (std::nothrow) KSI_HeapStats[count]);
-  if (!heaps.records) {
-    Warning("TallyHeapGetMemMapStats: malloc() for stats failure\n");
-    return false;
-  }
-  // One list serves all reads.
-  const ParamList heapParam(KSI_ParamListCreate(1, 1));
-  if (!heapParam) {
-    Warning("TallyHeapGetMemMapStats: KSI_ParamListCreate() for heapParam failure\n");
-    return false;
-  }
-  for (uint32_t i = 0; i < count; ++i) {
-    const char* name = nullptr;
-    if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) {
-      Warning("TallyHeapGetMemMapStats: KSI_ParamListGetString() failure\n");
-      return false;
-    }
-    if (KSI_ParamListAddString(heapParam.get(), name) != kSuccess) {
-      Warning("TallyHeapGetMemMapStats: KSI_ParamListAddString() failure\n");
-      return false;
-    }
-    const Status status = KSI_Get(KSI_NODE_system_heaps_stats, heapParam.get(),
-                                  &heaps.records[heaps.count], sizeof(KSI_HeapStats));
-    KSI_ParamListRemoveLastParam(heapParam.get());
-    if (status == kNotFound) continue;  // the heap is gone
-    if (status != kSuccess) {
-      Warning("TallyHeapGetMemMapStats: KSI_Get() failure\n");
-      return false;
-    }
-    ++heaps.count;
-  }
-  return true;
+constexpr Complaint kNotListed = {
+    Style::plain, "TallyHeapGetMemMapStats: KSI_GetInstanceListAlloc() for heapList failure"};
+constexpr Complaint kNoHeaps = {Style::plain,
+                                "TallyHeapGetMemMapStats: KSI_ParamListUsedCount() returned 0"};
+constexpr Complaint kNoRoom = {Style::plain, "TallyHeapGetMemMapStats: malloc() for stats failure"};
+constexpr Complaint kNoName = {Style::plain,
+                               "TallyHeapGetMemMapStats: KSI_ParamListGetString() failure"};
+constexpr ReaderTexts kHeapTexts = {
+    .create = {Style::plain,
+               "TallyHeapGetMemMapStats: KSI_ParamListCreate() for heapParam failure"},
+    .firstKey = {Style::plain, "TallyHeapGetMemMapStats: KSI_ParamListAddString() failure"},
+    .read = {Style::plain, "TallyHeapGetMemMapStats: KSI_Get() failure"},
+};
+
+// Reads a heap behind those that were read; one that is gone is passed over.
+Status ReadHeap(KSI_ParamList* key, const char* name, Heaps& heaps) {
+  if (Status status = kHeapTexts.firstKey.Of(KSI_ParamListAddString(key, name))) return status;
+  const Status status =
+      KSI_Get(KSI_NODE_system_heaps_stats, key, &heaps.records[heaps.count], sizeof(KSI_HeapStats));
+  KSI_ParamListRemoveLastParam(key);
+  if (status == kNotFound) return kSuccess;
+  if (status == kSuccess) ++heaps.count;
+  return kHeapTexts.read.Of(status);
 }
 
-// Once the unit is accepted the report succeeds, whatever could be read.
+// Reads the `count` heaps of a list.
+Status ReadHeaps(const ParamList& names, uint32_t count, Heaps& heaps) {
+  heaps.records.reset(new (std::nothrow) KSI_HeapStats[count]);
+  if (!heaps.records) return kNoRoom.Of(kFailure);
+  // One list serves all reads.
+  const ParamList key(KSI_ParamListCreate(1, 1));
+  if (!key) return kHeapTexts.create.Of(kFailure);
+  return ForEachName(names, count, kNoName,
+                     [&](const char* name) { return ReadHeap(key.get(), name, heaps); });
+}
+
+// Reads the heaps; fails, after its message, when anything but a single heap was missing.
+Status TallyHeapGetMemMapStats(Heaps& heaps) {
+  ParamList names;
+  if (Status status = kNotListed.Of(ListInstances(KSI_NODE_system_heaps, nullptr, names))) {
+    return status;
+  }
+  const uint32_t count = KSI_ParamListUsedCount(names.get());
+  if (count > 0) return ReadHeaps(names, count, heaps);
+  kNoHeaps.Say(kSuccess);
+  return kSuccess;
+}
+
 Status Run(const ReportOptions& options, Sink& sink) {
   ReportContext<KSI_HeapStats> context(kFrame, kColumns, sink);
   if (Status status = context.Settle(options)) return status;
   Heaps heaps;
   // sic: C42
-  if (!TallyHeapGetMemMapStats(heaps)) return kSuccess;
+  if (TallyHeapGetMemMapStats(heaps) != kSuccess) return kSuccess;
   context.Begin();
   for (const KSI_HeapStats& heap : std::span(heaps.records.get(), heaps.count)) {
     context.PrintRow(heap);

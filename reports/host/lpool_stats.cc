@@ -93,6 +93,11 @@ constexpr ReaderTexts kVmPoolListTexts = {
     .firstKey = {Style::code, "TallyTraverseLPools: KSI_ParamListAddInt() failure"},
     .read = {Style::plain, "TallyTraverseLPools: KSI_GetInstanceListAllocHint() failure"},
 };
+constexpr Complaint kNoName = {Style::plain,
+                               "TallyTraverseLPools: KSI_ParamListGetString() failure"};
+// sic: C36
+constexpr Complaint kNoMemInfo = {Style::plain, "TallyTraversLPools: KSI_Get hardwareInfo failure"};
+constexpr Complaint kNoNumVMs = {Style::plain, "TallyTraversLPools: KSI_Get numVMs failure"};
 
 Status TallyGetPSharePoolStats(uint32_t node, KSI_LargePagePool& pool) {
   return ReadRecord(KSI_NODE_memory_lpage_nodeList_psharePool, {.capacity = 1, .first = node},
@@ -121,31 +126,26 @@ Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
 
   ParamList names;
   if (Status status = ListVmPools(node, numVMs, names)) return status;
-  const uint32_t count = KSI_ParamListUsedCount(names.get());
-  for (uint32_t i = 0; i < count; ++i) {
-    const char* name = nullptr;
-    if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) {
-      Warning("TallyTraverseLPools: KSI_ParamListGetString() failure\n");
-      // sic: C37
-      static_cast<void>(names.release());
-      return kFailure;
-    }
+  const Status status = ForEachName(names, kNoName, [&](const char* name) {
     row.name = name;
     if (TallyGetVmPoolStats(node, name, row.pool) == kSuccess) context.PrintRow(row);
-  }
-  return kSuccess;
+    return kSuccess;
+  });
+  if (status == kSuccess) return kSuccess;
+  // sic: C37
+  static_cast<void>(names.release());
+  return kFailure;
 }
 
-// sic: C36
 Status TallyTraverseLPools(LPoolContext& context) {
   KSI_MemInfo memInfo;
-  if (KSI_Get(KSI_NODE_memory_memInfo, nullptr, &memInfo, sizeof memInfo) != kSuccess) {
-    Warning("TallyTraversLPools: KSI_Get hardwareInfo failure\n");
+  if (kNoMemInfo.Of(KSI_Get(KSI_NODE_memory_memInfo, nullptr, &memInfo, sizeof memInfo)) !=
+      kSuccess) {
     return kFailure;
   }
   uint32_t numVMs = 0;
-  if (KSI_Get(KSI_NODE_sched_globalStats_numVMs, nullptr, &numVMs, sizeof numVMs) != kSuccess) {
-    Warning("TallyTraversLPools: KSI_Get numVMs failure\n");
+  if (kNoNumVMs.Of(KSI_Get(KSI_NODE_sched_globalStats_numVMs, nullptr, &numVMs, sizeof numVMs)) !=
+      kSuccess) {
     return kFailure;
   }
   for (uint32_t node = 0; node < memInfo.numNodes; ++node) {

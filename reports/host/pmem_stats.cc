@@ -113,6 +113,15 @@ constexpr ReaderTexts kRegionStoreTexts = {
     .create = {Style::plain, "PMemGetRegionStoreInfo: KSI_ParamListCreate failure"},
     .firstKey = {Style::plain, "PMemGetRegionStoreInfo: KSI_ParamListAddString failure"},
 };
+// sic: C46
+constexpr Complaint kNoVolumeName = {Style::plain,
+                                     "PMemRegionStoreReport: KSI_ParamListGetString Failure"};
+constexpr Complaint kNoVolume = {Style::plain, "PMemRegionStoreReport: PMemGetVolumeInfo failure"};
+constexpr Complaint kNoRegionStore = {Style::plain,
+                                      "PMemRegionStoreReport: PMemGetRegionStoreInfo failure"};
+constexpr Complaint kNoRegionName = {Style::plain,
+                                     "PMemRegionsReport: KSI_ParamListGetString failure"};
+constexpr Complaint kNoRegion = {Style::plain, "PMemRegionsReport: GetRegionsInfo failure"};
 constexpr Complaint kRegionStoreRead = {Style::plain, "PMemGetRegionStoreInfo: KSI_Get failure"};
 constexpr ReaderTexts kRegionListTexts = {
     .create = {Style::plain, "PMemRegionsReport: KSI_ParamListCreate failure"},
@@ -148,69 +157,43 @@ Status GetRegionsInfo(const char* volume, const char* region, KSI_PmemRegion& re
                     RegionKeys(volume, region), kRegionTexts, record);
 }
 
-// Calls `print` with each name of a list until it fails; `failure` words a name that cannot be
-// fetched. False when not all were printed.
+// Calls `print` with each volume of the host until it fails.
 template <class Print>
-bool ForEachName(const ParamList& names, const char* failure, Print print) {
-  const uint32_t count = KSI_ParamListUsedCount(names.get());
-  for (uint32_t i = 0; i < count; ++i) {
-    const char* name = nullptr;
-    if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) {
-      Warning("%s", failure);
-      return false;
-    }
-    if (!print(name)) return false;
-  }
-  return true;
-}
-
-// The same for the volumes of the host.
-template <class Print>
-void ForEachVolume(const char* failure, Print print) {
+void ForEachVolume(const Complaint& notFetched, Print print) {
   ParamList volumes;
   if (ListInstances(KSI_NODE_memory_pmem_volumes, nullptr, volumes) != kSuccess) return;
-  ForEachName(volumes, failure, print);
+  // A failure has been told, and ends the rows.
+  static_cast<void>(ForEachName(volumes, notFetched, print));
 }
 
 void PMemRegionStoreReport(ReportContext<VolumeRow>& context) {
-  // sic: C46
-  ForEachVolume("PMemRegionStoreReport: KSI_ParamListGetString Failure\n", [&](const char* volume) {
+  ForEachVolume(kNoVolumeName, [&](const char* volume) {
     VolumeRow row = {.uuid = RowUuid(volume), .store = {}, .isClean = 0};
-    if (PMemGetVolumeInfo(volume) != kSuccess) {
-      Warning("PMemRegionStoreReport: PMemGetVolumeInfo failure\n");
-      return false;
-    }
-    if (PMemGetRegionStoreInfo(volume, row) != kSuccess) {
-      Warning("PMemRegionStoreReport: PMemGetRegionStoreInfo failure\n");
-      return false;
-    }
+    if (Status status = kNoVolume.Of(PMemGetVolumeInfo(volume))) return status;
+    if (Status status = kNoRegionStore.Of(PMemGetRegionStoreInfo(volume, row))) return status;
     context.PrintRow(row);
-    return true;
+    return kSuccess;
   });
 }
 
-bool PrintRegion(const char* volume, const char* region, ReportContext<RegionRow>& context) {
+Status PrintRegion(const char* volume, const char* region, ReportContext<RegionRow>& context) {
   RegionRow row;
   row.uuid = RowUuid(volume);
   row.regionUuid = region;
-  if (GetRegionsInfo(volume, region, row.region) != kSuccess) {
-    Warning("PMemRegionsReport: GetRegionsInfo failure\n");
-    return false;
-  }
+  if (Status status = kNoRegion.Of(GetRegionsInfo(volume, region, row.region))) return status;
   row.flagNames = FormatFlagMask(row.region.flags, pmemFlagNames);
   context.PrintRow(row);
-  return true;
+  return kSuccess;
 }
 
 void PMemRegionsReport(ReportContext<RegionRow>& context) {
-  constexpr char kNameFailure[] = "PMemRegionsReport: KSI_ParamListGetString failure\n";
-  ForEachVolume(kNameFailure, [&](const char* volume) {
+  ForEachVolume(kNoRegionName, [&](const char* volume) {
     ParamList regions;
-    if (ListInstances(KSI_NODE_memory_pmem_volumes_regionStore_regions, VolumeKey(volume),
-                      kRegionListTexts, regions) != kSuccess) {
-      return false;
+    if (Status status = ListInstances(KSI_NODE_memory_pmem_volumes_regionStore_regions,
+                                      VolumeKey(volume), kRegionListTexts, regions)) {
+      return status;
     }
-    return ForEachName(regions, kNameFailure,
+    return ForEachName(regions, kNoRegionName,
                        [&](const char* region) { return PrintRegion(volume, region, context); });
   });
 }
