@@ -44,6 +44,7 @@ void ReportContextBase::Begin(std::initializer_list<HostFigure> own) {
   const auto addMask = [&](const char* label, uint32_t mask) {
     add(label, FormatFlagMask(mask, frame_.filterNames).text());
   };
+  // sic: C48
   if (frame_.Takes('g')) addNumber("Start Group ID", static_cast<uint64_t>(options_.startGid));
   if (frame_.Takes('l')) addNumber("No. of levels", options_.levels);
   if (frame_.Takes('u')) add("Unit", UnitTitle(unit_));

@@ -34,6 +34,7 @@ void SelectLongOptions(const ReportFrame& frame, LongOptions& selected) {
 }
 
 Status ParseLevels(LevelCheck check, const char* text, uint32_t& levels) {
+  // sic: C49
   levels = static_cast<uint32_t>(std::strtol(text, nullptr, 10));
   if (levels == 0) {
     Warning("Invalid level %s, must be > 0\n", text);
@@ -48,6 +49,43 @@ Status ParseLevels(LevelCheck check, const char* text, uint32_t& levels) {
   return kSuccess;
 }
 
+// The options whose words are kept as they are, ...
+struct TextOption {
+  char letter;
+  const char* ReportOptions::*text;
+};
+constexpr TextOption kTextOptions[] = {
+    {'u', &ReportOptions::unitText},
+    {'i', &ReportOptions::inclusionText},
+    {'e', &ReportOptions::exclusionText},
+    {'s', &ReportOptions::columnMask},
+};
+
+// ... and those without one.
+struct FlagOption {
+  char letter;
+  bool ReportOptions::*flag;
+};
+constexpr FlagOption kFlagOptions[] = {
+    {'v', &ReportOptions::verbose},
+    {'q', &ReportOptions::csvMode},
+    {'t', &ReportOptions::tags},
+};
+
+// Takes the option that the scan stands at.
+Status TakeOption(const ReportFrame& frame, int letter, ReportOptions& options) {
+  if (letter == 'l') return ParseLevels(frame.levelCheck, optarg, options.levels);
+  // sic: C49
+  if (letter == 'g') options.startGid = std::strtol(optarg, nullptr, 10);
+  for (const TextOption& option : kTextOptions) {
+    if (option.letter == letter) options.*option.text = optarg;
+  }
+  for (const FlagOption& option : kFlagOptions) {
+    if (option.letter == letter) options.*option.flag = true;
+  }
+  return kSuccess;
+}
+
 }  // namespace
 
 bool ReportFrame::Takes(char letter) const { return std::strchr(options, letter) != nullptr; }
@@ -57,41 +95,11 @@ Status ParseReportOptions(const ReportFrame& frame, int argc, char** argv, Repor
   options.levels = frame.defaultLevels;
   LongOptions longOptions;
   SelectLongOptions(frame, longOptions);
-  for (;;) {
-    switch (getopt_long(argc, argv, frame.options, longOptions, nullptr)) {
-      case 'g':
-        options.startGid = std::strtol(optarg, nullptr, 10);
-        break;
-      case 'l':
-        if (Status status = ParseLevels(frame.levelCheck, optarg, options.levels)) return status;
-        break;
-      case 'u':
-        options.unitText = optarg;
-        break;
-      case 'i':
-        options.inclusionText = optarg;
-        break;
-      case 'e':
-        options.exclusionText = optarg;
-        break;
-      case 's':
-        options.columnMask = optarg;
-        break;
-      case 'v':
-        options.verbose = true;
-        break;
-      case 'q':
-        options.csvMode = true;
-        break;
-      case 't':
-        options.tags = true;
-        break;
-      case -1:
-        return kSuccess;
-      default:
-        break;
-    }
+  // sic: C51
+  for (int letter; (letter = getopt_long(argc, argv, frame.options, longOptions, nullptr)) != -1;) {
+    if (Status status = TakeOption(frame, letter, options)) return status;
   }
+  return kSuccess;
 }
 
 }  // namespace tally

@@ -124,6 +124,7 @@ int Run(int argc, char** argv) {
     Warning("Version check failed\n");
     return EXIT_FAILURE;
   }
+  // sic: C52
   if (options.report == nullptr) {
     PrintUsage(argv[0]);
     return EXIT_SUCCESS;

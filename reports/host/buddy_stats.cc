@@ -146,15 +146,23 @@ Status ReadBuddyName(const char* name, BuddyRow& row) {
   return TallyMemNode2NUMANode(row.memNode, row.numaNode);
 }
 
+// The names of the allocators; null when they cannot be listed or do not fit.
+ParamList ListBuddies() {
+  constexpr size_t kNameBytes = 128;  // of one name
+  // sic: C47
+  ParamList names(KSI_ParamListCreateAndAllocateParams(1, kMaxBuddies, kMaxBuddies * kNameBytes));
+  if (names && KSI_GetInstanceList(KSI_NODE_system_buddy, nullptr, names.get()) != kSuccess) {
+    names.reset();
+  }
+  return names;
+}
+
 // Puts the allocators into `rows` and returns how many there are. One whose NUMA node cannot be
 // told is left out.
 size_t ReadBuddies(std::span<BuddyRow, kMaxBuddies> rows) {
   constexpr char kPrefix[] = "memmap";
-  constexpr size_t kNameBytes = 12672;
-  const ParamList names(KSI_ParamListCreateAndAllocateParams(1, kMaxBuddies, kNameBytes));
-  if (!names || KSI_GetInstanceList(KSI_NODE_system_buddy, nullptr, names.get()) != kSuccess) {
-    return 0;
-  }
+  const ParamList names = ListBuddies();
+  if (!names) return 0;
   size_t kept = 0;
   for (uint32_t i = 0; i < KSI_ParamListUsedCount(names.get()) && kept < rows.size(); ++i) {
     const char* name = nullptr;
