@@ -43,34 +43,37 @@ Next PrintUsageAndExit(const char* programName, Next next) {
   return next;
 }
 
+// Takes the option that the scan stands at.
+Next TakeOption(int letter, const char* programName, Options& options) {
+  switch (letter) {
+    case 'f':
+      options.checkVersion = false;
+      break;
+    case 'c':
+      options.cacheFile = optarg;
+      break;
+    case 'h':
+      return PrintUsageAndExit(programName, Next::exitSuccess);
+    case 'r':
+      options.report = FindReport(optarg);
+      if (options.report != nullptr) break;
+      Warning("Invalid report %s\n", optarg);
+      return PrintUsageAndExit(programName, Next::exitFailure);
+    default:
+      Warning("Unexpected or out-of-sequence argument detected\n");
+      return PrintUsageAndExit(programName, Next::exitFailure);
+  }
+  return Next::run;
+}
+
 // Reads up to the first report: all words after it are the report's.
 Next ParseOptions(int argc, char** argv, Options& options) {
   opterr = 0;
   while (options.report == nullptr) {
-    switch (getopt_long(argc, argv, kShortOptions, kLongOptions, nullptr)) {
-      case 'f':
-        options.checkVersion = false;
-        break;
-      case 'c':
-        options.cacheFile = optarg;
-        break;
-      case 'h':
-        return PrintUsageAndExit(argv[0], Next::exitSuccess);
-      case 'r':
-        options.report = FindReport(optarg);
-        if (options.report == nullptr) {
-          Warning("Invalid report %s\n", optarg);
-          return PrintUsageAndExit(argv[0], Next::exitFailure);
-        }
-        break;
-      case '?':
-        Warning("Unexpected or out-of-sequence argument detected\n");
-        return PrintUsageAndExit(argv[0], Next::exitFailure);
-      case -1:
-        return Next::run;
-      default:
-        break;
-    }
+    const int letter = getopt_long(argc, argv, kShortOptions, kLongOptions, nullptr);
+    if (letter == -1) break;
+    const Next next = TakeOption(letter, argv[0], options);
+    if (next != Next::run) return next;
   }
   return Next::run;
 }
