@@ -88,7 +88,7 @@ Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
 
 Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
   if (IdOf(node) != ksi::node::sched_groups_members_groups) return List(node, keys, instances);
-  Status status = walk_.Ask(keys[0].number, std::chrono::steady_clock::now());
+  Status status = walk_.Ask(keys[0].number);
   const size_t before = instances.Count();
   if (status == kOk) status = List(node, keys, instances);
   if (status == kOk) walk_.Answer(instances, before);

@@ -2,13 +2,12 @@
 
 namespace ksi {
 
-Status WalkLimit::Ask(int64_t group, Time now) {
-  if (!Continues(group, now)) {
+Status WalkLimit::Ask(int64_t group) {
+  if (!Continues(group)) {
     taken_ = 0;
     first_ = group;
     firstIsListed_ = false;
   }
-  latest_ = now;
   ++taken_;
   return WalkStatus();
 }
@@ -20,10 +19,8 @@ void WalkLimit::Answer(const ParamList& groups, size_t from) {
   }
 }
 
-bool WalkLimit::Continues(int64_t group, Time now) const {
-  if (taken_ == 0 || (group == first_ && !firstIsListed_)) return false;
-  // What has failed goes on to fail, however slowly its messages are read.
-  return WalkStatus() != kOk || now - latest_ < kPause;
+bool WalkLimit::Continues(int64_t group) const {
+  return taken_ != 0 && (group != first_ || firstIsListed_);
 }
 
 }  // namespace ksi

@@ -7,7 +7,6 @@
 #ifndef KNVLIBS_WALK_LIMIT_H_
 #define KNVLIBS_WALK_LIMIT_H_
 
-#include <chrono>
 #include <cstddef>
 #include <cstdint>
 
@@ -18,17 +17,13 @@ namespace ksi {
 
 class WalkLimit {
  public:
-  using Time = std::chrono::steady_clock::time_point;
-
-  // The walk after which nobody asks for so long is over.
-  static constexpr std::chrono::seconds kPause{1};
-
   explicit WalkLimit(uint64_t fileSize) : most_(fileSize / 8 + 2048) {}
 
   // The groups of `group` are asked for. KSI_STATUS_METADATA_READ_ERROR if that is more than a walk
-  // may take, and from then on for the rest of the walk. A new walk begins after a pause, and when
-  // the first group of this one is asked again and nobody has listed it.
-  [[nodiscard]] Status Ask(int64_t group, Time now);
+  // may take, and from then on for the rest of the walk. A new walk begins when the first group of
+  // this one is asked again and nobody has listed it; never with time, for whoever reads what is
+  // made of a walk may be as slow as he likes.
+  [[nodiscard]] Status Ask(int64_t group);
 
   // They are the entries of `groups` from the one at `from` on.
   void Answer(const ParamList& groups, size_t from);
@@ -42,13 +37,12 @@ class WalkLimit {
   }
 
  private:
-  bool Continues(int64_t group, Time now) const;
+  bool Continues(int64_t group) const;
 
   uint64_t most_;
   uint64_t taken_ = 0;  // lists and entries; 0: no walk has begun
   int64_t first_ = 0;
   bool firstIsListed_ = false;
-  Time latest_;
 };
 
 }  // namespace ksi

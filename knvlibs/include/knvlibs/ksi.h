@@ -130,7 +130,9 @@ KSI_NODISCARD uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source,
  * contain each other, and to walk over them has no end: when a walk has asked for more lists of
  * groups and been given more entries than a file of its size can hold, this is
  * KSI_STATUS_METADATA_READ_ERROR, and lists of groups fail with it. It is so until
- * KSI_RefreshSource, or until the walk's first group is asked again, unless others list it. */
+ * KSI_RefreshSource, or until the walk's first group is asked again, unless others list it. No walk
+ * ends with time: a program that walks over groups again and again calls KSI_RefreshSource before
+ * each walk. */
 KSI_NODISCARD uint32_t KSI_SourceWalkStatus(struct KSI_Source* source);
 
 /* What is said to people. Any thread may call these at any time. */
