@@ -274,6 +274,21 @@ TEST_F(GroupsTest, WhatIsNotUnderstoodIsToldOnceAndLeftOut) {
             "/proc/100/limits: line 1 is not understood\n");
 }
 
+TEST_F(GroupsTest, WhatCannotBeReadIsToldOnceInAReadingAndLeftOut) {
+  // Even root cannot read a directory as a file.
+  for (int32_t pid = 201; pid < 204; ++pid) tree_.Write(ProcessFile(pid, "status/x"), "");
+  LinuxSource source(tree_.Root());
+  for (int reading = 0; reading < 2; ++reading) {
+    testing::internal::CaptureStderr();
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
+    EXPECT_EQ(
+        testing::internal::GetCapturedStderr(),
+        "/proc/201/status: Is a directory: what cannot be read is left out or has no value\n");
+    source.Refresh();
+  }
+}
+
 TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
   WriteProcess(101, "other");
   WriteProcess(102, "hidden");
@@ -301,6 +316,22 @@ TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
       "^/proc/PID/status: not permitted for some processes: they are left out\n"
       "/proc/100/smaps_rollup: not permitted: figures that take a walk of a process's memory "
       "have no value where it is not\n$");
+}
+
+TEST_F(GroupsTest, WhatIsBelowALockedCgroupIsLeftOutWithAWord) {
+  tree_.Write("/sys/fs/cgroup/jobs/a/b/cgroup.procs", "");
+  tree_.Write("/sys/fs/cgroup/jobs/c/cgroup.procs", "");
+  tree_.Lock("/sys/fs/cgroup/jobs/a");
+  tree_.Lock("/sys/fs/cgroup/jobs/c");
+  const auto asNobody = [&] {
+    constexpr uid_t kNobody = 65534;
+    if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
+    LinuxSource source(tree_.Root());
+    // The two and the process.
+    _exit(GetIds(source, "sched/groups/members/groups", {kJobs}).size() == 3 ? 0 : 1);
+  };
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0),
+              "^cgroup /jobs/a: not permitted: what is below such cgroups is left out\n$");
 }
 
 TEST_F(GroupsTest, ALockedCgroupIsDeniedAndNoZero) {

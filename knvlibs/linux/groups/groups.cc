@@ -135,8 +135,13 @@ void GroupTree::AddChildren(const LinuxHost& host, size_t self, std::vector<size
   const std::string path = groups_[self].path;
   int64_t id = groups_[self].id;
   std::vector<CgroupHierarchy::Child> children;
+  const Status status = cgroups_.List(host, path, id, children);
+  if (status == KSI_STATUS_PERMISSION_DENIED && host.First("cgroup denied")) {
+    Warning("cgroup %s: not permitted: what is below such cgroups is left out\n",
+            path.empty() ? "/" : Printable(path).c_str());
+  }
   // A cgroup that has gone since stays as one without children.
-  if (cgroups_.List(host, path, id, children) != kOk) return;
+  if (status != kOk) return;
   if (self != 0 && id != groups_[self].id) {
     byId_.erase(groups_[self].id);
     byId_.emplace(id, self);

@@ -7,6 +7,7 @@
 
 #include <array>
 #include <cerrno>
+#include <system_error>
 
 #include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/text.h"
@@ -34,7 +35,14 @@ class FileDescriptor {
 
 class Directory {
  public:
-  explicit Directory(DIR* stream) : stream_(stream) {}
+  // Takes `fd` over. Without a stream errno says why.
+  explicit Directory(int fd) : stream_(fd < 0 ? nullptr : fdopendir(fd)) {
+    if (fd >= 0 && stream_ == nullptr) {
+      const int error = errno;
+      close(fd);
+      errno = error;
+    }
+  }
   Directory(const Directory&) = delete;
   Directory& operator=(const Directory&) = delete;
   ~Directory() {
@@ -73,7 +81,7 @@ Status LinuxHost::Read(std::string_view file, std::string& content) const {
   path += file;
   // Without O_NONBLOCK a FIFO in a recorded tree would hold the program up.
   const FileDescriptor fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (fd.get() < 0) return StatusOfErrno(errno);
+  if (fd.get() < 0) return Failed(file, errno);
 
   // Kernel files have no size to ask for: grow until a read comes back empty.
   size_t length = 0;
@@ -81,11 +89,14 @@ Status LinuxHost::Read(std::string_view file, std::string& content) const {
   for (;;) {
     const ssize_t count = read(fd.get(), content.data() + length, content.size() - length);
     if (count < 0 && errno == EINTR) continue;
-    if (count < 0) return StatusOfErrno(errno);
+    if (count < 0) return Failed(file, errno);
     if (count == 0) break;
     length += static_cast<size_t>(count);
     if (length == content.size()) {
-      if (length >= kLargestFile) return KSI_STATUS_READ_ERROR;
+      if (length >= kLargestFile) {
+        TellOnce(file, EFBIG);
+        return KSI_STATUS_READ_ERROR;
+      }
       content.resize(2 * length);
     }
   }
@@ -117,7 +128,7 @@ Status LinuxHost::ReadLink(std::string_view link, std::string& target) const {
   path += link;
   std::array<char, 4096> text;
   const ssize_t length = readlink(path.c_str(), text.data(), text.size());
-  if (length < 0) return StatusOfErrno(errno);
+  if (length < 0) return Failed(link, errno);
   target.assign(text.data(), static_cast<size_t>(length));
   return kOk;
 }
@@ -125,14 +136,14 @@ Status LinuxHost::ReadLink(std::string_view link, std::string& target) const {
 Status LinuxHost::List(std::string_view directory, std::vector<Entry>& entries) const {
   std::string path = root_;
   path += directory;
-  const Directory stream(opendir(path.c_str()));
-  if (stream.get() == nullptr) return StatusOfErrno(errno);
+  const Directory stream(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (stream.get() == nullptr) return Failed(directory, errno);
 
   entries.clear();
   for (;;) {
     errno = 0;
     const dirent* entry = readdir(stream.get());
-    if (entry == nullptr) return errno == 0 ? kOk : StatusOfErrno(errno);
+    if (entry == nullptr) return errno == 0 ? kOk : Failed(directory, errno);
     const std::string_view name = entry->d_name;
     if (name == "." || name == "..") continue;
     entries.push_back({std::string(name), entry->d_ino, IsDirectory(stream.get(), *entry)});
@@ -155,6 +166,23 @@ Status LinuxHost::List(std::string_view directory, Entries wanted,
 }
 
 bool LinuxHost::First(std::string_view what) const { return reading_->told.emplace(what).second; }
+
+Status LinuxHost::Failed(std::string_view file, int error) const {
+  const Status status = StatusOfErrno(error);
+  // A reader that is denied a file may have another to turn to: it tells what goes without. A
+  // cgroup of threads has no processes of its own to list and says so by EOPNOTSUPP.
+  const bool isTold = status != KSI_STATUS_NOT_FOUND && status != KSI_STATUS_PERMISSION_DENIED &&
+                      error != EOPNOTSUPP;
+  if (isTold) TellOnce(file, error);
+  return status;
+}
+
+void LinuxHost::TellOnce(std::string_view file, int error) const {
+  const std::string reason = std::generic_category().message(error);
+  if (!First(reason)) return;
+  Warning("%.*s: %s: what cannot be read is left out or has no value\n",
+          static_cast<int>(file.size()), file.data(), reason.c_str());
+}
 
 void LinuxHost::BeginReading() { reading_ = std::make_unique<Reading>(); }
 

@@ -17,6 +17,8 @@ namespace ksi {
 
 struct Reading;
 
+// A read that fails is a status. Why it failed is told once in a reading, unless what was to be
+// read is gone or may not be read.
 class LinuxHost {
  public:
   using TimePoint = std::chrono::steady_clock::time_point;
@@ -76,6 +78,10 @@ class LinuxHost {
   Clock TimeSource() const { return clock_; }
 
  private:
+  // The status for an errno of a file or directory, which is told.
+  [[nodiscard]] Status Failed(std::string_view file, int error) const;
+  void TellOnce(std::string_view file, int error) const;
+
   std::string root_;  // without its last '/'
   Clock clock_;
   uint64_t pageKB_;
