@@ -157,6 +157,33 @@ TEST_F(GroupsTest, NamesAreDecodedAndHarmless) {
   EXPECT_EQ(NameOf(9), longName.substr(0, 64));
 }
 
+TEST_F(GroupsTest, NamesNeitherCommandNorTurnNorHide) {
+  WriteCgroup("/\xe2\x80\xae\\xc2\\x9b2J", 8, "");
+  EXPECT_EQ(NameOf(8), "??2J");
+  WriteProcess(kPid, "a\xe2\x80\x8b\x9b\xff\xc3\xbc\xe2\x82");
+  EXPECT_EQ(NameOf(kProcessGroup + kPid), "a???\xc3\xbc??");
+  tree_.Write(ProcessFile(kPid, "status"), "Name:\tqemu\nVmSize:\t 8 kB\nThreads:\t2\n");
+  tree_.Write(ProcessFile(kPid, "cmdline"),
+              std::string("qemu-system-x86_64\0-name\0w\xc2\x85\xe2\x81\xa6\x7f", 32) + "z");
+  EXPECT_EQ(NameOf(kProcessGroup + kPid), "w???z");
+}
+
+TEST_F(GroupsTest, NamesAreCutBetweenCharacters) {
+  const std::string longName = std::string(63, 'n') + "\xc3\xbc";
+  WriteCgroup("/" + longName, 9, "");
+  EXPECT_EQ(NameOf(9), longName.substr(0, 63));
+}
+
+TEST_F(GroupsTest, NamesInMessagesAreHarmless) {
+  const std::string directory = "/sys/fs/cgroup/\xc2\x9b";
+  tree_.Write(directory + "/cgroup.procs", "many\n");
+  testing::internal::CaptureStderr();
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 3u);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "/sys/fs/cgroup/?/cgroup.procs: line 1 is not understood\n");
+}
+
 TEST_F(GroupsTest, FlagsTellWhatACgroupIs) {
   int64_t id = 20;
   const auto flags = [&](const std::string& path) {

@@ -332,6 +332,17 @@ TEST_F(LinuxHostTest, HeapNamesFitAndDiffer) {
   EXPECT_EQ(Get("system/heaps/stats", {"none"}, &stats), KSI_STATUS_NOT_FOUND);
 }
 
+TEST_F(LinuxHostTest, HeapNamesAreHarmlessAndStayWhole) {
+  const std::string figures = " 1 2 64 64 1 : tunables 0 0 0 : slabdata 1 1 0\n";
+  const std::string longName = std::string(32, 'n') + "\xc3\xbc";
+  WriteSlabinfo("a\xc2\x9b" + figures + "a\x1b" + figures + longName + "\xc3\xbc" + figures +
+                longName + "n" + figures + longName + "n" + figures);
+  std::vector<std::string> names;
+  ASSERT_EQ(Names("system/heaps", {}, &names), kOk);
+  EXPECT_EQ(names, (std::vector<std::string>{"a?", "a?~2", longName, longName + "n",
+                                             longName.substr(0, 32) + "~2", "vmalloc"}));
+}
+
 TEST_F(LinuxHostTest, HeapLargerThanItsFieldHasNoSize) {
   WriteSlabinfo("dentry 21000000 42000000 192 21 1 : tunables 0 0 0 : slabdata 1 2000000 0\n");
   KSI_HeapStats stats;

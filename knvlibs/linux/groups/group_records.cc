@@ -1,6 +1,7 @@
 // What a group is and what it uses: the nodes below sched/groups. tally-linux(7) says where
 // each figure comes from and why.
 #include <knvlibs/ksi_records.h>
+#include "knvlibs/characters.h"
 #include "knvlibs/linux/groups/cgroup.h"
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/host/figure_file.h"
@@ -20,10 +21,10 @@ Status FindGroup(const LinuxHost& host, const Keys& keys, const GroupTree*& tree
   return group == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
-// A text that is cut where the field ends.
+// A text that is cut before the first character that the field has no room for.
 template <size_t size>
 void CopyText(std::string_view text, char (&field)[size]) {
-  text.copy(field, size);
+  CutAtCharacter(text, size).copy(field, size);
 }
 
 // The cgroup whose settings hold for a group, null if none do: its own, and for a virtual machine

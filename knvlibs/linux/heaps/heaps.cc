@@ -3,8 +3,10 @@
 #include <cstring>
 
 #include <knvlibs/ksi.h>
+#include "knvlibs/characters.h"
 #include "knvlibs/linux/heaps/slab_cache.h"
 #include "knvlibs/linux/host/figure_file.h"
+#include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
 
@@ -88,11 +90,12 @@ constexpr Reader kReaders[] = {
 
 constinit const ReaderTable kHeapReaders = kReaders;
 
-void Heaps::Add(std::string_view fullName, KSI_HeapStats record) {
-  std::string name(fullName.substr(0, kLongestName));
+void Heaps::Add(std::string_view givenName, KSI_HeapStats record) {
+  const std::string fullName = Printable(givenName);
+  std::string name(CutAtCharacter(fullName, kLongestName));
   for (size_t count = 2; !index_.emplace(name, records_.size()).second; ++count) {
     const std::string mark = '~' + std::to_string(count);
-    name = std::string(fullName.substr(0, kLongestName - mark.size())) + mark;
+    name = std::string(CutAtCharacter(fullName, kLongestName - mark.size())) + mark;
   }
   std::memcpy(record.name, name.c_str(), name.size() + 1);
   records_.push_back(record);

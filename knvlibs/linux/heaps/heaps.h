@@ -18,7 +18,7 @@ class Heaps {
  public:
   // Adds a heap under this name as far as it fits; a second heap of the same name gets "~2" at its
   // end, and so on.
-  void Add(std::string_view fullName, KSI_HeapStats record);
+  void Add(std::string_view givenName, KSI_HeapStats record);
 
   // Null if there is none of this name.
   const KSI_HeapStats* Find(std::string_view name) const;

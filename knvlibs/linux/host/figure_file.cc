@@ -61,7 +61,7 @@ Figure FigureFile::Find(std::string_view name) const {
 Status FigureFile::Require(std::string_view name, uint64_t& value) const {
   const Figure found = Find(name);
   if (!found) {
-    Warning("%s: %.*s is missing\n", file_.c_str(), static_cast<int>(name.size()), name.data());
+    Warning("%s: %s is missing\n", Printable(file_).c_str(), Printable(name).c_str());
     return KSI_STATUS_INVALID_METADATA;
   }
   value = *found;

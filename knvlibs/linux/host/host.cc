@@ -180,8 +180,8 @@ Status LinuxHost::Failed(std::string_view file, int error) const {
 void LinuxHost::TellOnce(std::string_view file, int error) const {
   const std::string reason = std::generic_category().message(error);
   if (!First(reason)) return;
-  Warning("%.*s: %s: what cannot be read is left out or has no value\n",
-          static_cast<int>(file.size()), file.data(), reason.c_str());
+  Warning("%s: %s: what cannot be read is left out or has no value\n", Printable(file).c_str(),
+          reason.c_str());
 }
 
 void LinuxHost::BeginReading() { reading_ = std::make_unique<Reading>(); }
@@ -192,13 +192,13 @@ Status LinuxHost::NotUnderstoodOnce(std::string_view kind, std::string_view file
 }
 
 Status NotUnderstood(std::string_view file, size_t line) {
-  Warning("%.*s: line %zu is not understood\n", static_cast<int>(file.size()), file.data(), line);
+  Warning("%s: line %zu is not understood\n", Printable(file).c_str(), line);
   return KSI_STATUS_INVALID_METADATA;
 }
 
 Status NameNotUnderstood(std::string_view directory, std::string_view name) {
-  Warning("%.*s: the name %.*s is not understood\n", static_cast<int>(directory.size()),
-          directory.data(), static_cast<int>(name.size()), name.data());
+  Warning("%s: the name %s is not understood\n", Printable(directory).c_str(),
+          Printable(name).c_str());
   return KSI_STATUS_INVALID_METADATA;
 }
 

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <charconv>
 
+#include "knvlibs/characters.h"
+
 namespace ksi {
 namespace {
 
@@ -46,9 +48,13 @@ bool ParseNumber(std::string_view text, uint64_t& number) { return Parse(text, 1
 bool ParseHex(std::string_view text, uint64_t& number) { return Parse(text, 16, number); }
 
 std::string Printable(std::string_view name) {
-  std::string printable(name);
-  std::ranges::replace_if(
-      printable, [](char c) { return (c >= 0 && c < ' ') || c == '\x7f'; }, '?');
+  std::string printable;
+  printable.reserve(name.size());
+  while (!name.empty()) {
+    const Character first = FirstOf(name);
+    printable += IsShown(first) ? name.substr(0, first.size) : "?";
+    name.remove_prefix(first.size);
+  }
   return printable;
 }
 

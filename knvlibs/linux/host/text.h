@@ -35,7 +35,8 @@ bool TakePrefix(std::string_view& text, std::string_view prefix);
 bool ParseNumber(std::string_view text, uint64_t& number);
 bool ParseHex(std::string_view text, uint64_t& number);
 
-// `name` with '?' for the bytes that a terminal would take for commands.
+// A name that somebody on the host chose, as it enters records and messages: with '?' for each
+// character that is not to be shown and each byte that is not UTF-8.
 std::string Printable(std::string_view name);
 
 }  // namespace ksi

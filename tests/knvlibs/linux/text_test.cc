@@ -72,6 +72,12 @@ TEST(TextTest, NumbersAreWholeAndFit) {
 TEST(TextTest, TerminalsGetNoCommands) {
   EXPECT_EQ(Printable(std::string("a\0\x1b[2J\x7f\n\t~", 10)), "a??[2J???~");
   EXPECT_EQ(Printable("gr\xc3\xbcn"), "gr\xc3\xbcn");
+  EXPECT_EQ(Printable("a\xc2\x9b"
+                      "2J\xe2\x80\xae\xe2\x80\x8bz"),
+            "a?2J??z");
+  EXPECT_EQ(Printable("\x9b"
+                      "2J\xff\xe2\x82"),
+            "?2J???");
 }
 
 }  // namespace
