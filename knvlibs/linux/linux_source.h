@@ -2,7 +2,7 @@
 #ifndef KNVLIBS_LINUX_LINUX_SOURCE_H_
 #define KNVLIBS_LINUX_LINUX_SOURCE_H_
 
-#include <string>
+#include <string_view>
 
 #include "knvlibs/linux/host/host.h"
 #include "knvlibs/linux/reading_span.h"
@@ -12,8 +12,9 @@ namespace ksi {
 
 class LinuxSource : public Source {
  public:
-  explicit LinuxSource(std::string root, LinuxHost::Clock clock = std::chrono::steady_clock::now)
-      : host_(std::move(root), clock) {}
+  explicit LinuxSource(std::string_view root,
+                       LinuxHost::Clock clock = std::chrono::steady_clock::now)
+      : host_(root, clock) {}
 
   [[nodiscard]] Status Value(const Node& node, const Keys& keys, Buffer record) override;
   [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;

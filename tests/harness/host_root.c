@@ -9,8 +9,6 @@
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
-#include <sys/types.h>
-#include <unistd.h>
 
 /* In place of the system's, whatever the build hides. */
 #pragma GCC visibility push(default)
@@ -38,10 +36,3 @@ static const char* Below(const char* path, char buffer[PATH_MAX]) {
 
 SHOWING_OPEN(open)
 SHOWING_OPEN(open64)
-
-ssize_t readlink(const char* path, char* to, size_t size) {
-  static ssize_t (*behind)(const char*, char*, size_t);
-  char buffer[PATH_MAX];
-  if (behind == NULL) *(void**)&behind = dlsym(RTLD_NEXT, "readlink");
-  return behind(Below(path, buffer), to, size);
-}

@@ -19,29 +19,10 @@ namespace {
 // No file that is read whole is anywhere near this large.
 constexpr size_t kLargestFile = size_t{64} << 20;
 
-class FileDescriptor {
- public:
-  explicit FileDescriptor(int fd) : fd_(fd) {}
-  FileDescriptor(const FileDescriptor&) = delete;
-  FileDescriptor& operator=(const FileDescriptor&) = delete;
-  ~FileDescriptor() {
-    if (fd_ >= 0) close(fd_);
-  }
-  int get() const { return fd_; }
-
- private:
-  int fd_;
-};
-
 class Directory {
  public:
-  // Takes `fd` over. Without a stream errno says why.
-  explicit Directory(int fd) : stream_(fd < 0 ? nullptr : fdopendir(fd)) {
-    if (fd >= 0 && stream_ == nullptr) {
-      const int error = errno;
-      close(fd);
-      errno = error;
-    }
+  explicit Directory(FileDescriptor fd) : stream_(fd.IsOpen() ? fdopendir(fd.Get()) : nullptr) {
+    if (stream_ != nullptr) fd.Release();
   }
   Directory(const Directory&) = delete;
   Directory& operator=(const Directory&) = delete;
@@ -61,15 +42,10 @@ bool IsDirectory(DIR* stream, const dirent& entry) {
          S_ISDIR(status.st_mode);
 }
 
-std::string WithoutLastSlash(std::string path) {
-  while (!path.empty() && path.back() == '/') path.pop_back();
-  return path;
-}
-
 }  // namespace
 
-LinuxHost::LinuxHost(std::string root, Clock clock)
-    : root_(WithoutLastSlash(std::move(root))),
+LinuxHost::LinuxHost(std::string_view root, Clock clock)
+    : root_(root),
       clock_(clock),
       pageKB_(static_cast<uint64_t>(sysconf(_SC_PAGESIZE)) / 1024),
       reading_(std::make_unique<Reading>()) {}
@@ -77,17 +53,15 @@ LinuxHost::LinuxHost(std::string root, Clock clock)
 LinuxHost::~LinuxHost() = default;
 
 Status LinuxHost::Read(std::string_view file, std::string& content) const {
-  std::string path = root_;
-  path += file;
   // Without O_NONBLOCK a FIFO in a recorded tree would hold the program up.
-  const FileDescriptor fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (fd.get() < 0) return Failed(file, errno);
+  const FileDescriptor fd = root_.Open(file, O_RDONLY | O_NONBLOCK);
+  if (!fd.IsOpen()) return Failed(file, errno);
 
   // Kernel files have no size to ask for: grow until a read comes back empty.
   size_t length = 0;
   content.resize(16384);
   for (;;) {
-    const ssize_t count = read(fd.get(), content.data() + length, content.size() - length);
+    const ssize_t count = read(fd.Get(), content.data() + length, content.size() - length);
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return Failed(file, errno);
     if (count == 0) break;
@@ -124,19 +98,17 @@ Status LinuxHost::ReadNumberIfAny(std::string_view file, Figure& figure) const {
 }
 
 Status LinuxHost::ReadLink(std::string_view link, std::string& target) const {
-  std::string path = root_;
-  path += link;
+  const FileDescriptor fd = root_.Open(link, O_PATH | O_NOFOLLOW);
+  if (!fd.IsOpen()) return Failed(link, errno);
   std::array<char, 4096> text;
-  const ssize_t length = readlink(path.c_str(), text.data(), text.size());
+  const ssize_t length = readlinkat(fd.Get(), "", text.data(), text.size());
   if (length < 0) return Failed(link, errno);
   target.assign(text.data(), static_cast<size_t>(length));
   return kOk;
 }
 
 Status LinuxHost::List(std::string_view directory, std::vector<Entry>& entries) const {
-  std::string path = root_;
-  path += directory;
-  const Directory stream(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const Directory stream(root_.Open(directory, O_RDONLY | O_DIRECTORY));
   if (stream.get() == nullptr) return Failed(directory, errno);
 
   entries.clear();

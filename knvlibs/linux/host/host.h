@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "knvlibs/linux/host/figure.h"
+#include "knvlibs/linux/host/host_root.h"
 #include "knvlibs/status.h"
 
 namespace ksi {
@@ -26,7 +27,7 @@ class LinuxHost {
 
   // `root` is "/" for the machine itself, or the directory of a recorded tree. `clock` tells the
   // time that bounds are measured with.
-  explicit LinuxHost(std::string root, Clock clock = std::chrono::steady_clock::now);
+  explicit LinuxHost(std::string_view root, Clock clock = std::chrono::steady_clock::now);
   ~LinuxHost();
 
   // The whole of a file, named from the root ("/proc/meminfo").
@@ -64,7 +65,7 @@ class LinuxHost {
                                          size_t line) const;
 
   // Whether this is the machine itself and not a recorded tree.
-  bool IsThisMachine() const { return root_.empty(); }
+  bool IsThisMachine() const { return root_.IsThisMachine(); }
 
   // What has been read and need not be read again until the next reading begins, which forgets it.
   Reading& Kept() const { return *reading_; }
@@ -82,7 +83,7 @@ class LinuxHost {
   [[nodiscard]] Status Failed(std::string_view file, int error) const;
   void TellOnce(std::string_view file, int error) const;
 
-  std::string root_;  // without its last '/'
+  HostRoot root_;
   Clock clock_;
   uint64_t pageKB_;
   std::unique_ptr<Reading> reading_;
