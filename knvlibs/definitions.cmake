@@ -4,8 +4,14 @@
 # would not change is left alone.
 function(commit_date result)
   if(EXISTS "${SOURCE}/.git")
-    execute_process(COMMAND git -C "${SOURCE}" log -1 --format=%ct
-      OUTPUT_VARIABLE seconds OUTPUT_STRIP_TRAILING_WHITESPACE ERROR_QUIET)
+    # Of a clone that is another user's the date is asked all the same: nothing of it is run.
+    execute_process(COMMAND git -c safe.directory=* -C "${SOURCE}" log -1 --format=%ct
+      RESULT_VARIABLE failed OUTPUT_VARIABLE seconds ERROR_VARIABLE why
+      OUTPUT_STRIP_TRAILING_WHITESPACE ERROR_STRIP_TRAILING_WHITESPACE)
+    if(failed)
+      message(WARNING "The date of the commit cannot be read, that of the last release is taken: "
+        "${failed}: ${why}")
+    endif()
   endif()
   set(${result} "${seconds}" PARENT_SCOPE)
 endfunction()
