@@ -132,7 +132,7 @@ TEST_F(Ksicache, CheckTakesSeveralFiles) {
   EXPECT_EQ(result.status, 1);
   const std::string problem = Path("bad.ksi") + ": there is no node sched/later\n";
   EXPECT_EQ(result.out, problem + problem);
-  EXPECT_EQ(result.err, "ksicache: " + Path("none") + ": no such file\n");
+  EXPECT_EQ(result.err, "ksicache: " + Path("none") + ": No such file or directory\n");
   EXPECT_EQ(Output({"check", Path("good.ksi"), Path("good.ksi")}), "");
 }
 

@@ -59,7 +59,7 @@ TEST_F(Ksicache, WrongCommandLines) {
 // What comes from outside reaches nobody's terminal as it is.
 TEST_F(Ksicache, MessagesAreEscaped) {
   ExpectFailure({"\x1b[2J\xc2\x9b\n"}, R"(there is no command \x1b[2J\xc2\x9b\x0a)", 2);
-  ExpectFailure({"info", "\xe2\x80\xae\xff"}, R"(\xe2\x80\xae\xff: no such file)");
+  ExpectFailure({"info", "\xe2\x80\xae\xff"}, R"(\xe2\x80\xae\xff: No such file or directory)");
   ExpectFailure({std::string(9000, 'x')}, "there is no command " + std::string(8172, 'x') + "...",
                 2);
 }

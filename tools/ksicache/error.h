@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 #include "knvlibs/source.h"
 
@@ -31,7 +32,14 @@ class OutputError : public std::runtime_error {
 // Ends the command with its message, a word on how to get help, and exit status 2.
 class UsageError : public std::runtime_error {
  public:
-  using std::runtime_error::runtime_error;
+  // `help`: whole lines, of this program's own text.
+  explicit UsageError(const std::string& message, std::string help = "Try 'ksicache --help'.\n")
+      : std::runtime_error(message), help_(std::move(help)) {}
+
+  const char* Help() const { return help_.c_str(); }
+
+ private:
+  std::string help_;
 };
 
 // The error for a system call on `fileName` that failed with this errno.

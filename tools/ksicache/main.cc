@@ -111,7 +111,7 @@ int main(int argc, char** argv) {
     return status;
   } catch (const ksicache::UsageError& error) {
     ksicache::PrintError(error.what());
-    static_cast<void>(std::fputs("Try 'ksicache --help'.\n", stderr));
+    static_cast<void>(std::fputs(error.Help(), stderr));
     return 2;
   } catch (const std::bad_alloc&) {
     // Without memory, which is what there is none of.

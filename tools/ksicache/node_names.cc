@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstddef>
 #include <numeric>
+#include <string>
 #include <vector>
 
 #include "knvlibs/catalogue.h"
@@ -27,12 +28,13 @@ size_t Distance(std::string_view a, std::string_view b) {
 
 std::string_view LastPartOf(std::string_view path) { return path.substr(path.rfind('/') + 1); }
 
+// A line each.
 std::string NodesBelow(std::string_view name) {
   std::string below;
   for (const ksi::Node& node : ksi::Catalogue()) {
     if (node.path.size() > name.size() && node.path.starts_with(name) &&
         node.path[name.size()] == '/') {
-      below += " " + std::string(node.path);
+      below += "  " + std::string(node.path) + "\n";
     }
   }
   return below;
@@ -57,14 +59,16 @@ std::string_view Likely(std::string_view name) {
 
 }  // namespace
 
-std::string WhyNoNode(std::string_view name) {
+UsageError NoNode(std::string_view name) {
   std::string_view level = name;
   while (level.ends_with('/')) level.remove_suffix(1);
   const std::string below = NodesBelow(level);
-  if (!below.empty()) return std::string(level) + " is no node, but below it are" + below;
+  if (!below.empty()) {
+    return UsageError(std::string(level) + " is no node, but below it are", below);
+  }
   const std::string_view likely = Likely(level);
   const std::string hint = likely.empty() ? "" : "; is it " + std::string(likely) + "?";
-  return "there is no node " + std::string(name) + hint;
+  return UsageError("there is no node " + std::string(name) + hint);
 }
 
 }  // namespace ksicache

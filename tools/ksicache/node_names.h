@@ -2,14 +2,15 @@
 #ifndef TOOLS_KSICACHE_NODE_NAMES_H_
 #define TOOLS_KSICACHE_NODE_NAMES_H_
 
-#include <string>
 #include <string_view>
+
+#include "tools/ksicache/error.h"
 
 namespace ksicache {
 
-// Says that there is no node of this name, and which there are: those below it, or the one that is
-// likely to be meant.
-std::string WhyNoNode(std::string_view name);
+// The error that there is no node of this name, with those that there are: the ones below it, a
+// line each, or the one that is likely to be meant.
+UsageError NoNode(std::string_view name);
 
 }  // namespace ksicache
 

@@ -1,5 +1,10 @@
 #include "tools/ksicache/reading_walk.h"
 
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <cstring>
+
 #include "knvlibs/cache_format.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/output.h"
@@ -11,16 +16,22 @@ namespace {
   throw DataError(std::string("damaged: ") + sqlite3_errmsg(file.Handle()));
 }
 
-const char* MeaningOf(ksi::Status status) {
+// A cache file is read here and there, which a pipe does not allow.
+bool IsRegular(const std::string& fileName) {
+  struct stat info = {};
+  return stat(fileName.c_str(), &info) != 0 || S_ISREG(info.st_mode);
+}
+
+std::string MeaningOf(ksi::Status status, const std::string& fileName) {
   switch (status) {
     case KSI_STATUS_NOT_FOUND:
-      return "no such file";
+      return std::strerror(ENOENT);
     case KSI_STATUS_PERMISSION_DENIED:
-      return "permission denied";
+      return std::strerror(EACCES);
     case KSI_STATUS_IS_A_DIRECTORY:
-      return "is a directory";
+      return std::strerror(EISDIR);
     case KSI_STATUS_INVALID_METADATA:
-      return "not a cache file";
+      return IsRegular(fileName) ? "not a cache file" : "is not a regular file";
     case KSI_STATUS_MAJOR_VERSION_MISMATCH:
       return "made by a newer version";
     case KSI_STATUS_METADATA_READ_ERROR:
@@ -103,7 +114,7 @@ std::unique_ptr<ksi::CacheFile> OpenCacheFile(const std::string& fileName) {
   std::string why;
   const ksi::Status status = ksi::CacheFile::Open(fileName.c_str(), &file, &why);
   if (status != ksi::kOk) {
-    throw DataError(MeaningOf(status) + (why.empty() ? "" : ": " + why));
+    throw DataError(MeaningOf(status, fileName) + (why.empty() ? "" : ": " + why));
   }
   return file;
 }

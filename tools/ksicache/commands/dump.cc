@@ -24,7 +24,7 @@ class Dumper {
       : file_(file), instances_(file), json_(line.Has(kJson)) {
     for (size_t i = 1; i < line.arguments.size(); ++i) {
       const ksi::Node* node = ksi::FindNode(line.arguments[i]);
-      if (node == nullptr) throw UsageError(WhyNoNode(line.arguments[i]));
+      if (node == nullptr) throw NoNode(line.arguments[i]);
       only_.insert(node);
     }
   }
