@@ -1,7 +1,9 @@
 // capture.
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cstring>
+#include <string>
 #include <utility>
 
 #include "knvlibs/cache_source.h"
@@ -22,6 +24,15 @@ TEST_F(Ksicache, CaptureRecordsAHost) {
   EXPECT_NE(result.out.find("\nfailed     3: sched/groups/stats/memoryStats [0] (0xbad0099 "),
             result.out.npos);
   EXPECT_NE(result.out.find(" of recorded.example.org\n"), result.out.npos) << result.out;
+  // What the library says is told, and counted.
+  const auto diagnostics = std::ranges::count(result.err, '\n');
+  EXPECT_GT(diagnostics, 0);
+  EXPECT_EQ(result.err.find("ksicache: /proc/meminfo: "), 0u) << result.err;
+  EXPECT_NE(
+      result.out.find("\nno value   figures without one may have been refused; diagnostics: " +
+                      std::to_string(diagnostics) + "\n           "),
+      result.out.npos)
+      << result.out;
   EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
   // What cannot be read is recorded as such.
   const std::string dump = Output({"dump", "--json", Path("a.ksi"), "memory/comprehensive",

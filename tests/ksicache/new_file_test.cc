@@ -78,6 +78,12 @@ TEST_F(Ksicache, StandardOutputTakesAFile) {
   EXPECT_EQ(result.err, "ksicache: standard output: cannot write: No space left on device\n");
 }
 
+TEST_F(Ksicache, StandardOutputTakesNoOption) {
+  ExpectFailure({"capture", "-", "--mode", "0644"}, "--mode is for a file, not standard output", 2);
+  ExpectFailure({"load", "--force", Path("a.json"), "-"},
+                "--force is for a file, not standard output", 2);
+}
+
 TEST_F(Ksicache, StandardOutputIsNoTerminal) {
   const int terminal = posix_openpt(O_RDWR | O_NOCTTY);
   ASSERT_GE(terminal, 0);

@@ -113,6 +113,15 @@ mode_t ModeOf(const CommandLine& line) {
   return mode;
 }
 
+void CheckOptionsFor(const std::string& target, const CommandLine& line) {
+  if (target != "-") return;
+  for (const Option* option : {&kForce, &kMode}) {
+    if (line.Has(*option)) {
+      throw UsageError(std::string("--") + option->name + " is for a file, not standard output");
+    }
+  }
+}
+
 NewFile::NewFile(std::string target, bool replace, mode_t mode)
     : name_(std::move(target)), replace_(replace), mode_(mode), standardOutput_(name_ == "-") {
   if (standardOutput_) {

@@ -68,6 +68,9 @@ class NewFile {
 inline constexpr Option kMode = {"mode", "MODE", "give FILE these rights instead of 0600"};
 mode_t ModeOf(const CommandLine& line);
 
+// Standard output is neither replaced nor given rights: fails with a UsageError if that is asked.
+void CheckOptionsFor(const std::string& target, const CommandLine& line);
+
 }  // namespace ksicache
 
 #endif  // TOOLS_KSICACHE_NEW_FILE_H_

@@ -11,6 +11,7 @@
 
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/diagnostics.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/host_library.h"
 #include "tools/ksicache/host_walk.h"
@@ -70,20 +71,31 @@ class Account {
          std::to_string(writer.Lists()) + " lists of " + host);
   }
 
-  void OfFailures(const Failures& failures) const {
+  // `diagnostics`: how many the library gave.
+  void OfFailures(const Failures& failures, size_t diagnostics) const {
     if (failures.absent.Count() != 0) {
       say_("absent     " + std::to_string(failures.absent.Count()) +
            ": not everything has every node");
     }
     if (failures.refused.Count() != 0) {
       say_("refused    " + failures.refused.Text());
-      say_(geteuid() == 0 ? "           it needs CAP_SYS_PTRACE and CAP_DAC_READ_SEARCH to read all"
-                          : "           run it as root to read all");
     }
+    // What is refused of a record that is read otherwise is a figure without a value in it.
+    const bool figures = diagnostics != 0 || geteuid() != 0;
+    if (figures) {
+      say_("no value   figures without one may have been refused" +
+           (diagnostics == 0 ? "" : "; diagnostics: " + std::to_string(diagnostics)));
+    }
+    if (figures || failures.refused.Count() != 0) OfRights();
     if (failures.failed.Count() != 0) say_("failed     " + failures.failed.Text());
   }
 
  private:
+  void OfRights() const {
+    say_(geteuid() == 0 ? "           it needs CAP_SYS_PTRACE and CAP_DAC_READ_SEARCH to read all"
+                        : "           run it as root to read all");
+  }
+
   void (*say_)(std::string_view);
 };
 
@@ -100,13 +112,16 @@ void CheckFound(const HostWalk& walk) {
 int Capture(const CommandLine& line) {
   const std::string& fileName = line.arguments[0];
   const std::string* root = line.ValueOf(kRoot);
+  CheckOptionsFor(fileName, line);
   const mode_t mode = ModeOf(line);
   if (root != nullptr || HostLibrary::OpensHosts()) CheckRoot(root == nullptr ? "/" : *root);
   CacheWriter writer(fileName, line.Has(kForce), mode);
+  Diagnostics diagnostics;
   HostLibrary library(root);
   const std::string taken = Now();
   HostWalk walk(library, writer);
   walk.Run();
+  diagnostics.Say();
   CheckFound(walk);
 
   const HostLibrary::Definitions definitions = library.KernelDefinitions();
@@ -114,7 +129,7 @@ int Capture(const CommandLine& line) {
   writer.Commit({definitions.signature, definitions.built, host, taken});
   const Account account(fileName == "-");
   account.OfFile(writer, host);
-  account.OfFailures(walk.GetFailures());
+  account.OfFailures(walk.GetFailures(), diagnostics.Count());
   return walk.GetFailures().failed.Count() == 0 ? 0 : 1;
 }
 
@@ -132,6 +147,9 @@ fails again when the file is read. What failed is said:
   absent   of nodes that the host, or a thing on it, does not have
   refused  for want of rights; the superuser sees most
   failed   for another reason, which makes the exit status 1
+
+Figures without a value in what was read may have been refused too. It is said
+where that can be: without the superuser's rights, or after diagnostics.
 )",
     .options = kOptions,
     .fewest = 1,

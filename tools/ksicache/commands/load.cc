@@ -183,6 +183,7 @@ ksi::CacheFile::Capture TakeHead(const Json& document) {
 constexpr const Option* kOptions[] = {&kForce, &kMode};
 
 int Load(const CommandLine& line) {
+  CheckOptionsFor(line.arguments[1], line);
   const mode_t mode = ModeOf(line);
   const std::string& jsonName = line.arguments[0];
   const std::unique_ptr<std::FILE, int (*)(std::FILE*)> json(std::fopen(jsonName.c_str(), "r"),

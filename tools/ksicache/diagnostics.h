@@ -1,0 +1,39 @@
+// What the library says of a host while it is captured.
+#ifndef TOOLS_KSICACHE_DIAGNOSTICS_H_
+#define TOOLS_KSICACHE_DIAGNOSTICS_H_
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+namespace ksicache {
+
+// Keeps them off a progress bar: they are said on standard error when there is none, at the end at
+// the latest. One at a time.
+class Diagnostics {
+ public:
+  Diagnostics();
+  Diagnostics(const Diagnostics&) = delete;
+  Diagnostics& operator=(const Diagnostics&) = delete;
+  ~Diagnostics();
+
+  // Says those that have not been said.
+  void Say();
+
+  // All, said or not.
+  size_t Count() const { return count_; }
+
+ private:
+  static constexpr size_t kMostKept = 1000;
+
+  static void Receive(void* context, const char* text);
+  void Keep(const char* text);
+
+  size_t count_ = 0;
+  size_t dropped_ = 0;  // of those to say
+  std::vector<std::string> kept_;
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_DIAGNOSTICS_H_
