@@ -88,7 +88,7 @@ bool OpenCache(const char* cacheFile) {
 
 // Whether the library's definitions are the kernel's.
 bool CheckVersion() {
-  char buildBuffer[21] = {};
+  char buildBuffer[KSI_BUILD_DATE_SIZE] = {};
   const char* appBuild = nullptr;
   const Status status = KSI_CheckSig(buildBuffer, sizeof buildBuffer, &appBuild);
   if (status != kSuccess) {

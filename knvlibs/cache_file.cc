@@ -87,12 +87,13 @@ bool HoldsChanges(const std::string& journal) {
 }
 
 bool IsDate(std::string_view text) {
-  return text.size() == 20 &&
+  return text.size() == cache::kDateSize &&
          std::ranges::all_of(text, [](char c) { return c >= ' ' && c <= '~'; });
 }
 
 bool IsSignature(std::string_view text) {
-  return text.size() == 32 && text.find_first_not_of("0123456789abcdef") == std::string_view::npos;
+  return text.size() == cache::kSignatureSize &&
+         text.find_first_not_of("0123456789abcdef") == std::string_view::npos;
 }
 
 bool IsPlain(std::string_view text) {

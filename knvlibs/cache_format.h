@@ -1,10 +1,12 @@
-// The layout of a KSI cache file; docs/ksi-cache-format.md describes it.
+// The layout of a KSI cache file; ksi-cache(5) describes it.
 #ifndef KNVLIBS_CACHE_FORMAT_H_
 #define KNVLIBS_CACHE_FORMAT_H_
 
 #include <cstddef>
 #include <cstdint>
 #include <string_view>
+
+#include <knvlibs/ksi.h>
 
 namespace ksi::cache {
 
@@ -35,6 +37,10 @@ constexpr Table kTables[] = {
 // node.kind
 constexpr std::string_view kValue = "value";
 constexpr std::string_view kList = "list";
+
+// The characters of a signature, and of the dates.
+constexpr size_t kSignatureSize = 32;
+constexpr size_t kDateSize = KSI_BUILD_DATE_SIZE - 1;
 
 // The longest key, entry or other text.
 constexpr size_t kLongestText = 4096;

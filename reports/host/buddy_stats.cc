@@ -32,8 +32,7 @@ constexpr ReportFrame kFrame = {
 // Room for the names of all buddies, and for a row of each.
 constexpr size_t kMaxBuddies = 99;
 
-// Where a name tells the memory node and the type of memory: "memmap-03-lo".
-constexpr size_t kNodeAt = 7;
+// Where a name tells the type of memory: "memmap-03-lo".
 constexpr size_t kTypeAt = 10;
 
 struct BuddyRow {
@@ -142,7 +141,7 @@ Status ReadBuddyName(const char* name, BuddyRow& row) {
   std::strncpy(row.name, name, sizeof row.name - 1);
   row.name[sizeof row.name - 1] = '\0';
   row.isLow = row.name[std::strlen(row.name) - 1] == 'o';
-  row.memNode = static_cast<uint32_t>(std::strtol(row.name + kNodeAt, nullptr, 10));
+  row.memNode = static_cast<uint32_t>(std::strtol(row.name + KSI_BUDDY_NODE_AT, nullptr, 10));
   return TallyMemNode2NUMANode(row.memNode, row.numaNode);
 }
 
@@ -160,7 +159,7 @@ ParamList ListBuddies() {
 // Puts the allocators into `rows` and returns how many there are. One whose NUMA node cannot be
 // told is left out.
 size_t ReadBuddies(std::span<BuddyRow, kMaxBuddies> rows) {
-  constexpr char kPrefix[] = "memmap";
+  constexpr char kPrefix[] = KSI_BUDDY_PREFIX;
   const ParamList names = ListBuddies();
   if (!names) return 0;
   size_t kept = 0;
@@ -176,12 +175,12 @@ size_t ReadBuddies(std::span<BuddyRow, kMaxBuddies> rows) {
 // By memory node, the low memory of a node first; both as the names tell them.
 bool SortsBefore(const BuddyRow& a, const BuddyRow& b) {
   if (std::strncmp(a.name, b.name, sizeof a.name) == 0) return false;
-  if (std::strncmp(a.name + kNodeAt, b.name + kNodeAt, 2) == 0) {
+  if (std::strncmp(a.name + KSI_BUDDY_NODE_AT, b.name + KSI_BUDDY_NODE_AT, 2) == 0) {
     return std::strncmp(a.name + kTypeAt, "lo", 2) == 0;
   }
   const auto node = [](const BuddyRow& row) {
     char digits[3] = "  ";
-    std::strncpy(digits, row.name + kNodeAt, 2);
+    std::strncpy(digits, row.name + KSI_BUDDY_NODE_AT, 2);
     return std::strtol(digits, nullptr, 10);
   };
   return node(a) < node(b);

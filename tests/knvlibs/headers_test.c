@@ -11,7 +11,7 @@
 _Static_assert(sizeof(struct KSI_BuddyStats) == KSI_SIZE_BuddyStats, "a record and its size");
 _Static_assert(sizeof(KSI_GroupFlags) == KSI_SIZE_GroupFlags, "a number and its size");
 _Static_assert(KSI_SIZE_None == 0, "a node without a value");
-_Static_assert(KSI_NO_VALUE == UINT64_MAX && KSI_NO_VALUE_32 == UINT32_MAX, "all ones");
+_Static_assert(KSI_NO_VALUE == UINT64_MAX && KSI_NO_VALUE_OF(32) == UINT32_MAX, "all ones");
 
 uint32_t NameOfFirstChild(const char* fileName, char* name, size_t size);
 void KeepText(void* context, const char* text);

@@ -298,7 +298,7 @@ TEST_F(Reads, UseTheFileNamedLast) {
 }
 
 TEST_F(Reads, SignatureOfAFileIsComparedWithTheLibrarys) {
-  char built[21] = {};
+  char built[KSI_BUILD_DATE_SIZE] = {};
   const char* own = nullptr;
   EXPECT_EQ(KSI_CheckSig(built, sizeof built, &own), 0u);
   EXPECT_EQ(std::string(built).size(), 20u);

@@ -114,7 +114,7 @@ TEST(Sources, AreReadAgainAfterARefresh) {
 
 TEST(Sources, TellTheirDefinitions) {
   const Handle example(Cache(TALLY_EXAMPLE));
-  char kernel[21] = "";
+  char kernel[KSI_BUILD_DATE_SIZE] = "";
   const char* own = nullptr;
   const char* built = nullptr;
   EXPECT_EQ(KSI_CheckSig(kernel, sizeof kernel, &own), 0U);

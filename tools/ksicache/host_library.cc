@@ -56,10 +56,9 @@ ksi::Status ReadEntry(KSI_ParamList* list, uint32_t index, ksi::Key* entry) {
   return status == ksi::kOk && !fits ? KSI_STATUS_LENGTH_MISMATCH : status;
 }
 
-// A date as a cache file has it: 20 characters that print.
+// A date as a cache file has it: characters that print.
 std::string DateOf(std::string text) {
-  constexpr size_t kDateSize = 20;
-  text.resize(kDateSize, ' ');
+  text.resize(ksi::cache::kDateSize, ' ');
   std::ranges::replace_if(
       text, [](char c) { return c < ' ' || c > '~'; }, '?');
   return text;
@@ -118,14 +117,13 @@ ksi::Status HostLibrary::List(const ksi::Node& node, const ksi::Keys& keys, Inst
 }
 
 HostLibrary::Definitions HostLibrary::KernelDefinitions() {
-  std::array<char, 21> built = {};
+  std::array<char, KSI_BUILD_DATE_SIZE> built = {};
   const char* ownBuilt = nullptr;
   const ksi::Status status =
       source_ == nullptr ? KSI_CheckSig(built.data(), built.size(), &ownBuilt)
                          : KSI_SourceCheckSig(source_.get(), built.data(), built.size(), &ownBuilt);
-  constexpr size_t kSignatureSize = 32;
   return {status == ksi::kOk ? std::string(ksi::kDefinitions.signature)
-                             : std::string(kSignatureSize, '0'),
+                             : std::string(ksi::cache::kSignatureSize, '0'),
           DateOf({built.data(), strnlen(built.data(), built.size())})};
 }
 

@@ -145,12 +145,11 @@ void HostWalk::FindInList(const ksi::Node& node, const Object& object,
   }
 }
 
-// A buddy's name holds the number of its memory node, where reports read it: "memmap-03-lo".
+// A buddy's name holds the number of its memory node.
 void HostWalk::FindMemNodeOf(std::string_view buddy) {
-  constexpr size_t kNumberAt = 7;
   constexpr size_t kNameSize = 15;
-  if (!buddy.starts_with("memmap") || buddy.size() < kNumberAt) return;
-  const std::string number(buddy.substr(0, kNameSize).substr(kNumberAt));
+  if (!buddy.starts_with(KSI_BUDDY_PREFIX) || buddy.size() < KSI_BUDDY_NODE_AT) return;
+  const std::string number(buddy.substr(0, kNameSize).substr(KSI_BUDDY_NODE_AT));
   const auto node = static_cast<uint32_t>(std::strtol(number.c_str(), nullptr, 10));
   FindNumber(ksi::Instance::kMemNode, node);
 }

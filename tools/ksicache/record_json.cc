@@ -2,9 +2,9 @@
 
 #include <algorithm>
 #include <cstring>
-#include <limits>
 #include <optional>
 
+#include <knvlibs/ksi_records.h>
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
@@ -201,8 +201,7 @@ std::string NumberToText(const ksi::Field& field, std::span<const std::byte> rec
     default:
       break;
   }
-  const uint64_t allOnes = std::numeric_limits<uint64_t>::max() >> (64 - 8 * field.width);
-  if (field.width >= 4 && number == allOnes) return "no value";
+  if (field.width >= 4 && number == KSI_NO_VALUE_OF(8 * field.width)) return "no value";
   return std::to_string(number);
 }
 

@@ -3,7 +3,8 @@
  * The kernel's information tree (KSI) is a tree of named nodes. A node's value is a record of fixed
  * size (ksi_records.h); some levels of the tree are instances, which a parameter list of integer
  * and string keys selects in path order. Every operation that can fail returns a status, 0 for
- * success (ksi_status.h); one that fails leaves its outputs as they were.
+ * success (ksi_status.h); one that fails leaves its outputs as they were, but for KSI_CheckSig and
+ * KSI_SourceCheckSig, which fill theirs whatever the status.
  *
  * Any thread may call the library; what the calls of different threads may share is said with each
  * group of operations.
@@ -15,8 +16,11 @@
 #include <stdint.h>
 
 /* A status that is not looked at is an error that is not seen. */
-#if defined(__cplusplus) && __cplusplus >= 201703L
+#if (defined(__cplusplus) && __cplusplus >= 201703L) || \
+    (defined(__STDC_VERSION__) && __STDC_VERSION__ >= 202311L)
 #define KSI_NODISCARD [[nodiscard]]
+#elif defined(__GNUC__)
+#define KSI_NODISCARD __attribute__((warn_unused_result))
 #else
 #define KSI_NODISCARD
 #endif
@@ -36,8 +40,12 @@ struct KSI_ParamList;
 /* Answers every later read from the cache file `fileName`. `flags` is 0. */
 KSI_NODISCARD uint32_t KSI_UseCache(const char* fileName, int flags);
 
+/* The bytes of a build date and its end. */
+#define KSI_BUILD_DATE_SIZE 21
+
 /* Compares the library's definitions with those of the kernel (or of the cache file) it reads.
- * `buildBuffer` of `size` (21) bytes receives the date the kernel's definitions were built,
+ * `buildBuffer` of `size` (KSI_BUILD_DATE_SIZE) bytes receives the date the kernel's definitions
+ * were built,
  * `*appBuild` the date of the library's own, both as "Nov 21 2026 10:00:00"; both are filled
  * whatever the status. */
 KSI_NODISCARD uint32_t KSI_CheckSig(char* buildBuffer, size_t size, const char** appBuild);
@@ -146,7 +154,7 @@ const char* KSI_StatusText(uint32_t status);
 #ifdef __GNUC__
 __attribute__((format(printf, 1, 2)))
 #endif
-void Warning(const char *format, ...);
+void Warning(const char* format, ...);
 
 /* Receives the whole text of a diagnostic, whatever its length; it lives until the handler returns.
  * The handler runs in the thread that says it, in the midst of a read maybe: it calls no operation

@@ -23,14 +23,19 @@
 #error "the records are read as they lie, which takes a little-endian machine"
 #endif
 
-/* "No value": all ones, of a 64-bit and of a 32-bit figure; -1 in a signed one. */
+/* "No value": all ones, of a figure of 64 bits and of one of `bits` bits; -1 in a signed one. */
 #define KSI_NO_VALUE UINT64_MAX
-#define KSI_NO_VALUE_32 UINT32_MAX
+#define KSI_NO_VALUE_OF(bits) (KSI_NO_VALUE >> (64 - (bits)))
 
 /* A limit in KB stands for none if it is negative; one of a group's allocation also above
  * KSI_GROUP_LARGEST_LIMIT, one of a user world from KSI_UW_NO_LIMIT on (compared unsigned). */
 #define KSI_GROUP_LARGEST_LIMIT INT64_C(0xFFFFFFFFF0)
 #define KSI_UW_NO_LIMIT UINT64_C(0x3FFFFFFF0)
+#define KSI_NO_LIMIT INT64_C(-1)
+
+/* A buddy allocator of memory, by its name: "memmap-03-lo" is that of memory node 3. */
+#define KSI_BUDDY_PREFIX "memmap"
+#define KSI_BUDDY_NODE_AT 7
 
 /* The memory states of a host, best first: STATE(number, identifier, name, title). */
 #define KSI_MEMORY_STATES(STATE)    \

@@ -378,7 +378,7 @@ static inline const char* KSI_FindStatusText(const char* const* texts, uint32_t 
   /* Small values are rows themselves; the base alone is neither. */
   const uint32_t row = status > KSI_STATUS_BASE ? status - KSI_STATUS_BASE : status;
   if (status >= KSI_STATUS_SERVICE_CONSOLE_BASE) return "Opaque service console status";
-  return row < (uint32_t)KSI_STATUS_TEXT_COUNT ? texts[row] : "Unknown status";
+  return row < KSI_STATUS_TEXT_COUNT ? texts[row] : "Unknown status";
 }
 
 #endif /* KNVLIBS_KSI_STATUS_TEXT_H_ */

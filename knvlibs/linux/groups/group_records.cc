@@ -11,8 +11,6 @@
 namespace ksi {
 namespace {
 
-constexpr int64_t kUnlimited = -1;
-
 Status FindGroup(const LinuxHost& host, const Keys& keys, const GroupTree*& tree,
                  const Group*& group) {
   const Status status = GroupTree::Get(host, tree);
@@ -189,7 +187,7 @@ Status ReadGroupAllocation(const LinuxHost& host, const Keys& keys, KSI_GroupAll
   record.min = FieldOf<int64_t>(reserved);
   // All ones is no limit here.
   record.max = FieldOf<int64_t>(limit);
-  record.minLimit = kUnlimited;
+  record.minLimit = KSI_NO_LIMIT;
   return kOk;
 }
 

@@ -7,8 +7,6 @@
 namespace ksi {
 namespace {
 
-constexpr int64_t kUnlimited = -1;
-
 // Fails with KSI_STATUS_NOT_FOUND if there is no such client.
 Status FindClient(const LinuxHost& host, const Keys& keys, const GroupTree*& tree,
                   const Group*& group) {
@@ -35,8 +33,8 @@ Status ReadUwTally(const LinuxHost& host, const Keys& keys, KSI_UwTally& record)
   if (status != kOk) return status;
 
   const Figure onlySwapTakes = SumOf({process.rssAnon, process.rssShmem});
-  record.max = kUnlimited;
-  record.minLimit = kUnlimited;
+  record.max = KSI_NO_LIMIT;
+  record.minLimit = KSI_NO_LIMIT;
   // All ones is no limit here; one that is too large for the field limits nothing.
   record.memSizeLimit = FieldOf<int32_t>(limit);
   record.memSize = FieldOf(process.vmSize);
