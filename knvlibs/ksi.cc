@@ -37,6 +37,7 @@ Status Guarded(Operation&& operation) {
   try {
     return operation();
   } catch (const std::bad_alloc&) {
+    Warning("out of memory\n");
     return KSI_STATUS_NO_MEMORY;
   } catch (...) {
     return KSI_STATUS_FAILURE;

@@ -1,7 +1,9 @@
 #include "knvlibs/linux/linux_source.h"
 
+#include <new>
 #include <vector>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
@@ -36,24 +38,53 @@ std::span<const ReaderTable> ReaderTables() {
   return tables;
 }
 
-void LinuxSource::BeginQuestion(ReadingSpan::Question question, const Keys& keys) {
-  if (span_.Begins(question, keys, host_.Now())) host_.BeginReading();
+// Runs an operation; without the memory for it that is told, once in a reading and without any.
+template <class Operation>
+Status LinuxSource::WithMemory(Operation&& operation) {
+  try {
+    return operation();
+  } catch (const std::bad_alloc&) {
+    if (!isMemoryTold_) Warning("out of memory: what cannot be read is left out or has no value\n");
+    isMemoryTold_ = true;
+    return KSI_STATUS_NO_MEMORY;
+  }
+}
+
+template <class Read>
+Status LinuxSource::Answer(ReadingSpan::Question question, const Keys& keys, Read&& read) {
+  Status status = WithMemory([&] {
+    if (span_.Begins(question, keys, host_.Now())) {
+      host_.BeginReading();
+      isMemoryTold_ = false;
+    }
+    host_.BeginQuestion();
+    return kOk;
+  });
+  if (status != kOk) {
+    span_.End();
+    return status;
+  }
+  status = WithMemory([&] {
+    const Status answer = read();
+    if (answer == KSI_STATUS_PERMISSION_DENIED) host_.TellDenied();
+    return answer;
+  });
+  span_.Answered(host_.Now());
+  return status;
 }
 
 Status LinuxSource::Value(const Node& node, const Keys& keys, Buffer record) {
-  BeginQuestion({IdOf(node), false}, keys);
-  const ValueReader read = ReaderOf(node).value;
-  const Status status = read == nullptr ? KSI_STATUS_NO_HANDLER : read(host_, keys, record);
-  span_.Answered(host_.Now());
-  return status;
+  return Answer({IdOf(node), false}, keys, [&]() -> Status {
+    const ValueReader read = ReaderOf(node).value;
+    return read == nullptr ? KSI_STATUS_NO_HANDLER : read(host_, keys, record);
+  });
 }
 
 Status LinuxSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
-  BeginQuestion({IdOf(node), true}, keys);
-  const ListReader read = ReaderOf(node).list;
-  const Status status = read == nullptr ? KSI_STATUS_NO_HANDLER : read(host_, keys, instances);
-  span_.Answered(host_.Now());
-  return status;
+  return Answer({IdOf(node), true}, keys, [&]() -> Status {
+    const ListReader read = ReaderOf(node).list;
+    return read == nullptr ? KSI_STATUS_NO_HANDLER : read(host_, keys, instances);
+  });
 }
 
 }  // namespace ksi

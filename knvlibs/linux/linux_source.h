@@ -26,10 +26,14 @@ class LinuxSource : public Source {
   const LinuxHost& Host() const { return host_; }
 
  private:
-  void BeginQuestion(ReadingSpan::Question question, const Keys& keys);
+  template <class Read>
+  Status Answer(ReadingSpan::Question question, const Keys& keys, Read&& read);
+  template <class Operation>
+  Status WithMemory(Operation&& operation);
 
   LinuxHost host_;
   ReadingSpan span_;
+  bool isMemoryTold_ = false;  // that there was none, in this reading
 };
 
 }  // namespace ksi

@@ -34,6 +34,9 @@ struct Reading {
   // What is left of the time that monitors may take.
   std::chrono::steady_clock::duration monitorTime = kMonitorTime;
 
+  // The first file that may not be read of those that a question takes.
+  std::string denied;
+
   // What has been said (LinuxHost::First).
   std::set<std::string, std::less<>> told;
 };

@@ -376,7 +376,7 @@ TEST_F(LinuxHostTest, SlabCachesThatMayNotBeSeenAreAStatus) {
                  "^/proc/slabinfo: permission denied\n$");
   KSI_HeapStats stats;
   ExpectAsNobody([&] { return Get("system/heaps/stats", {"dentry"}, &stats); },
-                 KSI_STATUS_PERMISSION_DENIED, "^$");
+                 KSI_STATUS_PERMISSION_DENIED, "^/proc/slabinfo: permission denied\n$");
 }
 
 TEST_F(LinuxHostTest, SlabCachesAreSeenInTheirDirectoryWhereTheFileMayNotBe) {
@@ -471,7 +471,8 @@ TEST_F(LinuxHostTest, PersistentMemoryThatMayNotBeSeenIsAStatus) {
   tree_.Lock(std::string(kNd) + "region0/size");
   KSI_PmemRegionStore store;
   ExpectAsNobody([&] { return Get("memory/pmem/volumes/regionStore/info", {"region0"}, &store); },
-                 KSI_STATUS_PERMISSION_DENIED, "^$");
+                 KSI_STATUS_PERMISSION_DENIED,
+                 "^/sys/bus/nd/devices/region0/size: permission denied\n$");
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 
 #include <cstring>
 
-#include <knvlibs/ksi.h>
 #include "knvlibs/characters.h"
 #include "knvlibs/linux/heaps/slab_cache.h"
 #include "knvlibs/linux/host/figure_file.h"
@@ -62,7 +61,6 @@ Status AddVmalloc(const LinuxHost& host, Heaps& heaps) {
 Status ListHeaps(const LinuxHost& host, const Keys& /*keys*/, ParamList& instances) {
   const Heaps* heaps = nullptr;
   Status status = host.Kept().heaps.Get(host, heaps);
-  if (status == KSI_STATUS_PERMISSION_DENIED) Warning("/proc/slabinfo: permission denied\n");
   if (status != kOk) return status;
   for (const KSI_HeapStats& record : heaps->Records()) {
     status = instances.AddText(record.name);

@@ -141,12 +141,20 @@ bool LinuxHost::First(std::string_view what) const { return reading_->told.empla
 
 Status LinuxHost::Failed(std::string_view file, int error) const {
   const Status status = StatusOfErrno(error);
-  // A reader that is denied a file may have another to turn to: it tells what goes without. A
-  // cgroup of threads has no processes of its own to list and says so by EOPNOTSUPP.
-  const bool isTold = status != KSI_STATUS_NOT_FOUND && status != KSI_STATUS_PERMISSION_DENIED &&
-                      error != EOPNOTSUPP;
-  if (isTold) TellOnce(file, error);
+  if (status == KSI_STATUS_PERMISSION_DENIED) {
+    // A reader may have another file to turn to, or tell what goes without.
+    if (reading_->denied.empty()) reading_->denied = file;
+  } else if (status != KSI_STATUS_NOT_FOUND && error != EOPNOTSUPP) {
+    // A cgroup of threads, which has no processes of its own to list, says so by EOPNOTSUPP.
+    TellOnce(file, error);
+  }
   return status;
+}
+
+void LinuxHost::BeginQuestion() { reading_->denied.clear(); }
+
+void LinuxHost::TellDenied() const {
+  if (First("denied")) Warning("%s: permission denied\n", Printable(reading_->denied).c_str());
 }
 
 void LinuxHost::TellOnce(std::string_view file, int error) const {

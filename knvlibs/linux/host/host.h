@@ -19,7 +19,7 @@ namespace ksi {
 struct Reading;
 
 // A read that fails is a status. Why it failed is told once in a reading, unless what was to be
-// read is gone or may not be read.
+// read is gone. That it may not be read is told if the answer fails for it (TellDenied).
 class LinuxHost {
  public:
   using TimePoint = std::chrono::steady_clock::time_point;
@@ -60,6 +60,9 @@ class LinuxHost {
   // files alike is told once.
   bool First(std::string_view what) const;
 
+  // Tells, once in a reading, which file may not be read: the first that the question met.
+  void TellDenied() const;
+
   // NotUnderstood, told once in a reading for all files of a kind.
   [[nodiscard]] Status NotUnderstoodOnce(std::string_view kind, std::string_view file,
                                          size_t line) const;
@@ -70,6 +73,7 @@ class LinuxHost {
   // What has been read and need not be read again until the next reading begins, which forgets it.
   Reading& Kept() const { return *reading_; }
   void BeginReading();
+  void BeginQuestion();
 
   // The size of a page in KB. Recorded trees are taken to come from a machine with pages of the
   // same size.

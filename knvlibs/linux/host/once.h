@@ -9,19 +9,18 @@
 
 namespace ksi {
 
-// Read by `kRead` when it is first asked for. A read that fails is tried again the next time.
+// Read by `kRead` when it is first asked for. A read that fails, or ends for want of memory, is
+// tried again the next time.
 template <class Part, Status (*kRead)(const LinuxHost&, Part&)>
 class Once {
  public:
   // Points `part` at it; it stays until the next reading begins.
   [[nodiscard]] Status Get(const LinuxHost& host, const Part*& part) {
-    if (!part_) {
+    if (!isRead_) {
       // Made in its place: what is read may point into itself.
       const Status status = kRead(host, part_.emplace());
-      if (status != kOk) {
-        part_.reset();
-        return status;
-      }
+      if (status != kOk) return status;
+      isRead_ = true;
     }
     part = &*part_;
     return kOk;
@@ -29,6 +28,7 @@ class Once {
 
  private:
   std::optional<Part> part_;
+  bool isRead_ = false;  // whole
 };
 
 }  // namespace ksi
