@@ -4,6 +4,7 @@
 #include "knvlibs/characters.h"
 #include "knvlibs/linux/groups/cgroup.h"
 #include "knvlibs/linux/groups/groups.h"
+#include "knvlibs/linux/groups/reader_of.h"
 #include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
@@ -152,18 +153,16 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const Group& group,
                                 : ReadCgroup(host, tree, group, *meminfo, record);
 }
 
-Status ReadGroupMemoryStats(const LinuxHost& host, const Keys& keys, KSI_GroupMemoryStats& record) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
+Status ReadGroupMemoryStats(const LinuxHost& host, const GroupTree& tree, const Group& group,
+                            KSI_GroupMemoryStats& record) {
   Figure reserved;
   Figure limit;
   Figure effective;
   Figure saved;
-  Status status = FindGroup(host, keys, tree, group);
-  if (status == kOk) status = ReadUse(host, *tree, *group, record);
-  if (status == kOk) status = ReadSettings(host, *tree, *group, reserved, limit);
-  if (status == kOk) status = ReadEffectiveReservation(host, *tree, *group, effective);
-  if (status == kOk) status = tree->ReadSharedSaved(host, *group, saved);
+  Status status = ReadUse(host, tree, group, record);
+  if (status == kOk) status = ReadSettings(host, tree, group, reserved, limit);
+  if (status == kOk) status = ReadEffectiveReservation(host, tree, group, effective);
+  if (status == kOk) status = tree.ReadSharedSaved(host, group, saved);
   if (status != kOk) return status;
 
   record.bMin = FieldOf(reserved);
@@ -176,13 +175,11 @@ Status ReadGroupMemoryStats(const LinuxHost& host, const Keys& keys, KSI_GroupMe
   return kOk;
 }
 
-Status ReadGroupAllocation(const LinuxHost& host, const Keys& keys, KSI_GroupAllocation& record) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
+Status ReadGroupAllocation(const LinuxHost& host, const GroupTree& tree, const Group& group,
+                           KSI_GroupAllocation& record) {
   Figure reserved;
   Figure limit;
-  Status status = FindGroup(host, keys, tree, group);
-  if (status == kOk) status = ReadSettings(host, *tree, *group, reserved, limit);
+  Status status = ReadSettings(host, tree, group, reserved, limit);
   if (status != kOk) return status;
   record.min = FieldOf<int64_t>(reserved);
   // All ones is no limit here.
@@ -191,17 +188,15 @@ Status ReadGroupAllocation(const LinuxHost& host, const Keys& keys, KSI_GroupAll
   return kOk;
 }
 
-Status ReadGroupCapacity(const LinuxHost& host, const Keys& keys, KSI_GroupCapacity& record) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
+Status ReadGroupCapacity(const LinuxHost& host, const GroupTree& tree, const Group& group,
+                         KSI_GroupCapacity& record) {
   Figure own;
   Figure limit;
   Figure below;
-  Status status = FindGroup(host, keys, tree, group);
-  if (status == kOk) status = ReadSettings(host, *tree, *group, own, limit);
-  if (status == kOk) status = ReadReservedBelow(host, *tree, *group, below);
+  Status status = ReadSettings(host, tree, group, own, limit);
+  if (status == kOk) status = ReadReservedBelow(host, tree, group, below);
   // What there is to reserve at the top is the whole host, if there are reservations.
-  if (status == kOk && group->id == kRootGroup && tree->Cgroups().HasReservations()) {
+  if (status == kOk && group.id == kRootGroup && tree.Cgroups().HasReservations()) {
     const FigureFile* meminfo = nullptr;
     status = host.Kept().meminfo.Get(host, meminfo);
     if (status == kOk) status = meminfo->Require("MemTotal", own.emplace());
@@ -212,83 +207,69 @@ Status ReadGroupCapacity(const LinuxHost& host, const Keys& keys, KSI_GroupCapac
   return kOk;
 }
 
-Status ReadGroupName(const LinuxHost& host, const Keys& keys, KSI_GroupName& record) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  const Status status = FindGroup(host, keys, tree, group);
-  if (status == kOk) CopyText(group->name, record.text);
-  return status;
+Status ReadGroupName(const LinuxHost& /*host*/, const GroupTree& /*tree*/, const Group& group,
+                     KSI_GroupName& record) {
+  CopyText(group.name, record.text);
+  return kOk;
 }
 
-Status ReadGroupTag(const LinuxHost& host, const Keys& keys, KSI_GroupTag& record) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  const Status status = FindGroup(host, keys, tree, group);
-  if (status == kOk) CopyText(UnitType(group->path), record.text);
-  return status;
+Status ReadGroupTag(const LinuxHost& /*host*/, const GroupTree& /*tree*/, const Group& group,
+                    KSI_GroupTag& record) {
+  CopyText(UnitType(group.path), record.text);
+  return kOk;
 }
 
-Status ReadParentGroupID(const LinuxHost& host, const Keys& keys, int64_t& id) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  const Status status = FindGroup(host, keys, tree, group);
-  if (status != kOk) return status;
+Status ReadParentGroupID(const LinuxHost& /*host*/, const GroupTree& tree, const Group& group,
+                         int64_t& id) {
   // The root is its own parent: there is no other.
-  id = group->parent == Group::kNone ? group->id : tree->At(group->parent).id;
+  id = group.parent == Group::kNone ? group.id : tree.At(group.parent).id;
   return kOk;
 }
 
-Status ReadGroupFlags(const LinuxHost& host, const Keys& keys, uint32_t& flags) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  const Status status = FindGroup(host, keys, tree, group);
-  if (status == kOk) flags = group->flags;
-  return status;
-}
-
-Status ReadGroupLeaderID(const LinuxHost& host, const Keys& keys, int32_t& pid) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  const Status status = FindGroup(host, keys, tree, group);
-  if (status != kOk) return status;
-  if (!group->IsProcess()) return KSI_STATUS_NOT_FOUND;
-  pid = tree->ProcessOf(*group).pid;
+Status ReadGroupFlags(const LinuxHost& /*host*/, const GroupTree& /*tree*/, const Group& group,
+                      uint32_t& flags) {
+  flags = group.flags;
   return kOk;
 }
 
-Status ListChildGroups(const LinuxHost& host, const Keys& keys, ParamList& instances) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  Status status = FindGroup(host, keys, tree, group);
-  if (status != kOk) return status;
-  instances.Reserve(group->children.size());
-  for (const size_t child : group->children) {
-    if (status == kOk) status = instances.AddNumber(static_cast<uint64_t>(tree->At(child).id));
+Status ReadGroupLeaderID(const LinuxHost& /*host*/, const GroupTree& tree, const Group& group,
+                         int32_t& pid) {
+  if (!group.IsProcess()) return KSI_STATUS_NOT_FOUND;
+  pid = tree.ProcessOf(group).pid;
+  return kOk;
+}
+
+Status ListChildGroups(const LinuxHost& /*host*/, const GroupTree& tree, const Group& group,
+                       ParamList& instances) {
+  Status status = kOk;
+  instances.Reserve(group.children.size());
+  for (const size_t child : group.children) {
+    if (status == kOk) status = instances.AddNumber(static_cast<uint64_t>(tree.At(child).id));
   }
   return status;
 }
 
-Status ListGroupClients(const LinuxHost& host, const Keys& keys, ParamList& instances) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  const Status status = FindGroup(host, keys, tree, group);
-  if (status != kOk) return status;
+Status ListGroupClients(const LinuxHost& /*host*/, const GroupTree& tree, const Group& group,
+                        ParamList& instances) {
   // The monitor is no client beside its virtual machine.
-  if (!group->IsProcess() || group->kind == Group::Kind::kVmm) return kOk;
-  return instances.AddNumber(static_cast<uint64_t>(tree->ProcessOf(*group).pid));
+  if (!group.IsProcess() || group.kind == Group::Kind::kVmm) return kOk;
+  return instances.AddNumber(static_cast<uint64_t>(tree.ProcessOf(group).pid));
 }
 
+template <auto read>
+constexpr auto OfGroup = ReaderOf<FindGroup, read>::Read;
+
 constexpr Reader kReaders[] = {
-    ValueOf<node::sched_groups_groupName, ReadGroupName>(),
-    ValueOf<node::sched_groups_groupTag, ReadGroupTag>(),
-    ValueOf<node::sched_groups_parentGroupID, ReadParentGroupID>(),
-    ValueOf<node::sched_groups_groupFlags, ReadGroupFlags>(),
-    ValueOf<node::sched_groups_groupLeaderID, ReadGroupLeaderID>(),
-    ValueOf<node::sched_groups_memAllocationInKB, ReadGroupAllocation>(),
-    ValueOf<node::sched_groups_stats_capacity, ReadGroupCapacity>(),
-    ValueOf<node::sched_groups_stats_memoryStats, ReadGroupMemoryStats>(),
-    ListOf<node::sched_groups_members_groups>(ListChildGroups),
-    ListOf<node::sched_groups_members_memClients>(ListGroupClients),
+    ValueOf<node::sched_groups_groupName, OfGroup<ReadGroupName>>(),
+    ValueOf<node::sched_groups_groupTag, OfGroup<ReadGroupTag>>(),
+    ValueOf<node::sched_groups_parentGroupID, OfGroup<ReadParentGroupID>>(),
+    ValueOf<node::sched_groups_groupFlags, OfGroup<ReadGroupFlags>>(),
+    ValueOf<node::sched_groups_groupLeaderID, OfGroup<ReadGroupLeaderID>>(),
+    ValueOf<node::sched_groups_memAllocationInKB, OfGroup<ReadGroupAllocation>>(),
+    ValueOf<node::sched_groups_stats_capacity, OfGroup<ReadGroupCapacity>>(),
+    ValueOf<node::sched_groups_stats_memoryStats, OfGroup<ReadGroupMemoryStats>>(),
+    ListOf<node::sched_groups_members_groups>(OfGroup<ListChildGroups>),
+    ListOf<node::sched_groups_members_memClients>(OfGroup<ListGroupClients>),
 };
 
 }  // namespace

@@ -1,6 +1,7 @@
 // A user world is a process. tally-linux(7) says where each figure comes from and why.
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/groups.h"
+#include "knvlibs/linux/groups/reader_of.h"
 #include "knvlibs/linux/groups/smaps.h"
 #include "knvlibs/linux/reader_tables.h"
 
@@ -16,19 +17,16 @@ Status FindClient(const LinuxHost& host, const Keys& keys, const GroupTree*& tre
   return group == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
-Status ReadUwTally(const LinuxHost& host, const Keys& keys, KSI_UwTally& record) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  Status status = FindClient(host, keys, tree, group);
-  if (status != kOk) return status;
-  if (group->kind != Group::Kind::kUserWorld) return KSI_STATUS_NOT_FOUND;
+Status ReadUwTally(const LinuxHost& host, const GroupTree& tree, const Group& group,
+                   KSI_UwTally& record) {
+  if (group.kind != Group::Kind::kUserWorld) return KSI_STATUS_NOT_FOUND;
 
-  const Process& process = tree->ProcessOf(*group);
+  const Process& process = tree.ProcessOf(group);
   Figure limit;
   Figure saved;
   Smaps smaps;
-  status = ReadAddressSpaceLimit(host, process.pid, limit);
-  if (status == kOk) status = tree->ReadSharedSaved(host, *group, saved);
+  Status status = ReadAddressSpaceLimit(host, process.pid, limit);
+  if (status == kOk) status = tree.ReadSharedSaved(host, group, saved);
   if (status == kOk) status = ReadSmapsRollup(host, process.pid, smaps);
   if (status != kOk) return status;
 
@@ -54,27 +52,28 @@ Status ReadUwTally(const LinuxHost& host, const Keys& keys, KSI_UwTally& record)
   return kOk;
 }
 
-Status ReadCommonTally(const LinuxHost& host, const Keys& keys, KSI_CommonTally& /*record*/) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  return FindClient(host, keys, tree, group);
+Status ReadCommonTally(const LinuxHost& /*host*/, const GroupTree& /*tree*/, const Group& /*group*/,
+                       KSI_CommonTally& /*record*/) {
+  return kOk;
 }
 
 // Linux moves pages at once, when it moves them: no client has a type of remapping that waits.
-Status ListRemapTypes(const LinuxHost& host, const Keys& keys, ParamList& /*instances*/) {
-  const GroupTree* tree = nullptr;
-  const Group* group = nullptr;
-  return FindClient(host, keys, tree, group);
+Status ListRemapTypes(const LinuxHost& /*host*/, const GroupTree& /*tree*/, const Group& /*group*/,
+                      ParamList& /*instances*/) {
+  return kOk;
 }
 
 Status ReadRemapType(const LinuxHost& /*host*/, const Keys& /*keys*/, KSI_RemapType& /*record*/) {
   return KSI_STATUS_NOT_FOUND;
 }
 
+template <auto read>
+constexpr auto OfClient = ReaderOf<FindClient, read>::Read;
+
 constexpr Reader kReaders[] = {
-    ValueOf<node::sched_memClients_tally_totalCommon, ReadCommonTally>(),
-    ValueOf<node::sched_memClients_tally_uw, ReadUwTally>(),
-    ListOf<node::sched_memClients_remapTypes>(ListRemapTypes),
+    ValueOf<node::sched_memClients_tally_totalCommon, OfClient<ReadCommonTally>>(),
+    ValueOf<node::sched_memClients_tally_uw, OfClient<ReadUwTally>>(),
+    ListOf<node::sched_memClients_remapTypes>(OfClient<ListRemapTypes>),
     ValueOf<node::sched_memClients_remapTypes, ReadRemapType>(),
 };
 

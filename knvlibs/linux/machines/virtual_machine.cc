@@ -6,6 +6,7 @@
 #include "knvlibs/linux/groups/cgroup.h"
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/process_ksm.h"
+#include "knvlibs/linux/groups/reader_of.h"
 #include "knvlibs/linux/reader_tables.h"
 
 namespace ksi {
@@ -88,20 +89,18 @@ void FillBalloon(const GuestMemory& guest, Figure memory, KSI_VmmTally& record) 
   }
 }
 
-Status ReadVmmTally(const LinuxHost& host, const Keys& keys, KSI_VmmTally& record) {
-  const GroupTree* tree = nullptr;
-  const VirtualMachine* machine = nullptr;
+Status ReadVmmTally(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                    KSI_VmmTally& record) {
   const GuestMapping* mapping = nullptr;
   ProcessKsm ksm;
   MemcgEvents events;
-  Status status = FindMachine(host, keys, tree, machine);
-  if (status == kOk) status = GetMapping(host, *machine, mapping);
-  if (status == kOk) status = ReadProcessKsm(host, machine->pid, ksm);
-  if (status == kOk) status = ReadOwnEvents(host, *tree, *machine, events);
+  Status status = GetMapping(host, machine, mapping);
+  if (status == kOk) status = ReadProcessKsm(host, machine.pid, ksm);
+  if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
   if (status != kOk) return status;
   SettleCompression(host, events);
 
-  const QemuCommandLine& line = machine->commandLine;
+  const QemuCommandLine& line = machine.commandLine;
   const Figure memory = line.memory ? line.memory : mapping->size;
   record.memSize = FieldOf(memory);
   record.memSizeLimit = FieldOf(line.maxMemory ? line.maxMemory : memory);
@@ -113,32 +112,27 @@ Status ReadVmmTally(const LinuxHost& host, const Keys& keys, KSI_VmmTally& recor
   record.sharedSaved = FieldOf(ksm.Saved());
   record.zipped = FieldOf(events.zswapped);
   record.zipSaved = FieldOf(DifferenceOf(events.zswapped, events.zswapPool));
-  FillBalloon(GetGuest(host, *machine), memory, record);
+  FillBalloon(GetGuest(host, machine), memory, record);
   return kOk;
 }
 
-Status ReadGuestTally(const LinuxHost& host, const Keys& keys, KSI_GuestTally& record) {
-  const GroupTree* tree = nullptr;
-  const VirtualMachine* machine = nullptr;
-  const Status status = FindMachine(host, keys, tree, machine);
-  if (status != kOk) return status;
-  const GuestMemory& guest = GetGuest(host, *machine);
+Status ReadGuestTally(const LinuxHost& host, const GroupTree& /*tree*/,
+                      const VirtualMachine& machine, KSI_GuestTally& record) {
+  const GuestMemory& guest = GetGuest(host, machine);
   record.memTotal = FieldOf(guest.total);
   record.lpageTotal = FieldOf<uint32_t>(std::nullopt);
   record.memNeeded = FieldOf(DifferenceOf(guest.total, guest.available));
   return kOk;
 }
 
-Status ReadSwapInfo(const LinuxHost& host, const Keys& keys, KSI_SwapInfo& record) {
-  const GroupTree* tree = nullptr;
-  const VirtualMachine* machine = nullptr;
+Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                    KSI_SwapInfo& record) {
   const GuestMapping* mapping = nullptr;
   ProcessKsm ksm;
   MemcgEvents events;
-  Status status = FindMachine(host, keys, tree, machine);
-  if (status == kOk) status = GetMapping(host, *machine, mapping);
-  if (status == kOk) status = ReadProcessKsm(host, machine->pid, ksm);
-  if (status == kOk) status = ReadOwnEvents(host, *tree, *machine, events);
+  Status status = GetMapping(host, machine, mapping);
+  if (status == kOk) status = ReadProcessKsm(host, machine.pid, ksm);
+  if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
   if (status != kOk) return status;
 
   record.swapped = FieldOf(mapping->smaps.swap);
@@ -155,12 +149,10 @@ Status ReadSwapInfo(const LinuxHost& host, const Keys& keys, KSI_SwapInfo& recor
   return kOk;
 }
 
-Status ReadMemzipInfo(const LinuxHost& host, const Keys& keys, KSI_MemzipInfo& record) {
-  const GroupTree* tree = nullptr;
-  const VirtualMachine* machine = nullptr;
+Status ReadMemzipInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                      KSI_MemzipInfo& record) {
   MemcgEvents events;
-  Status status = FindMachine(host, keys, tree, machine);
-  if (status == kOk) status = ReadOwnEvents(host, *tree, *machine, events);
+  Status status = ReadOwnEvents(host, tree, machine, events);
   if (status != kOk) return status;
   SettleCompression(host, events);
 
@@ -183,15 +175,13 @@ Status ReadTransparent(const LinuxHost& host, Figure& swapThreshold) {
                               swapThreshold);
 }
 
-Status ReadVmLargePages(const LinuxHost& host, const Keys& keys, KSI_VmLargePages& record) {
-  const GroupTree* tree = nullptr;
-  const VirtualMachine* machine = nullptr;
+Status ReadVmLargePages(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                        KSI_VmLargePages& record) {
   const GuestMapping* mapping = nullptr;
   MemcgEvents events;
   Figure threshold;
-  Status status = FindMachine(host, keys, tree, machine);
-  if (status == kOk) status = GetMapping(host, *machine, mapping);
-  if (status == kOk) status = ReadOwnEvents(host, *tree, *machine, events);
+  Status status = GetMapping(host, machine, mapping);
+  if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
   if (status == kOk) status = ReadTransparent(host, threshold);
   if (status != kOk) return status;
 
@@ -210,13 +200,11 @@ Status ReadVmLargePages(const LinuxHost& host, const Keys& keys, KSI_VmLargePage
   return kOk;
 }
 
-Status ReadVmmLeaderID(const LinuxHost& host, const Keys& keys, int32_t& pid) {
-  const GroupTree* tree = nullptr;
-  const VirtualMachine* machine = nullptr;
-  const Status status = FindMachine(host, keys, tree, machine);
+Status ReadVmmLeaderID(const LinuxHost& /*host*/, const GroupTree& /*tree*/,
+                       const VirtualMachine& machine, int32_t& pid) {
   // QEMU is one process: its monitor is led by the same.
-  if (status == kOk) pid = machine->pid;
-  return status;
+  pid = machine.pid;
+  return kOk;
 }
 
 Status ReadNumVMs(const LinuxHost& host, const Keys& /*keys*/, uint32_t& count) {
@@ -226,13 +214,16 @@ Status ReadNumVMs(const LinuxHost& host, const Keys& /*keys*/, uint32_t& count) 
   return status;
 }
 
+template <auto read>
+constexpr auto OfMachine = ReaderOf<FindMachine, read>::Read;
+
 constexpr Reader kReaders[] = {
-    ValueOf<node::sched_memClients_tally_vmm, ReadVmmTally>(),
-    ValueOf<node::sched_memClients_tally_guest, ReadGuestTally>(),
-    ValueOf<node::sched_memClients_swapInfo, ReadSwapInfo>(),
-    ValueOf<node::sched_memClients_memzipInfo, ReadMemzipInfo>(),
-    ValueOf<node::memory_lpage_vmLPage, ReadVmLargePages>(),
-    ValueOf<node::worldGroups_vmmLeaderID, ReadVmmLeaderID>(),
+    ValueOf<node::sched_memClients_tally_vmm, OfMachine<ReadVmmTally>>(),
+    ValueOf<node::sched_memClients_tally_guest, OfMachine<ReadGuestTally>>(),
+    ValueOf<node::sched_memClients_swapInfo, OfMachine<ReadSwapInfo>>(),
+    ValueOf<node::sched_memClients_memzipInfo, OfMachine<ReadMemzipInfo>>(),
+    ValueOf<node::memory_lpage_vmLPage, OfMachine<ReadVmLargePages>>(),
+    ValueOf<node::worldGroups_vmmLeaderID, OfMachine<ReadVmmLeaderID>>(),
     ValueOf<node::sched_globalStats_numVMs, ReadNumVMs>(),
 };
 
