@@ -112,6 +112,11 @@ FAILING_OPEN(open, (const char* path, int flags, ...), (path, flags, mode))
 FAILING_OPEN(open64, (const char* path, int flags, ...), (path, flags, mode))
 FAILING_OPEN(openat, (int at, const char* path, int flags, ...), (at, path, flags, mode))
 FAILING_OPEN(openat64, (int at, const char* path, int flags, ...), (at, path, flags, mode))
+/* What these are called in a fortified program. */
+FAILING(kOpen, int, __open_2, (const char* path, int flags), (path, flags))
+FAILING(kOpen, int, __open64_2, (const char* path, int flags), (path, flags))
+FAILING(kOpen, int, __openat_2, (int at, const char* path, int flags), (at, path, flags))
+FAILING(kOpen, int, __openat64_2, (int at, const char* path, int flags), (at, path, flags))
 
 FAILING(kRead, ssize_t, read, (int fd, void* to, size_t size), (fd, to, size))
 FAILING(kRead, ssize_t, pread, (int fd, void* to, size_t size, off_t at), (fd, to, size, at))

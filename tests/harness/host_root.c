@@ -36,3 +36,9 @@ static const char* Below(const char* path, char buffer[PATH_MAX]) {
 
 SHOWING_OPEN(open)
 SHOWING_OPEN(open64)
+
+/* What these are called in a fortified program. */
+int __open_2(const char* path, int flags);
+int __open64_2(const char* path, int flags);
+int __open_2(const char* path, int flags) { return open(path, flags); }
+int __open64_2(const char* path, int flags) { return open64(path, flags); }
