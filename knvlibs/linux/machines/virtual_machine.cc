@@ -59,6 +59,20 @@ Status ReadOwnEvents(const LinuxHost& host, const GroupTree& tree, const Virtual
   return tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
 }
 
+// What the kernel tells of a machine's use of memory, by its process and by its own cgroup.
+struct MachineUse {
+  const GuestMapping* mapping = nullptr;
+  ProcessKsm ksm;
+  MemcgEvents events;
+};
+
+Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+               MachineUse& use) {
+  Status status = GetMapping(host, machine, use.mapping);
+  if (status == kOk) status = ReadProcessKsm(host, machine.pid, use.ksm);
+  return status == kOk ? ReadOwnEvents(host, tree, machine, use.events) : status;
+}
+
 // Without a compressed cache for swap on the host nothing of any machine is compressed.
 void SettleCompression(const LinuxHost& host, MemcgEvents& events) {
   std::string enabled;
@@ -91,27 +105,24 @@ void FillBalloon(const GuestMemory& guest, Figure memory, KSI_VmmTally& record) 
 
 Status ReadVmmTally(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                     KSI_VmmTally& record) {
-  const GuestMapping* mapping = nullptr;
-  ProcessKsm ksm;
-  MemcgEvents events;
-  Status status = GetMapping(host, machine, mapping);
-  if (status == kOk) status = ReadProcessKsm(host, machine.pid, ksm);
-  if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
+  MachineUse use;
+  const Status status = ReadUse(host, tree, machine, use);
   if (status != kOk) return status;
-  SettleCompression(host, events);
+  SettleCompression(host, use.events);
 
   const QemuCommandLine& line = machine.commandLine;
-  const Figure memory = line.memory ? line.memory : mapping->size;
+  const Figure memory = line.memory ? line.memory : use.mapping->size;
   record.memSize = FieldOf(memory);
   record.memSizeLimit = FieldOf(line.maxMemory ? line.maxMemory : memory);
-  record.touched = FieldOf(mapping->smaps.referenced);
+  record.touched = FieldOf(use.mapping->smaps.referenced);
   // The kernel's zero page backs guest memory too, but does not count as resident.
-  record.mapped = FieldOf(SumOf({mapping->smaps.rss, mapping->smaps.hugetlb, ksm.zeroPages}));
-  record.shared = FieldOf(ksm.Saved());
-  record.zero = FieldOf(ksm.zeroPages);
-  record.sharedSaved = FieldOf(ksm.Saved());
-  record.zipped = FieldOf(events.zswapped);
-  record.zipSaved = FieldOf(DifferenceOf(events.zswapped, events.zswapPool));
+  record.mapped =
+      FieldOf(SumOf({use.mapping->smaps.rss, use.mapping->smaps.hugetlb, use.ksm.zeroPages}));
+  record.shared = FieldOf(use.ksm.Saved());
+  record.zero = FieldOf(use.ksm.zeroPages);
+  record.sharedSaved = FieldOf(use.ksm.Saved());
+  record.zipped = FieldOf(use.events.zswapped);
+  record.zipSaved = FieldOf(DifferenceOf(use.events.zswapped, use.events.zswapPool));
   FillBalloon(GetGuest(host, machine), memory, record);
   return kOk;
 }
@@ -127,23 +138,19 @@ Status ReadGuestTally(const LinuxHost& host, const GroupTree& /*tree*/,
 
 Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                     KSI_SwapInfo& record) {
-  const GuestMapping* mapping = nullptr;
-  ProcessKsm ksm;
-  MemcgEvents events;
-  Status status = GetMapping(host, machine, mapping);
-  if (status == kOk) status = ReadProcessKsm(host, machine.pid, ksm);
-  if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
+  MachineUse use;
+  const Status status = ReadUse(host, tree, machine, use);
   if (status != kOk) return status;
 
-  record.swapped = FieldOf(mapping->smaps.swap);
-  record.swapRead = FieldOf(events.swapcached);
-  record.swapIn = FieldOf(events.swpin);
-  record.swapOut = FieldOf(events.swpout);
+  record.swapped = FieldOf(use.mapping->smaps.swap);
+  record.swapRead = FieldOf(use.events.swapcached);
+  record.swapIn = FieldOf(use.events.swpin);
+  record.swapOut = FieldOf(use.events.swpout);
   // Linux swaps all to the same places.
   record.gblSwapRead = record.swapRead;
   record.gblSwapIn = record.swapIn;
   record.gblSwapOut = record.swapOut;
-  record.COWSwapper = FieldOf(ksm.merged == 0u ? Figure(0) : std::nullopt);
+  record.COWSwapper = FieldOf(use.ksm.merged == 0u ? Figure(0) : std::nullopt);
   // It is always the kernel that swaps.
   record.curSwapper = 1;
   return kOk;
