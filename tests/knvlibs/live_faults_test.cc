@@ -12,6 +12,7 @@
 #include <string>
 
 #include "tests/harness/program.h"
+#include "tests/harness/report_names.h"
 #include "tests/harness/tally.h"
 #include "tests/knvlibs/host_tree.h"
 
@@ -76,19 +77,8 @@ TEST_P(LiveFaults, AreToldOnce) {
   }
 }
 
-std::string NameOf(const testing::TestParamInfo<const char*>& report) {
-  std::string name = report.param;
-  std::erase(name, '-');
-  return name;
-}
-
-INSTANTIATE_TEST_SUITE_P(Reports, LiveFaults,
-                         testing::Values("group-stats", "vm-stats", "uw-stats", "swap-stats",
-                                         "guest-stats", "zip-stats", "lpage-stats",
-                                         "asyncremap-stats", "comp-stats", "pshare-stats",
-                                         "pshareHint-stats", "buddy-stats", "lpool-stats",
-                                         "heap-stats", "pmem-stats"),
-                         NameOf);
+INSTANTIATE_TEST_SUITE_P(Reports, LiveFaults, testing::ValuesIn(harness::kReportNames),
+                         harness::NameOf);
 
 }  // namespace
 }  // namespace ksi

@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "tests/harness/program.h"
+#include "tests/harness/report_names.h"
 #include "tests/harness/tally.h"
 #include "tests/knvlibs/cache_fixture.h"
 
@@ -118,19 +119,10 @@ TEST_P(SystemFaults, AreToldAndChangeNoFigure) {
   }
 }
 
-std::string NameOf(const testing::TestParamInfo<const char*>& command) {
-  std::string name = command.param;
-  std::erase(name, '-');
-  return name;
-}
-
-INSTANTIATE_TEST_SUITE_P(Commands, SystemFaults,
-                         testing::Values("group-stats", "vm-stats", "uw-stats", "swap-stats",
-                                         "guest-stats", "zip-stats", "lpage-stats",
-                                         "asyncremap-stats", "comp-stats", "pshare-stats",
-                                         "pshareHint-stats", "buddy-stats", "lpool-stats",
-                                         "heap-stats", "pmem-stats", "info", "check", "dump"),
-                         NameOf);
+INSTANTIATE_TEST_SUITE_P(Reports, SystemFaults, testing::ValuesIn(harness::kReportNames),
+                         harness::NameOf);
+INSTANTIATE_TEST_SUITE_P(Commands, SystemFaults, testing::Values("info", "check", "dump"),
+                         harness::NameOf);
 
 }  // namespace
 }  // namespace ksi
