@@ -9,12 +9,13 @@
 #include <string>
 
 #include "knvlibs/linux/groups/groups.h"
-#include "knvlibs/linux/groups/process_ksm.h"
 #include "knvlibs/linux/heaps/heaps.h"
 #include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/host/once.h"
+#include "knvlibs/linux/host/walk_time.h"
 #include "knvlibs/linux/machines/qmp.h"
 #include "knvlibs/linux/memory/buddyinfo.h"
+#include "knvlibs/linux/memory/ksm.h"
 #include "knvlibs/linux/memory/memory_nodes.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
 #include "knvlibs/linux/pmem/nvdimm.h"
@@ -28,11 +29,14 @@ struct Reading {
   Once<Buddies, ReadBuddies> buddies;
   Once<Heaps, ReadHeaps> heaps;
   Once<NvdimmDevices, ReadNvdimmDevices> nvdimms;
-  Once<bool, ReadIsSharing> isSharing;
+  Once<Ksm, ReadKsm> ksm;
   Once<GroupTree, GroupTree::Read> groups;
 
   // What is left of the time that monitors may take.
   std::chrono::steady_clock::duration monitorTime = kMonitorTime;
+
+  // What is left of the processor's time that walks may take.
+  std::chrono::nanoseconds walkTime = kWalkTime;
 
   // The first file that may not be read of those that a question takes.
   std::string denied;

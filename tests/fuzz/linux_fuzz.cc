@@ -42,7 +42,7 @@ constexpr HostFile kFiles[] = {
     {kNew, "proc/2100/smaps", "sched/memClients"},
     {kNew, "proc/2100/ksm_stat", "sched/"},
     {kNew, "proc/2100/limits", "sched/"},
-    {kNew, "proc/1500/smaps_rollup", "sched/memClients"},
+    {kNew, "sys/kernel/mm/ksm/pages_shared", "sched/"},
     {kNew, "run/libvirt/qemu/web.monitor", "sched/memClients"},
     {kNew, "cgroup.procs", "sched/"},
     {kNew, "memory.stat", "sched/"},

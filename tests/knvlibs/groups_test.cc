@@ -59,18 +59,25 @@ class GroupsTest : public testing::Test {
     tree_.Write(directory + "memory.max", "max\n");
   }
 
+  // Page sharing on the host.
+  void WriteSharing(const std::string& shared, const std::string& sharing,
+                    const std::string& zero) {
+    const std::string directory = "/sys/kernel/mm/ksm/";
+    tree_.Write(directory + "pages_shared", shared + "\n");
+    tree_.Write(directory + "pages_sharing", sharing + "\n");
+    tree_.Write(directory + "full_scans", "3\n");
+    tree_.Write(directory + "ksm_zero_pages", zero + "\n");
+  }
+
   void WriteProcess(int32_t pid, const std::string& name, const std::string& more = "") {
     tree_.Write(ProcessFile(pid, "status"),
                 "Name:\t" + name + "\nState:\tS (sleeping)\nPPid:\t1\n" + more +
-                    "VmPeak:\t 900 kB\nVmSize:\t 800 kB\n"
+                    "VmPeak:\t 900 kB\nVmSize:\t 800 kB\nVmLck:\t 30 kB\nVmPin:\t 7 kB\n"
                     "VmHWM:\t 500 kB\nVmRSS:\t 400 kB\nRssAnon:\t 100 kB\n"
                     "RssFile:\t 290 kB\nRssShmem:\t 10 kB\n"
-                    "VmPTE:\t 12 kB\nVmSwap:\t 20 kB\nThreads:\t1\n");
+                    "VmPTE:\t 12 kB\nVmSwap:\t 20 kB\nHugetlbPages:\t 0 kB\nThreads:\t1\n");
     tree_.Write(ProcessFile(pid, "limits"),
                 "Max address space         unlimited            unlimited            bytes     \n");
-    tree_.Write(ProcessFile(pid, "smaps_rollup"),
-                "0-1000 ---p 00000000 00:00 0          [rollup]\nRss: 400 kB\nReferenced: 300 kB\n"
-                "Private_Clean: 60 kB\nPrivate_Dirty: 100 kB\nLocked: 0 kB\n");
   }
 
   template <class Record>
@@ -251,27 +258,35 @@ TEST_F(GroupsTest, ACgroupWithoutTheControllerHasNoFigures) {
   EXPECT_EQ(uint64_t{stats.bMin}, 0u);
 }
 
-TEST_F(GroupsTest, WhatVanishesAfterTheScanIsNotFound) {
+TEST_F(GroupsTest, ACgroupThatVanishesAfterTheScanIsNotFound) {
   LinuxSource source(tree_.Root());
   EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
-  std::filesystem::remove_all(tree_.Root() + "/proc/100");
   std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup/jobs");
-  KSI_UwTally tally = {};
-  EXPECT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
-            KSI_STATUS_NOT_FOUND);
   KSI_GroupMemoryStats stats = {};
   EXPECT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kJobs}, &stats),
             KSI_STATUS_NOT_FOUND);
 }
 
-TEST_F(GroupsTest, AnEndedProcessIsNotFoundThoughItWaits) {
-  LinuxSource source(tree_.Root());
-  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
-  std::filesystem::remove(tree_.Root() + "/proc/100/smaps_rollup");
-  tree_.Write("/proc/100/status", "Name:\tworker\nState:\tZ (zombie)\nPPid:\t1\n");
-  KSI_UwTally tally = {};
-  EXPECT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally),
-            KSI_STATUS_NOT_FOUND);
+TEST_F(GroupsTest, AProcessThatEndsAfterTheScanIsShownAsItWas) {
+  for (const char* shared : {"0", "5"}) {
+    WriteProcess(kPid, "worker");
+    WriteSharing(shared, shared, "0");
+    LinuxSource source(tree_.Root());
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
+    std::filesystem::remove_all(tree_.Root() + "/proc/100");
+    KSI_UwTally tally = {};
+    ASSERT_EQ(GetValue(source, "sched/memClients/tally/uw", {int64_t{kPid}}, &tally), kOk);
+    EXPECT_EQ(uint64_t{tally.memSize}, 800u);
+    EXPECT_EQ(int32_t{tally.memSizeLimit}, -1);
+    // What it shared nobody can tell any more.
+    const bool sharedNothing = *shared == '0';
+    EXPECT_EQ(uint64_t{tally.mapped}, sharedNothing ? 400u : kNoValue);
+    EXPECT_EQ(uint64_t{tally.sharedSaved}, 0u);
+    KSI_GroupMemoryStats stats = {};
+    ASSERT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kProcessGroup + kPid}, &stats),
+              kOk);
+    EXPECT_EQ(uint64_t{stats.sharedSaved}, sharedNothing ? 0u : kNoValue);
+  }
 }
 
 TEST_F(GroupsTest, WhatIsNotUnderstoodIsToldOnceAndLeftOut) {
@@ -319,8 +334,12 @@ TEST_F(GroupsTest, WhatCannotBeReadIsToldOnceInAReadingAndLeftOut) {
 TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
   WriteProcess(101, "other");
   WriteProcess(102, "hidden");
-  tree_.Lock("/proc/100/smaps_rollup");
-  tree_.Lock("/proc/101/smaps_rollup");
+  WriteSharing("1", "1", "0");
+  for (const char* pid : {"100", "101"}) {
+    const std::string file = std::string("/proc/") + pid + "/ksm_stat";
+    tree_.Write(file, "ksm_merging_pages 1\n");
+    tree_.Lock(file);
+  }
   tree_.Lock("/proc/102/status");
   const auto asNobody = [&] {
     constexpr uid_t kNobody = 65534;
@@ -330,8 +349,9 @@ TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
     for (const int64_t pid : {100, 101}) {
       KSI_UwTally tally = {};
       isRight = isRight && GetValue(source, "sched/memClients/tally/uw", {pid}, &tally) == kOk;
-      isRight = isRight && tally.mapped == 400 && tally.touched == kNoValue &&
-                tally.swappable == kNoValue && tally.pinned == kNoValue;
+      // Readers make "no value" of the two for what is consumed.
+      isRight = isRight && tally.memSize == 800 && tally.mapped == kNoValue &&
+                tally.sharedSaved == 0 && tally.pinned == 37;
     }
     KSI_GroupName name = {};
     isRight = isRight && GetValue(source, "sched/groups/groupName", {kProcessGroup + 102}, &name) ==
@@ -341,8 +361,7 @@ TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
   EXPECT_EXIT(
       asNobody(), testing::ExitedWithCode(0),
       "^/proc/PID/status: not permitted for some processes: they are left out\n"
-      "/proc/100/smaps_rollup: not permitted: figures that take a walk of a process's memory "
-      "have no value where it is not\n$");
+      "/proc/PID/ksm_stat: not permitted for some processes: their shared memory has no value\n$");
 }
 
 TEST_F(GroupsTest, WhatIsBelowALockedCgroupIsLeftOutWithAWord) {
@@ -375,11 +394,79 @@ TEST_F(GroupsTest, ALockedCgroupIsDeniedAndNoZero) {
               "^/sys/fs/cgroup/jobs/memory.current: permission denied\n$");
 }
 
-TEST_F(GroupsTest, AKernelThatDoesNotWalkMemoryHasNoValueForIt) {
-  std::filesystem::remove(tree_.Root() + "/proc/100/smaps_rollup");
+TEST_F(GroupsTest, AUserWorldIsWalkedForNothing) {
   const auto tally = Get<KSI_UwTally>("sched/memClients/tally/uw", kPid);
   EXPECT_EQ(uint64_t{tally.mapped}, 400u);
   EXPECT_EQ(uint64_t{tally.touched}, kNoValue);
+  EXPECT_EQ(uint64_t{tally.swappable}, kNoValue);
+}
+
+TEST_F(GroupsTest, WhatIsLockedOrPinnedOrHugeIsNotSwappedAndInMemory) {
+  const auto pinned = [&](const std::string& sizes) {
+    WriteProcess(kPid, "worker", sizes);
+    return uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned};
+  };
+  EXPECT_EQ(pinned(""), 37u);
+  tree_.Write("/proc/100/status",
+              "Name:\tx\nVmSize:\t 800 kB\nVmLck:\t 30 kB\nVmPin:\t 7 kB\nVmRSS:\t 40 kB\n"
+              "HugetlbPages:\t 64 kB\nThreads:\t1\n");
+  EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, 101u);
+  // Locked when it comes into memory.
+  tree_.Write("/proc/100/status",
+              "Name:\tx\nVmSize:\t 800 kB\nVmLck:\t 700 kB\nVmPin:\t 0 kB\nVmRSS:\t 40 kB\n");
+  EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, 40u);
+}
+
+// Page sharing on the host: 20 pages stand for 100, and 8 zero pages for as many.
+class SharingTest : public GroupsTest {
+ protected:
+  SharingTest() { WriteSharing("20", "80", "8"); }
+
+  KSI_UwTally Tally(int32_t pid, const std::string& stat) {
+    tree_.Write(ProcessFile(pid, "ksm_stat"), stat);
+    return Get<KSI_UwTally>("sched/memClients/tally/uw", pid);
+  }
+};
+
+TEST_F(SharingTest, OfThePagesThatShareOneStays) {
+  const auto tally = Tally(kPid, "ksm_merging_pages 50\nksm_zero_pages 3\n");
+  EXPECT_EQ(uint64_t{tally.sharedSaved}, 4 * (50u * 80 / 100 + 3));
+  EXPECT_EQ(uint64_t{tally.mapped}, 400u + 4 * 3) << "zero pages do not count as resident";
+}
+
+TEST_F(SharingTest, WhatAllSaveIsWhatTheHostReclaimed) {
+  WriteProcess(101, "other");
+  tree_.Write("/sys/fs/cgroup/jobs/cgroup.procs", "100\n101\n");
+  tree_.Write("/proc/100/ksm_stat", "ksm_merging_pages 25\nksm_zero_pages 3\n");
+  tree_.Write("/proc/101/ksm_stat", "ksm_merging_pages 75\nksm_zero_pages 5\n");
+  const auto jobs = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kJobs);
+  LinuxSource source(tree_.Root());
+  KSI_PshareStats host = {};
+  ASSERT_EQ(GetValue(source, "memory/pshare/stats", {}, &host), kOk);
+  EXPECT_EQ(uint64_t{host.reclaimed}, 88u);
+  EXPECT_EQ(uint64_t{jobs.sharedSaved}, 4 * 88u);
+}
+
+TEST_F(SharingTest, ZeroPagesThatTheKernelDoesNotCountVoidNothing) {
+  std::filesystem::remove(tree_.Root() + "/sys/kernel/mm/ksm/ksm_zero_pages");
+  for (const char* used : {"0", "1"}) {
+    tree_.Write("/sys/kernel/mm/ksm/use_zero_pages", used);
+    const auto tally = Tally(kPid, "ksm_merging_pages 50\n");
+    EXPECT_EQ(uint64_t{tally.sharedSaved}, 160u);
+    EXPECT_EQ(uint64_t{tally.mapped}, 400u);
+  }
+}
+
+TEST_F(SharingTest, OlderKernelsTellOfMergedPagesInAFileOfTheirOwn) {
+  std::filesystem::remove(tree_.Root() + "/sys/kernel/mm/ksm/ksm_zero_pages");
+  tree_.Write("/proc/100/ksm_merging_pages", "50\n");
+  EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).sharedSaved}, 160u);
+  std::filesystem::remove(tree_.Root() + "/proc/100/ksm_merging_pages");
+  EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).mapped}, kNoValue);
+}
+
+TEST_F(SharingTest, NoneSavesMoreThanItHas) {
+  EXPECT_EQ(uint64_t{Tally(kPid, "ksm_merging_pages 9999\nksm_zero_pages 0\n").sharedSaved}, 400u);
 }
 
 TEST_F(GroupsTest, AddressSpacesHaveLimits) {

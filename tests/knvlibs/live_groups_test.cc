@@ -80,11 +80,6 @@ TEST(LiveGroupsTest, AChildIsAUserWorldWithTheFiguresOfPs) {
   EXPECT_EQ(std::to_string(tally.memSize),
             std::to_string(std::stoul(Shell("ps -o vsz= -p " + pid))));
   EXPECT_NEAR(static_cast<double>(tally.mapped), std::stod(Shell("ps -o rss= -p " + pid)), 256);
-  const std::string rollup = "/proc/" + pid + "/smaps_rollup";
-  if (access(rollup.c_str(), R_OK) == 0) {
-    EXPECT_NEAR(static_cast<double>(tally.touched),
-                std::stod(Shell("awk '$1 == \"Referenced:\" { print $2 }' " + rollup)), 64);
-  }
   KSI_GroupName name = {};
   ASSERT_EQ(GetValue(source, "sched/groups/groupName", {kProcessGroup + child.Pid()}, &name), kOk);
   EXPECT_STREQ(name.text, "sleep");

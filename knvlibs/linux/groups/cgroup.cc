@@ -103,7 +103,7 @@ Status CgroupHierarchy::ReadAmount(const LinuxHost& host, std::string_view path,
   constexpr uint64_t kVersion1Max = uint64_t{1} << 62;
   const std::string file = FileOf(path, name);
   std::string content;
-  const Status status = host.Read(file, content);
+  const Status status = host.ReadPiece(file, content);
   amount = missing;
   if (status == KSI_STATUS_NOT_FOUND) return kOk;
   if (status != kOk) return status;
@@ -119,7 +119,7 @@ Status CgroupHierarchy::ReadAmount(const LinuxHost& host, std::string_view path,
 
 Status CgroupHierarchy::ReadStat(const LinuxHost& host, std::string_view path,
                                  FigureFile& stat) const {
-  return stat.ReadPairs(host, FileOf(path, "memory.stat"));
+  return FigureFile::ReadMemoryStat(host, FileOf(path, "memory.stat"), stat);
 }
 
 Status CgroupHierarchy::CheckExists(const LinuxHost& host, std::string_view path) const {
@@ -216,6 +216,9 @@ Status CgroupHierarchy::ReadEvents(const LinuxHost& host, std::string_view path,
   events.zswapped = KBOf(stat, {"zswapped"});
   events.zswpin = pages("zswpin");
   events.zswpout = pages("zswpout");
+  events.active = KBOf(stat, {"active_anon", "active_file"});
+  events.thp = KBOf(stat, {"anon_thp", "shmem_thp"});
+  events.secPageTables = KBOf(stat, {"sec_pagetables"});
   events.thpAlloc = SumOf({stat.Find("thp_fault_alloc"), stat.Find("thp_collapse_alloc")});
   return kOk;
 }

@@ -41,6 +41,10 @@ struct MemcgEvents {
   Figure zswpout;
   Figure zswapMax;  // none is no limit
   Figure thpAlloc;  // times
+  // What is there now.
+  Figure active;         // on the lists of pages in use
+  Figure thp;            // in transparent huge pages
+  Figure secPageTables;  // of KVM
 };
 
 class CgroupHierarchy {

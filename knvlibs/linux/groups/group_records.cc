@@ -123,8 +123,25 @@ Status ReadCgroup(const LinuxHost& host, const GroupTree& tree, const Group& gro
   return kOk;
 }
 
-void FillProcess(const GroupTree& tree, const Group& group, KSI_GroupMemoryStats& record) {
-  const Process& process = tree.ProcessOf(group);
+// What a virtual machine takes beside the memory of its guest: the rest of QEMU, page tables, and
+// those of KVM, which only its own cgroup tells apart.
+Status ReadOverhead(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                    const FigureFile& meminfo, Figure& overhead) {
+  const GuestMapping* mapping = nullptr;
+  MemcgEvents events;
+  Status status = tree.GetMapping(host, machine, mapping);
+  if (status == kOk && machine.cgroup != Group::kNone) {
+    status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
+  }
+  if (status != kOk) return status;
+  if (meminfo.FindOr("SecPageTables", 0) == 0) events.secPageTables = 0;
+  const Process& process = tree.ProcessOf(tree.At(machine.group));
+  overhead = SumOf(
+      {DifferenceOf(process.Mapped(), mapping->resident), process.vmPte, events.secPageTables});
+  return kOk;
+}
+
+void FillProcess(const Process& process, KSI_GroupMemoryStats& record) {
   record.consumed = FieldOf(process.Mapped());
   // The kernel keeps no peak of hugetlb.
   record.consumedPeak = FieldOf(process.hugetlb == 0u ? process.vmHwm : std::nullopt);
@@ -133,21 +150,32 @@ void FillProcess(const GroupTree& tree, const Group& group, KSI_GroupMemoryStats
   record.ovhd = FieldOf(process.vmPte);
   // Only a walk of all its page tables tells.
   record.touched = FieldOf(std::nullopt);
-  if (group.virtualMachine == Group::kNone) return;
-  const QemuCommandLine& line = tree.VirtualMachineOf(group).commandLine;
+}
+
+// A virtual machine and its monitor, which is the same process. One that has ended since is shown
+// as it was.
+Status ReadMachine(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                   const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
+  Figure overhead;
+  const Status status = ReadOverhead(host, tree, machine, meminfo, overhead);
+  const QemuCommandLine& line = machine.commandLine;
   record.memSize = FieldOf(line.memory);
   record.memSizePeak = FieldOf(line.memory == line.maxMemory ? line.memory : std::nullopt);
+  record.ovhd = FieldOf(overhead);
+  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
 }
 
 Status ReadUse(const LinuxHost& host, const GroupTree& tree, const Group& group,
                KSI_GroupMemoryStats& record) {
-  if (group.IsProcess()) {
-    FillProcess(tree, group, record);
-    return kOk;
-  }
+  if (group.IsProcess()) FillProcess(tree.ProcessOf(group), record);
+  if (group.kind == Group::Kind::kUserWorld) return kOk;
+
   const FigureFile* meminfo = nullptr;
   const Status status = host.Kept().meminfo.Get(host, meminfo);
   if (status != kOk) return status;
+  if (group.IsProcess()) {
+    return ReadMachine(host, tree, tree.VirtualMachineOf(group), *meminfo, record);
+  }
   if (group.kind == Group::Kind::kKernel) return ReadKernel(*meminfo, record);
   return group.id == kRootGroup ? ReadRoot(*meminfo, record)
                                 : ReadCgroup(host, tree, group, *meminfo, record);
@@ -162,8 +190,10 @@ Status ReadGroupMemoryStats(const LinuxHost& host, const GroupTree& tree, const 
   Status status = ReadUse(host, tree, group, record);
   if (status == kOk) status = ReadSettings(host, tree, group, reserved, limit);
   if (status == kOk) status = ReadEffectiveReservation(host, tree, group, effective);
-  if (status == kOk) status = tree.ReadSharedSaved(host, group, saved);
   if (status != kOk) return status;
+  status = tree.ReadSharedSaved(host, group, saved);
+  if (status == KSI_STATUS_NOT_FOUND) saved.reset();  // a process that has ended since
+  if (status != kOk && status != KSI_STATUS_NOT_FOUND) return status;
 
   record.bMin = FieldOf(reserved);
   record.bMax = FieldOf(limit);

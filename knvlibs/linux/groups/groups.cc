@@ -86,7 +86,7 @@ Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
     if (group.children.empty()) group.flags |= KSI_GROUP_LEAF;
   }
   tree.reserved_.resize(tree.groups_.size());
-  tree.sharedSaved_.resize(tree.processes_.size());
+  tree.ksm_.resize(tree.processes_.size());
   tree.cgroupOfPid_.clear();
   tree.byPath_.clear();
   return kOk;
@@ -281,6 +281,19 @@ const VirtualMachine* GroupTree::FindVirtualMachine(int64_t pid) const {
                                                                    : &VirtualMachineOf(*group);
 }
 
+Status GroupTree::GetMapping(const LinuxHost& host, const VirtualMachine& machine,
+                             const GuestMapping*& mapping) const {
+  if (!machine.mapping) {
+    GuestMapping read;
+    const Status status =
+        ReadGuestMapping(host, ProcessOf(At(machine.group)), machine.commandLine, read);
+    if (status != kOk) return status;
+    machine.mapping = read;
+  }
+  mapping = &*machine.mapping;
+  return kOk;
+}
+
 Status GroupTree::ReadReservation(const LinuxHost& host, const Group& group,
                                   Figure& reserved) const {
   reserved = 0;
@@ -295,18 +308,24 @@ Status GroupTree::ReadReservation(const LinuxHost& host, const Group& group,
   return kOk;
 }
 
+Status GroupTree::ReadKsm(const LinuxHost& host, const Group& group, ProcessKsm& ksm) const {
+  std::optional<ProcessKsm>& known = ksm_[group.process];
+  if (!known) {
+    const Status status = ReadProcessKsm(host, ProcessOf(group).pid, ksm);
+    if (status != kOk) return status;
+    known = ksm;
+  }
+  ksm = *known;
+  return kOk;
+}
+
 Status GroupTree::ReadSharedSaved(const LinuxHost& host, const Group& group, Figure& saved) const {
   saved = 0;
   if (group.IsProcess()) {
-    std::optional<Figure>& known = sharedSaved_[group.process];
-    if (!known) {
-      ProcessKsm ksm;
-      const Status status = ReadProcessKsm(host, ProcessOf(group).pid, ksm);
-      if (status != kOk) return status;
-      known = ksm.Saved();
-    }
-    saved = *known;
-    return kOk;
+    ProcessKsm ksm;
+    const Status status = ReadKsm(host, group, ksm);
+    saved = ksm.saved;
+    return status;
   }
   for (const size_t child : group.children) {
     Figure part;

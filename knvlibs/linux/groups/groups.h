@@ -88,9 +88,18 @@ class GroupTree {
   const std::vector<VirtualMachine>& VirtualMachines() const { return virtualMachines_; }
   const CgroupHierarchy& Cgroups() const { return cgroups_; }
 
+  // A virtual machine's memory as QEMU has it mapped. Fails with KSI_STATUS_NOT_FOUND if it has
+  // ended.
+  [[nodiscard]] Status GetMapping(const LinuxHost& host, const VirtualMachine& machine,
+                                  const GuestMapping*& mapping) const;
+
   // What is reserved for a group itself, in KB.
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, const Group& group,
                                        Figure& reserved) const;
+
+  // What page sharing does for a group that is a process. Fails with KSI_STATUS_NOT_FOUND if it has
+  // ended.
+  [[nodiscard]] Status ReadKsm(const LinuxHost& host, const Group& group, ProcessKsm& ksm) const;
 
   // What page sharing saves of the memory of a group's processes, in KB.
   [[nodiscard]] Status ReadSharedSaved(const LinuxHost& host, const Group& group,
@@ -116,7 +125,7 @@ class GroupTree {
   std::unordered_map<int64_t, size_t> byId_;
   // What has been asked for, of each group and of each process.
   mutable std::vector<std::optional<Figure>> reserved_;
-  mutable std::vector<std::optional<Figure>> sharedSaved_;
+  mutable std::vector<std::optional<ProcessKsm>> ksm_;
 
   // Only while the tree grows.
   std::unordered_map<int32_t, size_t> cgroupOfPid_;

@@ -30,6 +30,8 @@ struct Process {
   Figure rssShmem;
   Figure vmPte;
   Figure vmSwap;
+  Figure vmLck;  // of mappings that are locked, in memory or not
+  Figure vmPin;
   Figure hugetlb = 0;
 
   // What is mapped and in memory.

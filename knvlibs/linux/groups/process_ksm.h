@@ -13,13 +13,10 @@ namespace ksi {
 struct ProcessKsm {
   Figure merged = 0;     // in pages that stand for several, which count as resident
   Figure zeroPages = 0;  // in place of which the kernel's zero page is mapped, which does not
-
-  // By the kernel's own reckoning.
-  Figure Saved() const { return SumOf({merged, zeroPages}); }
+  // What is not there for their sake. Zero pages that the kernel does not count (before 6.6) are
+  // neither resident nor in this.
+  Figure saved = 0;
 };
-
-// Whether there is a page on the host that is shared.
-[[nodiscard]] Status ReadIsSharing(const LinuxHost& host, bool& isSharing);
 
 // Where nothing is shared on the whole host this reads no file of the process; else it fails with
 // KSI_STATUS_NOT_FOUND if the process is gone.

@@ -18,14 +18,12 @@ struct SmapsField {
 constexpr SmapsField kFields[] = {
     {"Rss", &Smaps::rss},
     {"Referenced", &Smaps::referenced},
-    {"Private_Clean", &Smaps::privateClean},
-    {"Private_Dirty", &Smaps::privateDirty},
     {"AnonHugePages", &Smaps::anonHugePages},
     {"ShmemPmdMapped", &Smaps::shmemPmdMapped},
     {"Shared_Hugetlb", &Smaps::hugetlb},
     {"Private_Hugetlb", &Smaps::hugetlb},
     {"Swap", &Smaps::swap},
-    {"Locked", &Smaps::locked},
+    {"KSM", &Smaps::ksm},
 };
 
 // "Rss:                1688 kB". A field that is not of the table is none of ours.
@@ -51,7 +49,7 @@ bool ParseHeader(std::string_view line, Mapping& mapping) {
     return false;
   }
   const std::string_view permissions = TakeWord(line);
-  mapping.isWritable = permissions.starts_with("rw");
+  mapping.isWritable = permissions.starts_with("rw-");
   for (int i = 0; i < 3; ++i) TakeWord(line);  // offset, device, inode
   line.remove_prefix(std::min(line.find_first_not_of(' '), line.size()));
   mapping.name = line;
@@ -84,8 +82,8 @@ Status ReadOwn(const LinuxHost& host, int32_t pid, const std::string& file, std:
   if (status == KSI_STATUS_PERMISSION_DENIED) {
     if (host.First("smaps denied")) {
       Warning(
-          "%s: not permitted: figures that take a walk of a process's memory have no value where "
-          "it is not\n",
+          "%s: not permitted: figures of a virtual machine's memory have no value where it is "
+          "not\n",
           file.c_str());
     }
   } else if (status == KSI_STATUS_NOT_FOUND) {
@@ -102,36 +100,17 @@ Status ReadOwn(const LinuxHost& host, int32_t pid, const std::string& file, std:
 }  // namespace
 
 void Smaps::Add(const Smaps& other) {
-  for (Figure Smaps::*figure : {&Smaps::rss, &Smaps::referenced, &Smaps::privateClean,
-                                &Smaps::privateDirty, &Smaps::anonHugePages, &Smaps::shmemPmdMapped,
-                                &Smaps::hugetlb, &Smaps::swap, &Smaps::locked}) {
+  for (Figure Smaps::*figure :
+       {&Smaps::rss, &Smaps::referenced, &Smaps::anonHugePages, &Smaps::shmemPmdMapped,
+        &Smaps::hugetlb, &Smaps::swap, &Smaps::ksm}) {
     this->*figure = SumOf({this->*figure, other.*figure});
   }
 }
 
-Status ReadSmapsRollup(const LinuxHost& host, int32_t pid, Smaps& smaps) {
-  const std::string file = ProcessFile(pid, "smaps_rollup");
-  std::string content;
-  const Status status = ReadOwn(host, pid, file, content);
-  if (status != kOk) return status;
-
-  smaps = Smaps();
-  Lines lines(content);
-  std::string_view line;
-  Mapping whole;
-  if (lines.Next(line) && !ParseHeader(line, whole)) {
-    return host.NotUnderstoodOnce("smaps_rollup", file, lines.Number());
-  }
-  while (lines.Next(line)) {
-    if (!TakeField(line, smaps)) {
-      return host.NotUnderstoodOnce("smaps_rollup", file, lines.Number());
-    }
-  }
-  return kOk;
-}
-
-Status ReadMappings(const LinuxHost& host, int32_t pid, std::vector<Mapping>& mappings) {
-  const std::string file = ProcessFile(pid, "smaps");
+Status ReadMappings(const LinuxHost& host, int32_t pid, MappingsFile which,
+                    std::vector<Mapping>& mappings) {
+  const std::string name = which == MappingsFile::kMaps ? "maps" : "smaps";
+  const std::string file = ProcessFile(pid, name);
   std::string content;
   const Status status = ReadOwn(host, pid, file, content);
   if (status != kOk) return status;
@@ -141,7 +120,7 @@ Status ReadMappings(const LinuxHost& host, int32_t pid, std::vector<Mapping>& ma
   std::string_view line;
   while (lines.Next(line)) {
     if (!TakeLine(line, mappings)) {
-      return host.NotUnderstoodOnce("smaps", file, lines.Number());
+      return host.NotUnderstoodOnce(name, file, lines.Number());
     }
   }
   return kOk;

@@ -43,6 +43,11 @@ constexpr Figure DifferenceOf(Figure figure, Figure part) {
   return Less(*figure, *part);
 }
 
+constexpr Figure LesserOf(Figure one, Figure other) {
+  if (!one || !other) return std::nullopt;
+  return std::min(*one, *other);
+}
+
 constexpr Figure ProductOf(Figure figure, uint64_t factor) {
   uint64_t product = 0;
   if (!figure || __builtin_mul_overflow(*figure, factor, &product)) return std::nullopt;

@@ -9,7 +9,7 @@ namespace ksi {
 
 Status FigureFile::ReadMeminfo(const LinuxHost& host, FigureFile& meminfo) {
   meminfo.file_ = "/proc/meminfo";
-  const Status status = host.Read(meminfo.file_, meminfo.content_);
+  const Status status = host.ReadPiece(meminfo.file_, meminfo.content_);
   if (status != kOk) return status;
 
   // "MemTotal:       24684092 kB", "HugePages_Free:        0"
@@ -31,14 +31,19 @@ Status FigureFile::ReadMeminfo(const LinuxHost& host, FigureFile& meminfo) {
 }
 
 Status FigureFile::ReadVmstat(const LinuxHost& host, FigureFile& vmstat) {
-  return vmstat.ReadPairs(host, "/proc/vmstat");
+  vmstat.file_ = "/proc/vmstat";
+  const Status status = host.Read(vmstat.file_, vmstat.content_);
+  return status == kOk ? vmstat.ParsePairs(host) : status;
 }
 
-Status FigureFile::ReadPairs(const LinuxHost& host, std::string_view file) {
-  file_ = file;
-  const Status status = host.Read(file_, content_);
-  if (status != kOk) return status;
+Status FigureFile::ReadMemoryStat(const LinuxHost& host, std::string file, FigureFile& stat) {
+  stat.file_ = std::move(file);
+  const Status status = host.ReadPiece(stat.file_, stat.content_);
+  return status == kOk ? stat.ParsePairs(host) : status;
+}
 
+Status FigureFile::ParsePairs(const LinuxHost& host) {
+  const std::string_view file = file_;
   lines_.clear();
   Lines lines(content_);
   std::string_view text;

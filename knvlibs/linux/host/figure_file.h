@@ -20,8 +20,9 @@ class FigureFile {
   // /proc/vmstat, in pages or events.
   [[nodiscard]] static Status ReadVmstat(const LinuxHost& host, FigureFile& vmstat);
 
-  // Any file of names and values.
-  [[nodiscard]] Status ReadPairs(const LinuxHost& host, std::string_view file);
+  // A memory.stat of a cgroup, in bytes, pages or events.
+  [[nodiscard]] static Status ReadMemoryStat(const LinuxHost& host, std::string file,
+                                             FigureFile& stat);
 
   // A figure that not every kernel has.
   Figure Find(std::string_view name) const;
@@ -39,6 +40,9 @@ class FigureFile {
     std::string_view name;  // in content_
     uint64_t value;
   };
+
+  // "name value", a line each.
+  [[nodiscard]] Status ParsePairs(const LinuxHost& host);
 
   std::string file_;
   std::string content_;

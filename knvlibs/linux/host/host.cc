@@ -52,35 +52,46 @@ LinuxHost::LinuxHost(std::string_view root, Clock clock)
 
 LinuxHost::~LinuxHost() = default;
 
-Status LinuxHost::Read(std::string_view file, std::string& content) const {
+Status LinuxHost::Open(std::string_view file, FileDescriptor& fd) const {
   // Without O_NONBLOCK a FIFO in a recorded tree would hold the program up.
-  const FileDescriptor fd = root_.Open(file, O_RDONLY | O_NONBLOCK);
-  if (!fd.IsOpen()) return Failed(file, errno);
+  fd = root_.Open(file, O_RDONLY | O_NONBLOCK);
+  return fd.IsOpen() ? kOk : Failed(file, errno);
+}
 
-  // Kernel files have no size to ask for: grow until a read comes back empty.
-  size_t length = 0;
-  content.resize(16384);
+Status LinuxHost::Read(std::string_view file, std::string& content) const {
+  return Read(file, Made::kPieceByPiece, content);
+}
+
+Status LinuxHost::ReadPiece(std::string_view file, std::string& content) const {
+  return Read(file, Made::kInOnePiece, content);
+}
+
+Status LinuxHost::Read(std::string_view file, Made made, std::string& content) const {
+  FileDescriptor fd;
+  const Status status = Open(file, fd);
+  if (status != kOk) return status;
+
+  // Kernel files have no size to ask for: a piece ends where a read leaves room, the file where a
+  // read comes back empty.
+  std::array<char, 16384> part;
+  content.clear();
   for (;;) {
-    const ssize_t count = read(fd.Get(), content.data() + length, content.size() - length);
+    const ssize_t count = read(fd.Get(), part.data(), part.size());
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return Failed(file, errno);
-    if (count == 0) break;
-    length += static_cast<size_t>(count);
-    if (length == content.size()) {
-      if (length >= kLargestFile) {
-        TellOnce(file, EFBIG);
-        return KSI_STATUS_READ_ERROR;
-      }
-      content.resize(2 * length);
+    const auto length = static_cast<size_t>(count);
+    if (content.size() + length > kLargestFile) {
+      TellOnce(file, EFBIG);
+      return KSI_STATUS_READ_ERROR;
     }
+    content.append(part.data(), length);
+    if (length == 0 || (made == Made::kInOnePiece && length < part.size())) return kOk;
   }
-  content.resize(length);
-  return kOk;
 }
 
 Status LinuxHost::ReadNumber(std::string_view file, uint64_t& number) const {
   std::string content;
-  const Status status = Read(file, content);
+  const Status status = ReadPiece(file, content);
   if (status != kOk) return status;
   Lines lines(content);
   std::string_view line;

@@ -30,8 +30,15 @@ class LinuxHost {
   explicit LinuxHost(std::string_view root, Clock clock = std::chrono::steady_clock::now);
   ~LinuxHost();
 
-  // The whole of a file, named from the root ("/proc/meminfo").
+  // Opens a file for what is asked of it piece by piece.
+  [[nodiscard]] Status Open(std::string_view file, FileDescriptor& fd) const;
+
+  // The whole of a file, named from the root ("/proc/buddyinfo").
   [[nodiscard]] Status Read(std::string_view file, std::string& content) const;
+
+  // The same of a file that the kernel makes in one piece ("/proc/PID/status", "memory.stat", all
+  // files of one value), by a single read: its end need not be read for.
+  [[nodiscard]] Status ReadPiece(std::string_view file, std::string& content) const;
 
   // A file that is one number.
   [[nodiscard]] Status ReadNumber(std::string_view file, uint64_t& number) const;
@@ -83,6 +90,9 @@ class LinuxHost {
   Clock TimeSource() const { return clock_; }
 
  private:
+  enum class Made : uint8_t { kInOnePiece, kPieceByPiece };
+  [[nodiscard]] Status Read(std::string_view file, Made made, std::string& content) const;
+
   // The status for an errno of a file or directory, which is told.
   [[nodiscard]] Status Failed(std::string_view file, int error) const;
   void TellOnce(std::string_view file, int error) const;

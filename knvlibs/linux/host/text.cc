@@ -29,11 +29,11 @@ bool Lines::Next(std::string_view& line) {
 }
 
 std::string_view TakeWord(std::string_view& text) {
-  constexpr std::string_view kBlanks = " \t";
-  text.remove_prefix(std::min(text.find_first_not_of(kBlanks), text.size()));
-  const size_t end = std::min(text.find_first_of(kBlanks), text.size());
-  const std::string_view word = text.substr(0, end);
-  text.remove_prefix(end);
+  constexpr auto kIsBlank = [](char c) { return c == ' ' || c == '\t'; };
+  const auto start = std::ranges::find_if_not(text, kIsBlank);
+  const auto end = std::find_if(start, text.end(), kIsBlank);
+  const std::string_view word(start, end);
+  text = std::string_view(end, text.end());
   return word;
 }
 

@@ -1,12 +1,23 @@
 #include "knvlibs/linux/machines/guest_mapping.h"
 
 #include <algorithm>
+#include <span>
 #include <vector>
+
+#include "knvlibs/linux/groups/smaps.h"
+#include "knvlibs/linux/host/walk_time.h"
+#include "knvlibs/linux/machines/page_map.h"
 
 namespace ksi {
 namespace {
 
 uint64_t SizeOf(const Mapping& mapping) { return (mapping.end - mapping.start) / 1024; }
+
+Figure SumOfAll(const std::vector<Figure>& parts) {
+  Figure sum = 0;
+  for (const Figure& part : parts) sum = SumOf({sum, part});
+  return sum;
+}
 
 // Joins what the kernel has cut: mappings side by side of the same memory.
 std::vector<Mapping> Joined(const std::vector<Mapping>& mappings) {
@@ -34,37 +45,75 @@ std::vector<Mapping>::iterator FindBlock(std::vector<Mapping>& mappings, uint64_
   return best;
 }
 
-}  // namespace
-
-Status ReadGuestMapping(const LinuxHost& host, int32_t pid, const QemuCommandLine& line,
-                        GuestMapping& guest) {
-  std::vector<Mapping> mappings;
-  const Status status = ReadMappings(host, pid, mappings);
-  if (status != kOk) return status;
-  mappings = Joined(mappings);
-  guest = GuestMapping();
-  guest.isMade = std::ranges::any_of(mappings, &Mapping::isDontCopy);
-
-  if (line.blocks.empty()) {
-    // QEMU's default: then it is the largest thing that QEMU keeps from its children.
-    std::erase_if(mappings, [](const Mapping& mapping) { return !mapping.isDontCopy; });
-    const auto largest = std::ranges::max_element(mappings, {}, SizeOf);
-    if (largest != mappings.end()) guest = {SizeOf(*largest), largest->smaps, guest.isMade};
-    return kOk;
-  }
-  GuestMapping sum = guest;
-  for (const Figure& size : line.blocks) {
+// The mappings of all blocks; none if one of them is not there.
+std::vector<Mapping> FindBlocks(std::vector<Mapping> mappings, const std::vector<Figure>& sizes) {
+  std::vector<Mapping> blocks;
+  for (const Figure& size : sizes) {
     const auto block = size ? FindBlock(mappings, *size) : mappings.end();
-    if (block == mappings.end()) return kOk;
-    if (!sum.size) {
-      sum = {size, block->smaps, guest.isMade};
-    } else {
-      sum.size = SumOf({sum.size, size});
-      sum.smaps.Add(block->smaps);
-    }
+    if (block == mappings.end()) return {};
+    blocks.push_back(*block);
     mappings.erase(block);
   }
-  guest = sum;
+  return blocks;
+}
+
+// QEMU's default memory is the largest thing that it keeps from its children.
+std::vector<Mapping> FindDefault(std::vector<Mapping> mappings) {
+  std::erase_if(mappings, [](const Mapping& mapping) { return !mapping.isDontCopy; });
+  const auto largest = std::ranges::max_element(mappings, {}, SizeOf);
+  if (largest == mappings.end()) return {};
+  return {*largest};
+}
+
+bool IsShort(const LinuxHost& host, const Process& process) {
+  const Figure size = SumOf({process.vmRss, process.vmSwap});
+  return !host.IsThisMachine() || (size && *size <= kShortWalkKB);
+}
+
+void TakeSmaps(const std::vector<Mapping>& blocks, GuestMapping& guest) {
+  Smaps sum = blocks.front().smaps;
+  for (const Mapping& block : std::span(blocks).subspan(1)) sum.Add(block.smaps);
+  guest.resident = SumOf({sum.rss, sum.hugetlb});
+  guest.referenced = sum.referenced;
+  guest.swapped = sum.swap;
+  guest.huge = SumOf({sum.anonHugePages, sum.shmemPmdMapped, sum.hugetlb});
+  guest.merged = sum.ksm;
+}
+
+Status TakePages(const LinuxHost& host, int32_t pid, const std::vector<Mapping>& blocks,
+                 GuestMapping& guest) {
+  std::vector<AddressRange> ranges;
+  for (const Mapping& block : blocks) ranges.push_back({block.start, block.end});
+  PageCounts counts;
+  const Status status = CountPages(host, pid, ranges, counts);
+  guest.resident = counts.resident;
+  guest.swapped = counts.swapped;
+  guest.huge = counts.huge;
+  return status;
+}
+
+}  // namespace
+
+Status ReadGuestMapping(const LinuxHost& host, const Process& process, const QemuCommandLine& line,
+                        GuestMapping& guest) {
+  const MappingsFile file = IsShort(host, process) ? MappingsFile::kSmaps : MappingsFile::kMaps;
+  std::vector<Mapping> mappings;
+  guest = GuestMapping();
+  if (file == MappingsFile::kSmaps && !MayWalk(host)) return kOk;
+  {
+    const Walk walk(host);
+    const Status status = ReadMappings(host, process.pid, file, mappings);
+    if (status != kOk) return status;
+  }
+  mappings = Joined(mappings);
+  const std::vector<Mapping> blocks =
+      line.blocks.empty() ? FindDefault(mappings) : FindBlocks(mappings, line.blocks);
+  guest.isMade = file == MappingsFile::kSmaps ? std::ranges::any_of(mappings, &Mapping::isDontCopy)
+                                              : !blocks.empty();
+  if (blocks.empty()) return kOk;
+  guest.size = line.blocks.empty() ? SizeOf(blocks.front()) : SumOfAll(line.blocks);
+  if (file == MappingsFile::kMaps) return TakePages(host, process.pid, blocks, guest);
+  TakeSmaps(blocks, guest);
   return kOk;
 }
 

@@ -4,21 +4,28 @@
 
 #include <cstdint>
 
-#include "knvlibs/linux/groups/smaps.h"
+#include "knvlibs/linux/groups/process.h"
 #include "knvlibs/linux/host/host.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 #include "knvlibs/status.h"
 
 namespace ksi {
 
-// No figures if it cannot be found among the mappings of the process, or they may not be read.
+// KB. No figures if it cannot be found among the mappings of the process, or they may not be read.
 struct GuestMapping {
-  Figure size;  // KB
-  Smaps smaps;
-  // QEMU has made its machine: there is memory that it keeps from its children.
+  Figure size;
+  Figure resident;    // hugetlb too, but not the kernel's zero page
+  Figure referenced;  // only small processes tell
+  Figure swapped;
+  Figure huge;    // of the resident, in pages of 2 MB or more
+  Figure merged;  // of the resident, by page sharing
+  // QEMU has made its machine: its memory is there.
   bool isMade = false;
 };
-[[nodiscard]] Status ReadGuestMapping(const LinuxHost& host, int32_t pid,
+
+// A small process is walked for it; of a large one the mappings are looked at, and its pages are
+// counted piece by piece. Fails with KSI_STATUS_NOT_FOUND if the process is gone.
+[[nodiscard]] Status ReadGuestMapping(const LinuxHost& host, const Process& process,
                                       const QemuCommandLine& line, GuestMapping& guest);
 
 }  // namespace ksi

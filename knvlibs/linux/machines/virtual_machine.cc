@@ -7,7 +7,9 @@
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/process_ksm.h"
 #include "knvlibs/linux/groups/reader_of.h"
+#include "knvlibs/linux/memory/ksm.h"
 #include "knvlibs/linux/reader_tables.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
@@ -23,28 +25,17 @@ Status FindMachine(const LinuxHost& host, const Keys& keys, const GroupTree*& tr
   return machine == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
-Status GetMapping(const LinuxHost& host, const VirtualMachine& machine,
-                  const GuestMapping*& mapping) {
-  if (!machine.mapping) {
-    GuestMapping read;
-    const Status status = ReadGuestMapping(host, machine.pid, machine.commandLine, read);
-    if (status != kOk) return status;
-    machine.mapping = read;
-  }
-  mapping = &*machine.mapping;
-  return kOk;
-}
-
 // Whether a client may come without being the one that QEMU waits for to make its machine.
-bool MayBeAsked(const LinuxHost& host, const VirtualMachine& machine) {
+bool MayBeAsked(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine) {
   const GuestMapping* mapping = nullptr;
   return !machine.commandLine.waitsForClient ||
-         (GetMapping(host, machine, mapping) == kOk && mapping->isMade);
+         (tree.GetMapping(host, machine, mapping) == kOk && mapping->isMade);
 }
 
-const GuestMemory& GetGuest(const LinuxHost& host, const VirtualMachine& machine) {
+const GuestMemory& GetGuest(const LinuxHost& host, const GroupTree& tree,
+                            const VirtualMachine& machine) {
   if (!machine.guest) {
-    machine.guest = MayBeAsked(host, machine)
+    machine.guest = MayBeAsked(host, tree, machine)
                         ? ReadGuestMemory(host, machine.pid, machine.commandLine)
                         : UnaskedGuest(machine.commandLine);
   }
@@ -64,12 +55,14 @@ struct MachineUse {
   const GuestMapping* mapping = nullptr;
   ProcessKsm ksm;
   MemcgEvents events;
+  const Ksm* sharing = nullptr;  // on the host
 };
 
 Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                MachineUse& use) {
-  Status status = GetMapping(host, machine, use.mapping);
-  if (status == kOk) status = ReadProcessKsm(host, machine.pid, use.ksm);
+  Status status = tree.GetMapping(host, machine, use.mapping);
+  if (status == kOk) status = tree.ReadKsm(host, tree.At(machine.group), use.ksm);
+  if (status == kOk) status = host.Kept().ksm.Get(host, use.sharing);
   return status == kOk ? ReadOwnEvents(host, tree, machine, use.events) : status;
 }
 
@@ -86,6 +79,30 @@ void SettleCompression(const LinuxHost& host, MemcgEvents& events) {
   events.zswapMax = 0;
 }
 
+// What of the guest's memory is in use. Only of a small process the pages tell; else its own cgroup
+// does, of what is in memory.
+Figure TouchedOf(const MachineUse& use) {
+  if (use.mapping->referenced) return use.mapping->referenced;
+  return LesserOf(use.events.active, use.mapping->resident);
+}
+
+// What of the guest is in memory and what of it sharing saves. Readers take the latter off the
+// former for what is consumed, so both are told or neither.
+void FillSharing(const MachineUse& use, KSI_VmmTally& record) {
+  const Figure resident = use.mapping->resident;
+  const Figure zero = use.ksm.zeroPages;
+  // Who merges the memory of a guest merges little else; where that is not so, smaps tells.
+  const Figure merged =
+      use.mapping->merged ? use.mapping->merged : LesserOf(use.ksm.merged, resident);
+  // The kernel's zero page backs guest memory too, but does not count as resident.
+  const Figure mapped = SumOf({resident, zero.value_or(0)});
+  const Figure saved = SumOf({use.sharing->SavedOf(merged), zero.value_or(0)});
+  record.shared = FieldOf(SumOf({merged, zero}));
+  record.zero = FieldOf(zero);
+  record.mapped = FieldOf(saved ? mapped : std::nullopt);
+  record.sharedSaved = mapped ? saved.value_or(0) : 0;
+}
+
 void FillBalloon(const GuestMemory& guest, Figure memory, KSI_VmmTally& record) {
   switch (guest.balloon) {
     case GuestMemory::Balloon::kNone:
@@ -96,7 +113,7 @@ void FillBalloon(const GuestMemory& guest, Figure memory, KSI_VmmTally& record) 
       record.balloonTgt = FieldOf(std::nullopt);
       break;
     case GuestMemory::Balloon::kUnknown:
-      record.balloonActive = FieldOf<uint8_t>(std::nullopt);
+      // A flag has no third state: it is set where a balloon is known to be there.
       record.ballooned = FieldOf(std::nullopt);
       record.balloonTgt = FieldOf(std::nullopt);
       break;
@@ -114,26 +131,28 @@ Status ReadVmmTally(const LinuxHost& host, const GroupTree& tree, const VirtualM
   const Figure memory = line.memory ? line.memory : use.mapping->size;
   record.memSize = FieldOf(memory);
   record.memSizeLimit = FieldOf(line.maxMemory ? line.maxMemory : memory);
-  record.touched = FieldOf(use.mapping->smaps.referenced);
-  // The kernel's zero page backs guest memory too, but does not count as resident.
-  record.mapped =
-      FieldOf(SumOf({use.mapping->smaps.rss, use.mapping->smaps.hugetlb, use.ksm.zeroPages}));
-  record.shared = FieldOf(use.ksm.Saved());
-  record.zero = FieldOf(use.ksm.zeroPages);
-  record.sharedSaved = FieldOf(use.ksm.Saved());
+  record.touched = FieldOf(TouchedOf(use));
+  FillSharing(use, record);
   record.zipped = FieldOf(use.events.zswapped);
   record.zipSaved = FieldOf(DifferenceOf(use.events.zswapped, use.events.zswapPool));
-  FillBalloon(GetGuest(host, machine), memory, record);
+  FillBalloon(GetGuest(host, tree, machine), memory, record);
   return kOk;
 }
 
-Status ReadGuestTally(const LinuxHost& host, const GroupTree& /*tree*/,
-                      const VirtualMachine& machine, KSI_GuestTally& record) {
-  const GuestMemory& guest = GetGuest(host, machine);
+Status ReadGuestTally(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                      KSI_GuestTally& record) {
+  const GuestMemory& guest = GetGuest(host, tree, machine);
   record.memTotal = FieldOf(guest.total);
   record.lpageTotal = FieldOf<uint32_t>(std::nullopt);
   record.memNeeded = FieldOf(DifferenceOf(guest.total, guest.available));
   return kOk;
+}
+
+// What is swapped and not compressed instead. What is compressed in memory has its place in swap,
+// too, until it is written there.
+Figure SwappedOf(const MachineUse& use) {
+  if (use.mapping->swapped == 0u) return 0;
+  return DifferenceOf(use.mapping->swapped, use.events.zswapped);
 }
 
 Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
@@ -141,8 +160,9 @@ Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualM
   MachineUse use;
   const Status status = ReadUse(host, tree, machine, use);
   if (status != kOk) return status;
+  SettleCompression(host, use.events);
 
-  record.swapped = FieldOf(use.mapping->smaps.swap);
+  record.swapped = FieldOf(SwappedOf(use));
   record.swapRead = FieldOf(use.events.swapcached);
   record.swapIn = FieldOf(use.events.swpin);
   record.swapOut = FieldOf(use.events.swpout);
@@ -182,20 +202,28 @@ Status ReadTransparent(const LinuxHost& host, Figure& swapThreshold) {
                               swapThreshold);
 }
 
+// What of the guest's memory is in huge pages. Before Linux 6.7 only a small process tells; else
+// its own cgroup does, and hugetlb pages are the guest's if QEMU has any.
+Figure HugeOf(const GroupTree& tree, const VirtualMachine& machine, const GuestMapping& mapping,
+              const MemcgEvents& events) {
+  if (mapping.huge) return mapping.huge;
+  const Process& process = tree.ProcessOf(tree.At(machine.group));
+  return LesserOf(SumOf({events.thp, process.hugetlb}), mapping.resident);
+}
+
 Status ReadVmLargePages(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                         KSI_VmLargePages& record) {
   const GuestMapping* mapping = nullptr;
   MemcgEvents events;
   Figure threshold;
-  Status status = GetMapping(host, machine, mapping);
+  Status status = tree.GetMapping(host, machine, mapping);
   if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
   if (status == kOk) status = ReadTransparent(host, threshold);
   if (status != kOk) return status;
 
-  const Smaps& smaps = mapping->smaps;
-  const Figure backed = SumOf({smaps.anonHugePages, smaps.shmemPmdMapped, smaps.hugetlb});
   const Figure untold = threshold ? std::nullopt : Figure(0);
-  record.nrBackings = FieldOf<uint32_t>(QuotientOf(backed, kLargePageKB));
+  record.nrBackings =
+      FieldOf<uint32_t>(QuotientOf(HugeOf(tree, machine, *mapping, events), kLargePageKB));
   record.maxSwapThreshold = FieldOf<uint32_t>(threshold.value_or(0));
   record.nrAllocSuccess = FieldOf(threshold ? events.thpAlloc : Figure(0));
   record.nrFailPinned = FieldOf(untold);

@@ -1,9 +1,11 @@
-// /sys/kernel/mm/ksm: page sharing.
+#include "knvlibs/linux/memory/ksm.h"
+
 #include <string>
 #include <string_view>
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/reader_tables.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
@@ -12,7 +14,6 @@ constexpr std::string_view kDirectory = "/sys/kernel/mm/ksm/";
 
 std::string FileOf(std::string_view name) { return std::string(kDirectory).append(name); }
 
-// Client pages that are mapped to the kernel's zero page instead of a page of their own.
 Status ReadZeroPages(const LinuxHost& host, Figure& pages) {
   Status status = host.ReadNumberIfAny(FileOf("ksm_zero_pages"), pages);
   if (status != kOk || pages) return status;
@@ -24,34 +25,22 @@ Status ReadZeroPages(const LinuxHost& host, Figure& pages) {
 }
 
 Status ReadPshareStats(const LinuxHost& host, const Keys& /*keys*/, KSI_PshareStats& record) {
-  uint64_t shared = 0;
-  Status status = host.ReadNumber(FileOf("pages_shared"), shared);
-  // A kernel without page sharing has shared nothing.
-  if (status == KSI_STATUS_NOT_FOUND) return kOk;
-
-  uint64_t sharing = 0;
-  uint64_t scans = 0;
-  Figure scanned;
-  Figure zero;
-  if (status == kOk) status = host.ReadNumber(FileOf("pages_sharing"), sharing);
-  if (status == kOk) status = host.ReadNumber(FileOf("full_scans"), scans);
-  if (status == kOk) status = host.ReadNumberIfAny(FileOf("pages_scanned"), scanned);
-  if (status == kOk) status = ReadZeroPages(host, zero);
+  const Ksm* ksm = nullptr;
+  const Status status = host.Kept().ksm.Get(host, ksm);
   if (status != kOk) return status;
 
   // The kernel counts what is shared now, not what ever was: that can be told only of a scanner
   // that has not done anything yet. Which page has one reference left, only if there are no others.
-  const bool neverScanned = scans == 0 && scanned.value_or(0) == 0 && shared == 0;
-  const Figure everShared = neverScanned ? Figure(0) : std::nullopt;
+  const Figure everShared = ksm->hasScanned ? std::nullopt : Figure(0);
   const uint64_t pages4K = host.PageKB() / 4;
   const auto in4K = [&](Figure pages) { return FieldOf(ProductOf(pages, pages4K)); };
-  const uint64_t zeroIfTold = zero.value_or(0);
+  const uint64_t zeroIfTold = ksm->zeroPages.value_or(0);
 
-  record.cow = in4K(SumOf({shared, sharing, zeroIfTold}));
-  record.cow1 = in4K(sharing == 0 ? Figure(shared) : std::nullopt);
-  record.zero = in4K(zero);
-  record.used = in4K(shared);
-  record.reclaimed = in4K(SumOf({sharing, zeroIfTold}));
+  record.cow = in4K(SumOf({ksm->pagesShared, ksm->pagesSharing, zeroIfTold}));
+  record.cow1 = in4K(ksm->pagesSharing == 0 ? Figure(ksm->pagesShared) : std::nullopt);
+  record.zero = in4K(ksm->zeroPages);
+  record.used = in4K(ksm->pagesShared);
+  record.reclaimed = in4K(SumOf({ksm->pagesSharing, zeroIfTold}));
   record.totAdd = FieldOf(everShared);
   record.totRemove = FieldOf(everShared);
   return kOk;
@@ -62,5 +51,26 @@ constexpr Reader kReaders[] = {ValueOf<node::memory_pshare_stats, ReadPshareStat
 }  // namespace
 
 constinit const ReaderTable kKsmReaders = kReaders;
+
+Figure Ksm::SavedOf(Figure merged) const {
+  if (pagesSharing == 0) return 0;
+  const Figure all = SumOf({pagesShared, pagesSharing});
+  return all ? QuotientOf(ProductOf(merged, pagesSharing), *all) : std::nullopt;
+}
+
+Status ReadKsm(const LinuxHost& host, Ksm& ksm) {
+  Status status = host.ReadNumber(FileOf("pages_shared"), ksm.pagesShared);
+  if (status == KSI_STATUS_NOT_FOUND) return kOk;
+
+  uint64_t scans = 0;
+  Figure scanned;
+  if (status == kOk) status = host.ReadNumber(FileOf("pages_sharing"), ksm.pagesSharing);
+  if (status == kOk) status = host.ReadNumber(FileOf("full_scans"), scans);
+  if (status == kOk) status = host.ReadNumberIfAny(FileOf("pages_scanned"), scanned);
+  if (status == kOk) status = ReadZeroPages(host, ksm.zeroPages);
+  ksm.hasScanned = scans != 0 || scanned.value_or(0) != 0 || ksm.pagesShared != 0;
+  // A process may be gone; of these files one that is missing is none that went.
+  return status == KSI_STATUS_NOT_FOUND ? KSI_STATUS_INVALID_METADATA : status;
+}
 
 }  // namespace ksi

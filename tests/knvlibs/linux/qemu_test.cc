@@ -165,7 +165,7 @@ class WaitingMachineTest : public testing::Test {
  protected:
   WaitingMachineTest() {
     tree_.Write("/proc/100/status",
-                "Name:\tqemu\nState:\tS\nPPid:\t1\nThreads:\t2\nVmSize:\t9 kB\n");
+                "Name:\tqemu\nState:\tS\nPPid:\t1\nVmSize:\t9 kB\nThreads:\t2\n");
     std::string words;
     for (const char* word : {"qemu-kvm", "-m", "1", "-qmp", "unix:/run/q,server=on", "-device",
                              "virtio-balloon,id=b"}) {
@@ -175,22 +175,23 @@ class WaitingMachineTest : public testing::Test {
     tree_.Write("/run/q", "{\"QMP\": {}}\n{\"return\": {}}\n{\"return\": {\"actual\": 524288}}\n");
   }
 
-  // 0, 1, or all ones where nobody was asked.
-  int BalloonWith(const std::string& flags) {
+  // All ones where nobody was asked.
+  uint64_t BalloonWith(const std::string& flags) {
     tree_.Write("/proc/100/smaps",
                 "100000-200000 rw-p 0 00:00 0\nRss: 4 kB\nVmFlags: " + flags + "\n");
     LinuxSource source(tree_.Root());
     KSI_VmmTally tally = {};
     EXPECT_EQ(GetValue(source, "sched/memClients/tally/vmm", {int64_t{100}}, &tally), kOk);
-    return tally.balloonActive;
+    EXPECT_EQ(tally.balloonActive, tally.ballooned == kNoValue ? 0 : 1);
+    return tally.ballooned;
   }
 
   HostTree tree_;
 };
 
-TEST_F(WaitingMachineTest, IsNotReleased) { EXPECT_EQ(BalloonWith("rd wr mr"), 255); }
+TEST_F(WaitingMachineTest, IsNotReleased) { EXPECT_EQ(BalloonWith("rd wr mr"), kNoValue); }
 
-TEST_F(WaitingMachineTest, IsAskedOnceItIsMade) { EXPECT_EQ(BalloonWith("rd wr mr dc"), 1); }
+TEST_F(WaitingMachineTest, IsAskedOnceItIsMade) { EXPECT_EQ(BalloonWith("rd wr mr dc"), 512u); }
 
 }  // namespace
 }  // namespace ksi

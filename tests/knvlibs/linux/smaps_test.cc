@@ -14,7 +14,7 @@ class SmapsTest : public testing::Test {
  protected:
   Status Mappings(const std::string& text) {
     tree_.Write("/proc/7/smaps", text);
-    return ReadMappings(LinuxHost(tree_.Root()), kPid, mappings_);
+    return ReadMappings(LinuxHost(tree_.Root()), kPid, MappingsFile::kSmaps, mappings_);
   }
 
   HostTree tree_;
@@ -22,13 +22,14 @@ class SmapsTest : public testing::Test {
 };
 
 TEST_F(SmapsTest, AMappingIsAHeaderAndItsFields) {
-  ASSERT_EQ(Mappings("7f2c00000000-7f2c00400000 rw-p 00000000 00:00 0      /memory of a guest\n"
-                     "Size:               4096 kB\nRss:                1688 kB\n"
-                     "Referenced:         1600 kB\nAnonHugePages:      1024 kB\n"
-                     "Shared_Hugetlb:        2 kB\nPrivate_Hugetlb:       3 kB\n"
-                     "Swap:                  5 kB\nVmFlags: rd wr mr dc\n"
-                     "7fff0000-7fff1000 r--p 00000000 00:00 0\nRss: 4 kB\nVmFlags: rd dce\n"),
-            kOk);
+  ASSERT_EQ(
+      Mappings("7f2c00000000-7f2c00400000 rw-p 00000000 00:00 0      /memory of a guest\n"
+               "Size:               4096 kB\nRss:                1688 kB\n"
+               "Referenced:         1600 kB\nAnonHugePages:      1024 kB\n"
+               "Shared_Hugetlb:        2 kB\nPrivate_Hugetlb:       3 kB\n"
+               "Swap:                  5 kB\nKSM:                   6 kB\nVmFlags: rd wr mr dc\n"
+               "7fff0000-7fff1000 r--p 00000000 00:00 0\nRss: 4 kB\nVmFlags: rd dce\n"),
+      kOk);
   ASSERT_EQ(mappings_.size(), 2u);
   const Mapping& guest = mappings_[0];
   EXPECT_EQ(guest.start, 0x7f2c00000000u);
@@ -41,10 +42,11 @@ TEST_F(SmapsTest, AMappingIsAHeaderAndItsFields) {
   EXPECT_EQ(guest.smaps.anonHugePages, 1024u);
   EXPECT_EQ(guest.smaps.hugetlb, 5u);
   EXPECT_EQ(guest.smaps.swap, 5u);
-  EXPECT_EQ(guest.smaps.locked, std::nullopt);
+  EXPECT_EQ(guest.smaps.ksm, 6u);
   EXPECT_FALSE(mappings_[1].isWritable);
   EXPECT_FALSE(mappings_[1].isDontCopy);
   EXPECT_EQ(mappings_[1].name, "");
+  EXPECT_EQ(mappings_[1].smaps.ksm, std::nullopt);
 }
 
 TEST_F(SmapsTest, IsUnderstoodOrRefused) {
@@ -66,15 +68,26 @@ TEST_F(SmapsTest, IsUnderstoodOrRefused) {
 
 TEST_F(SmapsTest, AKernelWithoutItHasNoFiguresAndAZombieIsGone) {
   const LinuxHost host(tree_.Root());
-  Smaps smaps;
-  EXPECT_EQ(ReadSmapsRollup(host, kPid, smaps), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(ReadMappings(host, kPid, MappingsFile::kSmaps, mappings_), KSI_STATUS_NOT_FOUND);
   tree_.Write("/proc/7/status", kStatus);
-  EXPECT_EQ(ReadSmapsRollup(host, kPid, smaps), kOk);
-  EXPECT_EQ(smaps.rss, std::nullopt);
-  EXPECT_EQ(ReadMappings(host, kPid, mappings_), kOk);
+  EXPECT_EQ(ReadMappings(host, kPid, MappingsFile::kSmaps, mappings_), kOk);
   EXPECT_TRUE(mappings_.empty());
   tree_.Write("/proc/7/status", "Name:\tx\nState:\tZ (zombie)\n");
-  EXPECT_EQ(ReadSmapsRollup(host, kPid, smaps), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(ReadMappings(host, kPid, MappingsFile::kSmaps, mappings_), KSI_STATUS_NOT_FOUND);
+}
+
+TEST_F(SmapsTest, MapsTellsOfMappingsAlone) {
+  tree_.Write("/proc/7/maps",
+              "1000-3000 rw-p 00000000 00:00 0          [heap]\n"
+              "8000-9000 rwxp 00000000 00:00 0\n");
+  ASSERT_EQ(ReadMappings(LinuxHost(tree_.Root()), kPid, MappingsFile::kMaps, mappings_), kOk);
+  ASSERT_EQ(mappings_.size(), 2u);
+  EXPECT_EQ(mappings_[0].start, 0x1000u);
+  EXPECT_EQ(mappings_[0].end, 0x3000u);
+  EXPECT_TRUE(mappings_[0].isWritable);
+  EXPECT_EQ(mappings_[0].name, "[heap]");
+  EXPECT_EQ(mappings_[0].smaps.rss, std::nullopt);
+  EXPECT_FALSE(mappings_[1].isWritable) << "memory for code is none of a guest's";
 }
 
 TEST_F(SmapsTest, MappingsTogetherHaveWhatBothTell) {
@@ -83,11 +96,11 @@ TEST_F(SmapsTest, MappingsTogetherHaveWhatBothTell) {
   sum.swap = 2;
   Smaps other;
   other.rss = 10;
-  other.locked = 5;
+  other.ksm = 5;
   sum.Add(other);
   EXPECT_EQ(sum.rss, 11u);
   EXPECT_EQ(sum.swap, std::nullopt);
-  EXPECT_EQ(sum.locked, std::nullopt);
+  EXPECT_EQ(sum.ksm, std::nullopt);
   EXPECT_EQ(sum.hugetlb, 0u);
 }
 
