@@ -20,6 +20,7 @@
 #include <string_view>
 #include <type_traits>
 
+#include <knvlibs/ksi_records.h>
 #include "framework/column_table.h"
 #include "framework/display_unit.h"
 
@@ -67,7 +68,7 @@ struct Figure {
 
   // Whether the kernel has no value for the figure: all of the number's bits are ones.
   bool IsNone(const Cell& cell) const {
-    return IsNumber() && cell.number() << (64 - bits) == UINT64_MAX << (64 - bits);
+    return IsNumber() && (cell.number() & KSI_NO_VALUE_OF(bits)) == KSI_NO_VALUE_OF(bits);
   }
 
   // Whether the figure is shown as it is in `unit`.

@@ -23,8 +23,9 @@ constexpr uint64_t kNoValue = KSI_NO_VALUE;
 // A figure as a record's field has it. One that does not fit cannot be told.
 template <class Field = uint64_t>
 constexpr Field FieldOf(Figure figure) {
-  return figure && std::in_range<Field>(*figure) ? static_cast<Field>(*figure)
-                                                 : static_cast<Field>(kNoValue);
+  return figure && std::in_range<Field>(*figure)
+             ? static_cast<Field>(*figure)
+             : static_cast<Field>(KSI_NO_VALUE_OF(8 * sizeof(Field)));
 }
 
 constexpr Figure SumOf(std::initializer_list<Figure> parts) {
