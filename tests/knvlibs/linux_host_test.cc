@@ -231,10 +231,28 @@ TEST_F(LinuxHostTest, BuffersBeyondTheRecordHaveNoValue) {
 TEST_F(LinuxHostTest, NoMoreBuddiesThanAListHasRoomFor) {
   tree_.Write(kHasMemory, "0-119\n");
   for (int node = 0; node < 120; ++node) WriteZone(node, "Normal", "1", 10);
+  LinuxSource source(tree_.Root());
   std::vector<std::string> names;
-  ASSERT_EQ(Names("system/buddy", {}, &names), kOk);
+  KSI_BuddyStats stats;
+  testing::internal::CaptureStderr();
+  ASSERT_EQ(GetNames(source, "system/buddy", {}, &names), kOk);
+  EXPECT_EQ(GetValue(source, "system/buddy/comprehensive", {"memmap-98-hi"}, &stats), kOk);
+  EXPECT_EQ(GetValue(source, "system/buddy/comprehensive", {"memmap-99-hi"}, &stats),
+            KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "/proc/buddyinfo: more than 99 zones: the others are left out\n");
   ASSERT_EQ(names.size(), 99u);
   EXPECT_EQ(names.back(), "memmap-98-hi");
+}
+
+TEST_F(LinuxHostTest, AsManyBuddiesAsAListHasRoomForAreAll) {
+  tree_.Write(kHasMemory, "0-98\n");
+  for (int node = 0; node < 99; ++node) WriteZone(node, "Normal", "1", 10);
+  std::vector<std::string> names;
+  testing::internal::CaptureStderr();
+  ASSERT_EQ(Names("system/buddy", {}, &names), kOk);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+  EXPECT_EQ(names.size(), 99u);
 }
 
 TEST_F(LinuxHostTest, BuddyinfoIsUnderstoodOrRefused) {

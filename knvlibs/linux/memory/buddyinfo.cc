@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/memory/memory_nodes.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
@@ -117,7 +118,11 @@ Status ReadBuddies(const LinuxHost& host, Buddies& buddies) {
   Lines lines(content);
   std::string_view line;
   std::vector<uint64_t> free;
-  while (lines.Next(line) && buddies.size() < kMaxBuddies) {
+  while (lines.Next(line)) {
+    if (buddies.size() == kMaxBuddies) {
+      Warning("%s: more than %zu zones: the others are left out\n", kFile.data(), kMaxBuddies);
+      break;
+    }
     uint64_t numaNode = 0;
     std::string_view zoneName;
     if (!ParseLine(line, numaNode, zoneName, free)) return NotUnderstood(kFile, lines.Number());
