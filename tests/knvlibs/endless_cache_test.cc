@@ -64,6 +64,25 @@ TEST_F(EndlessCache, ReadingsOfUnknownNodes) {
   ExpectThatEveryCommandEnds();
 }
 
+TEST_F(EndlessCache, ReadingsOutOfOrder) {
+  const std::string flags = NumberOf("sched/groups/groupFlags");
+  const std::string name = NumberOf("sched/groups/groupName");
+  using Rows = std::vector<std::string>;
+  for (const Rows& rows :
+       {Rows{Record({"8", "", flags, "5", ""}), Record({"7", "", flags, "5", ""})},
+        Rows{Record({"8", "", flags, "5", ""}), Record({"8", "", flags, "5", ""})},
+        Rows{Record({"8", "8", name, "5", ""}), Record({"8", "7", name, "5", ""})},
+        Rows{Record({"", "", name, "5", ""}), Record({"8", "", name, "5", ""})}}) {
+    WriteSmallHost(file_);
+    PageFile pages(FileContent(file_));
+    pages.Fill(PageFile::RootOf(file_, "reading"), {Cell(0, rows[0]), Cell(0, rows[1])}, 0);
+    WriteContent(file_, pages.Content());
+    ExpectThatEveryCommandEnds();
+    EXPECT_EQ(Run({"info", file_}).err,
+              "ksicache: " + file_ + ": damaged: readings are out of order\n");
+  }
+}
+
 TEST_F(EndlessCache, Lists) {
   RunSql(file_, "UPDATE reading SET answer = 1000000000 WHERE key1 = 0 AND node = " + ListNode());
   PlantTree("instance", Record({"0", "", ListNode(), "0", "9"}));

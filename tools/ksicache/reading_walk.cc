@@ -4,6 +4,9 @@
 
 #include <cerrno>
 #include <cstring>
+#include <optional>
+#include <tuple>
+#include <utility>
 
 #include "knvlibs/cache_format.h"
 #include "tools/ksicache/error.h"
@@ -12,9 +15,7 @@
 namespace ksicache {
 namespace {
 
-[[noreturn]] void ThrowDamaged(const ksi::CacheFile& file) {
-  throw DataError(std::string("damaged: ") + sqlite3_errmsg(file.Handle()));
-}
+[[noreturn]] void ThrowDamaged(const char* why) { throw DataError(std::string("damaged: ") + why); }
 
 // A cache file is read here and there, which a pipe does not allow.
 bool IsRegular(const std::string& fileName) {
@@ -65,11 +66,17 @@ bool CanBeAsked(const ksi::Key& key) {
                                                key.text.size() <= ksi::cache::kLongestText);
 }
 
-// Takes the keys of a row, as many as its node has, or else as many as there are.
-bool TakeKeys(const ksi::Statement& row, const ksi::CacheFile::NodeRow* nodeRow, ksi::Keys* keys) {
+// Takes the key columns of a row; false if one is no key at all.
+bool TakeKeys(const ksi::Statement& row, ksi::Keys* keys) {
   for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
     if (!TakeKey(row, static_cast<int>(i), &keys->at[i])) return false;
   }
+  return true;
+}
+
+// Counts the keys of a row, as many as its node has, or else as many as there are; false if they
+// are not what the node takes.
+bool CountKeys(const ksi::CacheFile::NodeRow* nodeRow, ksi::Keys* keys) {
   if (nodeRow == nullptr || nodeRow->node == nullptr) {
     keys->count = IsAbsent(keys->at[0]) ? 0 : IsAbsent(keys->at[1]) ? 1 : 2;
     return true;
@@ -84,6 +91,17 @@ bool TakeKeys(const ksi::Statement& row, const ksi::CacheFile::NodeRow* nodeRow,
     if (!good) return false;
   }
   return true;
+}
+
+// Where a row stands in its table: numbers before texts, as SQLite has them.
+using KeyPlace = std::tuple<bool, int64_t, std::string>;
+using Place = std::tuple<KeyPlace, KeyPlace, int64_t>;
+
+Place PlaceOf(const Reading& reading) {
+  const auto place = [](const ksi::Key& key) {
+    return KeyPlace(key.kind == ksi::KeyKind::kText, key.number, key.text);
+  };
+  return {place(reading.keys[0]), place(reading.keys[1]), reading.node};
 }
 
 }  // namespace
@@ -124,26 +142,32 @@ void ForEachReading(const ksi::CacheFile& file, const std::function<void(const R
   int code = rows.Prepare(file.Handle(),
                           "SELECT key1, key2, node, status, answer FROM reading "
                           "ORDER BY key1, key2, node");
-  if (code != SQLITE_OK) ThrowDamaged(file);
+  if (code != SQLITE_OK) ThrowDamaged(file.ErrorText());
+  std::optional<Place> last;
   while ((code = rows.Step()) == SQLITE_ROW) {
     Reading reading{};
     reading.node = rows.Number(2);
     reading.row = file.FindRow(reading.node);
-    reading.goodKeys = TakeKeys(rows, reading.row, &reading.keys);
+    if (TakeKeys(rows, &reading.keys)) {
+      Place place = PlaceOf(reading);
+      if (last && place <= *last) ThrowDamaged("readings are out of order");
+      last = std::move(place);
+      reading.goodKeys = CountKeys(reading.row, &reading.keys);
+    }
     reading.status = rows.Type(3) == SQLITE_INTEGER ? rows.Number(3) : -1;
     reading.type = rows.Type(4);
     if (reading.type == SQLITE_BLOB) reading.value = rows.Blob(4);
     if (reading.type == SQLITE_INTEGER) reading.count = rows.Number(4);
     visit(reading);
   }
-  if (code != SQLITE_DONE) ThrowDamaged(file);
+  if (code != SQLITE_DONE) ThrowDamaged(file.ErrorText());
 }
 
 InstanceWalk::InstanceWalk(const ksi::CacheFile& file) : file_(file) {
   if (rows_.Prepare(file.Handle(),
                     "SELECT position, entry FROM instance "
                     "WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 ORDER BY position") != SQLITE_OK) {
-    ThrowDamaged(file);
+    ThrowDamaged(file.ErrorText());
   }
 }
 
@@ -167,7 +191,7 @@ void InstanceWalk::ForEach(
     visit(rows_.Type(0) == SQLITE_INTEGER ? rows_.Number(0) : -1, rows_);
   }
   rows_.Reset();
-  if (code != SQLITE_DONE) ThrowDamaged(file_);
+  if (code != SQLITE_DONE) ThrowDamaged(file_.ErrorText());
 }
 
 }  // namespace ksicache

@@ -47,7 +47,7 @@ class Checker {
       code = rows.Step();
       if (code == SQLITE_ROW && rows.Text(0) != "ok") Report(std::string(rows.Text(0)));
     }
-    if (code != SQLITE_DONE) Report(sqlite3_errmsg(file_.Handle()));
+    if (code != SQLITE_DONE) Report(file_.ErrorText());
   }
 
   void CheckSignature() {
@@ -155,7 +155,7 @@ class Checker {
                             "r.node = i.node AND r.status = 0 AND typeof(r.answer) = "
                             "'integer')");
     if (code == SQLITE_OK) code = rows.Step();
-    if (code != SQLITE_ROW) return Report(sqlite3_errmsg(file_.Handle()));
+    if (code != SQLITE_ROW) return Report(file_.ErrorText());
     if (rows.Number(0) != 0) {
       Report(std::to_string(rows.Number(0)) + " entries belong to no list");
     }
