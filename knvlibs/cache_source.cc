@@ -4,7 +4,9 @@
 #include <cstring>
 #include <limits>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/cache_format.h"
+#include "knvlibs/linux/host/text.h"
 #include "knvlibs/node_table.h"
 
 namespace ksi {
@@ -18,6 +20,8 @@ constexpr const char* kEntriesOfList =
 
 // More readings than a catalogue has nodes are damage.
 constexpr size_t kMostReadings = 256;
+
+constexpr const char* kOtherCount = "has other entries than it says";
 
 constexpr Key kAbsent{KeyKind::kText, 0, {}};
 
@@ -57,7 +61,7 @@ Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* sou
   std::unique_ptr<CacheFile> file;
   const Status status = CacheFile::Open(fileName, &file);
   if (status != kOk) return status;
-  std::unique_ptr<CacheSource> made(new CacheSource(std::move(file)));
+  std::unique_ptr<CacheSource> made(new CacheSource(fileName, std::move(file)));
 
   for (auto& ids : made->ids_) ids.assign(Catalogue().size(), -1);
   for (const CacheFile::NodeRow& row : made->file_->NodeRows()) {
@@ -75,11 +79,18 @@ Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* sou
 }
 
 Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
+  const Status status = Read(node, keys, record);
+  TellWhy(node);
+  return status;
+}
+
+Status CacheSource::Read(const Node& node, const Keys& keys, Buffer record) {
   const Object* object = nullptr;
   const Reading* reading = nullptr;
   const Status status = Find(node, Kind::kValue, keys, &object, &reading);
   if (status != kOk) return status;
   if (reading->type != SQLITE_BLOB || reading->size != record.size()) {
+    why_ = "has no record of this version";
     return KSI_STATUS_LENGTH_MISMATCH;
   }
   std::memcpy(record.data(), object->bytes.data() + reading->offset, record.size());
@@ -87,11 +98,73 @@ Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
 }
 
 Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
-  if (IdOf(node) != ksi::node::sched_groups_members_groups) return List(node, keys, instances);
-  Status status = walk_.Ask(keys[0].number);
   const size_t before = instances.Count();
+  Status status = BeginList(node, keys);
   if (status == kOk) status = List(node, keys, instances);
-  if (status == kOk) walk_.Answer(instances, before);
+  if (status == kOk) EndList(node, instances, before);
+  TellWhy(node);
+  return status;
+}
+
+// What the walks have to say of a list that is asked for; of the groups WalkStatus tells it.
+Status CacheSource::BeginList(const Node& node, const Keys& keys) {
+  switch (IdOf(node)) {
+    case ksi::node::sched_groups_members_groups:
+      return walk_.Ask(keys[0].number);
+    case ksi::node::sched_groups_members_memClients:
+    case ksi::node::sched_memClients_remapTypes:
+      return walk_.WalkStatus();
+    case ksi::node::memory_pmem_volumes:
+      return volumes_.Ask(0);  // always the first of its walk
+    case ksi::node::memory_pmem_volumes_regionStore_regions:
+      return volumes_.WalkStatus() == kOk ? kOk : Damaged("volumes are listed over and over");
+    default:
+      return kOk;
+  }
+}
+
+// The same of the entries that it has turned out to have.
+void CacheSource::EndList(const Node& node, const ParamList& instances, size_t from) {
+  switch (IdOf(node)) {
+    case ksi::node::sched_groups_members_groups:
+      return walk_.Answer(instances, from);
+    case ksi::node::sched_groups_members_memClients:
+    case ksi::node::sched_memClients_remapTypes:
+      return walk_.PassList(instances.Count() - from);
+    case ksi::node::memory_pmem_volumes:
+    case ksi::node::memory_pmem_volumes_regionStore_regions:
+      return volumes_.PassList(instances.Count() - from);
+    default:
+      return;
+  }
+}
+
+Status CacheSource::Damaged(const char* why) {
+  why_ = why;
+  return KSI_STATUS_METADATA_READ_ERROR;
+}
+
+// The status for what a call of SQLite gave.
+Status CacheSource::StatusOfCall(int code) {
+  const Status status = StatusOfSqlite(code);
+  if (status != kOk) why_ = file_->ErrorText();
+  return status;
+}
+
+// Tells what is wrong with what was read. Once: one damage is the reason for many.
+void CacheSource::TellWhy(const Node& node) {
+  if (why_.empty()) return;
+  if (!told_) {
+    Warning("%s: %.*s: %s\n", Printable(fileName_).c_str(), static_cast<int>(node.path.size()),
+            node.path.data(), why_.c_str());
+  }
+  told_ = true;
+  why_.clear();
+}
+
+Status CacheSource::BeginRead() {
+  const Status status = file_->BeginRead();
+  if (status != kOk) why_ = file_->ErrorText();
   return status;
 }
 
@@ -100,10 +173,10 @@ Status CacheSource::List(const Node& node, const Keys& keys, ParamList& instance
   const Reading* reading = nullptr;
   Status status = Find(node, Kind::kList, keys, &object, &reading);
   if (status != kOk) return status;
-  if (reading->type != SQLITE_INTEGER) return KSI_STATUS_METADATA_READ_ERROR;
+  if (reading->type != SQLITE_INTEGER) return Damaged("has no number of entries");
   const int64_t count = reading->number;
   if (count == 0) return kOk;
-  status = file_->BeginRead();
+  status = BeginRead();
   if (status != kOk) return status;
 
   int64_t position = 0;
@@ -114,25 +187,25 @@ Status CacheSource::List(const Node& node, const Keys& keys, ParamList& instance
   if (code == SQLITE_OK) {
     while (status == kOk && (code = entries_.Step()) == SQLITE_ROW) {
       status = position < count && entries_.Number(0) == position ? TakeEntry(node, instances)
-                                                                  : KSI_STATUS_METADATA_READ_ERROR;
+                                                                  : Damaged(kOtherCount);
       ++position;
     }
   }
+  if (status == kOk) status = StatusOfCall(code);
   entries_.Reset();
-  if (status == kOk) status = StatusOfSqlite(code);
-  if (status == kOk && position != count) status = KSI_STATUS_METADATA_READ_ERROR;
+  if (status == kOk && position != count) status = Damaged(kOtherCount);
   return status;
 }
 
 // The entry of the row that entries_ is on.
-Status CacheSource::TakeEntry(const Node& node, ParamList& instances) const {
+Status CacheSource::TakeEntry(const Node& node, ParamList& instances) {
   if (KindOf(node.entries) == KeyKind::kNumber) {
-    if (entries_.Type(1) != SQLITE_INTEGER) return KSI_STATUS_METADATA_READ_ERROR;
+    if (entries_.Type(1) != SQLITE_INTEGER) return Damaged("has an entry that is no number");
     return instances.AddNumber(static_cast<uint64_t>(entries_.Number(1)));
   }
   const std::string_view text = entries_.Text(1);
   if (entries_.Type(1) != SQLITE_TEXT || text.find('\0') != std::string_view::npos) {
-    return KSI_STATUS_METADATA_READ_ERROR;
+    return Damaged("has an entry that is no text");
   }
   return instances.AddText(text);
 }
@@ -181,7 +254,7 @@ Status CacheSource::FindObject(const Keys& keys, const Object** object) {
 Status CacheSource::Load(const Keys& keys, Object& object) {
   object.readings.clear();
   object.bytes.clear();
-  Status status = file_->BeginRead();
+  Status status = BeginRead();
   if (status != kOk) return status;
   status = CursorAt(keys) ? kOk : SeekCursor(keys);
   for (; status == kOk && CursorAt(keys); status = StepCursor()) {
@@ -190,12 +263,12 @@ Status CacheSource::Load(const Keys& keys, Object& object) {
     // Rows in order end: a damaged tree that leads back to itself does not.
     if (!object.readings.empty() &&
         (reading.node <= object.readings.back().node || object.readings.size() == kMostReadings)) {
-      return KSI_STATUS_METADATA_READ_ERROR;
+      return Damaged("readings are out of order");
     }
     const int64_t recorded = cursor_.Number(kStatus);
     if (cursor_.Type(kStatus) != SQLITE_INTEGER || recorded < 0 ||
         recorded > std::numeric_limits<Status>::max()) {
-      return KSI_STATUS_METADATA_READ_ERROR;
+      return Damaged("a reading has no good status");
     }
     reading.status = static_cast<Status>(recorded);
     reading.type = cursor_.Type(kAnswer);
@@ -217,14 +290,14 @@ Status CacheSource::Load(const Keys& keys, Object& object) {
 Status CacheSource::StepCursor() {
   const int code = cursor_.Step();
   onRow_ = code == SQLITE_ROW;
-  return StatusOfSqlite(code);
+  return StatusOfCall(code);
 }
 
 // To the first row that is not before `keys`.
 Status CacheSource::SeekCursor(const Keys& keys) {
   cursor_.Reset();
   const int code = BindKeys(cursor_, keys);
-  return code == SQLITE_OK ? StepCursor() : StatusOfSqlite(code);
+  return code == SQLITE_OK ? StepCursor() : StatusOfCall(code);
 }
 
 bool CacheSource::CursorAt(const Keys& keys) const {

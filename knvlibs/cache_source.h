@@ -26,11 +26,16 @@ class CacheSource : public Source {
   [[nodiscard]] static Status Open(const char* fileName, std::unique_ptr<CacheSource>* source);
 
   // A key that the file does not have is KSI_STATUS_NOT_FOUND; a read that failed when it was
-  // captured fails with its status again.
+  // captured fails with its status again. The first that fails because the file is damaged or
+  // cannot be read is told, with the reason.
   [[nodiscard]] Status Value(const Node& node, const Keys& keys, Buffer record) override;
   [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
-  // A walk over groups that contain each other fails in time, with KSI_STATUS_METADATA_READ_ERROR.
-  void Refresh() override { walk_.Restart(); }
+  // A walk over groups that contain each other, or with clients or volumes that are listed over and
+  // over, fails in time, with KSI_STATUS_METADATA_READ_ERROR.
+  void Refresh() override {
+    walk_.Restart();
+    volumes_.Restart();
+  }
   [[nodiscard]] Status WalkStatus() const override { return walk_.WalkStatus(); }
   Definitions KernelDefinitions() const override;
 
@@ -61,21 +66,35 @@ class CacheSource : public Source {
     std::vector<std::byte> bytes;
   };
 
-  explicit CacheSource(std::unique_ptr<CacheFile> file)
-      : file_(std::move(file)), walk_(file_->Size()) {}
+  CacheSource(const char* fileName, std::unique_ptr<CacheFile> file)
+      : fileName_(fileName),
+        file_(std::move(file)),
+        walk_(file_->Size()),
+        volumes_(file_->Size()) {}
 
+  [[nodiscard]] Status Read(const Node& node, const Keys& keys, Buffer record);
+  [[nodiscard]] Status BeginList(const Node& node, const Keys& keys);
+  void EndList(const Node& node, const ParamList& instances, size_t from);
+  [[nodiscard]] Status Damaged(const char* why);
+  [[nodiscard]] Status StatusOfCall(int code);
+  void TellWhy(const Node& node);
+  [[nodiscard]] Status BeginRead();
   [[nodiscard]] Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
                             const Reading** reading);
   [[nodiscard]] Status List(const Node& node, const Keys& keys, ParamList& instances);
-  [[nodiscard]] Status TakeEntry(const Node& node, ParamList& instances) const;
+  [[nodiscard]] Status TakeEntry(const Node& node, ParamList& instances);
   [[nodiscard]] Status FindObject(const Keys& keys, const Object** object);
   [[nodiscard]] Status Load(const Keys& keys, Object& object);
   [[nodiscard]] Status StepCursor();
   [[nodiscard]] Status SeekCursor(const Keys& keys);
   bool CursorAt(const Keys& keys) const;
 
+  std::string fileName_;
   std::unique_ptr<CacheFile> file_;
-  WalkLimit walk_;
+  WalkLimit walk_;     // over the groups, with their clients
+  WalkLimit volumes_;  // over the volumes, with their regions
+  std::string why_;    // what is wrong with what is being read, empty: nothing
+  bool told_ = false;
   // The identifiers that the nodes of the catalogue have in the file, -1: not in it.
   std::array<std::vector<int64_t>, 2> ids_;
 

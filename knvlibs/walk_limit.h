@@ -1,9 +1,10 @@
-// How long a walk over the groups of a cache file may be.
+// How long a walk over the lists of a cache file may be.
 //
 // In a tree each group stands in one place. A dozen groups that list each other are a small file
-// and a walk without end, and to remember who was seen would take memory for each group. So what a
-// walk asks for is counted: with the lists and their entries that a file of this size can hold, it
-// has seen everything more than once.
+// and a walk without end, and so, nearly, are lists that name the same client or volume over and
+// over; to remember who was seen would take memory for each. So what a walk asks for is counted:
+// with the lists and their entries that a file of this size can hold, it has seen everything more
+// than once.
 #ifndef KNVLIBS_WALK_LIMIT_H_
 #define KNVLIBS_WALK_LIMIT_H_
 
@@ -27,6 +28,11 @@ class WalkLimit {
 
   // They are the entries of `groups` from the one at `from` on.
   void Answer(const ParamList& groups, size_t from);
+
+  // A walk that has begun comes by another list, with so many entries.
+  void PassList(size_t entries) {
+    if (taken_ != 0) taken_ += 1 + entries;
+  }
 
   // Begins a new walk.
   void Restart() { taken_ = 0; }

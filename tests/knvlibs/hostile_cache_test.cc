@@ -8,11 +8,14 @@
 #include <filesystem>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/cache_file.h"
 #include "knvlibs/cache_source.h"
+#include "tests/harness/program.h"
+#include "tests/harness/tally.h"
 #include "tests/knvlibs/cache_fixture.h"
 
 namespace ksi {
@@ -214,6 +217,115 @@ TEST_F(HostileCache, HolesOfATerabyte) {
   ASSERT_EQ(truncate(file_.c_str(), off_t{1} << 40), 0);
   ASSERT_EQ(Open(), kOk);
   ExpectAnswers();
+}
+
+// What is told of files that are damaged where nobody looked when they were opened.
+class ToldDamage : public HostileCache {
+ protected:
+  // What is said while `ask` asks a file that was changed by this SQL.
+  template <class Ask>
+  std::string Said(const std::string& sql, Ask&& ask) {
+    WriteSmallHost(file_);
+    RunSql(file_, sql);
+    testing::internal::CaptureStderr();
+    EXPECT_EQ(Open(), kOk);
+    ask();
+    return testing::internal::GetCapturedStderr();
+  }
+
+  std::string Line(const std::string& what) const { return file_ + ": " + what + "\n"; }
+};
+
+TEST_F(ToldDamage, OfValues) {
+  const auto ask = [this] { EXPECT_NE(Flags(7), kOk); };
+  EXPECT_EQ(Said("UPDATE reading SET answer = zeroblob(5) WHERE key1 = 7", ask),
+            Line("sched/groups/groupFlags: has no record of this version"));
+  EXPECT_EQ(Said("UPDATE reading SET answer = 5 WHERE key1 = 7", ask),
+            Line("sched/groups/groupFlags: has no record of this version"));
+  EXPECT_EQ(Said("UPDATE reading SET status = -1 WHERE key1 = 7", ask),
+            Line("sched/groups/groupFlags: a reading has no good status"));
+  EXPECT_EQ(Said("UPDATE reading SET answer = zeroblob(50000000) WHERE key1 = 7", ask),
+            Line("sched/groups/groupFlags: string or blob too big"));
+}
+
+TEST_F(ToldDamage, OfLists) {
+  const auto ask = [this] { EXPECT_NE(ChildrenOf(0), kOk); };
+  const std::string list = "sched/groups/members/groups: ";
+  EXPECT_EQ(Said("UPDATE reading SET answer = 'two' WHERE key1 = 0 AND answer = 2", ask),
+            Line(list + "has no number of entries"));
+  EXPECT_EQ(Said("UPDATE reading SET answer = 3 WHERE key1 = 0 AND answer = 2", ask),
+            Line(list + "has other entries than it says"));
+  EXPECT_EQ(Said("DELETE FROM instance WHERE key1 = 0 AND position = 0", ask),
+            Line(list + "has other entries than it says"));
+  EXPECT_EQ(Said("UPDATE instance SET entry = 'x' WHERE key1 = 0 AND position = 1", ask),
+            Line(list + "has an entry that is no number"));
+  EXPECT_EQ(Said("UPDATE instance SET entry = 5 WHERE key1 = 30 AND position = 1",
+                 [this] {
+                   ParamList types(ParamList::kNoLimit);
+                   EXPECT_NE(source_->Instances(NodeAt("sched/memClients/remapTypes"),
+                                                MakeKeys({30}), types),
+                             kOk);
+                 }),
+            Line("sched/memClients/remapTypes: has an entry that is no text"));
+}
+
+TEST_F(ToldDamage, OfAFileCutShort) {
+  WriteLargeHost(file_);
+  testing::internal::CaptureStderr();
+  ASSERT_EQ(Open(), kOk);
+  std::filesystem::resize_file(file_, 4096);
+  EXPECT_EQ(CountAnswers(*source_), 0u);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            Line("sched/groups/stats/memoryStats: database disk image is malformed"));
+}
+
+TEST_F(ToldDamage, Once) {
+  EXPECT_EQ(Said("UPDATE reading SET status = -1",
+                 [this] {
+                   EXPECT_NE(Flags(9), kOk);
+                   EXPECT_NE(Flags(7), kOk);
+                   EXPECT_NE(ChildrenOf(0), kOk);
+                 }),
+            Line("sched/groups/groupFlags: a reading has no good status"));
+}
+
+// Reads that failed on the host, and those that there are not, are no damage.
+TEST_F(ToldDamage, IsNoneInAGoodFile) {
+  EXPECT_EQ(Said("UPDATE reading SET status = 0xbad0008, answer = NULL WHERE key1 = 7",
+                 [this] {
+                   EXPECT_EQ(Flags(7), KSI_STATUS_METADATA_READ_ERROR);
+                   EXPECT_EQ(ChildrenOf(9), KSI_STATUS_IO_ERROR);
+                   EXPECT_EQ(ChildrenOf(8), KSI_STATUS_NOT_FOUND);
+                   EXPECT_EQ(Flags(0), kOk);
+                 }),
+            "");
+}
+
+TEST_F(ToldDamage, IsPrintable) {
+  file_ = directory_.Path("\x1b[31mred.ksi");
+  EXPECT_EQ(Said("UPDATE reading SET status = -1", [this] { EXPECT_NE(Flags(7), kOk); }),
+            directory_.Path("?[31mred.ksi") +
+                ": sched/groups/groupFlags: a reading has no good status\n");
+}
+
+// Reports whose own messages do not tell of a list or a record that cannot be read.
+TEST_F(ToldDamage, OfReportsThatSayNothing) {
+  const std::vector<std::pair<std::string, std::string>> reports = {
+      {"buddy-stats", "system/buddy"},
+      {"comp-stats", "memory/comprehensive"},
+      {"pmem-stats", "memory/pmem/volumes"},
+      {"pshare-stats", "memory/pshare/stats"},
+      {"pshareHint-stats", "memory/pshare/stats"}};
+  for (const auto& [report, node] : reports) {
+    std::filesystem::copy_file(TALLY_EXAMPLE, file_,
+                               std::filesystem::copy_options::overwrite_existing);
+    RunSql(file_,
+           "UPDATE reading SET answer = 'x' WHERE node IN (SELECT id FROM node WHERE path = '" +
+               node + "')");
+    const harness::Result result =
+        harness::RunProgram(harness::BuiltTally({"-c", file_, "-r", report, "-q"}));
+    EXPECT_TRUE(result.err.starts_with(file_ + ": " + node + ": has no ")) << result.err;
+  }
 }
 
 }  // namespace

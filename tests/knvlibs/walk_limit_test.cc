@@ -5,8 +5,10 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include <knvlibs/ksi_records.h>
 #include "knvlibs/cache_source.h"
 #include "knvlibs/walk_limit.h"
 #include "tests/harness/program.h"
@@ -89,6 +91,14 @@ TEST_F(WalkLimitTest, BeginsAgainWhenItIsTold) {
   EXPECT_EQ(CountToTheEnd(2), 2047u);
 }
 
+TEST_F(WalkLimitTest, CountsOtherListsOfAWalk) {
+  limit_.PassList(5000);
+  EXPECT_EQ(Ask(0), kOk) << "before, there was no walk";
+  limit_.PassList(1000);
+  limit_.PassList(0);
+  EXPECT_EQ(CountToTheEnd(1), 1045u);
+}
+
 // Files and reports.
 
 class WalkedCache : public testing::Test {
@@ -116,10 +126,15 @@ class WalkedCache : public testing::Test {
     writer.AddList(NodeAt("sched/groups/members/groups"), MakeKeys({id}), list);
   }
 
-  harness::Result Report(std::vector<std::string> options) {
-    harness::Args args = {"-c", file_, "-r", "group-stats", "-q", "-s", "gid"};
+  harness::Result Run(const std::string& report, std::vector<std::string> options) {
+    harness::Args args = {"-c", file_, "-r", report, "-q"};
     args.insert(args.end(), options.begin(), options.end());
     return harness::RunProgram(harness::BuiltTally(args));
+  }
+
+  harness::Result Report(std::vector<std::string> options) {
+    options.insert(options.begin(), {"-s", "gid"});
+    return Run("group-stats", std::move(options));
   }
 
   static size_t Lines(const std::string& text) {
@@ -181,6 +196,68 @@ TEST_F(WalkedCache, GroupsThatMovedAreShownTwice) {
   EXPECT_EQ(result.status, 0);
   EXPECT_EQ(result.out, "gid\n0\n1\n3\n2\n3\n");
   EXPECT_EQ(result.err, "");
+}
+
+TEST_F(WalkedCache, VolumesThatAreListedOverAndOverEnd) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    const std::vector<Key> names(2000, Key{KeyKind::kText, 0, "v"});
+    const std::string path = "memory/pmem/volumes";
+    const KSI_PmemRegion region = {};
+    writer.AddList(NodeAt(path), {}, names);
+    writer.AddList(NodeAt(path + "/regionStore/regions"), MakeKeys({"v"}), names);
+    writer.AddValue(NodeAt(path + "/regionStore/regions/info"), MakeKeys({"v", "v"}),
+                    BytesOf(region));
+    writer.Commit(TestCapture());
+  }
+  const harness::Result result = Run("pmem-stats", {"-l", "2"});
+  EXPECT_EQ(result.status, 0);
+  EXPECT_GT(Lines(result.out), 2000u);
+  EXPECT_LT(Lines(result.out), 20000u);
+  EXPECT_EQ(result.err,
+            file_ +
+                ": memory/pmem/volumes/regionStore/regions: volumes are listed over and "
+                "over\n");
+}
+
+// A program that goes over the volumes again begins anew.
+TEST_F(WalkedCache, VolumesAreWalkedOverAgainAndAgain) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    writer.AddList(NodeAt("memory/pmem/volumes"), {}, TextList({"v", "w"}));
+    writer.AddList(NodeAt("memory/pmem/volumes/regionStore/regions"), MakeKeys({"v"}),
+                   TextList({"1", "2"}));
+    writer.Commit(TestCapture());
+  }
+  std::unique_ptr<CacheSource> source;
+  ASSERT_EQ(CacheSource::Open(file_.c_str(), &source), kOk);
+  for (int walk = 0; walk < 10000; ++walk) {
+    ParamList list(ParamList::kNoLimit);
+    ASSERT_EQ(source->Instances(NodeAt("memory/pmem/volumes"), {}, list), kOk);
+    ASSERT_EQ(
+        source->Instances(NodeAt("memory/pmem/volumes/regionStore/regions"), MakeKeys({"v"}), list),
+        kOk);
+  }
+}
+
+TEST_F(WalkedCache, ClientsThatAreListedOverAndOverEnd) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    AddGroup(writer, 0, {});
+    const std::vector<Key> clients(2000, Key{KeyKind::kNumber, 7, {}});
+    const std::vector<Key> types(2000, Key{KeyKind::kText, 0, "t"});
+    const KSI_RemapType pages = {};
+    writer.AddList(NodeAt("sched/groups/members/memClients"), MakeKeys({0}), clients);
+    writer.AddList(NodeAt("sched/memClients/remapTypes"), MakeKeys({7}), types);
+    writer.AddValue(NodeAt("sched/memClients/remapTypes"), MakeKeys({7, "t"}), BytesOf(pages));
+    writer.Commit(TestCapture());
+  }
+  const harness::Result result = Run("asyncremap-stats", {});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_GT(Lines(result.out), 2000u);
+  EXPECT_LT(Lines(result.out), 20000u);
+  EXPECT_NE(result.err.find("tally: groups contain each other, rows are missing: "),
+            std::string::npos);
 }
 
 TEST_F(WalkedCache, LargeHostsAreWalkedOverAgainAndAgain) {
