@@ -52,54 +52,9 @@ void JsonEntries::ForEachText(const std::function<void(std::string_view)>& visit
   }
 }
 
-// What the parser calls; a failure leaves it as an exception.
-class JsonReader::Events : public nlohmann::json_sax<Json> {
- public:
-  explicit Events(JsonReader& reader) : reader_(reader) {}
-
-  bool null() override { return Value(nullptr); }
-  bool boolean(bool value) override { return Value(value); }
-  bool number_integer(number_integer_t value) override { return Value(value); }
-  bool number_unsigned(number_unsigned_t value) override { return Value(value); }
-  bool number_float(number_float_t value, const string_t&) override { return Value(value); }
-  bool string(string_t& value) override { return Value(std::move(value)); }
-  bool binary(binary_t&) override { return false; }  // is not in text
-  bool start_object(size_t) override { return Start(Json::object()); }
-  bool start_array(size_t) override { return Start(Json::array()); }
-  bool end_object() override { return End(); }
-  bool end_array() override { return End(); }
-  bool key(string_t& key) override {
-    reader_.Key(std::move(key));
-    return true;
-  }
-  bool parse_error(size_t, const std::string&, const Json::exception& error) override {
-    // "[json.exception.parse_error.101] parse error at line 3, ...": the name of the exception
-    // tells a user nothing.
-    const std::string what = error.what();
-    throw DataError(what.substr(what.find("] ") + 2));
-  }
-
- private:
-  bool Value(Json value) {
-    reader_.Value(std::move(value));
-    return true;
-  }
-  bool Start(Json container) {
-    reader_.Start(std::move(container));
-    return true;
-  }
-  bool End() {
-    reader_.End();
-    return true;
-  }
-
-  JsonReader& reader_;
-};
-
 Json JsonReader::Read(std::FILE* file) {
-  Events events(*this);
   try {
-    Json::sax_parse(file, &events);
+    ksi::ReadJson(file, *this);
   } catch (const DataError&) {
     if (std::ferror(file) != 0) throw DataError("cannot be read");
     throw;
@@ -107,23 +62,29 @@ Json JsonReader::Read(std::FILE* file) {
   return std::move(document_);
 }
 
-void JsonReader::Start(Json container) {
+void JsonReader::OnError(std::string_view reason) { throw DataError(std::string(reason)); }
+
+bool JsonReader::OnStart(Json::Kind kind) {
   if (open_.size() == kDeepest) Fail("is nested too deeply");
-  open_.push_back({std::move(container), {}});
+  open_.push_back({{kind, {}, {}}, {}});
+  return true;
 }
 
-void JsonReader::Key(std::string key) {
-  if (open_.back().json.contains(key)) Fail("\"" + key + "\" is given twice in one object");
-  open_.back().key = std::move(key);
+bool JsonReader::OnName(std::string name) {
+  if (ksi::FindMember(&open_.back().json, name) != nullptr) {
+    Fail("\"" + name + "\" is given twice in one object");
+  }
+  open_.back().name = std::move(name);
+  return true;
 }
 
-void JsonReader::End() {
+bool JsonReader::OnEnd() {
   Json closed = std::move(open_.back().json);
   open_.pop_back();
-  Value(std::move(closed));
+  return OnValue(std::move(closed));
 }
 
-void JsonReader::Value(Json value) {
+bool JsonReader::OnValue(Json value) {
   if (open_.empty()) {
     document_ = std::move(value);
   } else if (open_.size() == kAroundReading && InReadings()) {
@@ -133,27 +94,25 @@ void JsonReader::Value(Json value) {
   } else {
     AddToParent(std::move(value));
   }
+  return true;
 }
 
 bool JsonReader::InReadings() const {
-  return open_.size() >= kAroundReading && open_[0].key == "readings" && open_[1].json.is_array();
+  return open_.size() >= kAroundReading && open_[0].name == "readings" &&
+         open_[1].json.kind == Json::Kind::kArray;
 }
 
 bool JsonReader::InEntries() const {
-  return InReadings() && open_.size() >= kAroundEntry && open_[2].key == "instances" &&
-         open_[3].json.is_array();
+  return InReadings() && open_.size() >= kAroundEntry && open_[2].name == "instances" &&
+         open_[3].json.kind == Json::Kind::kArray;
 }
 
 void JsonReader::AddToParent(Json value) {
   Open& parent = open_.back();
-  if (parent.json.size() == kMostMembers) {
+  if (parent.json.members.size() == kMostMembers) {
     Fail("has more than " + std::to_string(kMostMembers) + " members in one place");
   }
-  if (parent.json.is_array()) {
-    parent.json.push_back(std::move(value));
-  } else {
-    parent.json[parent.key] = std::move(value);
-  }
+  parent.json.members.push_back({std::move(parent.name), std::move(value)});
 }
 
 void JsonReader::Fail(const std::string& what) const {
@@ -161,7 +120,7 @@ void JsonReader::Fail(const std::string& what) const {
 }
 
 void JsonReader::Take(const Json& reading) {
-  if (!reading.is_object()) Fail("is not an object");
+  if (reading.kind != Json::Kind::kObject) Fail("is not an object");
   try {
     take_(reading, entries_);
   } catch (const DataError& error) {

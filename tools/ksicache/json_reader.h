@@ -9,6 +9,7 @@
 #include <deque>
 #include <functional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "tools/ksicache/record_json.h"
@@ -36,7 +37,7 @@ class JsonEntries {
   std::string noText_;
 };
 
-class JsonReader {
+class JsonReader : private ksi::JsonEvents {
  public:
   // Takes a reading: its members, of which "instances" is empty, and the entries of that.
   using TakeReading = std::function<void(const Json& reading, const JsonEntries& entries)>;
@@ -48,18 +49,19 @@ class JsonReader {
   Json Read(std::FILE* file);
 
  private:
-  class Events;
-
   // A container that is not closed yet.
   struct Open {
     Json json;
-    std::string key;  // of the member that comes
+    std::string name;  // of the member that comes
   };
 
-  void Start(Json container);
-  void Key(std::string key);
-  void End();
-  void Value(Json value);
+  // These fail with a DataError, and never with false.
+  bool OnValue(Json value) override;
+  bool OnStart(Json::Kind kind) override;
+  bool OnName(std::string name) override;
+  bool OnEnd() override;
+  void OnError(std::string_view reason) override;
+
   bool InReadings() const;
   bool InEntries() const;
   void AddToParent(Json value);

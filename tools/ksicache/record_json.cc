@@ -1,11 +1,14 @@
 #include "tools/ksicache/record_json.h"
 
 #include <algorithm>
+#include <charconv>
 #include <cstring>
 #include <optional>
 
 #include <knvlibs/ksi_records.h>
+#include "knvlibs/characters.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/printable.h"
 
 namespace ksicache {
 namespace {
@@ -28,7 +31,7 @@ std::optional<unsigned> DigitOf(char c) {
 
 std::string FromHex(const Json& json, const std::string& where) {
   std::string bytes;
-  const auto* hex = json.get_ptr<const std::string*>();
+  const std::string* hex = ksi::TextOf(&json);
   bool good = hex != nullptr && hex->size() % 2 == 0;
   for (size_t i = 0; good && i < hex->size(); i += 2) {
     const auto high = DigitOf((*hex)[i]);
@@ -55,23 +58,47 @@ bool IsZero(std::span<const std::byte> bytes) {
   return std::ranges::all_of(bytes, [](std::byte byte) { return byte == std::byte{0}; });
 }
 
-Json FieldToJson(const ksi::Field& field, std::span<const std::byte> record) {
+std::string Quoted(std::string_view text) {
+  constexpr std::string_view kCharacters = "\"\\\b\f\n\r\t";
+  constexpr std::string_view kEscapes = "\"\\bfnrt";
+  std::string quoted = "\"";
+  for (const char c : text) {
+    const size_t at = kCharacters.find(c);
+    if (at != std::string_view::npos) quoted += '\\';
+    quoted += at != std::string_view::npos ? kEscapes[at] : c;
+  }
+  return PrintableJson(quoted + '"');
+}
+
+std::string HexJson(std::span<const std::byte> bytes) {
+  return R"({"hex":")" + ToHex(bytes) + "\"}";
+}
+
+std::string FieldToJson(const ksi::Field& field, std::span<const std::byte> record) {
   switch (field.type) {
     case ksi::FieldType::kUnsigned:
     case ksi::FieldType::kBits:
-      return UnsignedAt(field, record);
+      return std::to_string(UnsignedAt(field, record));
     case ksi::FieldType::kSigned:
-      return SignedAt(field, record);
+      return std::to_string(SignedAt(field, record));
     case ksi::FieldType::kText:
       break;
   }
   const std::span<const std::byte> bytes = record.subspan(field.offset, field.width);
   const std::string_view text = TextOf(field, record);
-  if (!IsZero(bytes.subspan(text.size()))) return {{"hex", ToHex(bytes)}};
-  Json json = TextToJson(text);
   // Inside a record the hexadecimal form stands for the whole field.
-  if (json.is_object()) return {{"hex", ToHex(bytes)}};
-  return json;
+  const bool isPlain = IsUtf8(text) && IsZero(bytes.subspan(text.size()));
+  return isPlain ? Quoted(text) : HexJson(bytes);
+}
+
+// None if it is anything else, or has no room in 64 bits.
+std::optional<int64_t> SignedOf(const Json& json) {
+  if (json.kind != Json::Kind::kWord) return std::nullopt;
+  int64_t number = 0;
+  const char* end = json.text.data() + json.text.size();
+  const auto [rest, error] = std::from_chars(json.text.data(), end, number);
+  if (error != std::errc() || rest != end) return std::nullopt;
+  return number;
 }
 
 void FieldFromJson(const ksi::Field& field, const Json& json, const std::string& where,
@@ -79,14 +106,14 @@ void FieldFromJson(const ksi::Field& field, const Json& json, const std::string&
   const int bits = 8 * field.width;
   uint64_t number = 0;
   bool good = false;
-  if (json.is_number_unsigned()) {
-    number = json.get<uint64_t>();
+  if (const auto natural = ksi::NumberOf(&json)) {
+    number = *natural;
     const int room = field.type == ksi::FieldType::kSigned ? bits - 1 : bits;
     good = room == 64 || number >> room == 0;
-  } else if (json.is_number_integer() && field.type == ksi::FieldType::kSigned) {
-    const auto negative = json.get<int64_t>();
-    number = static_cast<uint64_t>(negative);
-    good = negative >> (bits - 1) == -1;
+  } else if (const auto negative = SignedOf(json);
+             negative && field.type == ksi::FieldType::kSigned) {
+    number = static_cast<uint64_t>(*negative);
+    good = *negative >> (bits - 1) == -1;
   }
   if (!good) {
     throw DataError(where + ": is not a" +
@@ -119,26 +146,36 @@ void ForEachGap(const ksi::Node& node, Visit&& visit) {
 
 }  // namespace
 
-Json TextToJson(std::string_view text) {
-  Json json = text;
-  try {
-    static_cast<void>(json.dump());  // checks that it is UTF-8
-  } catch (const Json::type_error&) {
-    return {{"hex", ToHex(std::as_bytes(std::span(text)))}};
+std::string ToText(const Json& json) {
+  if (json.kind == Json::Kind::kWord) return json.text;
+  if (json.kind == Json::Kind::kText) return Quoted(json.text);
+  const bool isObject = json.kind == Json::Kind::kObject;
+  std::string text;
+  for (const auto& [name, value] : json.members) {
+    text += text.empty() ? "" : ",";
+    text += (isObject ? Quoted(name) + ":" : "") + ToText(value);
   }
-  return json;
+  return isObject ? "{" + text + "}" : "[" + text + "]";
+}
+
+bool IsUtf8(std::string_view text) {
+  while (!text.empty()) {
+    const ksi::Character first = ksi::FirstOf(text);
+    if (!first.isValid) return false;
+    text.remove_prefix(first.size);
+  }
+  return true;
+}
+
+std::string TextToJson(std::string_view text) {
+  return IsUtf8(text) ? Quoted(text) : HexJson(std::as_bytes(std::span(text)));
 }
 
 std::string TextFromJson(const Json& json, const std::string& where) {
-  std::string text;
-  if (json.is_string()) {
-    text = json.get<std::string>();
-  } else if (json.is_object() && json.size() == 1 && json.contains("hex")) {
-    text = FromHex(json["hex"], where + ".hex");
-  } else {
-    throw DataError(where + R"(: is neither a string nor {"hex": "..."})");
-  }
-  return text;
+  if (const std::string* text = ksi::TextOf(&json)) return *text;
+  const Json* hex = json.members.size() == 1 ? ksi::FindMember(&json, "hex") : nullptr;
+  if (hex == nullptr) throw DataError(where + R"(: is neither a string nor {"hex": "..."})");
+  return FromHex(*hex, where + ".hex");
 }
 
 std::string PlainTextFromJson(const Json& json, const std::string& where) {
@@ -148,26 +185,28 @@ std::string PlainTextFromJson(const Json& json, const std::string& where) {
 }
 
 int64_t NumberFromJson(const Json& json, const std::string& where) {
-  const bool fits =
-      json.is_number_integer() && !(json.is_number_unsigned() && json.get<uint64_t>() > INT64_MAX);
-  if (!fits) throw DataError(where + ": is not a whole number of 64 bits");
-  return json.get<int64_t>();
+  const std::optional<int64_t> number = SignedOf(json);
+  if (!number) throw DataError(where + ": is not a whole number of 64 bits");
+  return *number;
 }
 
-Json RecordToJson(const ksi::Node& node, std::span<const std::byte> record) {
-  Json json = Json::object();
-  for (const ksi::Field& field : node.fields) json[field.name] = FieldToJson(field, record);
+std::string RecordToJson(const ksi::Node& node, std::span<const std::byte> record) {
+  std::string json = "{";
+  const auto add = [&](std::string_view name, const std::string& value) {
+    json += (json.size() == 1 ? "" : ",") + Quoted(name) + ":" + value;
+  };
+  for (const ksi::Field& field : node.fields) add(field.name, FieldToJson(field, record));
   ForEachUnused(node, record,
-                [&](const std::string& name, const std::string& hex) { json[name] = hex; });
-  return json;
+                [&](const std::string& name, const std::string& hex) { add(name, Quoted(hex)); });
+  return json + "}";
 }
 
 std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json) {
-  if (!json.is_object()) throw DataError("value: is not an object");
+  if (json.kind != Json::Kind::kObject) throw DataError("value: is not an object");
   std::vector<std::byte> record(node.recordSize);
-  for (const auto& member : json.items()) {
-    const std::string& name = member.key();
-    const Json& value = member.value();
+  for (const Json::Member& member : json.members) {
+    const std::string& name = member.name;
+    const Json& value = member.value;
     const std::string where = "value." + name;
     const auto field = std::ranges::find_if(
         node.fields, [&](const ksi::Field& each) { return each.name == name; });

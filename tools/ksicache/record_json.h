@@ -9,20 +9,27 @@
 
 #include <cstddef>
 #include <functional>
-#include <nlohmann/json.hpp>
 #include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "knvlibs/catalogue.h"
+#include "knvlibs/json.h"
 
 namespace ksicache {
 
-using Json = nlohmann::ordered_json;
+using ksi::Json;
+
+// JSON is written with escapes for all characters that are not to be shown.
+
+// What was read, as it would be written.
+std::string ToText(const Json& json);
+
+bool IsUtf8(std::string_view text);
 
 // Text of any bytes: a string, or {"hex": "..."}.
-Json TextToJson(std::string_view text);
+std::string TextToJson(std::string_view text);
 // Fails with a DataError that starts with `where`.
 std::string TextFromJson(const Json& json, const std::string& where);
 // The same of a text that has no NUL.
@@ -31,7 +38,7 @@ std::string PlainTextFromJson(const Json& json, const std::string& where);
 // A whole number of 64 bits, signed. Fails likewise.
 int64_t NumberFromJson(const Json& json, const std::string& where);
 
-Json RecordToJson(const ksi::Node& node, std::span<const std::byte> record);
+std::string RecordToJson(const ksi::Node& node, std::span<const std::byte> record);
 
 // A field that is not given is zero. Fails with a DataError that names what is wrong.
 std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json);

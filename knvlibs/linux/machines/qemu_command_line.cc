@@ -4,7 +4,7 @@
 #include <optional>
 #include <string_view>
 
-#include "knvlibs/linux/host/json.h"
+#include "knvlibs/json.h"
 #include "knvlibs/linux/host/text.h"
 
 namespace ksi {
@@ -55,14 +55,8 @@ Properties ParseProperties(std::string_view text, std::string_view implied) {
 Properties ParseJsonProperties(std::string_view text) {
   Properties properties;
   const std::optional<Json> json = ParseJson(text);
-  if (!json || !json->is_object()) return properties;
-  for (const auto& [name, value] : json->items()) {
-    if (const std::string* word = TextOf(&value)) {
-      properties.push_back({name, *word});
-    } else if (value.is_number()) {
-      properties.push_back({name, value.dump()});
-    }
-  }
+  if (!json || json->kind != Json::Kind::kObject) return properties;
+  for (const auto& [name, value] : json->members) properties.push_back({name, value.text});
   return properties;
 }
 

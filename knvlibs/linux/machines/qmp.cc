@@ -7,7 +7,7 @@
 #include <string_view>
 
 #include <knvlibs/ksi.h>
-#include "knvlibs/linux/host/json.h"
+#include "knvlibs/json.h"
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/machines/channel.h"
 #include "knvlibs/linux/machines/listener.h"

@@ -2,12 +2,13 @@
 #include <algorithm>
 #include <set>
 #include <string>
+#include <string_view>
+#include <vector>
 
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/node_names.h"
 #include "tools/ksicache/output.h"
-#include "tools/ksicache/printable.h"
 #include "tools/ksicache/reading_walk.h"
 #include "tools/ksicache/record_json.h"
 
@@ -15,8 +16,6 @@ namespace ksicache {
 namespace {
 
 constexpr Option kJson = {"json", nullptr, "dump as JSON"};
-
-std::string Spelled(const Json& json) { return PrintableJson(json.dump()); }
 
 class Dumper {
  public:
@@ -52,10 +51,9 @@ class Dumper {
       PrintLine("taken      " + capture.taken);
       return;
     }
-    Print("{\n  \"ksiCache\": 1,\n  \"host\": " + Spelled(TextToJson(capture.host)) +
-          ",\n  \"taken\": " + Spelled(TextToJson(capture.taken)) +
-          ",\n  \"built\": " + Spelled(TextToJson(capture.built)) +
-          ",\n  \"signature\": " + Spelled(TextToJson(capture.signature)) + ",\n  \"readings\": [");
+    Print("{\n  \"ksiCache\": 1,\n  \"host\": " + TextToJson(capture.host) + ",\n  \"taken\": " +
+          TextToJson(capture.taken) + ",\n  \"built\": " + TextToJson(capture.built) +
+          ",\n  \"signature\": " + TextToJson(capture.signature) + ",\n  \"readings\": [");
   }
 
   static void PrintName(const Reading& reading) {
@@ -90,22 +88,23 @@ class Dumper {
   }
 
   // One reading, one line: such files compare well.
-  void PrintJson(const Reading& reading, const char* member, const Json& answer) {
-    Json keys = Json::array();
+  void PrintJson(const Reading& reading, std::string_view member, const std::string& answer) {
+    std::string line = R"({"node":)" + TextToJson(reading.row->path) + R"(,"keys":[)";
     for (size_t i = 0; i < reading.keys.count; ++i) {
       const ksi::Key& key = reading.keys[i];
-      keys.push_back(key.kind == ksi::KeyKind::kNumber ? Json(key.number) : TextToJson(key.text));
+      line += i == 0 ? "" : ",";
+      line += key.kind == ksi::KeyKind::kNumber ? std::to_string(key.number) : TextToJson(key.text);
     }
-    const Json line = {{"node", reading.row->path}, {"keys", keys}, {member, answer}};
+    line.append("],\"").append(member).append("\":").append(answer).append("}");
     Print(first_ ? "\n    " : ",\n    ");
-    Print(Spelled(line));
+    Print(line);
     first_ = false;
   }
 
   void PrintFailure(const Reading& reading) {
     const std::string status = Hex(static_cast<ksi::Status>(reading.status));
     if (json_) {
-      PrintJson(reading, "status", status);
+      PrintJson(reading, "status", TextToJson(status));
     } else {
       PrintName(reading);
       PrintLine("    failed with " + status);
@@ -140,28 +139,36 @@ class Dumper {
     });
   }
 
+  // Text that is not UTF-8 looks the same in both.
+  std::string EntryOf(const ksi::Statement& row) const {
+    if (row.Type(1) == SQLITE_INTEGER) return std::to_string(row.Number(1));
+    const std::string_view text = row.Text(1);
+    return json_ || !IsUtf8(text) ? TextToJson(text) : std::string(text);
+  }
+
+  void PrintEntries(const Reading& reading, const std::vector<std::string>& entries) {
+    if (!json_) {
+      PrintName(reading);
+      for (const std::string& entry : entries) PrintLine("    " + entry);
+      return;
+    }
+    std::string list;
+    for (const std::string& entry : entries) list += (list.empty() ? "" : ",") + entry;
+    PrintJson(reading, "instances", "[" + list + "]");
+  }
+
   void PrintList(const Reading& reading) {
-    Json entries = Json::array();
+    std::vector<std::string> entries;
     int64_t position = 0;
     bool good = true;
     instances_.ForEach(reading, [&](int64_t at, const ksi::Statement& row) {
       good = good && at == position++ && position <= reading.count;
-      if (!good) return;
-      if (row.Type(1) == SQLITE_INTEGER) {
-        entries.push_back(row.Number(1));
-      } else {
-        entries.push_back(TextToJson(row.Text(1)));
-      }
+      if (good) entries.push_back(EntryOf(row));
     });
     if (!good || position != reading.count) {
       Complain(reading, "is a list with gaps");
-    } else if (json_) {
-      PrintJson(reading, "instances", entries);
     } else {
-      PrintName(reading);
-      for (const Json& entry : entries) {
-        PrintLine("    " + (entry.is_string() ? entry.get<std::string>() : entry.dump()));
-      }
+      PrintEntries(reading, entries);
     }
   }
 

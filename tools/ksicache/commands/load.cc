@@ -21,7 +21,7 @@ namespace ksicache {
 namespace {
 
 ksi::Status StatusFromJson(const Json& json) {
-  const auto* text = json.get_ptr<const std::string*>();
+  const std::string* text = ksi::TextOf(&json);
   ksi::Status status = 0;
   if (text != nullptr && text->starts_with("0x")) {
     const char* end = text->data() + text->size();
@@ -42,7 +42,7 @@ struct Members {
 
 Members MembersOf(const Json& reading) {
   Members members;
-  for (const auto& [name, value] : reading.items()) {
+  for (const auto& [name, value] : reading.members) {
     if (name == "node") {
       members.node = &value;
     } else if (name == "keys") {
@@ -59,10 +59,10 @@ Members MembersOf(const Json& reading) {
 }
 
 const ksi::Node& NodeOf(const Members& members) {
-  if (members.node == nullptr || !members.node->is_string()) throw DataError("has no \"node\"");
-  const auto path = members.node->get<std::string>();
-  const ksi::Node* node = ksi::FindNode(path);
-  if (node == nullptr) throw DataError("there is no node " + path);
+  const std::string* path = ksi::TextOf(members.node);
+  if (path == nullptr) throw DataError("has no \"node\"");
+  const ksi::Node* node = ksi::FindNode(*path);
+  if (node == nullptr) throw DataError("there is no node " + *path);
   return *node;
 }
 
@@ -70,7 +70,7 @@ const ksi::Node& NodeOf(const Members& members) {
 ksi::Kind KindOf(const ksi::Node& node, const Members& members) {
   const bool failed = members.kind == "status";
   const bool byKeys = failed && node.HasValue() && node.HasList();
-  const bool value = byKeys   ? members.keys->size() == node.valueKeys.Count()
+  const bool value = byKeys   ? members.keys->members.size() == node.valueKeys.Count()
                      : failed ? node.HasValue()
                               : members.kind == "value";
   if (value && !node.HasValue()) throw DataError("the node has no value");
@@ -80,19 +80,20 @@ ksi::Kind KindOf(const ksi::Node& node, const Members& members) {
 
 // `texts` has the texts among the keys.
 ksi::Keys TakeKeys(const ksi::Keying& keying, const Json& json, std::string* texts) {
-  if (json.size() != keying.Count()) {
+  if (json.members.size() != keying.Count()) {
     throw DataError("keys: the node takes " + std::to_string(keying.Count()));
   }
   ksi::Keys keys;
   for (keys.count = 0; keys.count < keying.Count(); ++keys.count) {
     const size_t i = keys.count;
     const std::string where = "keys[" + std::to_string(i) + "] (" + ksi::NameOf(keying.at[i]) + ")";
+    const Json& given = json.members[i].value;
     ksi::Key& key = keys.at[i];
     key.kind = ksi::KindOf(keying.at[i]);
     if (key.kind == ksi::KeyKind::kNumber) {
-      key.number = NumberFromJson(json[i], where);
+      key.number = NumberFromJson(given, where);
     } else {
-      texts[i] = PlainTextFromJson(json[i], where);
+      texts[i] = PlainTextFromJson(given, where);
       key.text = texts[i];
     }
   }
@@ -123,7 +124,7 @@ void TakeAnswer(const ksi::Node& node, const Members& members, const JsonEntries
     writer.AddFailure(node, kind, keys, StatusFromJson(*members.answer));
   } else if (isValue) {
     writer.AddValue(node, keys, RecordFromJson(node, *members.answer));
-  } else if (!members.answer->is_array()) {
+  } else if (members.answer->kind != Json::Kind::kArray) {
     throw DataError("instances: is not an array");
   } else {
     TakeList(node, keys, entries, writer);
@@ -134,7 +135,7 @@ void TakeReading(const Json& reading, const JsonEntries& entries, CacheWriter& w
   const Members members = MembersOf(reading);
   const ksi::Node& node = NodeOf(members);
   const std::string path(node.path);
-  if (members.keys == nullptr || !members.keys->is_array()) {
+  if (members.keys == nullptr || members.keys->kind != Json::Kind::kArray) {
     throw DataError(path + ": has no \"keys\"");
   }
   if (members.answer == nullptr) {
@@ -143,13 +144,14 @@ void TakeReading(const Json& reading, const JsonEntries& entries, CacheWriter& w
   try {
     TakeAnswer(node, members, entries, writer);
   } catch (const DataError& error) {
-    throw DataError(path + " " + members.keys->dump() + ": " + error.what());
+    throw DataError(path + " " + ToText(*members.keys) + ": " + error.what());
   }
 }
 
 void TakeMember(const std::string& name, const Json& value, ksi::CacheFile::Capture* capture) {
   if (name == "ksiCache") {
-    if (value != ksi::cache::kSchemaVersion) throw DataError("ksiCache: is not 1");
+    if (ksi::NumberOf(&value) != uint64_t{ksi::cache::kSchemaVersion})
+      throw DataError("ksiCache: is not 1");
   } else if (name == "host") {
     capture->host = PlainTextFromJson(value, name);
   } else if (name == "taken") {
@@ -158,21 +160,23 @@ void TakeMember(const std::string& name, const Json& value, ksi::CacheFile::Capt
     capture->built = PlainTextFromJson(value, name);
   } else if (name == "signature") {
     capture->signature = PlainTextFromJson(value, name);
-  } else if (name != "readings" || !value.is_array()) {
+  } else if (name != "readings" || value.kind != Json::Kind::kArray) {
     throw DataError("\"" + name + "\" is no member of a cache file");
   }
 }
 
 // What stands around the readings.
 ksi::CacheFile::Capture TakeHead(const Json& document) {
-  if (!document.is_object() || !document.contains("ksiCache")) {
+  if (ksi::FindMember(&document, "ksiCache") == nullptr) {
     throw DataError("is not the JSON of a cache file: it has no \"ksiCache\"");
   }
   ksi::CacheFile::Capture capture{
       std::string(ksi::kDefinitions.signature), std::string(ksi::kDefinitions.built), {}, {}};
-  for (const auto& [name, value] : document.items()) TakeMember(name, value, &capture);
+  for (const auto& [name, value] : document.members) TakeMember(name, value, &capture);
   for (const char* required : {"host", "taken", "readings"}) {
-    if (!document.contains(required)) throw DataError(std::string("has no ") + required);
+    if (ksi::FindMember(&document, required) == nullptr) {
+      throw DataError(std::string("has no ") + required);
+    }
   }
   if (const char* bad = ksi::BadMember(capture)) {
     throw DataError(std::string(bad) + ": is not as it is in a cache file");
