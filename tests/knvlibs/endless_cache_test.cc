@@ -100,6 +100,19 @@ TEST_F(EndlessCache, Nodes) {
   EXPECT_EQ(Open(), KSI_STATUS_METADATA_READ_ERROR);
 }
 
+// SQLite takes in all of the schema before it answers anything.
+TEST_F(EndlessCache, Schema) {
+  RunSql(
+      file_,
+      "PRAGMA writable_schema = ON; WITH RECURSIVE r(n) AS (SELECT 1 UNION ALL SELECT n + 1 FROM "
+      "r LIMIT 30000) INSERT INTO sqlite_schema SELECT 'table', 't' || n, 't' || n, 2, 'CREATE "
+      "TABLE t' || n || '(a)' FROM r");
+  std::unique_ptr<CacheFile> file;
+  std::string why;
+  EXPECT_EQ(CacheFile::Open(file_.c_str(), &file, &why), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(why, "its pages lead to each other without end");
+}
+
 // Each comparison with a row reads all of it, and rows go in a circle through one page: a single
 // step of a search takes as long as all the file has pages, for each comparison on each level.
 TEST_F(EndlessCache, RowsThatLeadBackToThemselves) {

@@ -17,6 +17,7 @@
 #include "tests/harness/program.h"
 #include "tests/harness/tally.h"
 #include "tests/knvlibs/cache_fixture.h"
+#include "tests/knvlibs/hostile_pages.h"
 
 namespace ksi {
 namespace {
@@ -211,6 +212,44 @@ TEST_F(HostileCache, WithoutADescriptorLeft) {
   ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &before), 0);
   EXPECT_EQ(status, KSI_STATUS_IO_ERROR);
 }
+
+TEST_F(HostileCache, NodesThatAreNotInTheOrderOfTheirNumbers) {
+  const std::string good = FileContent(file_);
+  // The places of a page's cells, two bytes each.
+  const size_t cells = (PageFile::RootOf(file_, "node") - 1) * PageFile::kPage + 8;
+  const std::string first = good.substr(cells, 2);
+  const std::string second = good.substr(cells + 2, 2);
+  for (const std::string& places : {second + first, first + first}) {
+    WriteContent(file_, std::string(good).replace(cells, 4, places));
+    std::unique_ptr<CacheFile> file;
+    std::string why;
+    EXPECT_EQ(CacheFile::Open(file_.c_str(), &file, &why), KSI_STATUS_METADATA_READ_ERROR);
+    EXPECT_EQ(why, "the table node is not understood");
+  }
+}
+
+#ifdef TALLY_SWAPPED
+// A file that somebody puts in the place of the one that was looked at is not waited for. (A
+// sanitizer does not share its process with another library that stands before it.)
+TEST_F(HostileCache, SwappedForAPipeBeforeItIsOpened) {
+  for (const std::string file : {"host.ksi", "host.ksi-journal"}) {
+    WriteSmallHost(file_);
+    WriteContent(directory_.Path("host.ksi-journal"), "half of a change");
+    ASSERT_EQ(mkfifo(directory_.Path("pipe").c_str(), 0600), 0);
+    harness::Program program;
+    program.path = KSICACHE_PROGRAM;
+    program.args = {"ksicache", "info", file_};
+    program.environment = harness::OwnEnvironment();
+    program.environment.emplace_back("LD_PRELOAD=" TALLY_SWAPPED);
+    program.environment.push_back("SWAPPED=" + directory_.Path(file));
+    program.environment.push_back("SWAPPED_FOR=" + directory_.Path("pipe"));
+    const harness::Result result = harness::RunProgram(program);
+    EXPECT_EQ(result.status, 1) << file << ": " << result.err;
+    EXPECT_TRUE(std::filesystem::is_fifo(directory_.Path(file)));
+    std::filesystem::remove(directory_.Path(file));
+  }
+}
+#endif
 
 // A file of which only the head was made, larger than any capture.
 TEST_F(HostileCache, HolesOfATerabyte) {

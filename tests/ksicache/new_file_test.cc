@@ -3,12 +3,15 @@
 #include <signal.h>
 #include <spawn.h>
 #include <stdlib.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 
 #include <array>
 #include <chrono>
+#include <future>
 #include <thread>
+#include <utility>
 
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/ksicache_fixture.h"
@@ -120,6 +123,73 @@ TEST_F(Ksicache, FilesAreMadeWithoutUnnamedOnes) {
     EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
     unlink(Path("a.ksi").c_str());
   }
+}
+
+// A file that has another name for a while, for want of unnamed ones or to take the place of a file
+// that is there, has its own before a signal ends the program.
+TEST_F(Ksicache, AHangupLeavesNoOtherName) {
+  WriteContent(Path("a.json"), JsonWith(""));
+  const std::pair<std::string, std::string> cases[] = {{"openat", "fsync"}, {"", "linkat"}};
+  for (const auto& [refused, last] : cases) {
+    WriteContent(Path("a.ksi"), "old");
+    harness::Program program = Command({"load", "--force", Path("a.json"), Path("a.ksi")});
+    program.environment.emplace_back("LD_PRELOAD=" KSICACHE_WITHOUT_UNNAMED_FILES);
+    program.environment.push_back("REFUSED=" + refused);
+    program.environment.push_back("HANGUP_AFTER=" + last);
+    EXPECT_EQ(harness::RunProgram(program).status, -SIGHUP) << last;
+    EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
+    EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
+  }
+}
+
+// What comes into the place of a file to be while it is made stays.
+TEST_F(Ksicache, AFileThatCameMeanwhileIsNotReplaced) {
+  const std::string pipe = Path("pipe");
+  for (const std::string refused : {"", "linkat"}) {
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    const int writer = open(pipe.c_str(), O_RDWR | O_CLOEXEC);
+    ASSERT_GE(writer, 0);
+    const std::string json = JsonWith("");
+    ASSERT_EQ(write(writer, json.data(), 1), 1);
+    harness::Program program = Command({"load", pipe, Path("a.ksi")});
+    program.environment.emplace_back("LD_PRELOAD=" KSICACHE_WITHOUT_UNNAMED_FILES);
+    program.environment.push_back("REFUSED=" + refused);
+    auto result = std::async(std::launch::async, [&] { return harness::RunProgram(program); });
+    // It has looked for the file when it reads.
+    for (int unread = 1; unread != 0;) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(1));
+      ASSERT_EQ(ioctl(writer, FIONREAD, &unread), 0);
+    }
+    WriteContent(Path("a.ksi"), "precious");
+    ASSERT_EQ(write(writer, json.data() + 1, json.size() - 1), ssize_t(json.size() - 1));
+    close(writer);
+    EXPECT_EQ(result.get().err,
+              "ksicache: " + Path("a.ksi") + ": exists already (--force replaces it)\n");
+    EXPECT_EQ(FileContent(Path("a.ksi")), "precious");
+    EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.ksi", "pipe"}));
+    unlink(Path("a.ksi").c_str());
+    unlink(pipe.c_str());
+  }
+}
+
+// The file and its name: neither is taken for kept before the disk has it.
+TEST_F(Ksicache, WhatTheDiskDoesNotTakeIsToldAndReplacesNothing) {
+  WriteContent(Path("a.json"), JsonWith(""));
+  WriteContent(Path("a.ksi"), "precious");
+  harness::Program program = Command({"load", "--force", Path("a.json"), Path("a.ksi")});
+  program.environment.emplace_back("LD_PRELOAD=" TALLY_FAIL_NTH);
+  program.environment.emplace_back("FAIL=fsync:1");
+  harness::Result result = harness::RunProgram(program);
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err, "ksicache: " + Path("a.ksi") + ": cannot write: Input/output error\n");
+  EXPECT_EQ(FileContent(Path("a.ksi")), "precious");
+  EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
+
+  program.environment.back() = "FAIL=fsync:2";
+  result = harness::RunProgram(program);
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err, "ksicache: " + Path("a.ksi") + ": Input/output error\n");
+  EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
 }
 #endif
 

@@ -1,8 +1,10 @@
 /* Stands before the C library and refuses files without a name: those of O_TMPFILE if REFUSED is
- * "openat", giving them names if it is "linkat". */
+ * "openat", giving them names if it is "linkat". The terminal hangs up when the call has
+ * succeeded that HANGUP_AFTER names, "fsync" or "linkat". */
 #define _GNU_SOURCE
 #include <errno.h>
 #include <fcntl.h>
+#include <signal.h>
 #include <stdarg.h>
 #include <stdlib.h>
 #include <string.h>
@@ -12,6 +14,17 @@
 static int IsRefused(const char* call) {
   const char* refused = getenv("REFUSED");
   return refused != NULL && strcmp(refused, call) == 0;
+}
+
+/* The result of a call, which may be the last that succeeds. */
+static int HangUpAfter(const char* call, long result) {
+  const char* last = getenv("HANGUP_AFTER");
+  if (result == 0 && last != NULL && strcmp(last, call) == 0) raise(SIGHUP);
+  return (int)result;
+}
+
+__attribute__((visibility("default"))) int fsync(int fd) {
+  return HangUpAfter("fsync", syscall(SYS_fsync, fd));
 }
 
 __attribute__((visibility("default"))) int openat(int directory, const char* path, int flags, ...) {
@@ -32,5 +45,5 @@ __attribute__((visibility("default"))) int linkat(int from, const char* file, in
     errno = ENOENT;
     return -1;
   }
-  return (int)syscall(SYS_linkat, from, file, to, path, flags);
+  return HangUpAfter("linkat", syscall(SYS_linkat, from, file, to, path, flags));
 }

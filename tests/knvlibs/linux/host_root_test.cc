@@ -3,6 +3,7 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <array>
 #include <cerrno>
@@ -131,6 +132,32 @@ TEST(HostRoot, AHostIsReadBelowItsRootAlone) {
   EXPECT_EQ(host.List("/sys", entries), KSI_STATUS_NOT_FOUND);
   EXPECT_EQ(host.ReadLink("/proc/meminfo", content), kOk);
   EXPECT_EQ(content, outside.Root() + "/meminfo");
+}
+
+TEST(HostRoot, APipeInATreeIsAnEmptyFile) {
+  const HostTree tree;
+  ASSERT_EQ(mkfifo((tree.Root() + "/meminfo").c_str(), 0600), 0);
+  std::string content = "old";
+  EXPECT_EQ(LinuxHost(tree.Root()).Read("/meminfo", content), kOk);
+  EXPECT_EQ(content, "");
+}
+
+TEST(HostRoot, AFileIsReadWholeOrNotAtAll) {
+  constexpr size_t kTooLarge = size_t{64} << 20;
+  const HostTree tree;
+  tree.Write("/meminfo", "MemTotal");
+  const LinuxHost host(tree.Root());
+  std::string content;
+  std::filesystem::resize_file(tree.Root() + "/meminfo", kTooLarge - 1);
+  EXPECT_EQ(host.Read("/meminfo", content), kOk);
+  EXPECT_EQ(content.size(), kTooLarge - 1);
+  EXPECT_TRUE(content.starts_with("MemTotal"));
+
+  std::filesystem::resize_file(tree.Root() + "/meminfo", kTooLarge);
+  testing::internal::CaptureStderr();
+  EXPECT_EQ(host.Read("/meminfo", content), KSI_STATUS_READ_ERROR);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "/meminfo: File too large: what cannot be read is left out or has no value\n");
 }
 
 }  // namespace

@@ -140,6 +140,14 @@ TEST(MonitorSocketTest, WhoDoesNotListenIsNotConnectedTo) {
       MonitorSocket(StandingClock, kDistant).Connect("/" + std::string(200, 'x'), getpid()));
 }
 
+TEST(MonitorSocketTest, AListenerWhoseQueueIsFullIsNotWaitedFor) {
+  const Endpoint endpoint;
+  ASSERT_EQ(listen(endpoint.Fd(), 0), 0);
+  MonitorSocket first(StandingClock, kDistant);
+  ASSERT_TRUE(first.Connect(endpoint.Path(), getpid()));
+  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect(endpoint.Path(), getpid()));
+}
+
 TEST(MonitorSocketTest, AListenerOfAnotherProcessIsNotTalkedTo) {
   const Peer peer(Listen);
   EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect(peer.Path(), getppid()));
