@@ -110,12 +110,12 @@ TEST(QemuCommandLineTest, AServerWaitsForItsFirstClientUnlessItIsToldNotTo) {
 
 class QmpTest : public testing::Test {
  protected:
-  GuestMemory Ask(const std::string& text) {
+  GuestMemory Ask(const std::string& text, const std::string& balloon = "balloon0") {
     tree_.Write("/run/q", text);
     QemuCommandLine line;
     line.monitor = "/run/q";
     line.hasBalloon = true;
-    line.balloon = "balloon0";
+    line.balloon = balloon;
     return ReadGuestMemory(LinuxHost(tree_.Root()), 100, line);
   }
 
@@ -141,6 +141,17 @@ TEST_F(QmpTest, StatisticsThatWereNeverSentAreNone) {
                                  "{\"stat-total-memory\": 4096}, \"last-update\": 0}}\n");
   EXPECT_EQ(memory.actual, 1024u);
   EXPECT_EQ(memory.total, std::nullopt);
+}
+
+TEST_F(QmpTest, OnlyABalloonWhoseNameCanStandInAPathIsAskedForTheGuest) {
+  const std::string answers = hello_ +
+                              "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": "
+                              "{\"stat-total-memory\": 4096}, \"last-update\": 5}}\n";
+  EXPECT_EQ(Ask(answers, "Balloon-0._z").total, 4u);
+  for (const char* name : {"", "a/b", "a b", "a\"}}", "\xc3\xbc"}) {
+    EXPECT_EQ(Ask(answers, name).actual, 1024u) << name;
+    EXPECT_EQ(Ask(answers, name).total, std::nullopt) << name;
+  }
 }
 
 TEST_F(QmpTest, WithoutABalloonDeviceThereIsNone) {
