@@ -24,6 +24,7 @@ namespace ksi {
 
 struct Reading {
   Once<FigureFile, FigureFile::ReadMeminfo> meminfo;
+  Once<FigureFile, FigureFile::ReadVmstat> vmstat;
   Once<Zones, ReadZones> zones;
   Once<MemoryNodes, ReadMemoryNodes> memoryNodes;
   Once<Buddies, ReadBuddies> buddies;

@@ -417,6 +417,52 @@ TEST_F(GroupsTest, WhatIsLockedOrPinnedOrHugeIsNotSwappedAndInMemory) {
   EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, 40u);
 }
 
+// Huge pages of hugetlb, which a cgroup's current does not count: 6 MB of them are in use.
+class HugetlbTest : public GroupsTest {
+ protected:
+  HugetlbTest() {
+    tree_.Write("/proc/meminfo",
+                "MemTotal: 65536 kB\nMemFree: 24 kB\nSlab: 8 kB\nPageTables: 4 kB\n"
+                "VmallocUsed: 4 kB\nHugePages_Total: 5\nHugePages_Free: 2\nHugepagesize: 2048 kB\n"
+                "Hugetlb: 10240 kB\n");
+    for (const char* pool : {"2048kB", "1048576kB"}) {
+      tree_.Write(std::string("/sys/kernel/mm/hugepages/hugepages-") + pool + "/nr_hugepages", "");
+    }
+    WriteHuge(kPid, 6144);
+  }
+
+  void WriteHuge(int32_t pid, uint64_t size) {
+    tree_.Write(ProcessFile(pid, "status"),
+                "Name:\tworker\nVmSize:\t 9000 kB\nVmRSS:\t 400 kB\nHugetlbPages:\t " +
+                    std::to_string(size) + " kB\nThreads:\t1\n");
+  }
+
+  KSI_GroupMemoryStats Jobs() {
+    return Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kJobs);
+  }
+};
+
+TEST_F(HugetlbTest, IsConsumedByTheCgroup) {
+  tree_.Write("/sys/fs/cgroup/jobs/hugetlb.2MB.current", "4194304\n");
+  tree_.Write("/sys/fs/cgroup/jobs/hugetlb.1GB.current", "1073741824\n");
+  tree_.Write("/sys/fs/cgroup/jobs/memory.peak", "9999360\n");
+  EXPECT_EQ(uint64_t{Jobs().consumed}, 1024u + 4096 + 1048576);
+  EXPECT_EQ(uint64_t{Jobs().consumedPeak}, kNoValue) << "no kernel keeps the peak of both";
+}
+
+TEST_F(HugetlbTest, WithoutTheControllerTheProcessesTell) {
+  EXPECT_EQ(uint64_t{Jobs().consumed}, 1024u + 6144);
+  // Two that map the same pages: nobody tells whose they are.
+  WriteHuge(101, 2048);
+  EXPECT_EQ(uint64_t{Jobs().consumed}, kNoValue);
+}
+
+TEST_F(HugetlbTest, MayBeMountedToCountAsMemory) {
+  tree_.Write("/proc/self/mounts",
+              "cgroup2 /sys/fs/cgroup cgroup2 rw,memory_hugetlb_accounting 0 0\n");
+  EXPECT_EQ(uint64_t{Jobs().consumed}, 1024u);
+}
+
 // Page sharing on the host: 20 pages stand for 100, and 8 zero pages for as many.
 class SharingTest : public GroupsTest {
  protected:

@@ -69,6 +69,16 @@ TEST_P(HostReportsTest, ShowTheFiguresOfTheHost) {
   harness::ExpectGolden(std::string("knvlibs/hosts/") + GetParam() + ".reports.txt", text);
 }
 
+TEST_P(HostReportsTest, EveryPageIsInOneOfFourParts) {
+  LinuxSource source(RecordedHost(GetParam()));
+  KSI_Comprehensive memory = {};
+  ASSERT_EQ(GetValue(source, "memory/comprehensive", {}, &memory), kOk);
+  const auto total = static_cast<double>(memory.managedByMemMap);
+  EXPECT_NEAR(static_cast<double>(memory.free + memory.dataAndHeap + memory.knvClientConsumed +
+                                  memory.otherConsumed),
+              total, 0.005 * total);
+}
+
 INSTANTIATE_TEST_SUITE_P(Hosts, HostReportsTest,
                          testing::Values("cgroup-v1-vm", "systemd-server", "kvm-two-nodes"),
                          [](const auto& host) {

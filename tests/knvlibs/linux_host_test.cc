@@ -468,6 +468,17 @@ TEST_F(LinuxHostTest, VolumesAndRegionsStandInTheOrderOfTheirNumbers) {
   ASSERT_EQ(Get("memory/pmem/volumes/regionStore/info", {"region2"}, &store), kOk);
   EXPECT_EQ(uint64_t{store.avail2MBlocks}, 0u);
   EXPECT_EQ(uint64_t{store.alloc2MBlocks}, 1u) << "the two together";
+
+  // Some kernels call all of it available, for no label has any.
+  const std::string nd = kNd;
+  tree_.Write(nd + "region4/size", "8388608\n");
+  tree_.Write(nd + "region4/available_size", "8388608\n");
+  tree_.Write(nd + "namespace4.0/size", "6291456\n");
+  ASSERT_EQ(Get("memory/pmem/volumes/regionStore/info", {"region4"}, &store), kOk);
+  EXPECT_EQ(uint64_t{store.total2MBlocks}, 4u);
+  EXPECT_EQ(uint64_t{store.alloc2MBlocks}, 3u);
+  EXPECT_EQ(uint64_t{store.avail2MBlocks}, 1u);
+  EXPECT_EQ(uint64_t{store.resvd2MBlocks}, 3u);
 }
 
 TEST_F(LinuxHostTest, NamespaceIsNotFollowedOutOfItsDirectory) {

@@ -129,9 +129,9 @@ TEST_F(LinuxMemory, IsDividedAsTheFilesSay) {
   EXPECT_EQ(uint64_t{record.critical}, 100 * kPage);
   EXPECT_EQ(uint64_t{record.buddyOvhd}, 23 * kPage);
   EXPECT_EQ(uint64_t{record.kernelCode}, 1024u + 1);
-  EXPECT_EQ(uint64_t{record.dataAndHeap}, 700u + 50 + 7 + 60 + 30);
+  EXPECT_EQ(uint64_t{record.dataAndHeap}, 700u + 50 + 7 + 60 + 30 + 9 * kPage);
   EXPECT_EQ(uint64_t{record.knvClientConsumed}, 100u + 2000 - 500);
-  EXPECT_EQ(uint64_t{record.otherConsumed}, 3000u + 500 + 3 * 2048);
+  EXPECT_EQ(uint64_t{record.otherConsumed}, 3000u + 500 + 5 * 2048);
   EXPECT_EQ(uint64_t{record.rsvdLow}, 100 * kPage);
   EXPECT_EQ(uint64_t{record.free}, 4000u);
 }
@@ -158,8 +158,39 @@ TEST_F(LinuxMemory, MechanismsThatAKernelIsBuiltWithoutAreZero) {
               "AnonPages: 3000 kB\nSlab: 700 kB\nPageTables: 50 kB\nVmallocUsed: 60 kB\n");
   const KSI_Comprehensive record = Comprehensive();
   EXPECT_EQ(uint64_t{record.discarded}, 0u);
-  EXPECT_EQ(uint64_t{record.dataAndHeap}, 810u);
+  EXPECT_EQ(uint64_t{record.dataAndHeap}, 810u + 9 * kPage);
   EXPECT_EQ(uint64_t{record.otherConsumed}, 3000u);
+}
+
+TEST_F(LinuxMemory, CompressedMemoryIsTheKernels) {
+  const uint64_t without = Comprehensive().dataAndHeap;
+  tree_.Write("/proc/vmstat", "nr_zspages 50\n");
+  EXPECT_EQ(uint64_t{Comprehensive().dataAndHeap}, without + 50 * kPage);
+  // A pool of zswap that is in zsmalloc, and one that is not.
+  tree_.Write("/proc/meminfo", std::string(kMeminfo) + "Zswap: 100 kB\n");
+  EXPECT_EQ(uint64_t{Comprehensive().dataAndHeap}, without + 50 * kPage);
+  tree_.Write("/proc/meminfo", std::string(kMeminfo) + "Zswap: 300 kB\n");
+  EXPECT_EQ(uint64_t{Comprehensive().dataAndHeap}, without + 300);
+}
+
+TEST_F(LinuxMemory, HugePagesOfAllSizesAreInUseOrKeptForIt) {
+  tree_.Write("/proc/meminfo", std::string(kMeminfo) + "Hugetlb: 1058816 kB\n");
+  EXPECT_EQ(uint64_t{Comprehensive().otherConsumed}, 3000u + 500 + 1058816);
+}
+
+TEST_F(LinuxMemory, WhatNobodyHasMappedIsOnTheListsOfReclaim) {
+  // Pages of files 1600, and of processes 3900, of which 400 wait in the swap cache.
+  const std::string lists = "Active: 2000 kB\nInactive: 3000 kB\nUnevictable: 480 kB\n";
+  tree_.Write("/proc/vmstat", "nr_isolated_anon 2\nnr_isolated_file 3\n");
+  tree_.Write("/proc/meminfo", kMeminfo + lists);
+  EXPECT_EQ(uint64_t{Comprehensive().otherConsumed}, 3900u + 5 * 2048);
+  EXPECT_EQ(uint64_t{Comprehensive().knvClientConsumed}, 1600u);
+  // Lists that miss pages that were just made, and such as tell of a part only.
+  for (const char* less : {"Active: 1000 kB\nInactive: 100 kB\nUnevictable: 0 kB\n",
+                           "Active: 9000 kB\nInactive: 9000 kB\n"}) {
+    tree_.Write("/proc/meminfo", std::string(kMeminfo) + less);
+    EXPECT_EQ(uint64_t{Comprehensive().otherConsumed}, 3500u + 5 * 2048) << less;
+  }
 }
 
 TEST_F(LinuxMemory, StateFollowsFromTheWatermarks) {
@@ -174,7 +205,7 @@ TEST_F(LinuxMemory, StateFollowsFromTheWatermarks) {
     ASSERT_EQ(Read(&record), kOk);
     EXPECT_EQ(uint32_t{record.memState}, each.state) << each.free;
     EXPECT_EQ(uint64_t{record.minFree}, 300 * kPage);
-    EXPECT_EQ(uint64_t{record.managedByMemSched}, 16800u - 847);
+    EXPECT_EQ(uint64_t{record.managedByMemSched}, 16800u - 847 - 9 * kPage);
   }
   std::string low = Zoneinfo(0);
   low.replace(low.find("free     100"), 12, "free     099");

@@ -132,6 +132,17 @@ TEST(LiveHostTest, FreeBuffersAreTheFreeMemoryOfNumastat) {
               [] { return FreeOfAll() / kMB; });
 }
 
+TEST(LiveHostTest, EveryPageIsInOneOfFourParts) {
+  // What is left are pages that drivers take from the page allocator for themselves.
+  LinuxSource source("/");
+  KSI_Comprehensive memory = {};
+  ASSERT_EQ(GetValue(source, "memory/comprehensive", {}, &memory), kOk);
+  const double total = static_cast<double>(memory.managedByMemMap);
+  const double parts = static_cast<double>(memory.free + memory.dataAndHeap +
+                                           memory.knvClientConsumed + memory.otherConsumed);
+  EXPECT_NEAR(parts, total, total < 3 * kMB * kMB ? 0.02 * total : 0.005 * total);
+}
+
 TEST(LiveHostTest, BuffersTogetherAreWhatTheZonesManage) {
   // To the page, for what is used is what is not free at the same moment.
   ExpectAgree("awk '$1 == \"managed\" { sum += $2 } END { printf \"%.0f\", sum }' /proc/zoneinfo",

@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <initializer_list>
+#include <iterator>
 
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/linux/memory/hugepages.h"
 
 namespace ksi {
 namespace {
@@ -26,6 +28,14 @@ Figure KBOf(const FigureFile& stat, std::initializer_list<std::string_view> name
   Figure bytes = 0;
   for (const std::string_view name : names) bytes = SumOf({bytes, stat.Find(name)});
   return QuotientOf(bytes, 1024);
+}
+
+// "hugetlb.2MB.current"
+std::string HugetlbFile(uint64_t sizeKB) {
+  constexpr const char* kUnits[] = {"KB", "MB", "GB"};
+  size_t unit = 0;
+  for (; sizeKB >= 1024 && unit + 1 < std::size(kUnits); ++unit) sizeKB /= 1024;
+  return "hugetlb." + std::to_string(sizeKB) + kUnits[unit] + ".current";
 }
 
 }  // namespace
@@ -192,6 +202,29 @@ Status CgroupHierarchy::ReadUsage1(const LinuxHost& host, std::string_view path,
   if (!usage.swap) usage.swap = DifferenceOf(withSwap, usage.current);
   usage.active = KBOf(stat, {"total_active_anon", "total_active_file"});
   return kOk;
+}
+
+Status CgroupHierarchy::ReadHugetlb(const LinuxHost& host, std::string_view path,
+                                    Figure& hugetlb) const {
+  hugetlb.reset();
+  if (version_ != Version::k2) return kOk;
+  // Since Linux 6.6 hugetlb can be mounted to count as memory.
+  std::string mounts;
+  if (host.Read("/proc/self/mounts", mounts) == kOk &&
+      mounts.find("memory_hugetlb_accounting") != std::string::npos) {
+    hugetlb = 0;
+    return kOk;
+  }
+  std::vector<uint64_t> sizes;
+  Status status = ListHugePageSizes(host, kHugePagePools, sizes);
+  Figure sum = 0;
+  for (const uint64_t size : sizes) {
+    Figure part;
+    if (status == kOk) status = ReadAmount(host, path, HugetlbFile(size), std::nullopt, part);
+    sum = SumOf({sum, part});
+  }
+  hugetlb = sum;
+  return status;
 }
 
 Status CgroupHierarchy::ReadEvents(const LinuxHost& host, std::string_view path,

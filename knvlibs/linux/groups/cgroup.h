@@ -83,6 +83,11 @@ class CgroupHierarchy {
   [[nodiscard]] Status ReadLimit(const LinuxHost& host, std::string_view path, Figure& limit) const;
   [[nodiscard]] Status ReadUsage(const LinuxHost& host, std::string_view path,
                                  MemcgUsage& usage) const;
+  // What huge pages of hugetlb are charged to it beside `current`; none where the controller for
+  // them is not enabled.
+  [[nodiscard]] Status ReadHugetlb(const LinuxHost& host, std::string_view path,
+                                   Figure& hugetlb) const;
+
   [[nodiscard]] Status ReadEvents(const LinuxHost& host, std::string_view path,
                                   MemcgEvents& events) const;
 

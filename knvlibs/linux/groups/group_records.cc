@@ -6,6 +6,7 @@
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/reader_of.h"
 #include "knvlibs/linux/host/figure_file.h"
+#include "knvlibs/linux/memory/kernel_memory.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
 
@@ -74,13 +75,13 @@ Status ReadEffectiveReservation(const LinuxHost& host, const GroupTree& tree, co
   return kOk;
 }
 
-Status ReadRoot(const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
+Status ReadRoot(const LinuxHost& host, const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
   uint64_t total = 0;
   uint64_t free = 0;
   uint64_t kernel = 0;
   Status status = meminfo.Require("MemTotal", total);
   if (status == kOk) status = meminfo.Require("MemFree", free);
-  if (status == kOk) status = ReadKernelHeap(meminfo, kernel);
+  if (status == kOk) status = ReadKernelMemory(host, kernel);
   if (status != kOk) return status;
 
   record.consumed = Less(total, free);
@@ -93,9 +94,9 @@ Status ReadRoot(const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
   return kOk;
 }
 
-Status ReadKernel(const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
+Status ReadKernel(const LinuxHost& host, KSI_GroupMemoryStats& record) {
   uint64_t kernel = 0;
-  const Status status = ReadKernelHeap(meminfo, kernel);
+  const Status status = ReadKernelMemory(host, kernel);
   record.consumed = kernel;
   record.memSize = kernel;
   record.consumedPeak = FieldOf(std::nullopt);
@@ -104,11 +105,23 @@ Status ReadKernel(const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
   return status;
 }
 
+// Of the default size meminfo tells what is in use; of the others a free page counts as used.
+uint64_t HugetlbInUse(const FigureFile& meminfo) {
+  const uint64_t all = meminfo.FindOr("Hugetlb", 0);
+  const uint64_t free = meminfo.FindOr("HugePages_Free", 0) * meminfo.FindOr("Hugepagesize", 0);
+  return Less(all, free);
+}
+
 Status ReadCgroup(const LinuxHost& host, const GroupTree& tree, const Group& group,
                   const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
   MemcgUsage usage;
-  const Status status = tree.Cgroups().ReadUsage(host, group.path, usage);
+  Figure hugetlb;
+  Status status = tree.Cgroups().ReadUsage(host, group.path, usage);
+  if (status == kOk) status = tree.ReadHugetlb(host, group, HugetlbInUse(meminfo), hugetlb);
   if (status != kOk) return status;
+  usage.current = SumOf({usage.current, hugetlb});
+  // The kernel keeps no peak of hugetlb.
+  if (hugetlb != 0u) usage.peak = usage.peakWithSwap = std::nullopt;
   // Kernels that do not account for swap, and hosts that have none.
   if (usage.current && meminfo.FindOr("SwapTotal", 0) == 0) {
     usage.swap = 0;
@@ -176,8 +189,8 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const Group& group,
   if (group.IsProcess()) {
     return ReadMachine(host, tree, tree.VirtualMachineOf(group), *meminfo, record);
   }
-  if (group.kind == Group::Kind::kKernel) return ReadKernel(*meminfo, record);
-  return group.id == kRootGroup ? ReadRoot(*meminfo, record)
+  if (group.kind == Group::Kind::kKernel) return ReadKernel(host, record);
+  return group.id == kRootGroup ? ReadRoot(host, *meminfo, record)
                                 : ReadCgroup(host, tree, group, *meminfo, record);
 }
 

@@ -308,6 +308,25 @@ Status GroupTree::ReadReservation(const LinuxHost& host, const Group& group,
   return kOk;
 }
 
+Figure GroupTree::ProcessHugetlbOf(const Group& group) const {
+  if (group.IsProcess()) return group.kind == Group::Kind::kVmm ? 0 : ProcessOf(group).hugetlb;
+  Figure sum = 0;
+  for (const size_t child : group.children) sum = SumOf({sum, ProcessHugetlbOf(groups_[child])});
+  return sum;
+}
+
+Status GroupTree::ReadHugetlb(const LinuxHost& host, const Group& group, uint64_t inUse,
+                              Figure& hugetlb) const {
+  hugetlb = 0;
+  if (inUse == 0) return kOk;
+  const Status status = cgroups_.ReadHugetlb(host, group.path, hugetlb);
+  if (status != kOk || hugetlb) return status;
+  // Without the controller the processes tell, unless some have pages in common.
+  const Figure all = ProcessHugetlbOf(groups_[0]);
+  if (all && *all <= inUse) hugetlb = ProcessHugetlbOf(group);
+  return kOk;
+}
+
 Status GroupTree::ReadKsm(const LinuxHost& host, const Group& group, ProcessKsm& ksm) const {
   std::optional<ProcessKsm>& known = ksm_[group.process];
   if (!known) {

@@ -97,6 +97,11 @@ class GroupTree {
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, const Group& group,
                                        Figure& reserved) const;
 
+  // What huge pages of hugetlb are used in a cgroup beside what its `current` counts; `inUse` is
+  // what all of the host have. None where that cannot be told.
+  [[nodiscard]] Status ReadHugetlb(const LinuxHost& host, const Group& group, uint64_t inUse,
+                                   Figure& hugetlb) const;
+
   // What page sharing does for a group that is a process. Fails with KSI_STATUS_NOT_FOUND if it has
   // ended.
   [[nodiscard]] Status ReadKsm(const LinuxHost& host, const Group& group, ProcessKsm& ksm) const;
@@ -117,6 +122,7 @@ class GroupTree {
   void FindOwnCgroups();
   size_t UnitOf(size_t group) const;
   size_t CountUserWorlds(size_t group) const;
+  Figure ProcessHugetlbOf(const Group& group) const;
 
   CgroupHierarchy cgroups_;
   std::vector<Group> groups_;  // the first is the root

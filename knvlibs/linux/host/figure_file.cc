@@ -73,16 +73,4 @@ Status FigureFile::Require(std::string_view name, uint64_t& value) const {
   return kOk;
 }
 
-Status ReadKernelHeap(const FigureFile& meminfo, uint64_t& heap) {
-  uint64_t slab = 0;
-  uint64_t pageTables = 0;
-  uint64_t vmalloc = 0;
-  Status status = meminfo.Require("Slab", slab);
-  if (status == kOk) status = meminfo.Require("PageTables", pageTables);
-  if (status == kOk) status = meminfo.Require("VmallocUsed", vmalloc);
-  heap = slab + pageTables + vmalloc + meminfo.FindOr("SecPageTables", 0) +
-         meminfo.FindOr("Percpu", 0);
-  return status;
-}
-
 }  // namespace ksi

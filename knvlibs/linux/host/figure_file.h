@@ -49,9 +49,6 @@ class FigureFile {
   std::vector<Line> lines_;
 };
 
-// What the kernel keeps for itself, in KB. The kernel's stacks are in vmalloc's figure.
-[[nodiscard]] Status ReadKernelHeap(const FigureFile& meminfo, uint64_t& heap);
-
 }  // namespace ksi
 
 #endif  // KNVLIBS_LINUX_HOST_FIGURE_FILE_H_

@@ -80,7 +80,7 @@ Status LinuxHost::Read(std::string_view file, Made made, std::string& content) c
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return Failed(file, errno);
     const auto length = static_cast<size_t>(count);
-    if (content.size() + length > kLargestFile) {
+    if (content.size() + length >= kLargestFile) {
       TellOnce(file, EFBIG);
       return KSI_STATUS_READ_ERROR;
     }

@@ -1,4 +1,6 @@
-// Huge pages: the pools of each memory node, one for each size of huge pages.
+// The pools of each memory node.
+#include "knvlibs/linux/memory/hugepages.h"
+
 #include <algorithm>
 #include <string>
 #include <string_view>
@@ -25,7 +27,7 @@ Status FindPools(const LinuxHost& host, int64_t key, std::string& directory) {
   if (status != kOk) return status;
   directory = nodes->numa ? "/sys/devices/system/node/node" +
                                 std::to_string(nodes->numaNodes[node]) + "/hugepages"
-                          : "/sys/kernel/mm/hugepages";
+                          : std::string(kHugePagePools);
   return kOk;
 }
 
@@ -47,21 +49,10 @@ Status ReadPsharePool(const LinuxHost& host, const Keys& keys, KSI_LargePagePool
 
 Status ListPools(const LinuxHost& host, const Keys& keys, ParamList& instances) {
   std::string directory;
-  std::vector<std::string> names;
-  Status status = FindPools(host, keys[0].number, directory);
-  if (status != kOk) return status;
-  status = host.List(directory, LinuxHost::Entries::kDirectories, names);
-  // A kernel without huge pages has no pool of them.
-  if (status == KSI_STATUS_NOT_FOUND) return kOk;
-  if (status != kOk) return status;
-
   std::vector<uint64_t> sizes;
-  for (const std::string& name : names) {
-    if (!ParseSize(name, kDirectoryPrefix, sizes.emplace_back())) {
-      return NameNotUnderstood(directory, name);
-    }
-  }
-  std::ranges::sort(sizes);
+  Status status = FindPools(host, keys[0].number, directory);
+  if (status == kOk) status = ListHugePageSizes(host, directory, sizes);
+  if (status != kOk) return status;
   for (const uint64_t sizeKB : sizes) {
     status = instances.AddText(std::string(kPoolPrefix) + std::to_string(sizeKB) + "kB");
     if (status != kOk) return status;
@@ -100,5 +91,21 @@ constexpr Reader kReaders[] = {
 }  // namespace
 
 constinit const ReaderTable kHugePageReaders = kReaders;
+
+Status ListHugePageSizes(const LinuxHost& host, std::string_view directory,
+                         std::vector<uint64_t>& sizesKB) {
+  std::vector<std::string> names;
+  const Status status = host.List(directory, LinuxHost::Entries::kDirectories, names);
+  sizesKB.clear();
+  if (status == KSI_STATUS_NOT_FOUND) return kOk;
+  if (status != kOk) return status;
+  for (const std::string& name : names) {
+    if (!ParseSize(name, kDirectoryPrefix, sizesKB.emplace_back())) {
+      return NameNotUnderstood(directory, name);
+    }
+  }
+  std::ranges::sort(sizesKB);
+  return kOk;
+}
 
 }  // namespace ksi

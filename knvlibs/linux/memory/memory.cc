@@ -6,6 +6,7 @@
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/memory/iomem.h"
+#include "knvlibs/linux/memory/kernel_memory.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
@@ -46,8 +47,25 @@ uint64_t ReservedLowOf(const Zones& zones) {
   return reserved;
 }
 
+// All pages on the lists of page reclaim, those that it has taken off to look at too: pages of
+// files and of processes. A kernel that has them tells of all; 0 where some are missing.
+uint64_t LruOf(const FigureFile& meminfo, const FigureFile& vmstat, uint64_t pageKB) {
+  const Figure isolated =
+      SumOf({vmstat.FindOr("nr_isolated_anon", 0), vmstat.FindOr("nr_isolated_file", 0)});
+  return SumOf({meminfo.Find("Active"), meminfo.Find("Inactive"), meminfo.Find("Unevictable"),
+                ProductOf(isolated, pageKB)})
+      .value_or(0);
+}
+
+// Huge pages of all sizes, free ones too: nothing else may have them.
+uint64_t HugetlbOf(const FigureFile& meminfo) {
+  return meminfo.FindOr("Hugetlb",
+                        meminfo.FindOr("HugePages_Total", 0) * meminfo.FindOr("Hugepagesize", 0));
+}
+
 // What the kernel uses on behalf of files (`cache`) and what processes use (`processes`), in KB.
-Status ReadConsumed(const FigureFile& meminfo, uint64_t& cache, uint64_t& processes) {
+Status ReadConsumed(const LinuxHost& host, const FigureFile& meminfo, const FigureFile& vmstat,
+                    uint64_t& cache, uint64_t& processes) {
   uint64_t buffers = 0;
   uint64_t cached = 0;
   uint64_t anonymous = 0;
@@ -57,20 +75,20 @@ Status ReadConsumed(const FigureFile& meminfo, uint64_t& cache, uint64_t& proces
   if (status != kOk) return status;
 
   const uint64_t shmem = meminfo.FindOr("Shmem", 0);
-  const uint64_t hugepageKB = meminfo.FindOr("Hugepagesize", 0);
-  const uint64_t hugepages =
-      Less(meminfo.FindOr("HugePages_Total", 0), meminfo.FindOr("HugePages_Free", 0));
   cache = buffers + Less(cached, shmem);
-  processes = anonymous + shmem + hugepages * hugepageKB;
+  // AnonPages are mapped: pages that wait in the swap cache for nobody are only on the lists. On
+  // these, pages are missing that were just made.
+  const uint64_t reclaimable = Less(LruOf(meminfo, vmstat, host.PageKB()), cache);
+  processes = std::max(anonymous + shmem, reclaimable) + HugetlbOf(meminfo);
   return kOk;
 }
 
 Status ReadComprehensive(const LinuxHost& host, const Keys& /*keys*/, KSI_Comprehensive& record) {
   const FigureFile* meminfo = nullptr;
   const Zones* zones = nullptr;
-  FigureFile vmstat;
+  const FigureFile* vmstat = nullptr;
   Status status = host.Kept().meminfo.Get(host, meminfo);
-  if (status == kOk) status = FigureFile::ReadVmstat(host, vmstat);
+  if (status == kOk) status = host.Kept().vmstat.Get(host, vmstat);
   if (status == kOk) status = host.Kept().zones.Get(host, zones);
   uint64_t total = 0;
   uint64_t free = 0;
@@ -79,13 +97,13 @@ Status ReadComprehensive(const LinuxHost& host, const Keys& /*keys*/, KSI_Compre
   uint64_t processes = 0;
   if (status == kOk) status = meminfo->Require("MemTotal", total);
   if (status == kOk) status = meminfo->Require("MemFree", free);
-  if (status == kOk) status = ReadKernelHeap(*meminfo, heap);
-  if (status == kOk) status = ReadConsumed(*meminfo, cache, processes);
+  if (status == kOk) status = ReadKernelMemory(host, heap);
+  if (status == kOk) status = ReadConsumed(host, *meminfo, *vmstat, cache, processes);
   if (status != kOk) return status;
 
   const Zone sum = TotalOf(*zones);
   const Figure memmap =
-      SumOf({vmstat.Find("nr_memmap_pages"), vmstat.FindOr("nr_memmap_boot_pages", 0)});
+      SumOf({vmstat->Find("nr_memmap_pages"), vmstat->FindOr("nr_memmap_boot_pages", 0)});
   record.total = sum.present * host.PageKB();
   record.managedByMemMap = total;
   record.reliableMem = 0;
@@ -109,7 +127,7 @@ Status ReadGlobalTally(const LinuxHost& host, const Keys& /*keys*/, KSI_GlobalTa
   Status status = host.Kept().meminfo.Get(host, meminfo);
   if (status == kOk) status = host.Kept().zones.Get(host, zones);
   if (status == kOk) status = meminfo->Require("MemTotal", total);
-  if (status == kOk) status = ReadKernelHeap(*meminfo, heap);
+  if (status == kOk) status = ReadKernelMemory(host, heap);
   if (status != kOk) return status;
 
   const Zone sum = TotalOf(*zones);

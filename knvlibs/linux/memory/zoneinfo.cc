@@ -33,7 +33,7 @@ bool ParseHeading(std::string_view line, Zone& zone) {
 }
 
 // A zone's own figures start at "  pages free" and end at "protection:". Before them the first zone
-// of a node has the figures of the node, after them come counters and per-CPU lists.
+// of a node has the figures of the node, after them come counters and the lists of each processor.
 class ZoneParser {
  public:
   explicit ZoneParser(Zones& zones) : zones_(zones) {}
@@ -41,8 +41,8 @@ class ZoneParser {
   // False if the line is not understood.
   bool Take(std::string_view line) {
     if (line.starts_with("Node ")) return TakeHeading(line);
-    if (place_ == Place::kOutside) return true;
     std::string_view name = TakeWord(line);
+    if (place_ == Place::kOutside) return name != "count:" || TakeCount(line);
     if (place_ == Place::kBeforePages) {
       if (name != "pages") return true;
       place_ = Place::kInPages;
@@ -69,6 +69,13 @@ class ZoneParser {
     if (known == std::end(kNames)) return true;
     seen_ |= 1u << (known - kNames);
     return ParseNumber(TakeWord(line), zones_.back().*known->figure) && TakeWord(line).empty();
+  }
+
+  bool TakeCount(std::string_view line) {
+    uint64_t count = 0;
+    if (zones_.empty() || !ParseNumber(TakeWord(line), count)) return false;
+    zones_.back().perCpu += count;
+    return TakeWord(line).empty();
   }
 
   bool End() {

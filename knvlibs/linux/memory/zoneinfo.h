@@ -21,6 +21,7 @@ struct Zone {
   uint64_t high = 0;
   uint64_t present = 0;
   uint64_t managed = 0;
+  uint64_t perCpu = 0;  // free, but on the lists of single processors
 
   // Below 4 GB, kept for devices that reach no further.
   bool IsLow() const { return name.starts_with("DMA"); }

@@ -127,8 +127,9 @@ Status ReadRegionStore(const LinuxHost& host, const Keys& keys, KSI_PmemRegionSt
   if (status == kOk) status = ReadAllocation(host, *devices, region, allocation);
   if (status != kOk) return status;
 
-  // Memory without labels is one namespace, and nothing of it is left to give.
-  const uint64_t available = labelled.value_or(0);
+  // Memory without labels is one namespace, and nothing of it is left to give, though the kernel
+  // may call all of it available: no label has any.
+  const uint64_t available = std::min(labelled.value_or(0), Less(size, allocation.bytes));
   record.alloc2MBlocks = BlocksOf(allocation.bytes);
   record.resvd2MBlocks = BlocksOf(Less(size, available));
   record.avail2MBlocks = BlocksOf(available);
