@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <new>
 
 #include "knvlibs/cache_format.h"
 #include "knvlibs/cache_vfs.h"
@@ -69,15 +70,16 @@ std::string RealName(const char* fileName) {
     void operator()(char* text) const { std::free(text); }
   };
   const std::unique_ptr<char, Free> real(realpath(fileName, nullptr));
+  if (real == nullptr && errno == ENOMEM) throw std::bad_alloc();
   return real == nullptr ? fileName : real.get();
 }
 
 // Whether a file holds changes; one that was made invalid starts with a NUL.
 bool HoldsChanges(const std::string& journal) {
   struct stat info;
-  if (lstat(journal.c_str(), &info) != 0 || !S_ISREG(info.st_mode) || info.st_size == 0) {
-    return false;
-  }
+  // What cannot be looked at may hold them, unless its name is too long for a file.
+  if (lstat(journal.c_str(), &info) != 0) return errno != ENOENT && errno != ENAMETOOLONG;
+  if (!S_ISREG(info.st_mode) || info.st_size == 0) return false;
   const int fd = open(journal.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW);
   if (fd < 0) return true;
   char first = 0;

@@ -31,13 +31,15 @@ KSI_Source& CurrentSource() {
 
 KSI_Source& SourceOf(KSI_Source* handle) { return handle == nullptr ? CurrentSource() : *handle; }
 
+void TellNoMemory() { Warning("out of memory\n"); }
+
 // Runs one operation at the boundary.
 template <class Operation>
 Status Guarded(Operation&& operation) {
   try {
     return operation();
   } catch (const std::bad_alloc&) {
-    Warning("out of memory\n");
+    TellNoMemory();
     return KSI_STATUS_NO_MEMORY;
   } catch (...) {
     return KSI_STATUS_FAILURE;
@@ -148,6 +150,9 @@ ParamList* CreateList(int version, int capacity, Make&& make) {
   if (version != kParamListVersion || capacity < 0) return nullptr;
   try {
     return make(static_cast<size_t>(capacity));
+  } catch (const std::bad_alloc&) {
+    TellNoMemory();
+    return nullptr;
   } catch (...) {
     return nullptr;
   }
@@ -244,6 +249,12 @@ uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source, uint16_t node
 uint32_t KSI_SourceWalkStatus(struct KSI_Source* source) {
   return ksi::Guarded([&] {
     return ksi::SourceOf(source).Ask([](const ksi::Source& asked) { return asked.WalkStatus(); });
+  });
+}
+
+uint32_t KSI_SourceLossStatus(struct KSI_Source* source) {
+  return ksi::Guarded([&] {
+    return ksi::SourceOf(source).Ask([](const ksi::Source& asked) { return asked.LossStatus(); });
   });
 }
 

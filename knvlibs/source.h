@@ -64,6 +64,10 @@ class Source {
   // walked over has shown to be no tree.
   [[nodiscard]] virtual Status WalkStatus() const { return kOk; }
 
+  // The first reason for which something was left out of an answer, or has no value in it, other
+  // than that it has gone or may not be read.
+  [[nodiscard]] virtual Status LossStatus() const { return kOk; }
+
   // The definitions of the kernel that answers.
   virtual Definitions KernelDefinitions() const = 0;
 };

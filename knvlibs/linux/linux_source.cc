@@ -46,6 +46,7 @@ Status LinuxSource::WithMemory(Operation&& operation) {
   } catch (const std::bad_alloc&) {
     if (!isMemoryTold_) Warning("out of memory: what cannot be read is left out or has no value\n");
     isMemoryTold_ = true;
+    host_.Lose(KSI_STATUS_NO_MEMORY);
     return KSI_STATUS_NO_MEMORY;
   }
 }

@@ -20,6 +20,8 @@ class LinuxSource : public Source {
   [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
   void Refresh() override { span_.End(); }
 
+  [[nodiscard]] Status LossStatus() const override { return host_.LossStatus(); }
+
   // The library is built for the host it runs on: its own definitions are the kernel's.
   Definitions KernelDefinitions() const override { return kDefinitions; }
 

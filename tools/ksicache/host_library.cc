@@ -18,6 +18,7 @@ KSI_NODES(WEAK_NODE)
 #pragma weak KSI_SourceCheckSig
 #pragma weak KSI_SourceGet
 #pragma weak KSI_SourceGetInstanceListAlloc
+#pragma weak KSI_SourceLossStatus
 
 namespace ksicache {
 namespace {
@@ -114,6 +115,10 @@ ksi::Status HostLibrary::List(const ksi::Node& node, const ksi::Keys& keys, Inst
     instances->entries_.push_back(entry);
   }
   return status;
+}
+
+ksi::Status HostLibrary::LossStatus() {
+  return &KSI_SourceLossStatus == nullptr ? ksi::kOk : KSI_SourceLossStatus(source_.get());
 }
 
 HostLibrary::Definitions HostLibrary::KernelDefinitions() {

@@ -52,6 +52,10 @@ class HostLibrary {
   [[nodiscard]] ksi::Status List(const ksi::Node& node, const ksi::Keys& keys,
                                  Instances* instances);
 
+  // Why something that could not be read is left out of the answers; kOk if nothing is, or the
+  // library does not tell.
+  [[nodiscard]] ksi::Status LossStatus();
+
   Definitions KernelDefinitions();
 
  private:

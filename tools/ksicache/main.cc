@@ -114,8 +114,7 @@ int main(int argc, char** argv) {
     static_cast<void>(std::fputs(error.Help(), stderr));
     return 2;
   } catch (const std::bad_alloc&) {
-    // Without memory, which is what there is none of.
-    static_cast<void>(std::fputs("ksicache: out of memory\n", stderr));
+    ksicache::PrintNoMemory();
     return 1;
   } catch (const std::exception& error) {
     ksicache::PrintError(error.what());

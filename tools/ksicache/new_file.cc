@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <charconv>
 #include <cstdint>
+#include <optional>
 
 #include "tools/ksicache/error.h"
 
@@ -53,23 +54,24 @@ Error Exists(const std::string& name) {
   return Error{name + ": exists already (--force replaces it)"};
 }
 
-// A name of an open file in a directory, which goes with its owner as long as it is that file's.
+// A name of an open file in a directory, which goes with its owner unless it is another file's. It
+// takes no memory, for want of which the name would stay.
 class TemporaryEntry {
  public:
-  TemporaryEntry(int directory, std::string name, int file)
-      : directory_(directory), name_(std::move(name)), file_(file) {}
+  // REQUIRES: the text of the name lives as long.
+  TemporaryEntry(int directory, const std::string& name, int file)
+      : directory_(directory), name_(name), file_(file) {}
   TemporaryEntry(const TemporaryEntry&) = delete;
   TemporaryEntry& operator=(const TemporaryEntry&) = delete;
   ~TemporaryEntry() {
-    if (IsOwn()) unlinkat(directory_, name_.c_str(), 0);
+    if (IsOwn().value_or(true)) unlinkat(directory_, name_.c_str(), 0);
   }
 
   // rename(2), but only where nothing stands if `replace` is false.
   int RenameTo(const std::string& target, bool replace) const {
-    if (!IsOwn()) {
-      errno = ESTALE;
-      return -1;
-    }
+    const std::optional<bool> own = IsOwn();
+    if (own == false) errno = ESTALE;
+    if (!own.value_or(false)) return -1;
     if (!replace) {
       const int result =
           renameat2(directory_, name_.c_str(), directory_, target.c_str(), RENAME_NOREPLACE);
@@ -80,15 +82,19 @@ class TemporaryEntry {
   }
 
  private:
-  bool IsOwn() const {
+  // None if it cannot be told; errno says why.
+  std::optional<bool> IsOwn() const {
     struct stat named = {};
     struct stat open = {};
-    return fstatat(directory_, name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 &&
-           fstat(file_, &open) == 0 && named.st_dev == open.st_dev && named.st_ino == open.st_ino;
+    if (fstatat(directory_, name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) != 0 ||
+        fstat(file_, &open) != 0) {
+      return std::nullopt;
+    }
+    return named.st_dev == open.st_dev && named.st_ino == open.st_ino;
   }
 
   int directory_;
-  std::string name_;
+  const std::string& name_;
   int file_;
 };
 
@@ -132,8 +138,16 @@ NewFile::NewFile(std::string target, bool replace, mode_t mode)
   entry_ = EntryOf(name_);
   directory_.Reset(open(DirectoryOf(name_).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!directory_) throw SystemError(name_, errno);
+  OpenListing();
   CheckTarget();
   OpenUnnamed();
+}
+
+// Now, because nothing may fail for want of a descriptor once the file has its name.
+void NewFile::OpenListing() {
+  listing_.Reset(openat(directory_.Get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  // Who may make files in it may not always list them.
+  if (!listing_ && errno != EACCES) throw SystemError(name_, errno);
 }
 
 void NewFile::CheckTarget() const {
@@ -214,10 +228,9 @@ void NewFile::Rename(const std::string& entry, int fd) const {
 
 // The name is on the disk when its directory is.
 void NewFile::SyncDirectory() const {
-  const Descriptor directory(openat(directory_.Get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (directory && fsync(directory.Get()) == 0) return;
+  if (!listing_ || fsync(listing_.Get()) == 0) return;
   // Some file systems cannot sync a directory.
-  if (errno != EINVAL && errno != EACCES) throw SystemError(name_, errno);
+  if (errno != EINVAL) throw SystemError(name_ + ": is whole, but may not outlast a crash", errno);
 }
 
 }  // namespace ksicache

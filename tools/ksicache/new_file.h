@@ -42,10 +42,11 @@ class NewFile {
   const std::string& Name() const { return name_; }
 
   // Writes the file, brings it to the disk and gives it its name. Fails with an Error; what stood
-  // there stands there still.
+  // there stands there still, unless it says that the file is whole.
   void Commit(std::span<const std::byte> content);
 
  private:
+  void OpenListing();
   void CheckTarget() const;
   void OpenUnnamed();
   void Fill(int fd, std::span<const std::byte> content) const;
@@ -60,6 +61,7 @@ class NewFile {
   mode_t mode_;
   bool standardOutput_;
   Descriptor directory_;
+  Descriptor listing_;  // of the same, to bring it to the disk; none where it may not be read
   std::string entry_;   // the target's name in its directory
   Descriptor unnamed_;  // none where the file system has no such files
 };

@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <new>
 #include <string>
 
 #include "tools/ksicache/error.h"
@@ -23,14 +24,18 @@ void Print(std::string_view text) {
 
 void PrintLine(std::string_view text) { Print(Printable(text) + "\n"); }
 
-void PrintError(std::string_view message) {
+void PrintError(std::string_view message) try {
   // More than any message with the longest file name has.
   constexpr size_t kLongest = 8192;
   std::string line = "ksicache: " + Printable(message.substr(0, kLongest));
   line += message.size() > kLongest ? "...\n" : "\n";
   // When even this fails, there is nobody to tell.
   static_cast<void>(std::fputs(line.c_str(), stderr));
+} catch (const std::bad_alloc&) {
+  PrintNoMemory();
 }
+
+void PrintNoMemory() { static_cast<void>(std::fputs("ksicache: out of memory\n", stderr)); }
 
 void FinishOutput() {
   if (std::fflush(stdout) != 0) ThrowLost();

@@ -15,6 +15,9 @@ void PrintLine(std::string_view text);
 // A line on standard error, after the program's name, escaped; cut where nobody reads on.
 void PrintError(std::string_view message);
 
+// That there is no memory, without any.
+void PrintNoMemory();
+
 // Fails if not all that was printed got out.
 void FinishOutput();
 

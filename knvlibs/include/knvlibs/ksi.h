@@ -143,6 +143,11 @@ KSI_NODISCARD uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source,
  * each walk. */
 KSI_NODISCARD uint32_t KSI_SourceWalkStatus(struct KSI_Source* source);
 
+/* Whether something was left out of an answer of `source` since it was opened, or has no value in
+ * it, for another reason than that it has gone or may not be read: the status of the first such
+ * reason, which was said to people, too. */
+KSI_NODISCARD uint32_t KSI_SourceLossStatus(struct KSI_Source* source);
+
 /* What is said to people. Any thread may call these at any time. */
 
 /* The message of a status: constant text, never NULL. */

@@ -168,7 +168,12 @@ void LinuxHost::TellDenied() const {
   if (First("denied")) Warning("%s: permission denied\n", Printable(reading_->denied).c_str());
 }
 
+void LinuxHost::Lose(Status why) const {
+  if (loss_ == kOk) loss_ = why;
+}
+
 void LinuxHost::TellOnce(std::string_view file, int error) const {
+  Lose(StatusOfErrno(error));
   const std::string reason = std::generic_category().message(error);
   if (!First(reason)) return;
   Warning("%s: %s: what cannot be read is left out or has no value\n", Printable(file).c_str(),

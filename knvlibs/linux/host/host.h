@@ -70,6 +70,10 @@ class LinuxHost {
   // Tells, once in a reading, which file may not be read: the first that the question met.
   void TellDenied() const;
 
+  // Notes why something is left out of an answer; the first reason stays.
+  void Lose(Status why) const;
+  [[nodiscard]] Status LossStatus() const { return loss_; }
+
   // NotUnderstood, told once in a reading for all files of a kind.
   [[nodiscard]] Status NotUnderstoodOnce(std::string_view kind, std::string_view file,
                                          size_t line) const;
@@ -101,6 +105,7 @@ class LinuxHost {
   Clock clock_;
   uint64_t pageKB_;
   std::unique_ptr<Reading> reading_;
+  mutable Status loss_ = kOk;
 };
 
 // Warns that a line of a file (the first is 1) is not understood; returns the status for it.

@@ -71,8 +71,8 @@ class Account {
          std::to_string(writer.Lists()) + " lists of " + host);
   }
 
-  // `diagnostics`: how many the library gave.
-  void OfFailures(const Failures& failures, size_t diagnostics) const {
+  // `diagnostics`: how many the library gave. `loss`: why it left out what could not be read.
+  void OfFailures(const Failures& failures, size_t diagnostics, ksi::Status loss) const {
     if (failures.absent.Count() != 0) {
       say_("absent     " + std::to_string(failures.absent.Count()) +
            ": not everything has every node");
@@ -88,6 +88,7 @@ class Account {
     }
     if (figures || failures.refused.Count() != 0) OfRights();
     if (failures.failed.Count() != 0) say_("failed     " + failures.failed.Text());
+    if (loss != ksi::kOk) say_("left out   what could not be read: " + StatusText(loss));
   }
 
  private:
@@ -129,8 +130,9 @@ int Capture(const CommandLine& line) {
   writer.Commit({definitions.signature, definitions.built, host, taken});
   const Account account(fileName == "-");
   account.OfFile(writer, host);
-  account.OfFailures(walk.GetFailures(), diagnostics.Count());
-  return walk.GetFailures().failed.Count() == 0 ? 0 : 1;
+  const ksi::Status loss = library.LossStatus();
+  account.OfFailures(walk.GetFailures(), diagnostics.Count(), loss);
+  return walk.GetFailures().failed.Count() == 0 && loss == ksi::kOk ? 0 : 1;
 }
 
 }  // namespace
@@ -147,6 +149,7 @@ fails again when the file is read. What failed is said:
   absent   of nodes that the host, or a thing on it, does not have
   refused  for want of rights; the superuser sees most
   failed   for another reason, which makes the exit status 1
+  left out of an answer for such a reason, which does so too
 
 Figures without a value in what was read may have been refused too. It is said
 where that can be: without the superuser's rights, or after diagnostics.
