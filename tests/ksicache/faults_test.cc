@@ -39,6 +39,14 @@ constexpr Writing kWritings[] = {
 
 void PrintTo(const Writing& writing, std::ostream* stream) { *stream << writing.name; }
 
+// One of each kind, with longer names than a string holds without memory of its own.
+constexpr const char* kReadings = R"(
+    {"node":"sched/groups/groupName","keys":[4],"value":{"text":"a group with a long name"}},
+    {"node":"sched/groups/groupFlags","keys":[4],"status":"0xbad0003"},
+    {"node":"sched/groups/members/groups","keys":[0],"instances":[4,5,6,7,8,9,10,11,12]},
+    {"node":"system/heaps","keys":[],"instances":["main",{"hex":"ff80ff80ff80ff80ff80"},"modules"]},
+    {"node":"system/heaps/stats","keys":["a heap with a long name"],"value":{"size":5}})";
+
 constexpr const char* kOld = "precious";
 
 class WritingFaults : public Ksicache, public testing::WithParamInterface<Writing> {
@@ -46,8 +54,7 @@ class WritingFaults : public Ksicache, public testing::WithParamInterface<Writin
   void SetUp() override {
     words_ = {"capture", "--root", RecordedHost("kvm-two-nodes"), Path("a.ksi")};
     if (GetParam().command == std::string("load")) {
-      Output(words_);
-      WriteContent(source_.Path("a.json"), Output({"dump", "--json", Path("a.ksi")}));
+      WriteContent(source_.Path("a.json"), JsonWith(kReadings));
       words_ = {"load", source_.Path("a.json"), Path("a.ksi")};
     }
     if (GetParam().replaces) words_.emplace_back("--force");
