@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <filesystem>
 #include <string>
 #include <utility>
 
@@ -60,6 +61,25 @@ TEST_F(Ksicache, CaptureHasAllThatTheHostTells) {
   ASSERT_EQ(CacheSource::Open(Path("a.ksi").c_str(), &cache), kOk);
   LinuxSource host(root);
   EXPECT_EQ(HostText(*cache), HostText(host));
+}
+
+// Nothing fails for the library, but what is below cannot be known.
+TEST_F(Ksicache, CaptureThatLeavesOutWhatCannotBeReadHasFailed) {
+  const std::string root = Path("host");
+  std::filesystem::copy(RecordedHost("kvm-two-nodes"), root,
+                        std::filesystem::copy_options::recursive);
+  const std::string file = "/sys/fs/cgroup/cgroup.controllers";
+  std::filesystem::remove(root + file);
+  std::filesystem::create_directory(root + file);
+  const harness::Result result = Run({"capture", Path("a.ksi"), "--root", root});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err, "ksicache: " + file +
+                            ": Is a directory: what cannot be read is left out or has no value\n");
+  EXPECT_EQ(result.out.find("\nfailed"), result.out.npos) << result.out;
+  EXPECT_TRUE(
+      result.out.ends_with("\nleft out   what could not be read: 0xbad0055 Is a directory\n"))
+      << result.out;
+  EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
 }
 
 TEST_F(Ksicache, CaptureTakesNoOtherDirectoryForAHost) {
