@@ -12,11 +12,16 @@
 namespace ksi {
 namespace {
 
+// The columns of the rows of readings, and of those of lists.
 enum ReadingColumn { kKey1, kKey2, kNode, kStatus, kAnswer };
+enum EntryColumn { kPosition = kNode + 1, kEntry };
 
-constexpr const char* kEntriesOfList =
-    "SELECT position, entry FROM instance WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 "
-    "ORDER BY position";
+constexpr const char* kReadings =
+    "SELECT key1, key2, node, status, answer FROM reading WHERE (key1, key2) >= (?1, ?2) "
+    "ORDER BY key1, key2, node";
+constexpr const char* kEntries =
+    "SELECT key1, key2, node, position, entry FROM instance "
+    "WHERE (key1, key2, node) >= (?1, ?2, ?3) ORDER BY key1, key2, node, position";
 
 // More readings than a catalogue has nodes are damage.
 constexpr size_t kMostReadings = 256;
@@ -28,24 +33,43 @@ constexpr Key kAbsent{KeyKind::kText, 0, {}};
 // The keys of an object as the file has them.
 const Key& KeyAt(const Keys& keys, size_t i) { return i < keys.count ? keys[i] : kAbsent; }
 
-int BindKeys(Statement& statement, const Keys& keys) {
-  int code = SQLITE_OK;
-  for (size_t i = 0; i < kMaxKeys && code == SQLITE_OK; ++i) {
-    const Key& key = KeyAt(keys, i);
-    const int parameter = static_cast<int>(i) + 1;
-    code = key.kind == KeyKind::kNumber ? statement.Bind(parameter, key.number)
-                                        : statement.Bind(parameter, key.text);
-  }
-  return code;
-}
-
 bool ColumnIs(const Statement& row, int column, const Key& key) {
   return key.kind == KeyKind::kNumber
              ? row.Type(column) == SQLITE_INTEGER && row.Number(column) == key.number
-             : row.Type(column) == SQLITE_TEXT && row.Text(column) == key.text;
+             : row.Type(column) == SQLITE_TEXT && row.Bytes(column) == key.text;
 }
 
 }  // namespace
+
+bool CacheSource::Cursor::IsAt(const Keys& keys) const {
+  return isOnRow && ColumnIs(rows, kKey1, KeyAt(keys, 0)) && ColumnIs(rows, kKey2, KeyAt(keys, 1));
+}
+
+int CacheSource::Cursor::Step() {
+  const int code = rows.Step();
+  isOnRow = code == SQLITE_ROW;
+  return code;
+}
+
+void CacheSource::Cursor::Leave() {
+  rows.Reset();
+  isOnRow = false;
+}
+
+// To the first row that is not before `keys`, and `node` if the rows are of lists.
+int CacheSource::Cursor::Seek(sqlite3* database, const Keys& keys, const int64_t* node) {
+  Leave();
+  // Many a report reads little, so this waits until it is needed.
+  int code = rows ? SQLITE_OK : rows.Prepare(database, node == nullptr ? kReadings : kEntries);
+  for (size_t i = 0; i < kMaxKeys && code == SQLITE_OK; ++i) {
+    const Key& key = KeyAt(keys, i);
+    const int parameter = static_cast<int>(i) + 1;
+    code = key.kind == KeyKind::kNumber ? rows.Bind(parameter, key.number)
+                                        : rows.Bind(parameter, key.text);
+  }
+  if (code == SQLITE_OK && node != nullptr) code = rows.Bind(kMaxKeys + 1, *node);
+  return code == SQLITE_OK ? Step() : code;
+}
 
 bool CacheSource::OwnKey::Is(const Key& key) const {
   return kind == key.kind && (kind == KeyKind::kNumber ? number == key.number : text == key.text);
@@ -69,11 +93,6 @@ Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* sou
     made->ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
   }
 
-  const int code = made->cursor_.Prepare(
-      made->file_->Handle(),
-      "SELECT key1, key2, node, status, answer FROM reading WHERE (key1, key2) >= (?1, ?2) "
-      "ORDER BY key1, key2, node");
-  if (code != SQLITE_OK) return StatusOfSqlite(code);
   *source = std::move(made);
   return kOk;
 }
@@ -179,32 +198,35 @@ Status CacheSource::List(const Node& node, const Keys& keys, ParamList& instance
   status = BeginRead();
   if (status != kOk) return status;
 
+  // The lists of a walk lie side by side.
+  const auto isOnList = [&] {
+    return entries_.IsAt(keys) && entries_.rows.Number(kNode) == reading->node;
+  };
+  int code = SQLITE_ROW;
+  if (!isOnList() || entries_.rows.Number(kPosition) != 0) {
+    code = entries_.Seek(file_->Handle(), keys, &reading->node);
+  }
   int64_t position = 0;
-  // Many a report lists nothing, so this waits for the first list.
-  int code = entries_ ? SQLITE_OK : entries_.Prepare(file_->Handle(), kEntriesOfList);
-  if (code == SQLITE_OK) code = BindKeys(entries_, keys);
-  if (code == SQLITE_OK) code = entries_.Bind(3, reading->node);
-  if (code == SQLITE_OK) {
-    while (status == kOk && (code = entries_.Step()) == SQLITE_ROW) {
-      status = position < count && entries_.Number(0) == position ? TakeEntry(node, instances)
-                                                                  : Damaged(kOtherCount);
-      ++position;
-    }
+  for (; status == kOk && code == SQLITE_ROW && isOnList(); code = entries_.Step(), ++position) {
+    status = position < count && entries_.rows.Number(kPosition) == position
+                 ? TakeEntry(node, instances)
+                 : Damaged(kOtherCount);
   }
   if (status == kOk) status = StatusOfCall(code);
-  entries_.Reset();
   if (status == kOk && position != count) status = Damaged(kOtherCount);
+  if (status != kOk) entries_.Leave();
   return status;
 }
 
 // The entry of the row that entries_ is on.
 Status CacheSource::TakeEntry(const Node& node, ParamList& instances) {
+  const Statement& row = entries_.rows;
   if (KindOf(node.entries) == KeyKind::kNumber) {
-    if (entries_.Type(1) != SQLITE_INTEGER) return Damaged("has an entry that is no number");
-    return instances.AddNumber(static_cast<uint64_t>(entries_.Number(1)));
+    if (row.Type(kEntry) != SQLITE_INTEGER) return Damaged("has an entry that is no number");
+    return instances.AddNumber(static_cast<uint64_t>(row.Number(kEntry)));
   }
-  const std::string_view text = entries_.Text(1);
-  if (entries_.Type(1) != SQLITE_TEXT || text.find('\0') != std::string_view::npos) {
+  const std::string_view text = row.Text(kEntry);
+  if (row.Type(kEntry) != SQLITE_TEXT || text.find('\0') != std::string_view::npos) {
     return Damaged("has an entry that is no text");
   }
   return instances.AddText(text);
@@ -239,11 +261,7 @@ Status CacheSource::FindObject(const Keys& keys, const Object** object) {
   Object& loaded = objects_[oldest_];
   loaded.valid = false;
   const Status status = Load(keys, loaded);
-  if (status != kOk) {
-    cursor_.Reset();
-    onRow_ = false;
-    return status;
-  }
+  if (status != kOk) return status;
   for (size_t i = 0; i < kMaxKeys; ++i) loaded.keys[i].Take(KeyAt(keys, i));
   loaded.valid = true;
   oldest_ = (oldest_ + 1) % objects_.size();
@@ -251,58 +269,61 @@ Status CacheSource::FindObject(const Keys& keys, const Object** object) {
   return kOk;
 }
 
+// A cursor on the first reading of an object: one that is there after the object before it, or else
+// the one that has rested longest. Off any row if there is no such object.
+Status CacheSource::FindCursor(const Keys& keys, Cursor*& cursor) {
+  const auto there =
+      std::ranges::find_if(cursors_, [&](const Cursor& each) { return each.IsAt(keys); });
+  if (there != cursors_.end()) {
+    cursor = &*there;
+    return kOk;
+  }
+  cursor = &cursors_[restedCursor_];
+  restedCursor_ = (restedCursor_ + 1) % cursors_.size();
+  return StatusOfCall(cursor->Seek(file_->Handle(), keys, nullptr));
+}
+
 Status CacheSource::Load(const Keys& keys, Object& object) {
   object.readings.clear();
   object.bytes.clear();
+  Cursor* cursor = nullptr;
   Status status = BeginRead();
-  if (status != kOk) return status;
-  status = CursorAt(keys) ? kOk : SeekCursor(keys);
-  for (; status == kOk && CursorAt(keys); status = StepCursor()) {
-    Reading reading{};
-    reading.node = cursor_.Number(kNode);
-    // Rows in order end: a damaged tree that leads back to itself does not.
-    if (!object.readings.empty() &&
-        (reading.node <= object.readings.back().node || object.readings.size() == kMostReadings)) {
-      return Damaged("readings are out of order");
-    }
-    const int64_t recorded = cursor_.Number(kStatus);
-    if (cursor_.Type(kStatus) != SQLITE_INTEGER || recorded < 0 ||
-        recorded > std::numeric_limits<Status>::max()) {
-      return Damaged("a reading has no good status");
-    }
-    reading.status = static_cast<Status>(recorded);
-    reading.type = cursor_.Type(kAnswer);
-    if (reading.type == SQLITE_INTEGER) {
-      reading.number = cursor_.Number(kAnswer);
-    } else if (reading.type == SQLITE_BLOB) {
-      const std::span<const std::byte> blob = cursor_.Blob(kAnswer);
-      reading.offset = object.bytes.size();
-      reading.size = blob.size();
-      if (blob.size() <= kMaxRecordSize) {  // a larger one is no node's
-        object.bytes.insert(object.bytes.end(), blob.begin(), blob.end());
-      }
-    }
-    object.readings.push_back(reading);
+  if (status == kOk) status = FindCursor(keys, cursor);
+  while (status == kOk && cursor->IsAt(keys)) {
+    status = TakeReading(cursor->rows, object);
+    if (status == kOk) status = StatusOfCall(cursor->Step());
   }
+  if (status != kOk && cursor != nullptr) cursor->Leave();
   return status;
 }
 
-Status CacheSource::StepCursor() {
-  const int code = cursor_.Step();
-  onRow_ = code == SQLITE_ROW;
-  return StatusOfCall(code);
-}
-
-// To the first row that is not before `keys`.
-Status CacheSource::SeekCursor(const Keys& keys) {
-  cursor_.Reset();
-  const int code = BindKeys(cursor_, keys);
-  return code == SQLITE_OK ? StepCursor() : StatusOfCall(code);
-}
-
-bool CacheSource::CursorAt(const Keys& keys) const {
-  return onRow_ && ColumnIs(cursor_, kKey1, KeyAt(keys, 0)) &&
-         ColumnIs(cursor_, kKey2, KeyAt(keys, 1));
+Status CacheSource::TakeReading(const Statement& row, Object& object) {
+  Reading reading{};
+  reading.node = row.Number(kNode);
+  // Rows in order end: a damaged tree that leads back to itself does not.
+  if (!object.readings.empty() &&
+      (reading.node <= object.readings.back().node || object.readings.size() == kMostReadings)) {
+    return Damaged("readings are out of order");
+  }
+  const int64_t recorded = row.Number(kStatus);
+  if (row.Type(kStatus) != SQLITE_INTEGER || recorded < 0 ||
+      recorded > std::numeric_limits<Status>::max()) {
+    return Damaged("a reading has no good status");
+  }
+  reading.status = static_cast<Status>(recorded);
+  reading.type = row.Type(kAnswer);
+  if (reading.type == SQLITE_INTEGER) {
+    reading.number = row.Number(kAnswer);
+  } else if (reading.type == SQLITE_BLOB) {
+    const std::span<const std::byte> blob = row.Blob(kAnswer);
+    reading.offset = object.bytes.size();
+    reading.size = blob.size();
+    if (blob.size() <= kMaxRecordSize) {  // a larger one is no node's
+      object.bytes.insert(object.bytes.end(), blob.begin(), blob.end());
+    }
+  }
+  object.readings.push_back(reading);
+  return kOk;
 }
 
 }  // namespace ksi

@@ -66,6 +66,17 @@ class CacheSource : public Source {
     std::vector<std::byte> bytes;
   };
 
+  // Over all readings from an object on, or over the entries of all lists.
+  struct Cursor {
+    Statement rows;
+    bool isOnRow = false;
+
+    bool IsAt(const Keys& keys) const;
+    int Step();
+    void Leave();
+    int Seek(sqlite3* database, const Keys& keys, const int64_t* node);
+  };
+
   CacheSource(const char* fileName, std::unique_ptr<CacheFile> file)
       : fileName_(fileName),
         file_(std::move(file)),
@@ -84,10 +95,9 @@ class CacheSource : public Source {
   [[nodiscard]] Status List(const Node& node, const Keys& keys, ParamList& instances);
   [[nodiscard]] Status TakeEntry(const Node& node, ParamList& instances);
   [[nodiscard]] Status FindObject(const Keys& keys, const Object** object);
+  [[nodiscard]] Status FindCursor(const Keys& keys, Cursor*& cursor);
   [[nodiscard]] Status Load(const Keys& keys, Object& object);
-  [[nodiscard]] Status StepCursor();
-  [[nodiscard]] Status SeekCursor(const Keys& keys);
-  bool CursorAt(const Keys& keys) const;
+  [[nodiscard]] Status TakeReading(const Statement& row, Object& object);
 
   std::string fileName_;
   std::unique_ptr<CacheFile> file_;
@@ -98,9 +108,11 @@ class CacheSource : public Source {
   // The identifiers that the nodes of the catalogue have in the file, -1: not in it.
   std::array<std::vector<int64_t>, 2> ids_;
 
-  Statement cursor_;  // over all readings; on a row if onRow_
-  bool onRow_ = false;
-  Statement entries_;  // of one list
+  // A report goes in order through several regions of the file: its groups, their clients and their
+  // leaders. In each a cursor waits where the next object begins.
+  std::array<Cursor, 3> cursors_;
+  size_t restedCursor_ = 0;
+  Cursor entries_;
 
   // The objects read last: a report alternates between a group, its client and its leader.
   std::array<Object, 4> objects_;

@@ -60,6 +60,11 @@ class Statement {
     const auto* text = reinterpret_cast<const char*>(sqlite3_column_text(handle_, column));
     return text == nullptr ? std::string_view() : std::string_view(text, Size(column));
   }
+  // The bytes of a text as they lie, which costs less than to have them end in a NUL.
+  std::string_view Bytes(int column) const {
+    const auto* bytes = static_cast<const char*>(sqlite3_column_blob(handle_, column));
+    return bytes == nullptr ? std::string_view() : std::string_view(bytes, Size(column));
+  }
   std::span<const std::byte> Blob(int column) const {
     const auto* blob = static_cast<const std::byte*>(sqlite3_column_blob(handle_, column));
     return blob == nullptr ? std::span<const std::byte>() : std::span(blob, Size(column));
