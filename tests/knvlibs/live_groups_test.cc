@@ -1,7 +1,9 @@
 // Groups and their processes on the machine itself, compared with what other programs make of the
 // same files. Where figures move, the tolerance is named.
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/ioctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -11,6 +13,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
+#include <optional>
 #include <sstream>
 #include <string>
 #include <thread>
@@ -19,6 +22,8 @@
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/linux_source.h"
+#include "knvlibs/linux/machines/conversation.h"
+#include "knvlibs/linux/machines/monitor_socket.h"
 #include "tests/harness/program.h"
 #include "tests/harness/tally.h"
 #include "tests/knvlibs/host_tree.h"
@@ -188,6 +193,162 @@ TEST(LiveGroupsTest, AGuestIsAVirtualMachine) {
         << other.out << other.err;
   }
 }
+
+// A child that has made a machine with KVM and runs a second thread, as all that do.
+class MachineMaker {
+ public:
+  MachineMaker() {
+    int ready[2];
+    EXPECT_EQ(pipe(ready), 0);
+    pid_ = fork();
+    if (pid_ == 0) {
+      constexpr unsigned long kCreateMachine = _IO(0xAE, 0x01);
+      const int kvm = open("/dev/kvm", O_RDWR);
+      std::thread processor([] { pause(); });
+      if (ioctl(kvm, kCreateMachine, 0) >= 0 && write(ready[1], "y", 1) == 1) pause();
+      _exit(1);
+    }
+    close(ready[1]);
+    char answer = 'n';
+    isMade_ = read(ready[0], &answer, 1) == 1;
+    close(ready[0]);
+  }
+  ~MachineMaker() {
+    kill(pid_, SIGKILL);
+    waitpid(pid_, nullptr, 0);
+  }
+  MachineMaker(const MachineMaker&) = delete;
+  MachineMaker& operator=(const MachineMaker&) = delete;
+
+  bool IsMade() const { return isMade_; }
+  pid_t Pid() const { return pid_; }
+
+ private:
+  pid_t pid_ = -1;
+  bool isMade_ = false;
+};
+
+TEST(LiveGroupsTest, WhatMakesAMachineWithKvmIsAVirtualMachine) {
+  if (access("/dev/kvm", R_OK | W_OK) != 0) GTEST_SKIP() << "this machine has no KVM";
+  const MachineMaker maker;
+  if (!maker.IsMade()) GTEST_SKIP() << "KVM makes no machine here";
+  const harness::Result run = TallyLive({"-r", "vm-stats", "-q", "-s", "worldGrp:memSize:mapped"});
+  EXPECT_EQ(run.status, 0) << run.err;
+  const std::string row =
+      std::to_string(maker.Pid()) + ",18446744073709551615,18446744073709551615\n";
+  EXPECT_NE(run.out.find(row), std::string::npos) << run.out;
+}
+
+// A QEMU that this machine can run, with room for modules, and what plugs them in.
+struct RoomyGuest {
+  const char* accelerator;
+  int64_t memory;  // MB
+  const char* monitor;
+};
+
+class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
+ protected:
+  void SetUp() override {
+    if (std::system("command -v qemu-system-x86_64 >/dev/null") != 0) {
+      GTEST_SKIP() << "this machine has no QEMU";
+    }
+    if (GetParam().accelerator == std::string("kvm") && access("/dev/kvm", R_OK | W_OK) != 0) {
+      GTEST_SKIP() << "this machine has no KVM";
+    }
+    const std::string memory = std::to_string(GetParam().memory) + "M,slots=4,maxmem=8G";
+    guest_.emplace(std::vector<std::string>{"qemu-system-x86_64",
+                                            "-name",
+                                            "guest=tally-plug",
+                                            "-accel",
+                                            GetParam().accelerator,
+                                            "-M",
+                                            "pc",
+                                            "-m",
+                                            memory,
+                                            "-display",
+                                            "none",
+                                            "-serial",
+                                            "none",
+                                            "-monitor",
+                                            "none",
+                                            "-device",
+                                            "virtio-balloon-pci,id=balloon0",
+                                            "-object",
+                                            "memory-backend-ram,id=changing,size=512M",
+                                            "-device",
+                                            "virtio-mem-pci,memdev=changing,requested-size=0",
+                                            GetParam().monitor,
+                                            "unix:" + path_ + ",server=on,wait=off"});
+    for (int i = 0; i < 100 && access(path_.c_str(), F_OK) != 0; ++i) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    }
+    std::this_thread::sleep_for(std::chrono::seconds(1));
+  }
+
+  void Command(const std::string& command) {
+    MonitorSocket socket(std::chrono::steady_clock::now,
+                         std::chrono::steady_clock::now() + std::chrono::seconds(20));
+    ASSERT_TRUE(socket.Connect(path_, guest_->Pid()));
+    Conversation monitor(socket);
+    ASSERT_TRUE(monitor.Begin());
+    const std::optional<Json> answer = monitor.Ask(command);
+    ASSERT_TRUE(answer);
+    EXPECT_NE(FindMember(&*answer, "return"), nullptr) << command;
+  }
+
+  void Plug(const std::string& id, const std::string& size) {
+    Command(R"({"execute":"object-add","arguments":{"qom-type":"memory-backend-ram","id":")" + id +
+            R"(","prealloc":true,"size":)" + size + "}}");
+    Command(R"({"execute":"device_add","arguments":{"driver":"pc-dimm","memdev":")" + id +
+            R"(","id":"dimm-)" + id + R"("}})");
+  }
+
+  // "memSizeLimit,memSize,ballooned", and the last, mapped.
+  std::string Row(double& mapped) const {
+    const harness::Result run =
+        TallyLive({"-r", "vm-stats", "-q", "-s", "name:memSizeLimit:memSize:ballooned:mapped"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    const std::string start = "tally-plug,";
+    const size_t row = run.out.find(start);
+    EXPECT_NE(row, std::string::npos) << run.out;
+    if (row == std::string::npos) return {};
+    const std::string line = run.out.substr(row + start.size(), run.out.find('\n', row) - row);
+    const size_t last = line.substr(0, line.find('\n')).rfind(',');
+    mapped = std::stod(line.substr(last + 1));
+    return line.substr(0, last);
+  }
+
+  std::string SizesOf(int64_t megabytes) const {
+    return "8388608," + std::to_string(megabytes * 1024) + ",0";
+  }
+
+  const HostTree directory_;
+  const std::string path_ = directory_.Root() + "/monitor";
+  std::optional<Child> guest_;
+};
+
+TEST_P(PluggedMemoryTest, IsMemoryOfTheGuest) {
+  double before = 0;
+  double small = 0;
+  double large = 0;
+  EXPECT_EQ(Row(before), SizesOf(GetParam().memory));
+  Plug("small", "67108864");
+  EXPECT_EQ(Row(small), SizesOf(GetParam().memory + 64));
+  EXPECT_GE(small, before + 65536) << "all of it is there";
+  // So much that the process is not walked any more.
+  Plug("large", "268435456");
+  EXPECT_EQ(Row(large), SizesOf(GetParam().memory + 320));
+  EXPECT_GE(large, before + 327680);
+  EXPECT_LE(large, static_cast<double>((GetParam().memory + 320) * 1024));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Guests, PluggedMemoryTest,
+    testing::Values(RoomyGuest{"tcg", 64, "-qmp"}, RoomyGuest{"tcg", 2048, "-qmp-pretty"},
+                    RoomyGuest{"kvm", 64, "-qmp-pretty"}, RoomyGuest{"kvm", 2048, "-qmp"}),
+    [](const auto& guest) {
+      return std::string(guest.param.accelerator) + std::to_string(guest.param.memory);
+    });
 
 TEST(LiveGroupsTest, AGuestThatWaitsForItsFirstClientIsNotReleased) {
   if (std::system("command -v qemu-system-x86_64 >/dev/null") != 0) {

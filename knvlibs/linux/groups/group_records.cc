@@ -6,6 +6,7 @@
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/reader_of.h"
 #include "knvlibs/linux/host/figure_file.h"
+#include "knvlibs/linux/machines/guest.h"
 #include "knvlibs/linux/memory/kernel_memory.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
@@ -136,22 +137,69 @@ Status ReadCgroup(const LinuxHost& host, const GroupTree& tree, const Group& gro
   return kOk;
 }
 
-// What a virtual machine takes beside the memory of its guest: the rest of QEMU, page tables, and
-// those of KVM, which only its own cgroup tells apart.
-Status ReadOverhead(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
-                    const FigureFile& meminfo, Figure& overhead) {
-  const GuestMapping* mapping = nullptr;
+// What the page tables of KVM take for a machine by its own cgroup.
+Status ReadOwnTables(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                     Figure& tables) {
+  tables.reset();
+  if (machine.cgroup == Group::kNone) return kOk;
   MemcgEvents events;
-  Status status = tree.GetMapping(host, machine, mapping);
-  if (status == kOk && machine.cgroup != Group::kNone) {
-    status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
+  const Status status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
+  tables = events.secPageTables;
+  return status;
+}
+
+// Whether what the host has of such page tables is that of the machines. Since Linux 6.11 those of
+// devices are among it.
+Status ReadHostTables(const LinuxHost& host, const GroupTree& tree, const FigureFile& meminfo,
+                      Figure& tables) {
+  FigureFile vmstat;
+  tables.reset();
+  if (!tree.HasAllMachines()) return kOk;
+  const Status status = FigureFile::ReadVmstat(host, vmstat);
+  if (status == kOk && vmstat.FindOr("nr_iommu_pages", 0) == 0) {
+    tables = meminfo.Find("SecPageTables");
   }
-  if (status != kOk) return status;
-  if (meminfo.FindOr("SecPageTables", 0) == 0) events.secPageTables = 0;
-  const Process& process = tree.ProcessOf(tree.At(machine.group));
-  overhead = SumOf(
-      {DifferenceOf(process.Mapped(), mapping->resident), process.vmPte, events.secPageTables});
+  return status;
+}
+
+// The share of the one machine whose own cgroup does not tell: what is left of the host's. There
+// is no telling how several divide it.
+Status ReadRestOfTables(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                        const FigureFile& meminfo, Figure& rest) {
+  Status status = ReadHostTables(host, tree, meminfo, rest);
+  for (const VirtualMachine& other : tree.VirtualMachines()) {
+    if (status != kOk || !rest) return status;
+    if (&other == &machine || UsesKvm(host, tree, other) == false) continue;
+    Figure part;
+    status = ReadOwnTables(host, tree, other, part);
+    rest = DifferenceOf(rest, part);
+  }
+  return status;
+}
+
+Status ReadKvmTables(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                     const FigureFile& meminfo, Figure& tables) {
+  tables = 0;
+  if (meminfo.FindOr("SecPageTables", 0) == 0) return kOk;
+  const Status status = ReadOwnTables(host, tree, machine, tables);
+  if (status != kOk || tables) return status;
+  const std::optional<bool> usesKvm = UsesKvm(host, tree, machine);
+  if (usesKvm == true) return ReadRestOfTables(host, tree, machine, meminfo, tables);
+  if (usesKvm == false) tables = 0;
   return kOk;
+}
+
+// What a virtual machine takes beside the memory of its guest: the rest of QEMU, page tables, and
+// those of KVM.
+Status ReadOverhead(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                    const GuestMapping& mapping, const FigureFile& meminfo, Figure& overhead) {
+  Figure tables;
+  overhead.reset();
+  if (!mapping.resident) return kOk;
+  const Status status = ReadKvmTables(host, tree, machine, meminfo, tables);
+  const Process& process = tree.ProcessOf(tree.At(machine.group));
+  overhead = SumOf({DifferenceOf(process.Mapped(), mapping.resident), process.vmPte, tables});
+  return status;
 }
 
 void FillProcess(const Process& process, KSI_GroupMemoryStats& record) {
@@ -169,11 +217,18 @@ void FillProcess(const Process& process, KSI_GroupMemoryStats& record) {
 // as it was.
 Status ReadMachine(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                    const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
-  Figure overhead;
-  const Status status = ReadOverhead(host, tree, machine, meminfo, overhead);
   const QemuCommandLine& line = machine.commandLine;
-  record.memSize = FieldOf(line.memory);
-  record.memSizePeak = FieldOf(line.memory == line.maxMemory ? line.memory : std::nullopt);
+  GuestMapping ended;
+  ended.memory = line.memory;
+  if (line.MayChange()) ended.memory.modules.reset();
+  const GuestMapping* mapping = &ended;
+  Figure overhead;
+  Status status = GetMapping(host, tree, machine, mapping);
+  if (status == kOk) status = ReadOverhead(host, tree, machine, *mapping, meminfo, overhead);
+  const Figure size = mapping->memory.Size();
+  record.memSize = FieldOf(size);
+  // What may be more is no peak.
+  record.memSizePeak = FieldOf(!line.maxMemory || size == line.maxMemory ? size : std::nullopt);
   record.ovhd = FieldOf(overhead);
   return status == KSI_STATUS_NOT_FOUND ? kOk : status;
 }

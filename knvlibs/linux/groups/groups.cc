@@ -174,6 +174,7 @@ Status GroupTree::AddProcesses(const LinuxHost& host) {
   Status status = ListProcesses(host, pids);
   if (status != kOk) return status;
 
+  kvm_ = KvmSearch(host);
   processes_.reserve(pids.size());
   for (const int32_t pid : pids) {
     Process process;
@@ -188,15 +189,26 @@ Status GroupTree::AddProcesses(const LinuxHost& host) {
   return kOk;
 }
 
+// Whether a process runs a virtual machine.
+bool GroupTree::FindMachine(const LinuxHost& host, const Process& process,
+                            VirtualMachine& machine) {
+  machine.pid = process.pid;
+  std::vector<std::string> words;
+  // QEMU is never a single thread; most others are and need not be asked.
+  machine.isQemu =
+      process.threads > 1 && ReadCommandLine(host, process.pid, words) == kOk && IsQemu(words);
+  if (machine.isQemu) machine.commandLine = ParseQemuCommandLine(words);
+  return machine.isQemu || kvm_.IsMachine(host, process);
+}
+
 void GroupTree::AddProcess(const LinuxHost& host, Process process) {
   const int32_t pid = process.pid;
   const size_t index = processes_.size();
   const size_t cgroup = CgroupOf(host, pid);
   processes_.push_back(std::move(process));
-  std::vector<std::string> words;
-  // QEMU is never a single thread; most others are and need not be asked.
-  if (processes_[index].threads > 1 && ReadCommandLine(host, pid, words) == kOk && IsQemu(words)) {
-    AddVirtualMachine(cgroup, index, ParseQemuCommandLine(words));
+  VirtualMachine machine;
+  if (FindMachine(host, processes_[index], machine)) {
+    AddVirtualMachine(cgroup, index, std::move(machine));
     return;
   }
   Group group;
@@ -208,13 +220,14 @@ void GroupTree::AddProcess(const LinuxHost& host, Process process) {
   Add(cgroup, std::move(group));
 }
 
-void GroupTree::AddVirtualMachine(size_t parent, size_t process, QemuCommandLine commandLine) {
-  const int32_t pid = processes_[process].pid;
+void GroupTree::AddVirtualMachine(size_t parent, size_t process, VirtualMachine machine) {
+  const int32_t pid = machine.pid;
+  const std::string& name = machine.commandLine.name;
   Group group;
   group.id = kProcessGroup | pid;
   group.kind = Group::Kind::kVirtualMachine;
   group.flags = KSI_GROUP_VM;
-  group.name = commandLine.name.empty() ? processes_[process].name : Printable(commandLine.name);
+  group.name = name.empty() ? processes_[process].name : Printable(name);
   group.process = process;
   group.virtualMachine = virtualMachines_.size();
   const size_t self = Add(parent, std::move(group));
@@ -227,10 +240,7 @@ void GroupTree::AddVirtualMachine(size_t parent, size_t process, QemuCommandLine
   monitor.process = process;
   monitor.virtualMachine = virtualMachines_.size();
   Add(self, std::move(monitor));
-  VirtualMachine machine;
-  machine.pid = pid;
   machine.group = self;
-  machine.commandLine = std::move(commandLine);
   virtualMachines_.push_back(std::move(machine));
 }
 
@@ -279,19 +289,6 @@ const VirtualMachine* GroupTree::FindVirtualMachine(int64_t pid) const {
   const Group* group = FindClient(pid);
   return group == nullptr || group->virtualMachine == Group::kNone ? nullptr
                                                                    : &VirtualMachineOf(*group);
-}
-
-Status GroupTree::GetMapping(const LinuxHost& host, const VirtualMachine& machine,
-                             const GuestMapping*& mapping) const {
-  if (!machine.mapping) {
-    GuestMapping read;
-    const Status status =
-        ReadGuestMapping(host, ProcessOf(At(machine.group)), machine.commandLine, read);
-    if (status != kOk) return status;
-    machine.mapping = read;
-  }
-  mapping = &*machine.mapping;
-  return kOk;
 }
 
 Status GroupTree::ReadReservation(const LinuxHost& host, const Group& group,

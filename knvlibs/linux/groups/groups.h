@@ -25,6 +25,7 @@
 #include "knvlibs/linux/groups/process_ksm.h"
 #include "knvlibs/linux/host/host.h"
 #include "knvlibs/linux/machines/guest_mapping.h"
+#include "knvlibs/linux/machines/kvm.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 #include "knvlibs/linux/machines/qmp.h"
 #include "knvlibs/status.h"
@@ -60,11 +61,15 @@ struct VirtualMachine {
   size_t group = Group::kNone;
   // The cgroup that was made for this virtual machine alone, if there is one.
   size_t cgroup = Group::kNone;
+  // Of another monitor nothing is known but that it is one.
+  bool isQemu = true;
   QemuCommandLine commandLine;
 
   // What takes long to find out, once it was asked.
+  mutable std::optional<QemuMappings> mappings;  // until they have been measured
   mutable std::optional<GuestMapping> mapping;
   mutable std::optional<GuestMemory> guest;
+  mutable std::optional<std::optional<bool>> usesKvm;
 };
 
 class GroupTree {
@@ -88,10 +93,8 @@ class GroupTree {
   const std::vector<VirtualMachine>& VirtualMachines() const { return virtualMachines_; }
   const CgroupHierarchy& Cgroups() const { return cgroups_; }
 
-  // A virtual machine's memory as QEMU has it mapped. Fails with KSI_STATUS_NOT_FOUND if it has
-  // ended.
-  [[nodiscard]] Status GetMapping(const LinuxHost& host, const VirtualMachine& machine,
-                                  const GuestMapping*& mapping) const;
+  // Whether no virtual machine that uses KVM can have been missed.
+  bool HasAllMachines() const { return kvm_.IsWhole(); }
 
   // What is reserved for a group itself, in KB.
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, const Group& group,
@@ -116,15 +119,18 @@ class GroupTree {
   void AddChildren(const LinuxHost& host, size_t self, std::vector<size_t>& added);
   [[nodiscard]] Status AddProcesses(const LinuxHost& host);
   void AddProcess(const LinuxHost& host, Process process);
+  [[nodiscard]] bool FindMachine(const LinuxHost& host, const Process& process,
+                                 VirtualMachine& machine);
   size_t Add(size_t parent, Group group);
   size_t CgroupOf(const LinuxHost& host, int32_t pid) const;
-  void AddVirtualMachine(size_t parent, size_t process, QemuCommandLine commandLine);
+  void AddVirtualMachine(size_t parent, size_t process, VirtualMachine machine);
   void FindOwnCgroups();
   size_t UnitOf(size_t group) const;
   size_t CountUserWorlds(size_t group) const;
   Figure ProcessHugetlbOf(const Group& group) const;
 
   CgroupHierarchy cgroups_;
+  KvmSearch kvm_;
   std::vector<Group> groups_;  // the first is the root
   std::vector<Process> processes_;
   std::vector<VirtualMachine> virtualMachines_;

@@ -65,6 +65,8 @@ bool TakeField(std::string_view name, std::string_view value, Process& process,
     facts.state = Trimmed(value).substr(0, 1);
   } else if (name == "PPid") {
     return ParseNumber(Trimmed(value), facts.parent);
+  } else if (name == "FDSize") {
+    return ParseNumber(Trimmed(value), process.fdSize);
   } else if (name == kLastField) {
     return ParseNumber(Trimmed(value), process.threads);
   } else if (name == "Kthread") {

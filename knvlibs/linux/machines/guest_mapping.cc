@@ -4,7 +4,6 @@
 #include <span>
 #include <vector>
 
-#include "knvlibs/linux/groups/smaps.h"
 #include "knvlibs/linux/host/walk_time.h"
 #include "knvlibs/linux/machines/page_map.h"
 
@@ -12,12 +11,6 @@ namespace ksi {
 namespace {
 
 uint64_t SizeOf(const Mapping& mapping) { return (mapping.end - mapping.start) / 1024; }
-
-Figure SumOfAll(const std::vector<Figure>& parts) {
-  Figure sum = 0;
-  for (const Figure& part : parts) sum = SumOf({sum, part});
-  return sum;
-}
 
 // Joins what the kernel has cut: mappings side by side of the same memory.
 std::vector<Mapping> Joined(const std::vector<Mapping>& mappings) {
@@ -45,14 +38,14 @@ std::vector<Mapping>::iterator FindBlock(std::vector<Mapping>& mappings, uint64_
   return best;
 }
 
-// The mappings of all blocks; none if one of them is not there.
-std::vector<Mapping> FindBlocks(std::vector<Mapping> mappings, const std::vector<Figure>& sizes) {
+// The mappings of all blocks, and those that are left; none if one of them is not there.
+std::vector<Mapping> FindBlocks(const std::vector<Figure>& sizes, std::vector<Mapping>& left) {
   std::vector<Mapping> blocks;
   for (const Figure& size : sizes) {
-    const auto block = size ? FindBlock(mappings, *size) : mappings.end();
-    if (block == mappings.end()) return {};
+    const auto block = size ? FindBlock(left, *size) : left.end();
+    if (block == left.end()) return {};
     blocks.push_back(*block);
-    mappings.erase(block);
+    left.erase(block);
   }
   return blocks;
 }
@@ -63,6 +56,15 @@ std::vector<Mapping> FindDefault(std::vector<Mapping> mappings) {
   const auto largest = std::ranges::max_element(mappings, {}, SizeOf);
   if (largest == mappings.end()) return {};
   return {*largest};
+}
+
+// Whether memory for a guest may be left. Memory of devices is kept from children, too: that of a
+// screen is 16 MB, and no module is as small.
+bool MayHoldModule(const std::vector<Mapping>& left) {
+  constexpr uint64_t kLargestOfDevices = uint64_t{16} << 10;
+  return std::ranges::any_of(left, [](const Mapping& mapping) {
+    return mapping.isDontCopy && SizeOf(mapping) > kLargestOfDevices;
+  });
 }
 
 bool IsShort(const LinuxHost& host, const Process& process) {
@@ -94,25 +96,39 @@ Status TakePages(const LinuxHost& host, int32_t pid, const std::vector<Mapping>&
 
 }  // namespace
 
-Status ReadGuestMapping(const LinuxHost& host, const Process& process, const QemuCommandLine& line,
-                        GuestMapping& guest) {
-  const MappingsFile file = IsShort(host, process) ? MappingsFile::kSmaps : MappingsFile::kMaps;
-  std::vector<Mapping> mappings;
-  guest = GuestMapping();
-  if (file == MappingsFile::kSmaps && !MayWalk(host)) return kOk;
-  {
-    const Walk walk(host);
-    const Status status = ReadMappings(host, process.pid, file, mappings);
-    if (status != kOk) return status;
+Status ReadQemuMappings(const LinuxHost& host, const Process& process, QemuMappings& mappings) {
+  mappings.file = IsShort(host, process) ? MappingsFile::kSmaps : MappingsFile::kMaps;
+  mappings.mappings.clear();
+  if (mappings.file == MappingsFile::kSmaps && !MayWalk(host)) return kOk;
+  const Walk walk(host);
+  const Status status = ReadMappings(host, process.pid, mappings.file, mappings.mappings);
+  mappings.mappings = Joined(mappings.mappings);
+  return status;
+}
+
+bool IsMade(const QemuMappings& mappings, const MachineMemory& start) {
+  if (mappings.file == MappingsFile::kSmaps) {
+    return std::ranges::any_of(mappings.mappings, &Mapping::isDontCopy);
   }
-  mappings = Joined(mappings);
-  const std::vector<Mapping> blocks =
-      line.blocks.empty() ? FindDefault(mappings) : FindBlocks(mappings, line.blocks);
-  guest.isMade = file == MappingsFile::kSmaps ? std::ranges::any_of(mappings, &Mapping::isDontCopy)
-                                              : !blocks.empty();
+  std::vector<Mapping> left = mappings.mappings;
+  return !FindBlocks(start.AllBlocks(), left).empty();
+}
+
+Status MeasureGuest(const LinuxHost& host, int32_t pid, const QemuMappings& mappings,
+                    MachineMemory memory, bool isSure, GuestMapping& guest) {
+  guest = GuestMapping();
+  const bool isSmaps = mappings.file == MappingsFile::kSmaps;
+  std::vector<Mapping> left = mappings.mappings;
+  std::vector<Mapping> blocks =
+      memory.base ? FindBlocks(memory.AllBlocks(), left) : FindDefault(left);
+  if (!memory.base && !blocks.empty()) memory.base = SizeOf(blocks.front());
+  if (!isSure && (!isSmaps || blocks.empty() || MayHoldModule(left))) {
+    memory.modules.reset();
+    blocks.clear();
+  }
+  guest.memory = std::move(memory);
   if (blocks.empty()) return kOk;
-  guest.size = line.blocks.empty() ? SizeOf(blocks.front()) : SumOfAll(line.blocks);
-  if (file == MappingsFile::kMaps) return TakePages(host, process.pid, blocks, guest);
+  if (!isSmaps) return TakePages(host, pid, blocks, guest);
   TakeSmaps(blocks, guest);
   return kOk;
 }

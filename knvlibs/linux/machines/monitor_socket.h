@@ -15,9 +15,10 @@ namespace ksi {
 
 class MonitorSocket : public Channel {
  public:
-  // Answers take some hundred bytes each; events of a busy guest may stand between them.
+  // Answers take some hundred bytes each, those of all memory modules a hundred kilobytes, on one
+  // line or on one for each value; events of a busy guest may stand between them.
   static constexpr size_t kMostBytes = size_t{256} << 10;
-  static constexpr size_t kMostLines = 256;
+  static constexpr size_t kMostLines = 8192;
 
   // The conversation is over when `clock` comes to `deadline`.
   MonitorSocket(LinuxHost::Clock clock, LinuxHost::TimePoint deadline)

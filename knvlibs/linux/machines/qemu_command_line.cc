@@ -103,6 +103,8 @@ struct Parts {
   std::vector<Properties> sockets;
   std::vector<std::string> monitors;  // ids of character devices
   Monitor monitor;                    // named by -qmp itself
+  std::string accelerators;           // "kvm:tcg", the first that works is taken
+  bool hasConfig = false;             // there are options in a file
 };
 
 bool IsOn(const Properties& properties, std::string_view name) {
@@ -148,17 +150,39 @@ void Take(std::string_view option, const std::string& value, Parts& parts, QemuC
     if (FindOrEmpty(monitor, "mode") == "control") {
       parts.monitors.push_back(FindOrEmpty(monitor, "chardev"));
     }
+  } else if (option == "accel") {
+    parts.accelerators += FindOrEmpty(ParseProperties(value, "accel"), "accel") + ':';
+  } else if (option == "machine" || option == "M") {
+    parts.accelerators += FindOrEmpty(ParseProperties(value, "type"), "accel") + ':';
+  } else if (option == "readconfig") {
+    parts.hasConfig = true;
   } else if (option == "qmp" || option == "qmp-pretty") {
     if (parts.monitor.path.empty()) parts.monitor = MonitorAt(value);
     parts.monitors.push_back(value);  // or the id of a character device
   }
 }
 
+// The driver of a device for plugged memory; "virtio-mem-pci" and "-ccw" are both virtio-mem.
+bool IsModule(const std::string& driver) {
+  return driver == "pc-dimm" || driver == "nvdimm" || driver.starts_with("virtio-mem-") ||
+         driver.starts_with("virtio-pmem-");
+}
+
+MemoryModule ModuleOf(const Properties& device, Figure block) {
+  const std::string driver = FindOrEmpty(device, "driver");
+  MemoryModule module = {.size = block, .block = block, .isDimm = driver == "pc-dimm"};
+  // How much of it the guest has is agreed upon while it runs.
+  if (driver.starts_with("virtio-mem-")) module.size.reset();
+  const std::string* label = Find(device, "label-size");
+  if (driver == "nvdimm" && label != nullptr) {
+    module.size = DifferenceOf(block, ParseSize(*label, kBytes));
+  }
+  return module;
+}
+
 void FindMemory(const Parts& parts, QemuCommandLine& line) {
-  line.memory = ParseSize(FindOrEmpty(parts.memory, "size"), kMegabytes);
-  if (!line.memory) return;
-  line.blocks.push_back(line.memory);
-  const Figure start = line.memory;
+  MachineMemory& memory = line.memory;
+  memory.base = ParseSize(FindOrEmpty(parts.memory, "size"), kMegabytes);
   // Memory of the machine itself may be cut into backends, one for each of its NUMA nodes.
   std::vector<Figure> nodes;
   Figure nodesSize = 0;
@@ -170,17 +194,15 @@ void FindMemory(const Parts& parts, QemuCommandLine& line) {
     if (device == parts.devices.end()) {
       nodes.push_back(backend.size);
       nodesSize = SumOf({nodesSize, backend.size});
-    } else if (FindOrEmpty(*device, "driver") == "pc-dimm") {
-      line.memory = SumOf({line.memory, backend.size});
-      line.blocks.push_back(backend.size);
+    } else if (IsModule(FindOrEmpty(*device, "driver"))) {
+      memory.modules->push_back(ModuleOf(*device, backend.size));
     }
   }
-  if (nodesSize == start) {
-    line.blocks.erase(line.blocks.begin());
-    line.blocks.insert(line.blocks.begin(), nodes.begin(), nodes.end());
+  if (memory.base) {
+    memory.blocks = nodesSize == memory.base ? nodes : std::vector<Figure>{memory.base};
   }
   const std::string* maximum = Find(parts.memory, "maxmem");
-  line.maxMemory = maximum == nullptr ? line.memory : ParseSize(*maximum, kMegabytes);
+  line.maxMemory = maximum == nullptr ? memory.Size() : ParseSize(*maximum, kMegabytes);
 }
 
 void FindMonitor(const Parts& parts, QemuCommandLine& line) {
@@ -198,7 +220,26 @@ void FindMonitor(const Parts& parts, QemuCommandLine& line) {
   line.waitsForClient = monitor.waitsForClient;
 }
 
+// Where KVM is one of several, whether it works settles it.
+std::optional<bool> FindKvm(const std::vector<std::string>& words, const Parts& parts) {
+  const auto isWord = [&](std::string_view word) {
+    return std::ranges::find(words, word) != words.end();
+  };
+  if (isWord("-enable-kvm") || isWord("--enable-kvm")) return true;
+  std::string accelerators = parts.accelerators;
+  std::erase(accelerators, ':');
+  if (accelerators == "kvm") return true;
+  // By another name it may stand for a program with other defaults.
+  const bool isPlain = words[0].find("qemu-system-") != std::string::npos && !parts.hasConfig;
+  if (!isPlain || accelerators.find("kvm") != std::string::npos) return std::nullopt;
+  return false;
+}
+
 }  // namespace
+
+bool QemuCommandLine::MayChange() const {
+  return !memory.modules->empty() || maxMemory != memory.base;
+}
 
 bool IsQemu(const std::vector<std::string>& words) {
   if (words.empty()) return false;
@@ -217,6 +258,7 @@ QemuCommandLine ParseQemuCommandLine(const std::vector<std::string>& words) {
   }
   FindMemory(parts, line);
   FindMonitor(parts, line);
+  line.usesKvm = FindKvm(words, parts);
   for (const Properties& device : parts.devices) {
     if (!FindOrEmpty(device, "driver").starts_with("virtio-balloon")) continue;
     line.hasBalloon = true;

@@ -3,25 +3,30 @@
 #define KNVLIBS_LINUX_MACHINES_QEMU_COMMAND_LINE_H_
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "knvlibs/linux/host/figure.h"
+#include "knvlibs/linux/machines/machine_memory.h"
 
 namespace ksi {
 
 struct QemuCommandLine {
-  std::string name;  // -name; may be empty
-  // KB.
-  Figure memory;     // what the machine starts with, -m, and the modules plugged in
-  Figure maxMemory;  // with all modules it has room for, maxmem=
-  // The sizes of the blocks that this memory is made of, in KB.
-  std::vector<Figure> blocks;
-  std::string monitor;  // path of the socket that answers QMP; may be empty
+  std::string name;      // -name; may be empty
+  MachineMemory memory;  // that the machine starts with: -m, and the modules that are named
+  Figure maxMemory;      // with all modules it has room for, maxmem=, in KB
+  std::string monitor;   // path of the socket that answers QMP; may be empty
   // QEMU makes its machine only when that socket has had its first client.
   bool waitsForClient = false;
   bool hasBalloon = false;
-  std::string balloon;  // id of the balloon device; may be empty
+  std::string balloon;          // id of the balloon device; may be empty
+  std::optional<bool> usesKvm;  // none if the command line does not tell
+
+  // Whether the machine may have other memory than it started with.
+  bool MayChange() const;
+  // Whether what memory it has is told here.
+  bool TellsMemory() const { return memory.base && !MayChange(); }
 };
 
 // Whether this command line is that of QEMU running a whole machine.

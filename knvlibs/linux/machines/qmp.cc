@@ -9,7 +9,9 @@
 #include <knvlibs/ksi.h>
 #include "knvlibs/json.h"
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/linux/host/wall_clock.h"
 #include "knvlibs/linux/machines/channel.h"
+#include "knvlibs/linux/machines/conversation.h"
 #include "knvlibs/linux/machines/listener.h"
 #include "knvlibs/linux/machines/monitor_socket.h"
 #include "knvlibs/linux/reading.h"
@@ -35,20 +37,6 @@ class RecordedChannel : public Channel {
   Lines lines_;
 };
 
-// Sends a command; the answer is what comes back that is no event.
-std::optional<Json> Ask(Channel& channel, std::string_view command) {
-  if (!channel.Send(command)) return std::nullopt;
-  std::string line;
-  while (channel.Receive(line)) {
-    std::optional<Json> answer = ParseJson(line);
-    if (!answer) return std::nullopt;
-    if (FindMember(&*answer, "return") != nullptr || FindMember(&*answer, "error") != nullptr) {
-      return answer;
-    }
-  }
-  return std::nullopt;
-}
-
 // The member of this name, in KB, of an object that may be missing.
 Figure KBOf(const Json* object, std::string_view name) {
   const Figure bytes = NumberOf(FindMember(object, name));
@@ -56,8 +44,8 @@ Figure KBOf(const Json* object, std::string_view name) {
   return bytes == kNoValue ? std::nullopt : QuotientOf(bytes, 1024);
 }
 
-void AskForBalloon(Channel& channel, GuestMemory& memory) {
-  const std::optional<Json> answer = Ask(channel, R"({"execute":"query-balloon"})");
+void AskForBalloon(Conversation& monitor, GuestMemory& memory) {
+  const std::optional<Json> answer = monitor.Ask(R"({"execute":"query-balloon"})");
   if (!answer) return;
   if (const Json* result = FindMember(&*answer, "return")) {
     memory.balloon = GuestMemory::Balloon::kActive;
@@ -68,42 +56,91 @@ void AskForBalloon(Channel& channel, GuestMemory& memory) {
   if (kind != nullptr && *kind == "DeviceNotActive") memory.balloon = GuestMemory::Balloon::kNone;
 }
 
+// What a command answers; none if it fails.
+std::optional<Json> AskFor(Conversation& monitor, std::string_view command) {
+  std::optional<Json> answer = monitor.Ask(command);
+  if (!answer || FindMember(&*answer, "return") == nullptr) return std::nullopt;
+  return *FindMember(&*answer, "return");
+}
+
+std::optional<Json> AskDevice(Conversation& monitor, const std::string& id, const char* property) {
+  return AskFor(monitor, R"({"execute":"qom-get","arguments":{"path":"/machine/peripheral/)" + id +
+                             R"(","property":")" + property + R"("}})");
+}
+
 // Figures that the guest sends now and then, if somebody has asked it to.
-void AskForStatistics(Channel& channel, const std::string& balloon, GuestMemory& memory) {
+void AskForStatistics(const LinuxHost& host, Conversation& monitor, const std::string& balloon,
+                      GuestMemory& memory) {
   // An id of other characters would not stand in a path, and could end the text.
   constexpr std::string_view kIdCharacters =
       "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-._";
   if (balloon.empty() || balloon.find_first_not_of(kIdCharacters) != std::string::npos) return;
-  const std::optional<Json> answer =
-      Ask(channel, R"({"execute":"qom-get","arguments":{"path":"/machine/peripheral/)" + balloon +
-                       R"(","property":"guest-stats"}})");
-  const Json* result = answer ? FindMember(&*answer, "return") : nullptr;
-  if (NumberOf(FindMember(result, "last-update")).value_or(0) == 0) return;
-  const Json* statistics = FindMember(result, "stats");
+  const std::optional<Json> result = AskDevice(monitor, balloon, "guest-stats");
+  if (!result) return;
+  const std::optional<Json> interval = AskDevice(monitor, balloon, "guest-stats-polling-interval");
+  if (!interval || !AreCurrent(NumberOf(FindMember(&*result, "last-update")), WallClock(host),
+                               NumberOf(&*interval))) {
+    return;
+  }
+  const Json* statistics = FindMember(&*result, "stats");
   memory.total = KBOf(statistics, "stat-total-memory");
   memory.available = KBOf(statistics, "stat-available-memory");
 }
 
-// Whether a monitor greets and takes questions.
-bool Greet(Channel& channel) {
-  std::string greeting;
-  if (!channel.Receive(greeting)) return false;
-  const std::optional<Json> hello = ParseJson(greeting);
-  return hello && FindMember(&*hello, "QMP") != nullptr &&
-         Ask(channel, R"({"execute":"qmp_capabilities"})").has_value();
+// The size of the backend of a module, "/objects/mem1".
+Figure BackendSize(const Json& backends, const Json* module) {
+  const std::string* path = TextOf(FindMember(module, "memdev"));
+  if (path == nullptr) return std::nullopt;
+  const std::string_view id = std::string_view(*path).substr(path->rfind('/') + 1);
+  for (const auto& [name, backend] : backends.members) {
+    const std::string* own = TextOf(FindMember(&backend, "id"));
+    if (own != nullptr && *own == id) return KBOf(&backend, "size");
+  }
+  return std::nullopt;
 }
 
-void Converse(Channel& channel, const QemuCommandLine& line, GuestMemory& memory) {
-  if (!Greet(channel)) return;
-  AskForBalloon(channel, memory);
-  AskForStatistics(channel, line.balloon, memory);
+MemoryModule ModuleOf(const Json& backends, const Json& device) {
+  const Json* data = FindMember(&device, "data");
+  const std::string* type = TextOf(FindMember(&device, "type"));
+  MemoryModule module;
+  module.size = KBOf(data, "size");
+  module.block = BackendSize(backends, data);
+  module.isDimm = type != nullptr && *type == "dimm";
+  return module;
+}
+
+// Nothing is told of modules that do not add up to what there is: one may have come in between.
+void AskForModules(Conversation& monitor, GuestMemory& memory) {
+  // A machine has 256 slots at most.
+  constexpr size_t kMostModules = 256;
+  const auto summary = AskFor(monitor, R"({"execute":"query-memory-size-summary"})");
+  if (!summary) return;
+  memory.base = KBOf(&*summary, "base-memory");
+  const auto devices = AskFor(monitor, R"({"execute":"query-memory-devices"})");
+  const auto backends = AskFor(monitor, R"({"execute":"query-memdev"})");
+  if (!devices || !backends || devices->members.size() > kMostModules) return;
+  MachineMemory machine = {.base = 0, .blocks = {}, .modules = {{}}};
+  for (const auto& [name, device] : devices->members) {
+    machine.modules->push_back(ModuleOf(*backends, device));
+  }
+  const Figure plugged = KBOf(&*summary, "plugged-memory");
+  if (plugged && machine.Size() == plugged) memory.modules = std::move(machine.modules);
+}
+
+void Converse(const LinuxHost& host, Channel& channel, const QemuCommandLine& line,
+              GuestMemory& memory) {
+  Conversation monitor(channel);
+  if (!monitor.Begin()) return;
+  AskForBalloon(monitor, memory);
+  AskForStatistics(host, monitor, line.balloon, memory);
+  if (!line.TellsMemory()) AskForModules(monitor, memory);
 }
 
 void AskRecorded(const LinuxHost& host, const QemuCommandLine& line, GuestMemory& memory) {
   std::string text;
   if (host.Read(line.monitor, text) != kOk) return;
   RecordedChannel channel(std::move(text));
-  Converse(channel, line, memory);
+  Converse(host, channel, line, memory);
 }
 
 void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, GuestMemory& memory) {
@@ -119,7 +156,7 @@ void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, Gu
   MonitorSocket socket(host.TimeSource(), start + patience);
   // Where the listener cannot be looked up, the connection tells who it is.
   if (Listens(host, pid, line.monitor).value_or(true) && socket.Connect(line.monitor, pid)) {
-    Converse(socket, line, memory);
+    Converse(host, socket, line, memory);
   }
   left -= host.Now() - start;
 }
@@ -141,6 +178,12 @@ GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuComman
     AskRecorded(host, line, memory);
   }
   return memory;
+}
+
+bool AreCurrent(Figure sent, Figure now, Figure interval) {
+  if (!sent || !now || !interval) return false;
+  const uint64_t age = Less(*now, *sent) + Less(*sent, *now);  // clocks may be set
+  return age <= ProductOf(interval, 2).value_or(0) && interval != 0u;
 }
 
 }  // namespace ksi

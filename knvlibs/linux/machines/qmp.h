@@ -1,4 +1,4 @@
-// QMP: asking QEMU itself about its guest. Only questions are sent, nothing that changes anything.
+// QMP: asking QEMU itself about its guest.
 //
 // A recorded tree has, in the place of the socket, a file with the lines that the socket said.
 #ifndef KNVLIBS_LINUX_MACHINES_QMP_H_
@@ -6,8 +6,11 @@
 
 #include <chrono>
 #include <cstdint>
+#include <optional>
+#include <vector>
 
 #include "knvlibs/linux/host/host.h"
+#include "knvlibs/linux/machines/machine_memory.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 
 namespace ksi {
@@ -21,9 +24,13 @@ struct GuestMemory {
   enum class Balloon : uint8_t { kNone, kActive, kUnknown };
 
   Balloon balloon = Balloon::kUnknown;
-  Figure actual;     // what the balloon leaves to the guest
-  Figure total;      // as the guest counts
+  Figure actual;  // what the balloon leaves to the guest
+  // As the guest counts, if it has done so lately.
+  Figure total;
   Figure available;  // without its having to swap
+  // What the machine has.
+  Figure base;
+  std::optional<std::vector<MemoryModule>> modules;
 };
 
 // What is known without asking: whether there is a balloon at all.
@@ -32,6 +39,10 @@ GuestMemory UnaskedGuest(const QemuCommandLine& line);
 // Asks the monitor that the command line of process `pid` names, if it is that process that listens
 // there. What is not answered in time is not told.
 GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuCommandLine& line);
+
+// Whether figures that a guest sent at `sent` are those of `now` (seconds of the same clock): not
+// older than two of the intervals, in seconds, at which it is asked for them.
+bool AreCurrent(Figure sent, Figure now, Figure interval);
 
 }  // namespace ksi
 

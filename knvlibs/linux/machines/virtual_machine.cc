@@ -7,6 +7,7 @@
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/groups/process_ksm.h"
 #include "knvlibs/linux/groups/reader_of.h"
+#include "knvlibs/linux/machines/guest.h"
 #include "knvlibs/linux/memory/ksm.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
@@ -23,23 +24,6 @@ Status FindMachine(const LinuxHost& host, const Keys& keys, const GroupTree*& tr
   if (status != kOk) return status;
   machine = tree->FindVirtualMachine(keys[0].number);
   return machine == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
-}
-
-// Whether a client may come without being the one that QEMU waits for to make its machine.
-bool MayBeAsked(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine) {
-  const GuestMapping* mapping = nullptr;
-  return !machine.commandLine.waitsForClient ||
-         (tree.GetMapping(host, machine, mapping) == kOk && mapping->isMade);
-}
-
-const GuestMemory& GetGuest(const LinuxHost& host, const GroupTree& tree,
-                            const VirtualMachine& machine) {
-  if (!machine.guest) {
-    machine.guest = MayBeAsked(host, tree, machine)
-                        ? ReadGuestMemory(host, machine.pid, machine.commandLine)
-                        : UnaskedGuest(machine.commandLine);
-  }
-  return *machine.guest;
 }
 
 // What happened to the cgroup that was made for the machine; nothing is told if there is none.
@@ -60,7 +44,7 @@ struct MachineUse {
 
 Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                MachineUse& use) {
-  Status status = tree.GetMapping(host, machine, use.mapping);
+  Status status = GetMapping(host, tree, machine, use.mapping);
   if (status == kOk) status = tree.ReadKsm(host, tree.At(machine.group), use.ksm);
   if (status == kOk) status = host.Kept().ksm.Get(host, use.sharing);
   return status == kOk ? ReadOwnEvents(host, tree, machine, use.events) : status;
@@ -127,15 +111,15 @@ Status ReadVmmTally(const LinuxHost& host, const GroupTree& tree, const VirtualM
   if (status != kOk) return status;
   SettleCompression(host, use.events);
 
-  const QemuCommandLine& line = machine.commandLine;
-  const Figure memory = line.memory ? line.memory : use.mapping->size;
-  record.memSize = FieldOf(memory);
-  record.memSizeLimit = FieldOf(line.maxMemory ? line.maxMemory : memory);
+  const MachineMemory& memory = use.mapping->memory;
+  const Figure limit = machine.commandLine.maxMemory;
+  record.memSize = FieldOf(memory.Size());
+  record.memSizeLimit = FieldOf(limit ? limit : memory.Size());
   record.touched = FieldOf(TouchedOf(use));
   FillSharing(use, record);
   record.zipped = FieldOf(use.events.zswapped);
   record.zipSaved = FieldOf(DifferenceOf(use.events.zswapped, use.events.zswapPool));
-  FillBalloon(GetGuest(host, tree, machine), memory, record);
+  FillBalloon(GetGuest(host, tree, machine), memory.BalloonSize(), record);
   return kOk;
 }
 
@@ -216,7 +200,7 @@ Status ReadVmLargePages(const LinuxHost& host, const GroupTree& tree, const Virt
   const GuestMapping* mapping = nullptr;
   MemcgEvents events;
   Figure threshold;
-  Status status = tree.GetMapping(host, machine, mapping);
+  Status status = GetMapping(host, tree, machine, mapping);
   if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
   if (status == kOk) status = ReadTransparent(host, threshold);
   if (status != kOk) return status;

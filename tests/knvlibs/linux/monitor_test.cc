@@ -8,6 +8,7 @@
 #include <atomic>
 #include <chrono>
 #include <cstring>
+#include <ctime>
 #include <filesystem>
 #include <functional>
 #include <string>
@@ -295,14 +296,16 @@ Peer::Script Answering(std::vector<std::string> answers) {
   };
 }
 
-TEST(MonitorTest, AnswersThreeQuestions) {
+TEST(MonitorTest, AnswersTheQuestions) {
   const Peer peer(Answering(
       {R"({"return": {}})",
        R"({"event": "X"})"
        "\n"
        R"({"return": {"actual": 1048576}})",
        R"({"return": {"stats": {"stat-total-memory": 4096, "stat-available-memory": 2048},)"
-       R"( "last-update": 5}})"}));
+       R"( "last-update": )" +
+           std::to_string(std::time(nullptr)) + "}}",
+       R"({"return": 60})"}));
   const LinuxHost host("/", StandingClock);
   const GuestMemory memory = ReadGuestMemory(host, getpid(), LineOf(peer.Path()));
   EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kActive);

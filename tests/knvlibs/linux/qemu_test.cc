@@ -1,6 +1,7 @@
 // What a QEMU command line and its monitor tell of a virtual machine.
 #include <gtest/gtest.h>
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -33,38 +34,81 @@ TEST(QemuCommandLineTest, QemuIsKnownByItsProgram) {
 }
 
 TEST(QemuCommandLineTest, MemoryHasManyForms) {
-  EXPECT_EQ(Parse({"-m", "64"}).memory, 64 * 1024u);
-  EXPECT_EQ(Parse({"-m", "4G"}).memory, 4 * kGB);
-  EXPECT_EQ(Parse({"-m", "4g"}).memory, 4 * kGB);
-  EXPECT_EQ(Parse({"--m", "size=4194304k"}).memory, 4 * kGB);
-  EXPECT_EQ(Parse({"-m", "size=2T,slots=4,maxmem=4T"}).memory, 2048 * kGB);
+  EXPECT_EQ(Parse({"-m", "64"}).memory.Size(), 64 * 1024u);
+  EXPECT_EQ(Parse({"-m", "4G"}).memory.Size(), 4 * kGB);
+  EXPECT_EQ(Parse({"-m", "4g"}).memory.Size(), 4 * kGB);
+  EXPECT_EQ(Parse({"--m", "size=4194304k"}).memory.Size(), 4 * kGB);
+  EXPECT_EQ(Parse({"-m", "size=2T,slots=4,maxmem=4T"}).memory.Size(), 2048 * kGB);
   EXPECT_EQ(Parse({"-m", "1G,slots=4,maxmem=4294967296B"}).maxMemory, 4 * kGB);
   EXPECT_EQ(Parse({"-m", "1G"}).maxMemory, kGB);
   for (const char* strange : {"", "x", "4X", "-4", "1.5G", "99999999999999999999", "16777216E"}) {
-    EXPECT_EQ(Parse({"-m", strange}).memory, std::nullopt) << strange;
+    EXPECT_EQ(Parse({"-m", strange}).memory.Size(), std::nullopt) << strange;
   }
-  EXPECT_EQ(Parse({"-m"}).memory, std::nullopt);
-  EXPECT_TRUE(Parse({}).blocks.empty());
+  EXPECT_EQ(Parse({"-m"}).memory.Size(), std::nullopt);
+  EXPECT_TRUE(Parse({}).memory.AllBlocks().empty());
 }
 
 TEST(QemuCommandLineTest, BackendsAreNodesOrModules) {
   const QemuCommandLine nodes =
       Parse({"-m", "4G", "-object", "memory-backend-ram,id=a,size=1G", "-object",
              R"({"qom-type":"memory-backend-memfd","id":"b","size":3221225472})"});
-  EXPECT_EQ(nodes.memory, 4 * kGB);
-  EXPECT_EQ(nodes.blocks, (std::vector<Figure>{kGB, 3 * kGB}));
+  EXPECT_EQ(nodes.memory.Size(), 4 * kGB);
+  EXPECT_EQ(nodes.memory.AllBlocks(), (std::vector<Figure>{kGB, 3 * kGB}));
+  EXPECT_FALSE(nodes.MayChange());
 
   const QemuCommandLine module =
       Parse({"-m", "4G,maxmem=8G", "-object", "memory-backend-ram,id=a,size=1G", "-device",
              R"({"driver":"pc-dimm","id":"d","memdev":"a"})"});
-  EXPECT_EQ(module.memory, 5 * kGB);
+  EXPECT_EQ(module.memory.Size(), 5 * kGB);
+  EXPECT_EQ(module.memory.BalloonSize(), 5 * kGB);
   EXPECT_EQ(module.maxMemory, 8 * kGB);
-  EXPECT_EQ(module.blocks, (std::vector<Figure>{4 * kGB, kGB}));
+  EXPECT_EQ(module.memory.AllBlocks(), (std::vector<Figure>{4 * kGB, kGB}));
+  EXPECT_TRUE(module.MayChange());
+}
 
-  const QemuCommandLine persistent = Parse(
-      {"-m", "4G", "-object", "memory-backend-file,id=n,size=1G", "-device", "nvdimm,memdev=n"});
-  EXPECT_EQ(persistent.memory, 4 * kGB);
-  EXPECT_EQ(persistent.blocks, (std::vector<Figure>{4 * kGB}));
+TEST(QemuCommandLineTest, PersistentMemoryIsMemoryButForItsLabelAndTheBalloon) {
+  const QemuCommandLine line =
+      Parse({"-m", "4G,slots=1,maxmem=5G", "-object", "memory-backend-file,id=n,size=1G", "-device",
+             "nvdimm,memdev=n,label-size=128K"});
+  EXPECT_EQ(line.memory.Size(), 5 * kGB - 128);
+  EXPECT_EQ(line.memory.BalloonSize(), 4 * kGB);
+  EXPECT_EQ(line.memory.AllBlocks(), (std::vector<Figure>{4 * kGB, kGB}));
+  EXPECT_EQ(Parse({"-m", "4G", "-object", "memory-backend-file,id=n,size=1G", "-device",
+                   "nvdimm,memdev=n"})
+                .memory.Size(),
+            5 * kGB);
+}
+
+TEST(QemuCommandLineTest, HowMuchOfADeviceOfChangingSizeIsPluggedIsNotSaid) {
+  const QemuCommandLine line =
+      Parse({"-m", "4G,maxmem=8G", "-object", "memory-backend-ram,id=m,size=2G", "-device",
+             "virtio-mem-pci,memdev=m,requested-size=1G"});
+  EXPECT_EQ(line.memory.Size(), std::nullopt);
+  EXPECT_EQ(line.memory.BalloonSize(), 4 * kGB);
+  EXPECT_EQ(line.memory.AllBlocks(), (std::vector<Figure>{4 * kGB, 2 * kGB}));
+}
+
+TEST(QemuCommandLineTest, WithRoomForModulesMemoryMayChange) {
+  EXPECT_FALSE(Parse({"-m", "4G"}).MayChange());
+  EXPECT_FALSE(Parse({"-m", "4G,maxmem=4G"}).MayChange());
+  EXPECT_TRUE(Parse({"-m", "4G,slots=1,maxmem=8G"}).MayChange());
+  EXPECT_TRUE(Parse({"-m", "slots=1,maxmem=8G"}).MayChange());
+  EXPECT_FALSE(Parse({}).MayChange());
+  EXPECT_FALSE(Parse({}).TellsMemory());
+  EXPECT_TRUE(Parse({"-m", "4G"}).TellsMemory());
+}
+
+TEST(QemuCommandLineTest, AcceleratorsAreNamedInManyWays) {
+  EXPECT_EQ(Parse({"-accel", "kvm"}).usesKvm, true);
+  EXPECT_EQ(Parse({"-accel", "accel=kvm,dirty-ring-size=4096"}).usesKvm, true);
+  EXPECT_EQ(Parse({"-machine", "pc-q35-9.2,usb=off,accel=kvm"}).usesKvm, true);
+  EXPECT_EQ(Parse({"-m", "64", "-enable-kvm"}).usesKvm, true);
+  EXPECT_EQ(Parse({"-M", "q35,accel=kvm:tcg"}).usesKvm, std::nullopt);
+  EXPECT_EQ(Parse({"-accel", "kvm", "-accel", "tcg"}).usesKvm, std::nullopt);
+  EXPECT_EQ(Parse({"-accel", "tcg"}).usesKvm, false);
+  EXPECT_EQ(Parse({"-m", "64"}).usesKvm, false);
+  EXPECT_EQ(Parse({"-readconfig", "vm.cfg"}).usesKvm, std::nullopt);
+  EXPECT_EQ(ParseQemuCommandLine({"/usr/libexec/qemu-kvm", "-m", "64"}).usesKvm, std::nullopt);
 }
 
 TEST(QemuCommandLineTest, NamesMayHaveCommas) {
@@ -112,13 +156,15 @@ class QmpTest : public testing::Test {
  protected:
   GuestMemory Ask(const std::string& text, const std::string& balloon = "balloon0") {
     tree_.Write("/run/q", text);
-    QemuCommandLine line;
-    line.monitor = "/run/q";
-    line.hasBalloon = true;
-    line.balloon = balloon;
-    return ReadGuestMemory(LinuxHost(tree_.Root()), 100, line);
+    tree_.Write("/proc/stat", "cpu  1 2 3\nbtime 1000\nprocesses 5\n");
+    tree_.Write("/proc/uptime", "100.99 350.12\n");
+    line_.monitor = "/run/q";
+    line_.hasBalloon = true;
+    line_.balloon = balloon;
+    return ReadGuestMemory(LinuxHost(tree_.Root()), 100, line_);
   }
 
+  QemuCommandLine line_;
   const std::string hello_ = "{\"QMP\": {}}\n{\"return\": {}}\n";
   HostTree tree_;
 };
@@ -128,7 +174,8 @@ TEST_F(QmpTest, TellsTheBalloonAndTheGuest) {
       Ask(hello_ +
           "{\"event\": \"X\"}\n{\"return\": {\"actual\": 1048576}}\n"
           "{\"return\": {\"stats\": {\"stat-total-memory\": 4096, "
-          "\"stat-available-memory\": 18446744073709551615}, \"last-update\": 5}}\n");
+          "\"stat-available-memory\": 18446744073709551615}, \"last-update\": 1085}}\n"
+          "{\"return\": 10}\n");
   EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kActive);
   EXPECT_EQ(memory.actual, 1024u);
   EXPECT_EQ(memory.total, 4u);
@@ -146,7 +193,8 @@ TEST_F(QmpTest, StatisticsThatWereNeverSentAreNone) {
 TEST_F(QmpTest, OnlyABalloonWhoseNameCanStandInAPathIsAskedForTheGuest) {
   const std::string answers = hello_ +
                               "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": "
-                              "{\"stat-total-memory\": 4096}, \"last-update\": 5}}\n";
+                              "{\"stat-total-memory\": 4096}, \"last-update\": 1095}}\n"
+                              "{\"return\": 10}\n";
   EXPECT_EQ(Ask(answers, "Balloon-0._z").total, 4u);
   for (const char* name : {"", "a/b", "a b", "a\"}}", "\xc3\xbc"}) {
     EXPECT_EQ(Ask(answers, name).actual, 1024u) << name;
@@ -169,6 +217,155 @@ TEST_F(QmpTest, WhatAnswersOtherwiseTellsNothing) {
     EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kUnknown) << text;
     EXPECT_EQ(memory.actual, std::nullopt) << text;
   }
+}
+
+TEST_F(QmpTest, StatisticsAreOfNowOrNone) {
+  const auto totalOf = [&](const std::string& lastUpdate, const std::string& interval) {
+    return Ask(hello_ + "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": " +
+               "{\"stat-total-memory\": 4096}, \"last-update\": " + lastUpdate + "}}\n" + interval)
+        .total;
+  };
+  const std::string ten = "{\"return\": 10}\n";
+  EXPECT_EQ(totalOf("1100", ten), 4u);
+  EXPECT_EQ(totalOf("1080", ten), 4u);
+  EXPECT_EQ(totalOf("1079", ten), std::nullopt) << "it has missed two";
+  EXPECT_EQ(totalOf("1120", ten), 4u);
+  EXPECT_EQ(totalOf("1121", ten), std::nullopt) << "the clock was set";
+  EXPECT_EQ(totalOf("1100", "{\"return\": 0}\n"), std::nullopt) << "nobody asks it any more";
+  EXPECT_EQ(totalOf("1100", ""), std::nullopt);
+  EXPECT_EQ(totalOf("1100", "{\"error\": {\"class\": \"GenericError\"}}\n"), std::nullopt);
+}
+
+TEST_F(QmpTest, WithoutTheTimeOfDayStatisticsAreNone) {
+  const std::string answers = hello_ +
+                              "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": "
+                              "{\"stat-total-memory\": 4096}, \"last-update\": 1095}}\n"
+                              "{\"return\": 10}\n";
+  EXPECT_EQ(Ask(answers).total, 4u);
+  for (const char* file : {"/proc/uptime", "/proc/stat"}) {
+    std::filesystem::remove(tree_.Root() + file);
+    tree_.Write("/run/q", answers);
+    EXPECT_EQ(ReadGuestMemory(LinuxHost(tree_.Root()), 100, line_).total, std::nullopt) << file;
+  }
+}
+
+// One answer on several lines, with what looks like an end in a text.
+TEST_F(QmpTest, AnswersMayStandOnSeveralLines) {
+  const GuestMemory memory = Ask(R"({
+    "QMP": {
+        "version": {
+            "package": "}]\"}"
+        },
+        "capabilities": [
+            "oob"
+        ]
+    }
+}
+{
+    "return": {
+    }
+}
+{
+    "event": "X",
+    "data": {
+    }
+}
+{
+    "return": {
+        "actual": 1048576
+    }
+}
+{
+    "return": {
+        "stats": {
+            "stat-total-memory": 4096
+        },
+        "last-update": 1095
+    }
+}
+{
+    "return": 10
+}
+)");
+  EXPECT_EQ(memory.actual, 1024u);
+  EXPECT_EQ(memory.total, 4u);
+}
+
+TEST_F(QmpTest, NoMoreThan256MessagesAreTaken) {
+  const auto actualAfter = [&](size_t events) {
+    std::string text = hello_;
+    for (size_t i = 0; i < events; ++i) text += "{\"event\": \"X\"}\n";
+    return Ask(text + "{\"return\": {\"actual\": 1048576}}\n").actual;
+  };
+  EXPECT_EQ(actualAfter(253), 1024u);
+  EXPECT_EQ(actualAfter(254), std::nullopt);
+}
+
+// What a monitor says of a machine that started with 1 GB: of its sizes, devices and backends.
+class ModulesTest : public QmpTest {
+ protected:
+  ModulesTest() { line_.maxMemory = 8 * kGB; }
+
+  GuestMemory Told(const std::string& plugged, const std::string& devices,
+                   const std::string& backends) {
+    return Ask(hello_ + "{\"error\": {\"class\": \"DeviceNotActive\"}}\n{\"return\": " +
+                   "{\"base-memory\": 1073741824, \"plugged-memory\": " + plugged +
+                   "}}\n{\"return\": [" + devices + "]}\n{\"return\": [" + backends + "]}\n",
+               "");
+  }
+
+  const std::string dimm_ =
+      R"({"type": "dimm", "data": {"memdev": "/objects/d", "size": 1048576}})";
+  const std::string persistent_ =
+      R"({"type": "nvdimm", "data": {"memdev": "/objects/n", "size": 2097152}})";
+  const std::string changing_ =
+      R"({"type": "virtio-mem", "data": {"memdev": "/objects/v", "size": 4194304}})";
+  const std::string backends_ =
+      R"({"id": "pc.ram", "size": 1073741824}, {"id": "d", "size": 1048576}, )"
+      R"({"id": "n", "size": 2228224}, {"id": "v", "size": 8388608})";
+};
+
+TEST_F(ModulesTest, HaveASizeAndABlock) {
+  const GuestMemory memory =
+      Told("7340032", dimm_ + ", " + persistent_ + ", " + changing_, backends_);
+  EXPECT_EQ(memory.base, kGB);
+  EXPECT_EQ(memory.modules, (std::vector<MemoryModule>{
+                                {1024, 1024, true}, {2048, 2176, false}, {4096, 8192, false}}));
+}
+
+TEST_F(ModulesTest, MayBeNone) {
+  EXPECT_EQ(Told("0", "", "").modules, std::vector<MemoryModule>());
+}
+
+TEST_F(ModulesTest, AreNotToldIfTheyDoNotAddUp) {
+  EXPECT_EQ(Told("7340033", dimm_, backends_).modules, std::nullopt);
+  EXPECT_EQ(Told("null", dimm_, backends_).modules, std::nullopt);
+  EXPECT_EQ(Told("0", R"({"type": "dimm", "data": {}})", "").modules, std::nullopt);
+}
+
+TEST_F(ModulesTest, WithoutABackendHaveNoBlock) {
+  EXPECT_EQ(Told("1048576", dimm_, "").modules,
+            (std::vector<MemoryModule>{{1024, std::nullopt, true}}));
+}
+
+TEST_F(ModulesTest, AreAskedForOnlyWhereTheCommandLineDoesNotTell) {
+  line_.memory.base = kGB;
+  line_.maxMemory = kGB;
+  EXPECT_EQ(Told("0", "", "").modules, std::nullopt);
+}
+
+TEST_F(ModulesTest, NoMachineHasMoreThan256) {
+  const auto count = [&](size_t devices) {
+    std::string list;
+    for (size_t i = 0; i < devices; ++i) {
+      list += list.empty() ? "" : ", ";
+      list += R"({"type": "dimm", "data": {"size": 1024}})";
+    }
+    const auto modules = Told(std::to_string(devices * 1024), list, "").modules;
+    return modules ? modules->size() : 0;
+  };
+  EXPECT_EQ(count(256), 256u);
+  EXPECT_EQ(count(257), 0u);
 }
 
 // A QEMU that makes its machine when its monitor has had a client.

@@ -1,0 +1,88 @@
+#include "knvlibs/linux/machines/guest.h"
+
+namespace ksi {
+namespace {
+
+Status GetMappings(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                   const QemuMappings*& mappings) {
+  if (!machine.mappings) {
+    QemuMappings read;
+    const Status status = ReadQemuMappings(host, tree.ProcessOf(tree.At(machine.group)), read);
+    if (status != kOk) return status;
+    machine.mappings = std::move(read);
+  }
+  mappings = &*machine.mappings;
+  return kOk;
+}
+
+// Whether a client may come without being the one that QEMU waits for to make its machine.
+bool MayBeAsked(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine) {
+  const QemuMappings* mappings = nullptr;
+  return !machine.commandLine.waitsForClient ||
+         (GetMappings(host, tree, machine, mappings) == kOk &&
+          IsMade(*mappings, machine.commandLine.memory));
+}
+
+// What the machine starts with, and what has become of it by its monitor.
+MachineMemory MemoryOf(const QemuCommandLine& line, const GuestMemory& guest) {
+  MachineMemory memory = line.memory;
+  if (!memory.base && guest.base) {
+    memory.base = guest.base;
+    memory.blocks = {guest.base};
+  }
+  if (guest.modules) memory.modules = guest.modules;
+  return memory;
+}
+
+Status ReadMapping(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                   GuestMapping& guest) {
+  if (!machine.isQemu) {
+    guest.memory.modules.reset();
+    return kOk;
+  }
+  const QemuCommandLine& line = machine.commandLine;
+  const GuestMemory told = line.TellsMemory() ? GuestMemory() : GetGuest(host, tree, machine);
+  const bool isSure = !line.MayChange() || told.modules;
+  const QemuMappings* mappings = nullptr;
+  const Status status = GetMappings(host, tree, machine, mappings);
+  if (status != kOk) return status;
+  return MeasureGuest(host, machine.pid, *mappings, MemoryOf(line, told), isSure, guest);
+}
+
+}  // namespace
+
+const GuestMemory& GetGuest(const LinuxHost& host, const GroupTree& tree,
+                            const VirtualMachine& machine) {
+  if (!machine.guest && !machine.isQemu) machine.guest.emplace();
+  if (!machine.guest) {
+    machine.guest = MayBeAsked(host, tree, machine)
+                        ? ReadGuestMemory(host, machine.pid, machine.commandLine)
+                        : UnaskedGuest(machine.commandLine);
+  }
+  return *machine.guest;
+}
+
+std::optional<bool> UsesKvm(const LinuxHost& host, const GroupTree& tree,
+                            const VirtualMachine& machine) {
+  if (!machine.usesKvm) {
+    const std::optional<bool> holds =
+        machine.isQemu ? HoldsMachine(host, tree.ProcessOf(tree.At(machine.group))) : true;
+    machine.usesKvm = holds ? holds : machine.commandLine.usesKvm;
+  }
+  return *machine.usesKvm;
+}
+
+Status GetMapping(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                  const GuestMapping*& mapping) {
+  if (!machine.mapping) {
+    GuestMapping read;
+    const Status status = ReadMapping(host, tree, machine, read);
+    machine.mappings.reset();
+    if (status != kOk) return status;
+    machine.mapping = std::move(read);
+  }
+  mapping = &*machine.mapping;
+  return kOk;
+}
+
+}  // namespace ksi
