@@ -5,6 +5,7 @@
 
 #include <chrono>
 #include <functional>
+#include <optional>
 #include <set>
 #include <string>
 
@@ -13,6 +14,7 @@
 #include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/host/once.h"
 #include "knvlibs/linux/host/walk_time.h"
+#include "knvlibs/linux/machines/libvirt.h"
 #include "knvlibs/linux/machines/qmp.h"
 #include "knvlibs/linux/memory/buddyinfo.h"
 #include "knvlibs/linux/memory/ksm.h"
@@ -35,6 +37,9 @@ struct Reading {
 
   // What is left of the time that monitors may take.
   std::chrono::steady_clock::duration monitorTime = kMonitorTime;
+
+  // The machines of libvirt, once one was asked for.
+  std::optional<LibvirtDomains> libvirt;
 
   // What is left of the processor's time that walks may take.
   std::chrono::nanoseconds walkTime = kWalkTime;

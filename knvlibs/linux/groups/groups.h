@@ -90,6 +90,7 @@ class GroupTree {
   const VirtualMachine& VirtualMachineOf(const Group& group) const {
     return virtualMachines_[group.virtualMachine];
   }
+  const std::vector<Process>& Processes() const { return processes_; }
   const std::vector<VirtualMachine>& VirtualMachines() const { return virtualMachines_; }
   const CgroupHierarchy& Cgroups() const { return cgroups_; }
 

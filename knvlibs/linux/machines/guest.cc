@@ -1,5 +1,9 @@
 #include "knvlibs/linux/machines/guest.h"
 
+#include "knvlibs/linux/host/wall_clock.h"
+#include "knvlibs/linux/machines/libvirt.h"
+#include "knvlibs/linux/reading.h"
+
 namespace ksi {
 namespace {
 
@@ -21,6 +25,29 @@ bool MayBeAsked(const LinuxHost& host, const GroupTree& tree, const VirtualMachi
   return !machine.commandLine.waitsForClient ||
          (GetMappings(host, tree, machine, mappings) == kOk &&
           IsMade(*mappings, machine.commandLine.memory));
+}
+
+// A machine of libvirt; null if it is none.
+const LibvirtDomain* FindDomain(const LinuxHost& host, const GroupTree& tree,
+                                const VirtualMachine& machine) {
+  if (machine.commandLine.uuid.empty()) return nullptr;
+  std::optional<LibvirtDomains>& domains = host.Kept().libvirt;
+  if (!domains) domains = ReadLibvirt(host, tree);
+  const auto found = domains->find(machine.pid);
+  return found == domains->end() ? nullptr : &found->second;
+}
+
+// What libvirt tells, else its monitor; both only of a machine that is made.
+GuestMemory AskFor(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine) {
+  if (!machine.isQemu) return GuestMemory();
+  GuestMemory guest = UnaskedGuest(machine.commandLine);
+  const LibvirtDomain* domain = FindDomain(host, tree, machine);
+  if (domain != nullptr) {
+    TakeDomain(*domain, WallClock(host), guest);
+    return guest;
+  }
+  return MayBeAsked(host, tree, machine) ? ReadGuestMemory(host, machine.pid, machine.commandLine)
+                                         : guest;
 }
 
 // What the machine starts with, and what has become of it by its monitor.
@@ -53,12 +80,7 @@ Status ReadMapping(const LinuxHost& host, const GroupTree& tree, const VirtualMa
 
 const GuestMemory& GetGuest(const LinuxHost& host, const GroupTree& tree,
                             const VirtualMachine& machine) {
-  if (!machine.guest && !machine.isQemu) machine.guest.emplace();
-  if (!machine.guest) {
-    machine.guest = MayBeAsked(host, tree, machine)
-                        ? ReadGuestMemory(host, machine.pid, machine.commandLine)
-                        : UnaskedGuest(machine.commandLine);
-  }
+  if (!machine.guest) machine.guest = AskFor(host, tree, machine);
   return *machine.guest;
 }
 

@@ -133,6 +133,8 @@ void Take(std::string_view option, const std::string& value, Parts& parts, QemuC
   if (option == "name") {
     const Properties name = ParseProperties(value, "guest");
     line.name = FindOrEmpty(name, "guest");
+  } else if (option == "uuid") {
+    line.uuid = value;
   } else if (option == "m") {
     parts.memory = ParseProperties(value, "size");
   } else if (option == "object") {

@@ -14,6 +14,7 @@ namespace ksi {
 
 struct QemuCommandLine {
   std::string name;      // -name; may be empty
+  std::string uuid;      // -uuid; may be empty
   MachineMemory memory;  // that the machine starts with: -m, and the modules that are named
   Figure maxMemory;      // with all modules it has room for, maxmem=, in KB
   std::string monitor;   // path of the socket that answers QMP; may be empty
