@@ -204,6 +204,15 @@ Status CgroupHierarchy::ReadUsage1(const LinuxHost& host, std::string_view path,
   return kOk;
 }
 
+Status CgroupHierarchy::ReadSwap(const LinuxHost& host, std::string_view path,
+                                 MemcgSwap& swap) const {
+  swap = MemcgSwap();
+  if (version_ != Version::k2) return kOk;
+  const Status status = ReadAmount(host, path, "memory.swap.max", std::nullopt, swap.max);
+  if (status != kOk) return status;
+  return ReadAmount(host, path, "memory.swap.current", std::nullopt, swap.current);
+}
+
 Status CgroupHierarchy::ReadHugetlb(const LinuxHost& host, std::string_view path,
                                     Figure& hugetlb) const {
   hugetlb.reset();

@@ -47,6 +47,12 @@ struct MemcgEvents {
   Figure secPageTables;  // of KVM
 };
 
+// The swap of one cgroup and all below it, in KB; only version 2 tells.
+struct MemcgSwap {
+  Figure max;  // none is no limit
+  Figure current;
+};
+
 class CgroupHierarchy {
  public:
   // Finds the hierarchy that has the memory controller: version 2, else version 1, else none.
@@ -88,6 +94,8 @@ class CgroupHierarchy {
   [[nodiscard]] Status ReadHugetlb(const LinuxHost& host, std::string_view path,
                                    Figure& hugetlb) const;
 
+  [[nodiscard]] Status ReadSwap(const LinuxHost& host, std::string_view path,
+                                MemcgSwap& swap) const;
   [[nodiscard]] Status ReadEvents(const LinuxHost& host, std::string_view path,
                                   MemcgEvents& events) const;
 

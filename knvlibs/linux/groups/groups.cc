@@ -82,6 +82,7 @@ Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
   const Status status = tree.AddProcesses(host);
   if (status != kOk) return status;
   tree.FindOwnCgroups();
+  tree.LookAtSwap(host);
   for (Group& group : tree.groups_) {
     if (group.children.empty()) group.flags |= KSI_GROUP_LEAF;
   }
@@ -274,6 +275,30 @@ void GroupTree::FindOwnCgroups() {
         ((groups_[unit].flags & KSI_GROUP_CONTAINER) != 0 || CountUserWorlds(unit) == 0);
     if (!isOwn) machine.cgroup = Group::kNone;
   }
+}
+
+// What a machine's swap is compared with, should somebody ask whether it is being swapped.
+void GroupTree::LookAtSwap(const LinuxHost& host) {
+  for (VirtualMachine& machine : virtualMachines_) {
+    MachineSwap swap;
+    if (ReadSwap(host, machine, swap) == kOk) machine.swapAtFirst = swap.current;
+  }
+}
+
+Status GroupTree::ReadSwap(const LinuxHost& host, const VirtualMachine& machine,
+                           MachineSwap& swap) const {
+  swap = MachineSwap();
+  Status status = kOk;
+  for (size_t at = machine.cgroup; status == kOk && at != Group::kNone; at = At(at).parent) {
+    MemcgSwap each;
+    status = cgroups_.ReadSwap(host, At(at).path, each);
+    if (at == machine.cgroup) swap.current = each.current;
+    if (!each.max || !each.current) continue;
+    const uint64_t left = Less(*each.max, *each.current);
+    swap.limit = std::min(swap.limit.value_or(*each.max), *each.max);
+    swap.left = std::min(swap.left.value_or(left), left);
+  }
+  return status;
 }
 
 const Group* GroupTree::Find(int64_t id) const {

@@ -61,6 +61,8 @@ struct VirtualMachine {
   size_t group = Group::kNone;
   // The cgroup that was made for this virtual machine alone, if there is one.
   size_t cgroup = Group::kNone;
+  // The swap of that cgroup when the reading began.
+  Figure swapAtFirst;
   // Of another monitor nothing is known but that it is one.
   bool isQemu = true;
   QemuCommandLine commandLine;
@@ -70,6 +72,13 @@ struct VirtualMachine {
   mutable std::optional<GuestMapping> mapping;
   mutable std::optional<GuestMemory> guest;
   mutable std::optional<std::optional<bool>> usesKvm;
+};
+
+// The swap of a machine by its own cgroup, in KB; no figures without one.
+struct MachineSwap {
+  Figure current;
+  Figure limit;  // the lowest of the cgroup and of those around it
+  Figure left;   // below the nearest limit
 };
 
 class GroupTree {
@@ -96,6 +105,9 @@ class GroupTree {
 
   // Whether no virtual machine that uses KVM can have been missed.
   bool HasAllMachines() const { return kvm_.IsWhole(); }
+
+  [[nodiscard]] Status ReadSwap(const LinuxHost& host, const VirtualMachine& machine,
+                                MachineSwap& swap) const;
 
   // What is reserved for a group itself, in KB.
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, const Group& group,
@@ -126,6 +138,7 @@ class GroupTree {
   size_t CgroupOf(const LinuxHost& host, int32_t pid) const;
   void AddVirtualMachine(size_t parent, size_t process, VirtualMachine machine);
   void FindOwnCgroups();
+  void LookAtSwap(const LinuxHost& host);
   size_t UnitOf(size_t group) const;
   size_t CountUserWorlds(size_t group) const;
   Figure ProcessHugetlbOf(const Group& group) const;

@@ -1,5 +1,6 @@
 // A virtual machine is a QEMU process. tally-linux(7) says where each figure comes from and
 // why.
+#include <algorithm>
 #include <string>
 
 #include <knvlibs/ksi_records.h>
@@ -26,12 +27,30 @@ Status FindMachine(const LinuxHost& host, const Keys& keys, const GroupTree*& tr
   return machine == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
-// What happened to the cgroup that was made for the machine; nothing is told if there is none.
+// What is not told of a machine is 0 where nothing of any is compressed: without a compressed cache
+// for swap on the host nothing ever was, and with an empty one nothing is.
+Status SettleCompression(const LinuxHost& host, MemcgEvents& events) {
+  std::string enabled;
+  const FigureFile* meminfo = nullptr;
+  const Status found = host.Read("/sys/module/zswap/parameters/enabled", enabled);
+  const Status status = host.Kept().meminfo.Get(host, meminfo);
+  if (events.zswapPool) return kOk;
+  const bool isOff = found == KSI_STATUS_NOT_FOUND || enabled.starts_with('N');
+  const bool isEmpty = status == kOk && meminfo->Find("Zswapped") == 0u;
+  if (isOff || isEmpty) events.zswapPool = events.zswapped = 0;
+  if (isOff) events.zswpin = events.zswpout = events.zswapMax = 0;
+  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
+}
+
+// What happened to the cgroup that was made for the machine; little is told if there is none.
 Status ReadOwnEvents(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                      MemcgEvents& events) {
   events = MemcgEvents();
-  if (machine.cgroup == Group::kNone) return kOk;
-  return tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
+  Status status = kOk;
+  if (machine.cgroup != Group::kNone) {
+    status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
+  }
+  return status == kOk ? SettleCompression(host, events) : status;
 }
 
 // What the kernel tells of a machine's use of memory, by its process and by its own cgroup.
@@ -48,19 +67,6 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachin
   if (status == kOk) status = tree.ReadKsm(host, tree.At(machine.group), use.ksm);
   if (status == kOk) status = host.Kept().ksm.Get(host, use.sharing);
   return status == kOk ? ReadOwnEvents(host, tree, machine, use.events) : status;
-}
-
-// Without a compressed cache for swap on the host nothing of any machine is compressed.
-void SettleCompression(const LinuxHost& host, MemcgEvents& events) {
-  std::string enabled;
-  const Status status = host.Read("/sys/module/zswap/parameters/enabled", enabled);
-  const bool isOff = status == KSI_STATUS_NOT_FOUND || enabled.starts_with('N');
-  if (!isOff || events.zswapPool) return;
-  events.zswapPool = 0;
-  events.zswapped = 0;
-  events.zswpin = 0;
-  events.zswpout = 0;
-  events.zswapMax = 0;
 }
 
 // What of the guest's memory is in use. Only of a small process the pages tell; else its own cgroup
@@ -109,7 +115,6 @@ Status ReadVmmTally(const LinuxHost& host, const GroupTree& tree, const VirtualM
   MachineUse use;
   const Status status = ReadUse(host, tree, machine, use);
   if (status != kOk) return status;
-  SettleCompression(host, use.events);
 
   const MachineMemory& memory = use.mapping->memory;
   const Figure limit = machine.commandLine.maxMemory;
@@ -139,13 +144,30 @@ Figure SwappedOf(const MachineUse& use) {
   return DifferenceOf(use.mapping->swapped, use.events.zswapped);
 }
 
+// The swap that the machine may have, and what of it is free: the host's, or what its own cgroup is
+// limited to.
+Status FillSwapSpace(const LinuxHost& host, const MachineSwap& swap, KSI_SwapInfo& record) {
+  const FigureFile* meminfo = nullptr;
+  const Status status = host.Kept().meminfo.Get(host, meminfo);
+  if (status != kOk) return status;
+  const uint64_t total = meminfo->FindOr("SwapTotal", 0);
+  const uint64_t free = meminfo->FindOr("SwapFree", 0);
+  record.totalReg = std::min(swap.limit.value_or(total), total);
+  record.freeReg = std::min(swap.left.value_or(free), free);
+  return kOk;
+}
+
 Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                     KSI_SwapInfo& record) {
   MachineUse use;
-  const Status status = ReadUse(host, tree, machine, use);
+  Status status = ReadUse(host, tree, machine, use);
   if (status != kOk) return status;
-  SettleCompression(host, use.events);
+  MachineSwap swap;
+  status = tree.ReadSwap(host, machine, swap);
+  if (status == kOk) status = FillSwapSpace(host, swap, record);
+  if (status != kOk) return status;
 
+  record.isSwapping = swap.current > machine.swapAtFirst && machine.swapAtFirst ? 1 : 0;
   record.swapped = FieldOf(SwappedOf(use));
   record.swapRead = FieldOf(use.events.swapcached);
   record.swapIn = FieldOf(use.events.swpin);
@@ -165,7 +187,6 @@ Status ReadMemzipInfo(const LinuxHost& host, const GroupTree& tree, const Virtua
   MemcgEvents events;
   Status status = ReadOwnEvents(host, tree, machine, events);
   if (status != kOk) return status;
-  SettleCompression(host, events);
 
   record.totalCache = FieldOf(events.zswapMax);
   record.maxCache = FieldOf(events.zswapMax);

@@ -4,6 +4,7 @@
 
 #include <filesystem>
 #include <string>
+#include <utility>
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/groups.h"
@@ -308,6 +309,88 @@ TEST_F(KvmTablesTest, AreNotToldWhereAMachineMayHaveBeenMissed) {
   testing::internal::CaptureStderr();
   EXPECT_EQ(Stats().ovhd, kNoValue);
   EXPECT_NE(testing::internal::GetCapturedStderr(), "");
+}
+
+// A machine with a cgroup of its own, in a slice, on a host with 10,000 KB of swap.
+class SwappedMachineTest : public MachineTest {
+ protected:
+  SwappedMachineTest() {
+    tree_.Write("/proc/meminfo",
+                "MemTotal: 1024 kB\nMemFree: 24 kB\nSlab: 8 kB\nPageTables: 4 kB\n"
+                "VmallocUsed: 4 kB\nSwapTotal: 10000 kB\nSwapFree: 6000 kB\n");
+    WriteQemu(kPid, "1", "-smp", "2");
+    tree_.Write(kRoot + "/cgroup.controllers", "memory\n");
+    tree_.Write(kRoot + "/cgroup.procs", "");
+    tree_.Write(kSlice + "/cgroup.procs", "");
+    tree_.Write(kOwn + "/cgroup.procs", "100\n");
+    for (const std::string& cgroup : {kSlice, kOwn}) {
+      tree_.Write(cgroup + "/memory.stat", "zswapped 0\nzswap 0\n");
+      WriteSwap(cgroup, "max", 2000);
+    }
+  }
+
+  void WriteSwap(const std::string& cgroup, const std::string& max, uint64_t current) {
+    tree_.Write(cgroup + "/memory.swap.max", max + "\n");
+    tree_.Write(cgroup + "/memory.swap.current", std::to_string(current * 1024) + "\n");
+  }
+
+  static constexpr const char* kNode = "sched/memClients/swapInfo";
+  const std::string kRoot = "/sys/fs/cgroup";
+  const std::string kSlice = kRoot + "/machine.slice";
+  const std::string kOwn = kSlice + "/web.scope";
+};
+
+TEST_F(SwappedMachineTest, SharesTheSwapOfTheHost) {
+  const auto swap = Get<KSI_SwapInfo>(kNode, kPid);
+  EXPECT_EQ(uint64_t{swap.totalReg}, 10000u);
+  EXPECT_EQ(uint64_t{swap.freeReg}, 6000u);
+  EXPECT_EQ(uint8_t{swap.isSwapping}, 0u);
+}
+
+TEST_F(SwappedMachineTest, HasWhatItIsLimitedTo) {
+  WriteSwap(kOwn, "4096000", 1000);
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).totalReg}, 4000u);
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).freeReg}, 3000u);
+  // What is around it may be limited more, and have less left.
+  WriteSwap(kSlice, "3072000", 2500);
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).totalReg}, 3000u);
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).freeReg}, 500u);
+  // No more than there is.
+  WriteSwap(kSlice, "max", 2500);
+  WriteSwap(kOwn, "20480000", 1000);
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).totalReg}, 10000u);
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).freeReg}, 6000u);
+}
+
+TEST_F(SwappedMachineTest, IsSwappingIfItsSwapHasGrownSinceTheReportBegan) {
+  LinuxSource source(tree_.Root());
+  for (const auto& [current, isSwapping] : {std::pair(2001, 1), {2000, 0}, {1999, 0}}) {
+    source.Refresh();
+    WriteSwap(kOwn, "max", 2000);
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
+    WriteSwap(kOwn, "max", static_cast<uint64_t>(current));
+    KSI_SwapInfo swap = {};
+    ASSERT_EQ(GetValue(source, kNode, {int64_t{kPid}}, &swap), kOk);
+    EXPECT_EQ(uint8_t{swap.isSwapping}, isSwapping) << current;
+  }
+}
+
+TEST_F(SwappedMachineTest, WhatIsCompressedIsNotSwappedToo) {
+  tree_.Write("/sys/module/zswap/parameters/enabled", "Y\n");
+  tree_.Write(ProcessFile(kPid, "smaps"),
+              "100000-200000 rw-p 0 00:00 0\nRss: 1000 kB\nSwap: 500 kB\nVmFlags: rd wr dc\n");
+  tree_.Write(kOwn + "/memory.stat", "zswapped 307200\nzswap 102400\n");
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).swapped}, 200u);
+  EXPECT_EQ(uint64_t{Tally().zipped}, 300u);
+  EXPECT_EQ(uint64_t{Tally().zipSaved}, 200u);
+  // Of the machine nothing is told; that nothing is compressed on the host settles it.
+  tree_.Write(kOwn + "/memory.stat", "");
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).swapped}, kNoValue);
+  tree_.Write("/proc/meminfo",
+              "MemTotal: 1024 kB\nSlab: 8 kB\nPageTables: 4 kB\nVmallocUsed: 4 kB\n"
+              "SwapTotal: 10000 kB\nZswapped: 0 kB\n");
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>(kNode, kPid).swapped}, 500u);
+  EXPECT_EQ(uint64_t{Tally().zipped}, 0u);
 }
 
 }  // namespace
