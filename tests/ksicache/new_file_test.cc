@@ -185,6 +185,14 @@ TEST_F(Ksicache, WhatTheDiskDoesNotTakeIsToldAndReplacesNothing) {
   EXPECT_EQ(FileContent(Path("a.ksi")), "precious");
   EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
 
+  // Nothing but that unnamed files are unknown is a reason to make one with a name.
+  for (int n = 2; n <= 4; ++n) {
+    program.environment.back() = "FAIL=open:" + std::to_string(n);
+    result = harness::RunProgram(program);
+    EXPECT_EQ(result.status, 1) << n;
+    EXPECT_EQ(result.err, "ksicache: " + Path("a.ksi") + ": Too many open files\n") << n;
+  }
+
   program.environment.back() = "FAIL=fsync:2";
   result = harness::RunProgram(program);
   EXPECT_EQ(result.status, 1);
