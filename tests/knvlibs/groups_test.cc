@@ -118,6 +118,15 @@ TEST_F(GroupsTest, AProcessStandsBelowItsCgroup) {
   EXPECT_EQ(FlagsOf(kProcessGroup + kPid), uint32_t{KSI_GROUP_USER_WORLD | KSI_GROUP_LEAF});
 }
 
+TEST_F(GroupsTest, AProcessHasANumberOf31Bits) {
+  WriteProcess(INT32_MAX, "last");
+  tree_.Write("/proc/2147483648/status", "Name:\tnone\nVmSize:\t 8 kB\n");
+  tree_.Write("/proc/0/status", "Name:\tnone\nVmSize:\t 8 kB\n");
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
+            (std::vector<int64_t>{kKernelGroup, kJobs, kProcessGroup + INT32_MAX}));
+}
+
 TEST_F(GroupsTest, WithoutARecordedIdACgroupHasThatOfItsDirectory) {
   const std::string directory = tree_.Root() + "/sys/fs/cgroup/jobs";
   std::filesystem::remove(directory + "/cgroup.id");

@@ -156,6 +156,11 @@ TEST_F(Ksicache, DumpNamesNodesThatThereAreNot) {
   expect("groupname", "there is no node groupname; is it sched/groups/groupName?");
   expect("sched/group/groupFlags",
          "there is no node sched/group/groupFlags; is it sched/groups/groupFlags?");
+  // A third of it may be wrong: changed, left out or put in.
+  expect("graapNaye", "there is no node graapNaye; is it sched/groups/groupName?");
+  expect("memorStat", "there is no node memorStat; is it sched/groups/stats/memoryStats?");
+  expect("memInfoxyz", "there is no node memInfoxyz; is it memory/memInfo?");
+  expect("memInfowxyz", "there is no node memInfowxyz");
   expect("zzz", "there is no node zzz");
   expect("", "there is no node ");
   expect(std::string(1000, 'x'), "there is no node " + std::string(1000, 'x'));
