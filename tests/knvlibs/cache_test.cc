@@ -251,6 +251,12 @@ TEST_F(Cache, HeadThatIsNotUnderstoodIsDamage) {
   }
 }
 
+TEST_F(Cache, TextsMayBeAsLongAsTheyAreAllowed) {
+  ASSERT_EQ(OpenAfter("UPDATE capture SET host = printf('%.4096c', 'x')"), kOk);
+  EXPECT_EQ(OpenAfter("UPDATE capture SET host = printf('%.4097c', 'x')"),
+            KSI_STATUS_METADATA_READ_ERROR);
+}
+
 TEST_F(Cache, NodesThatTheLibraryDoesNotKnowAreLeftAlone) {
   ASSERT_EQ(OpenAfter("INSERT INTO node VALUES(500, 'sched/later', 'value'); INSERT INTO reading "
                       "VALUES(7, '', 500, 0, zeroblob(9))"),

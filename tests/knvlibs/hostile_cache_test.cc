@@ -82,7 +82,8 @@ TEST_F(HostileCache, BesideAJournalThroughALink) {
 
 TEST_F(HostileCache, JournalsWithoutChangesAreNone) {
   const std::string journal = file_ + "-journal";
-  for (const std::string& content : {std::string(), std::string(512, '\0')}) {
+  const std::string invalid("\0 half of a change", 18);
+  for (const std::string& content : {std::string(), std::string(512, '\0'), invalid}) {
     WriteContent(journal, content);
     ASSERT_EQ(Open(), kOk);
     ExpectAnswers();

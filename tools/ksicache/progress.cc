@@ -14,8 +14,8 @@ constexpr size_t kWidth = 30;
 
 }  // namespace
 
-Progress::Progress(const char* title)
-    : title_(title), terminal_(isatty(STDERR_FILENO) == 1), next_(Clock::now() + kFirst) {}
+Progress::Progress(const char* title, Clock::time_point (*now)())
+    : title_(title), now_(now), terminal_(isatty(STDERR_FILENO) == 1), next_(now() + kFirst) {}
 
 Progress::~Progress() {
   if (shown_) static_cast<void>(std::fputs("\r\x1b[K", stderr));
@@ -23,7 +23,7 @@ Progress::~Progress() {
 
 void Progress::Show(size_t done, size_t total) {
   if (!terminal_ || total == 0) return;
-  const Clock::time_point now = Clock::now();
+  const Clock::time_point now = now_();
   if (now < next_) return;
   next_ = now + kBetween;
   shown_ = true;

@@ -10,7 +10,9 @@ namespace ksicache {
 // Shows nothing unless standard error is a terminal.
 class Progress {
  public:
-  explicit Progress(const char* title);
+  using Clock = std::chrono::steady_clock;
+
+  explicit Progress(const char* title, Clock::time_point (*now)() = Clock::now);
   Progress(const Progress&) = delete;
   Progress& operator=(const Progress&) = delete;
   ~Progress();
@@ -19,9 +21,8 @@ class Progress {
   void Show(size_t done, size_t total);
 
  private:
-  using Clock = std::chrono::steady_clock;
-
   const char* title_;
+  Clock::time_point (*now_)();
   bool terminal_;
   bool shown_ = false;
   Clock::time_point next_;

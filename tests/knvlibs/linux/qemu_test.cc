@@ -35,6 +35,8 @@ TEST(QemuCommandLineTest, QemuIsKnownByItsProgram) {
 
 TEST(QemuCommandLineTest, MemoryHasManyForms) {
   EXPECT_EQ(Parse({"-m", "64"}).memory.Size(), 64 * 1024u);
+  EXPECT_EQ(Parse({"-m", "129"}).memory.Size(), 129 * 1024u);
+  EXPECT_EQ(Parse({"-m", "130"}).memory.Size(), 130 * 1024u);
   EXPECT_EQ(Parse({"-m", "4G"}).memory.Size(), 4 * kGB);
   EXPECT_EQ(Parse({"-m", "4g"}).memory.Size(), 4 * kGB);
   EXPECT_EQ(Parse({"--m", "size=4194304k"}).memory.Size(), 4 * kGB);
