@@ -386,6 +386,16 @@ TEST_F(LinuxHostTest, SlabinfoIsUnderstoodOrRefused) {
                       "/proc/slabinfo: line 1 is not understood");
 }
 
+TEST_F(LinuxHostTest, HeapsThatAListHasNoRoomForAreAStatus) {
+  WriteSlabinfo("a_name_of_some_length 1 2 64 64 1 : tunables 0 0 0 : slabdata 1 1 0\n");
+  LinuxSource source(tree_.Root());
+  ParamList all(2, 30);
+  EXPECT_EQ(source.Instances(*FindNode("system/heaps"), Keys(), all), kOk);
+  ParamList narrow(2, 21);  // the second would fit
+  EXPECT_EQ(source.Instances(*FindNode("system/heaps"), Keys(), narrow),
+            KSI_STATUS_TOO_MANY_ELEMENTS);
+}
+
 TEST_F(LinuxHostTest, SlabCachesThatMayNotBeSeenAreAStatus) {
   WriteSlabinfo("dentry 1 2 64 64 1 : tunables 0 0 0 : slabdata 1 1 0\n");
   tree_.Lock("/proc/slabinfo");
