@@ -1,6 +1,7 @@
 // The command line of ksicache, its help and its output.
 #include <cstring>
 
+#include "tests/harness/golden.h"
 #include "tests/ksicache/ksicache_fixture.h"
 
 namespace ksi {
@@ -12,6 +13,14 @@ TEST_F(Ksicache, HelpAndVersion) {
             0u);
   EXPECT_EQ(Output({"-h"}), Output({"--help"}));
   EXPECT_EQ(Output({"--version"}), "ksicache " KSICACHE_VERSION "\n");
+}
+
+TEST_F(Ksicache, HelpSaysAll) {
+  std::string text = Output({"--help"});
+  for (const char* command : {"capture", "info", "dump", "load", "check"}) {
+    text += "\n" + Output({command, "--help"});
+  }
+  harness::ExpectGolden("ksicache/help.txt", text);
 }
 
 TEST_F(Ksicache, EachCommandHasItsHelp) {
