@@ -92,6 +92,35 @@ TEST_F(EndlessCache, Lists) {
   EXPECT_EQ(Flags(7), kOk);
 }
 
+TEST_F(EndlessCache, ReadingsOfAnObjectThatAreNotInOrder) {
+  const std::string list = Record({"7", "", ListNode(), "0", "0"});
+  const std::string before = Record({"7", "", "0", "0", "0"});
+  const std::string good = FileContent(file_);
+  const auto status = [&](const std::string& first, const std::string& second) {
+    PageFile pages(good);
+    pages.Fill(PageFile::RootOf(file_, "reading"), {Cell(0, first), Cell(0, second)}, 0);
+    WriteContent(file_, pages.Content());
+    EXPECT_EQ(Open(), kOk);
+    return ChildrenOf(7);
+  };
+  EXPECT_EQ(status(before, list), kOk);
+  EXPECT_EQ(status(list, before), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(status(list, list), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(EndlessCache, MoreReadingsOfAnObjectThanThereAreNodes) {
+  const auto insert = [](const std::string& count) {
+    return "WITH RECURSIVE r(n) AS (SELECT 1000 UNION ALL SELECT n + 1 FROM r LIMIT " + count +
+           ") INSERT OR IGNORE INTO reading SELECT 7, '', n, 0, 0 FROM r";
+  };
+  RunSql(file_, insert("200"));
+  ASSERT_EQ(Open(), kOk);
+  EXPECT_EQ(ChildrenOf(7), kOk);
+  RunSql(file_, insert("300"));
+  ASSERT_EQ(Open(), kOk);
+  EXPECT_EQ(ChildrenOf(7), KSI_STATUS_METADATA_READ_ERROR);
+}
+
 TEST_F(EndlessCache, Nodes) {
   PageFile pages(FileContent(file_));
   const uint32_t root = PageFile::RootOf(file_, "node");

@@ -44,6 +44,8 @@ TEST_F(Ksicache, CheckSaysWhatIsWrongAndWhere) {
          "sched/groups/groupFlags [x]: has keys that the node does not take");
   expect("UPDATE reading SET key2 = 5 WHERE key1 = 7 AND node = " + flags,
          "sched/groups/groupFlags [7]: has keys that the node does not take");
+  expect("UPDATE reading SET key1 = 7.5 WHERE key1 = 7 AND node = " + flags,
+         "sched/groups/groupFlags: has keys that the node does not take");
   expect("UPDATE reading SET node = 900 WHERE key1 = 7 AND node = " + flags,
          "node 900 [7]: is not in the table of nodes");
   expect("UPDATE reading SET answer = -2 WHERE key1 = 7 AND node = " + groups,
