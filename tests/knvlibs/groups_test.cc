@@ -142,6 +142,17 @@ TEST_F(GroupsTest, WithoutCgroupsProcessesStandBelowTheRoot) {
             (std::vector<int64_t>{kKernelGroup, kProcessGroup + kPid}));
 }
 
+TEST_F(GroupsTest, CgroupsAreThoseOfTheHierarchyThatHasTheController) {
+  tree_.Write("/sys/fs/cgroup/cgroup.controllers", "cpu io\n");
+  EXPECT_EQ(StatusOf<uint32_t>("sched/groups/groupFlags", kJobs), KSI_STATUS_NOT_FOUND);
+  tree_.Write("/sys/fs/cgroup/unified/cgroup.controllers", "cpu\n");
+  tree_.Write("/sys/fs/cgroup/unified/cgroup.procs", "");
+  WriteCgroup("/unified/jobs", 8, "100\n");
+  EXPECT_EQ(StatusOf<uint32_t>("sched/groups/groupFlags", 8), KSI_STATUS_NOT_FOUND);
+  tree_.Write("/sys/fs/cgroup/unified/cgroup.controllers", "memory\n");
+  EXPECT_EQ(StatusOf<uint32_t>("sched/groups/groupFlags", 8), kOk);
+}
+
 TEST_F(GroupsTest, AProcessThatNoCgroupListsTellsWhereItIs) {
   WriteProcess(101, "moved");
   tree_.Write("/proc/101/cgroup", "1:cpu,cpuacct:/\n0::/jobs\n");

@@ -150,6 +150,9 @@ TEST(Text, IsCopiedUpToItsSize) {
   buffer[0] = 'k';
   EXPECT_EQ(Str_Strcpy(buffer, "abc", 0), buffer);
   EXPECT_EQ(buffer[0], 'k');
+  buffer[1] = 'l';
+  EXPECT_EQ(Str_Strcpy(buffer, nullptr, 1), buffer);
+  EXPECT_EQ(std::string(buffer, 2), std::string("\0l", 2));
 }
 
 TEST(Diagnostic, IsTheFormattedTextAndNothingElse) {

@@ -189,6 +189,8 @@ TEST_F(Ksicache, LoadTakesNoMoreThanACacheFileHas) {
   ExpectRefused(many, "is nested too deeply");
   ExpectRefused(R"({"ksiCache":1,"readings":)" + many, "readings[0]: is nested too deeply");
   ExpectRefused(JsonWith(R"({"instances":)" + many), "readings[0]: is nested too deeply");
+  ExpectRefused(JsonWith(R"({"value":[[[[[]]]]]})"), "readings[0]: has no \"node\"");
+  ExpectRefused(JsonWith(R"({"value":[[[[[[]]]]]]})"), "readings[0]: is nested too deeply");
   std::string members;
   for (int i = 0; i < 257; ++i) members += (i == 0 ? "\"" : ",\"") + std::to_string(i) + "\":0";
   ExpectRefused("{" + members + "}", "has more than 256 members in one place");
