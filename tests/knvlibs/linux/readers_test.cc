@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include <map>
+#include <vector>
 
 #include "knvlibs/catalogue.h"
 #include "knvlibs/linux/linux_source.h"
@@ -32,6 +33,33 @@ TEST(ReadersTest, WhatHasNoReaderIsAStatus) {
   ParamList list(ParamList::kNoLimit);
   EXPECT_EQ(source.Value(*FindNode("system/heaps"), Keys(), Buffer()), KSI_STATUS_NO_HANDLER);
   EXPECT_EQ(source.Instances(*FindNode("memory/memInfo"), Keys(), list), KSI_STATUS_NO_HANDLER);
+}
+
+// Keys of the kinds that a node takes.
+Keys AnyKeys(const Keying& keying) {
+  Keys keys;
+  keys.count = keying.Count();
+  for (size_t i = 0; i < keys.count; ++i) keys.at[i] = {KindOf(keying.at[i]), 100, "x"};
+  return keys;
+}
+
+TEST(ReadersTest, WhereNoProcessCanBeListedNothingOfGroupsIsFound) {
+  const HostTree tree;
+  LinuxSource source(tree.Root());
+  for (const Node& node : Catalogue()) {
+    if (!node.path.starts_with("sched/") && !node.path.starts_with("worldGroups/")) continue;
+    if (node.path.starts_with("sched/globalStats/memory")) continue;
+    if (node.HasValue()) {
+      std::vector<std::byte> record(node.recordSize);
+      EXPECT_EQ(source.Value(node, AnyKeys(node.valueKeys), record), KSI_STATUS_NOT_FOUND)
+          << node.path;
+    }
+    if (node.HasList()) {
+      ParamList list(ParamList::kNoLimit);
+      EXPECT_EQ(source.Instances(node, AnyKeys(node.listKeys), list), KSI_STATUS_NOT_FOUND)
+          << node.path;
+    }
+  }
 }
 
 TEST(ReadersTest, ABufferOfAnotherSizeIsNotFilled) {
