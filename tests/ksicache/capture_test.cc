@@ -82,6 +82,21 @@ TEST_F(Ksicache, CaptureThatLeavesOutWhatCannotBeReadHasFailed) {
   EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
 }
 
+TEST_F(Ksicache, CaptureAsksForNoMemoryNodeThatThereIsNot) {
+  const HostTree host;
+  host.Write("/proc/meminfo", "MemTotal: 1000 kB\n");
+  host.Write("/sys/devices/system/node/has_memory", "0-11\n");
+  host.Write("/proc/buddyinfo", "Node 11, zone Normal 1\n");
+  host.Write(
+      "/proc/zoneinfo",
+      "Node 11, zone Normal\n  pages free 1\n min 1\n low 1\n high 1\n present 9\n managed 9\n"
+      " protection: (0, 0)\n");
+  Run({"capture", Path("a.ksi"), "--root", host.Root()});
+  const std::string nodes = Output({"dump", "--json", Path("a.ksi"), "memory/memNodes"});
+  EXPECT_NE(nodes.find(R"("keys":[11],"value")"), nodes.npos) << nodes;
+  EXPECT_EQ(nodes.find(R"("keys":[12])"), nodes.npos) << nodes;
+}
+
 TEST_F(Ksicache, CaptureTakesNoOtherDirectoryForAHost) {
   ExpectFailure({"capture", Path("a.ksi"), "--root", Path("")},
                 Path("") + ": is not the root of a Linux host: it has no proc/meminfo");
