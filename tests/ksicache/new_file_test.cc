@@ -81,6 +81,17 @@ TEST_F(Ksicache, StandardOutputTakesAFile) {
   EXPECT_EQ(result.err, "ksicache: standard output: cannot write: No space left on device\n");
 }
 
+TEST_F(Ksicache, StandardOutputKeepsItsRights) {
+  WriteContent(Path("a.json"), JsonWith(""));
+  WriteContent(Path("out"), "");
+  ASSERT_EQ(chmod(Path("out").c_str(), 0604), 0);
+  harness::Program program = Command({"load", Path("a.json"), "-"});
+  program.outPath = Path("out");
+  EXPECT_EQ(harness::RunProgram(program).status, 0);
+  EXPECT_EQ(ModeOf(Path("out")), 0604u);
+  EXPECT_EQ(Output({"check", Path("out")}), "");
+}
+
 TEST_F(Ksicache, StandardOutputTakesNoOption) {
   ExpectFailure({"capture", "-", "--mode", "0644"}, "--mode is for a file, not standard output", 2);
   ExpectFailure({"load", "--force", Path("a.json"), "-"},
