@@ -35,9 +35,9 @@ std::string_view AttributeOf(std::string_view tag, std::string_view name) {
 
 // Walks the elements of a description. Names of elements are those of libvirt; text and attributes
 // are wanted where they are numbers, so that nothing needs to be decoded.
-class Walk {
+class DomainWalk {
  public:
-  explicit Walk(std::string_view xml) : rest_(xml) {}
+  explicit DomainWalk(std::string_view xml) : rest_(xml) {}
 
   DomainXml Run() {
     DomainXml domain;
@@ -136,6 +136,6 @@ class Walk {
 
 }  // namespace
 
-DomainXml ParseDomainXml(std::string_view xml) { return Walk(xml).Run(); }
+DomainXml ParseDomainXml(std::string_view xml) { return DomainWalk(xml).Run(); }
 
 }  // namespace ksi

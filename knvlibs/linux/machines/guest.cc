@@ -39,7 +39,7 @@ const LibvirtDomain* FindDomain(const LinuxHost& host, const GroupTree& tree,
 
 // What libvirt tells, else its monitor; both only of a machine that is made.
 GuestMemory AskFor(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine) {
-  if (!machine.isQemu) return GuestMemory();
+  if (!machine.isQemu) return {};
   GuestMemory guest = UnaskedGuest(machine.commandLine);
   const LibvirtDomain* domain = FindDomain(host, tree, machine);
   if (domain != nullptr) {

@@ -85,6 +85,7 @@ void TakeSmaps(const std::vector<Mapping>& blocks, GuestMapping& guest) {
 Status TakePages(const LinuxHost& host, int32_t pid, const std::vector<Mapping>& blocks,
                  GuestMapping& guest) {
   std::vector<AddressRange> ranges;
+  ranges.reserve(blocks.size());
   for (const Mapping& block : blocks) ranges.push_back({block.start, block.end});
   PageCounts counts;
   const Status status = CountPages(host, pid, ranges, counts);

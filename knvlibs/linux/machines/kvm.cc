@@ -25,10 +25,13 @@ class Unheeded {
   std::string denied_;
 };
 
-bool IsMachineLink(const LinuxHost& host, int32_t pid, const std::string& descriptor) {
+// One that has been closed since leads nowhere.
+std::optional<bool> IsMachineLink(const LinuxHost& host, int32_t pid,
+                                  const std::string& descriptor) {
   std::string target;
-  return host.ReadLink(ProcessFile(pid, "fd/" + descriptor), target) == kOk &&
-         target == "anon_inode:kvm-vm";
+  const Status status = host.ReadLink(ProcessFile(pid, "fd/" + descriptor), target);
+  if (status != kOk && status != KSI_STATUS_NOT_FOUND) return std::nullopt;
+  return status == kOk && target == "anon_inode:kvm-vm";
 }
 
 std::optional<bool> LookFor(const LinuxHost& host, int32_t pid, uint64_t& count) {
@@ -39,9 +42,12 @@ std::optional<bool> LookFor(const LinuxHost& host, int32_t pid, uint64_t& count)
   if (status == KSI_STATUS_NOT_FOUND && host.IsThisMachine()) return false;
   if (status != kOk) return std::nullopt;
   count = descriptors.size();
-  return std::ranges::any_of(descriptors, [&](const std::string& descriptor) {
-    return IsMachineLink(host, pid, descriptor);
-  });
+  for (const std::string& descriptor : descriptors) {
+    const std::optional<bool> isMachine = IsMachineLink(host, pid, descriptor);
+    // A directory may be seen without where its links lead.
+    if (!isMachine || *isMachine) return isMachine;
+  }
+  return false;
 }
 
 // The process of a thread; none if it has gone.
