@@ -1,5 +1,5 @@
 // Virtual machines as a host's files show them: which processes they are, what memory they have,
-// and what they take beside it.
+// and what they take beside it. Fields of records are not aligned: "+" takes their values.
 #include <gtest/gtest.h>
 
 #include <filesystem>
@@ -86,35 +86,35 @@ class MachineTest : public testing::Test {
 TEST_F(MachineTest, WithoutRoomForModulesHasWhatItStartedWith) {
   WriteQemu(kPid, "1", "-smp", "2");
   WriteMappings(kPid, "1000000-9000000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n");
-  EXPECT_EQ(Tally().memSize, 1024u);
-  EXPECT_EQ(Tally().memSizeLimit, 1024u);
-  EXPECT_EQ(Tally().mapped, 1000u);
-  EXPECT_EQ(Stats().memSize, 1024u);
-  EXPECT_EQ(Stats().memSizePeak, 1024u);
+  EXPECT_EQ(+Tally().memSize, 1024u);
+  EXPECT_EQ(+Tally().memSizeLimit, 1024u);
+  EXPECT_EQ(+Tally().mapped, 1000u);
+  EXPECT_EQ(+Stats().memSize, 1024u);
+  EXPECT_EQ(+Stats().memSizePeak, 1024u);
 }
 
 TEST_F(MachineTest, WithRoomHasWhatItStartedWithIfThereIsNoMore) {
   WriteQemu(kPid, "1,slots=1,maxmem=64M", "-smp", "2");
   // A screen's memory.
   WriteMappings(kPid, "1000000-2000000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n");
-  EXPECT_EQ(Tally().memSize, 1024u);
-  EXPECT_EQ(Tally().memSizeLimit, 65536u);
-  EXPECT_EQ(Tally().mapped, 1000u);
-  EXPECT_EQ(Stats().memSize, 1024u);
-  EXPECT_EQ(Stats().memSizePeak, kNoValue);
+  EXPECT_EQ(+Tally().memSize, 1024u);
+  EXPECT_EQ(+Tally().memSizeLimit, 65536u);
+  EXPECT_EQ(+Tally().mapped, 1000u);
+  EXPECT_EQ(+Stats().memSize, 1024u);
+  EXPECT_EQ(+Stats().memSizePeak, kNoValue);
 }
 
 TEST_F(MachineTest, WithRoomAndMoreThatMayBeMemoryIsNotTold) {
   WriteQemu(kPid, "1,slots=1,maxmem=64M", "-smp", "2");
   WriteMappings(kPid, "1000000-2001000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n");
-  EXPECT_EQ(Tally().memSize, kNoValue);
-  EXPECT_EQ(Tally().memSizeLimit, 65536u);
-  EXPECT_EQ(Tally().mapped, kNoValue);
-  EXPECT_EQ(Stats().memSize, kNoValue);
-  EXPECT_EQ(Stats().ovhd, kNoValue);
+  EXPECT_EQ(+Tally().memSize, kNoValue);
+  EXPECT_EQ(+Tally().memSizeLimit, 65536u);
+  EXPECT_EQ(+Tally().mapped, kNoValue);
+  EXPECT_EQ(+Stats().memSize, kNoValue);
+  EXPECT_EQ(+Stats().ovhd, kNoValue);
   // What QEMU does not keep from its children is not memory of a guest.
   WriteMappings(kPid, "1000000-2001000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: rd wr\n");
-  EXPECT_EQ(Tally().memSize, 1024u);
+  EXPECT_EQ(+Tally().memSize, 1024u);
 }
 
 TEST_F(MachineTest, WhatItsMonitorTellsIsItsMemory) {
@@ -132,13 +132,13 @@ TEST_F(MachineTest, WhatItsMonitorTellsIsItsMemory) {
                 "4000000-4200000 rw-p 0 00:00 0\nRss: 30 kB\nVmFlags: dc\n"
                 "6000000-7000000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n");
   const KSI_VmmTally tally = Tally();
-  EXPECT_EQ(tally.memSize, 4096u);
-  EXPECT_EQ(tally.memSizeLimit, 65536u);
-  EXPECT_EQ(tally.mapped, 1730u);
+  EXPECT_EQ(+tally.memSize, 4096u);
+  EXPECT_EQ(+tally.memSizeLimit, 65536u);
+  EXPECT_EQ(+tally.mapped, 1730u);
   // QEMU takes the balloon off the memory that it has without the changing device: 3 MB.
-  EXPECT_EQ(tally.ballooned, 1024u);
-  EXPECT_EQ(Stats().memSize, 4096u);
-  EXPECT_EQ(Stats().ovhd, 4000u - 1730 + 12);
+  EXPECT_EQ(+tally.ballooned, 1024u);
+  EXPECT_EQ(+Stats().memSize, 4096u);
+  EXPECT_EQ(+Stats().ovhd, 4000u - 1730 + 12);
 }
 
 TEST_F(MachineTest, AMachineThatEndsAfterTheScanIsShownAsItStartedIfItCannotHaveChanged) {
@@ -154,8 +154,8 @@ TEST_F(MachineTest, AMachineThatEndsAfterTheScanIsShownAsItStartedIfItCannotHave
     KSI_GroupMemoryStats stats = {};
     const std::string path = "sched/groups/stats/memoryStats";
     ASSERT_EQ(GetValue(source, path, {kProcessGroup | pid}, &stats), kOk);
-    EXPECT_EQ(stats.memSize, size);
-    EXPECT_EQ(stats.consumed, 4000u);
+    EXPECT_EQ(+stats.memSize, size);
+    EXPECT_EQ(+stats.consumed, 4000u);
   }
 }
 
@@ -186,17 +186,17 @@ TEST_F(OtherMonitorTest, IsKnownByItsDescriptor) {
   EXPECT_STREQ(Get<KSI_GroupName>("sched/groups/groupName", kProcessGroup | kPid).text,
                "light-monitor");
   const KSI_GroupMemoryStats stats = Stats();
-  EXPECT_EQ(stats.consumed, 4000u);
-  EXPECT_EQ(stats.consumedPeak, 5000u);
-  EXPECT_EQ(stats.memSize, kNoValue);
-  EXPECT_EQ(stats.memSizePeak, kNoValue);
-  EXPECT_EQ(stats.ovhd, kNoValue);
+  EXPECT_EQ(+stats.consumed, 4000u);
+  EXPECT_EQ(+stats.consumedPeak, 5000u);
+  EXPECT_EQ(+stats.memSize, kNoValue);
+  EXPECT_EQ(+stats.memSizePeak, kNoValue);
+  EXPECT_EQ(+stats.ovhd, kNoValue);
   const KSI_VmmTally tally = Tally();
-  EXPECT_EQ(tally.memSize, kNoValue);
-  EXPECT_EQ(tally.memSizeLimit, kNoValue);
-  EXPECT_EQ(tally.mapped, kNoValue);
-  EXPECT_EQ(tally.ballooned, kNoValue);
-  EXPECT_EQ(tally.balloonActive, 0u);
+  EXPECT_EQ(+tally.memSize, kNoValue);
+  EXPECT_EQ(+tally.memSizeLimit, kNoValue);
+  EXPECT_EQ(+tally.mapped, kNoValue);
+  EXPECT_EQ(+tally.ballooned, kNoValue);
+  EXPECT_EQ(+tally.balloonActive, 0u);
 }
 
 TEST_F(OtherMonitorTest, WithoutTheDescriptorIsAUserWorld) {
@@ -262,27 +262,27 @@ class KvmTablesTest : public MachineTest {
   }
 };
 
-TEST_F(KvmTablesTest, AreThoseOfTheOnlyMachine) { EXPECT_EQ(Stats().ovhd, kOther + 100); }
+TEST_F(KvmTablesTest, AreThoseOfTheOnlyMachine) { EXPECT_EQ(+Stats().ovhd, kOther + 100); }
 
 TEST_F(KvmTablesTest, AMachineWithoutKvmHasNone) {
   WriteQemu(kPid, "1", "-accel", "tcg");
-  EXPECT_EQ(Stats().ovhd, kOther);
+  EXPECT_EQ(+Stats().ovhd, kOther);
   // Descriptors know better than options.
   WriteQemu(kPid, "1", "-accel", "kvm:tcg");
-  EXPECT_EQ(Stats().ovhd, kNoValue);
+  EXPECT_EQ(+Stats().ovhd, kNoValue);
   WriteDescriptor(kPid, "3", "/dev/null");
-  EXPECT_EQ(Stats().ovhd, kOther);
+  EXPECT_EQ(+Stats().ovhd, kOther);
   WriteDescriptor(kPid, "4", "anon_inode:kvm-vm");
-  EXPECT_EQ(Stats().ovhd, kOther + 100);
+  EXPECT_EQ(+Stats().ovhd, kOther + 100);
 }
 
 TEST_F(KvmTablesTest, OfSeveralCannotBeDivided) {
   WriteQemu(kPid + 1, "1", "-accel", "kvm");
-  EXPECT_EQ(Stats().ovhd, kNoValue);
-  EXPECT_EQ(Stats(kPid + 1).ovhd, kNoValue);
+  EXPECT_EQ(+Stats().ovhd, kNoValue);
+  EXPECT_EQ(+Stats(kPid + 1).ovhd, kNoValue);
   WriteQemu(kPid + 1, "1", "-accel", "tcg");
-  EXPECT_EQ(Stats().ovhd, kOther + 100);
-  EXPECT_EQ(Stats(kPid + 1).ovhd, kOther);
+  EXPECT_EQ(+Stats().ovhd, kOther + 100);
+  EXPECT_EQ(+Stats(kPid + 1).ovhd, kOther);
 }
 
 TEST_F(KvmTablesTest, AreWhatMachinesWithCgroupsOfTheirOwnLeave) {
@@ -294,20 +294,20 @@ TEST_F(KvmTablesTest, AreWhatMachinesWithCgroupsOfTheirOwnLeave) {
   tree_.Write(scope + "memory.stat", "sec_pagetables 71680\n");
   tree_.Write(scope + "memory.zswap.max", "max\n");
   WriteQemu(kPid + 1, "1", "-accel", "kvm");
-  EXPECT_EQ(Stats(kPid + 1).ovhd, kOther + 70);
-  EXPECT_EQ(Stats().ovhd, kOther + 30);
+  EXPECT_EQ(+Stats(kPid + 1).ovhd, kOther + 70);
+  EXPECT_EQ(+Stats().ovhd, kOther + 30);
 }
 
 TEST_F(KvmTablesTest, OfDevicesAreNotThoseOfAMachine) {
   WriteVmstat("1");
-  EXPECT_EQ(Stats().ovhd, kNoValue);
+  EXPECT_EQ(+Stats().ovhd, kNoValue);
 }
 
 TEST_F(KvmTablesTest, AreNotToldWhereAMachineMayHaveBeenMissed) {
   std::filesystem::create_directories(tree_.Root() + "/sys/devices/virtual/misc/kvm");
   WriteProcess(kPid + 1, "server", 2, KvmSearch::kMostDescriptors + 1);
   testing::internal::CaptureStderr();
-  EXPECT_EQ(Stats().ovhd, kNoValue);
+  EXPECT_EQ(+Stats().ovhd, kNoValue);
   EXPECT_NE(testing::internal::GetCapturedStderr(), "");
 }
 
