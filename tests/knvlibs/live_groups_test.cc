@@ -244,6 +244,10 @@ struct RoomyGuest {
   const char* accelerator;
   int64_t memory;  // MB
   const char* monitor;
+
+  friend std::ostream& operator<<(std::ostream& out, const RoomyGuest& guest) {
+    return out << guest.accelerator << ' ' << guest.memory << " MB";
+  }
 };
 
 class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
@@ -258,7 +262,7 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
     const std::string memory = std::to_string(GetParam().memory) + "M,slots=4,maxmem=8G";
     guest_.emplace(std::vector<std::string>{"qemu-system-x86_64",
                                             "-name",
-                                            "guest=tally-plug",
+                                            "guest=" + Name(),
                                             "-accel",
                                             GetParam().accelerator,
                                             "-M",
@@ -279,21 +283,37 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
                                             "virtio-mem-pci,memdev=changing,requested-size=0",
                                             GetParam().monitor,
                                             "unix:" + path_ + ",server=on,wait=off"});
-    for (int i = 0; i < 100 && access(path_.c_str(), F_OK) != 0; ++i) {
-      std::this_thread::sleep_for(std::chrono::milliseconds(100));
-    }
-    std::this_thread::sleep_for(std::chrono::seconds(1));
   }
 
-  void Command(const std::string& command) {
+  // The tests of the other guests run beside this one.
+  static std::string Name() {
+    return std::string("tally-plug-") + GetParam().accelerator + std::to_string(GetParam().memory);
+  }
+
+  // Tries until it is so. A monitor has one client at a time, and reports of other tests ask it,
+  // too.
+  template <class Attempt>
+  static bool Eventually(Attempt&& attempt) {
+    for (int i = 0; i < 100; ++i) {
+      if (attempt()) return true;
+      std::this_thread::sleep_for(std::chrono::milliseconds(200));
+    }
+    return false;
+  }
+
+  bool TryCommand(const std::string& command) const {
     MonitorSocket socket(std::chrono::steady_clock::now,
                          std::chrono::steady_clock::now() + std::chrono::seconds(20));
-    ASSERT_TRUE(socket.Connect(path_, guest_->Pid()));
+    if (!socket.Connect(path_, guest_->Pid())) return false;
     Conversation monitor(socket);
-    ASSERT_TRUE(monitor.Begin());
+    if (!monitor.Begin()) return false;
     const std::optional<Json> answer = monitor.Ask(command);
-    ASSERT_TRUE(answer);
-    EXPECT_NE(FindMember(&*answer, "return"), nullptr) << command;
+    EXPECT_TRUE(answer && FindMember(&*answer, "return") != nullptr) << command;
+    return true;
+  }
+
+  void Command(const std::string& command) const {
+    ASSERT_TRUE(Eventually([&] { return TryCommand(command); })) << command;
   }
 
   void Plug(const std::string& id, const std::string& size) {
@@ -303,19 +323,28 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
             R"(","id":"dimm-)" + id + R"("}})");
   }
 
-  // "memSizeLimit,memSize,ballooned", and the last, mapped.
-  std::string Row(double& mapped) const {
+  // "memSizeLimit,memSize,ballooned", and the last, mapped; empty if there is no such row.
+  static std::string Row(double& mapped) {
     const harness::Result run =
         TallyLive({"-r", "vm-stats", "-q", "-s", "name:memSizeLimit:memSize:ballooned:mapped"});
     EXPECT_EQ(run.status, 0) << run.err;
-    const std::string start = "tally-plug,";
+    const std::string start = "\n" + Name() + ",";
     const size_t row = run.out.find(start);
-    EXPECT_NE(row, std::string::npos) << run.out;
     if (row == std::string::npos) return {};
-    const std::string line = run.out.substr(row + start.size(), run.out.find('\n', row) - row);
-    const size_t last = line.substr(0, line.find('\n')).rfind(',');
+    std::string line = run.out.substr(row + start.size());
+    line.resize(line.find('\n'));
+    const size_t last = line.rfind(',');
     mapped = std::stod(line.substr(last + 1));
     return line.substr(0, last);
+  }
+
+  // The row with these sizes, in MB, once it is there; what of it is mapped.
+  double MappedOnceItHas(int64_t megabytes) const {
+    double mapped = 0;
+    std::string row;
+    Eventually([&] { return (row = Row(mapped)) == SizesOf(megabytes); });
+    EXPECT_EQ(row, SizesOf(megabytes));
+    return mapped;
   }
 
   std::string SizesOf(int64_t megabytes) const {
@@ -328,18 +357,15 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
 };
 
 TEST_P(PluggedMemoryTest, IsMemoryOfTheGuest) {
-  double before = 0;
-  double small = 0;
-  double large = 0;
-  EXPECT_EQ(Row(before), SizesOf(GetParam().memory));
+  const int64_t start = GetParam().memory;
+  const double before = MappedOnceItHas(start);
   Plug("small", "67108864");
-  EXPECT_EQ(Row(small), SizesOf(GetParam().memory + 64));
-  EXPECT_GE(small, before + 65536) << "all of it is there";
+  EXPECT_GE(MappedOnceItHas(start + 64), before + 65536) << "all of it is there";
   // So much that the process is not walked any more.
   Plug("large", "268435456");
-  EXPECT_EQ(Row(large), SizesOf(GetParam().memory + 320));
+  const double large = MappedOnceItHas(start + 320);
   EXPECT_GE(large, before + 327680);
-  EXPECT_LE(large, static_cast<double>((GetParam().memory + 320) * 1024));
+  EXPECT_LE(large, static_cast<double>((start + 320) * 1024));
 }
 
 INSTANTIATE_TEST_SUITE_P(
