@@ -304,7 +304,7 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
   bool TryCommand(const std::string& command) const {
     MonitorSocket socket(std::chrono::steady_clock::now,
                          std::chrono::steady_clock::now() + std::chrono::seconds(20));
-    if (!socket.Connect(path_, guest_->Pid())) return false;
+    if (!socket.Connect(path_, guest_->Pid(), geteuid())) return false;
     Conversation monitor(socket);
     if (!monitor.Begin()) return false;
     const std::optional<Json> answer = monitor.Ask(command);

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <memory>
+#include <numeric>
 #include <string>
 #include <utility>
 #include <vector>
@@ -48,7 +49,9 @@ TEST_F(WalkLimitTest, CountsLists) {
 }
 
 TEST_F(WalkLimitTest, CountsEntries) {
-  EXPECT_EQ(Ask(0, std::vector<uint64_t>(2000, 5)), kOk);
+  std::vector<uint64_t> many(2000);
+  std::iota(many.begin(), many.end(), 5);
+  EXPECT_EQ(Ask(0, many), kOk);
   EXPECT_EQ(CountToTheEnd(1), 47u);
 }
 
@@ -68,11 +71,38 @@ TEST_F(WalkLimitTest, BeginsAgainWithItsFirstGroup) {
   EXPECT_EQ(limit_.WalkStatus(), kOk);
 }
 
-TEST_F(WalkLimitTest, GoesOnWithAFirstGroupThatIsListed) {
-  size_t walks = 0;
-  while (walks < 10000 && Ask(0, {1}) == kOk && Ask(1, {0}) == kOk) ++walks;
-  EXPECT_EQ(walks, 512u);
+TEST_F(WalkLimitTest, EndsWhereAGroupListsOneThatItStandsBelow) {
+  EXPECT_EQ(Ask(0, {1, 2}), kOk);
+  EXPECT_EQ(Ask(1, {3}), kOk);
+  EXPECT_EQ(Ask(3, {4}), kOk);
+  EXPECT_EQ(Ask(4, {5, 1}), kOk);
+  EXPECT_EQ(limit_.WalkStatus(), KSI_STATUS_METADATA_READ_ERROR);
+  EXPECT_EQ(Ask(5), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(WalkLimitTest, EndsWhereAGroupListsItselfOrTheFirst) {
+  EXPECT_EQ(Ask(0, {0}), kOk);
   EXPECT_EQ(Ask(0), KSI_STATUS_METADATA_READ_ERROR);
+  limit_.Restart();
+  EXPECT_EQ(Ask(0, {1}), kOk);
+  EXPECT_EQ(Ask(1, {0}), kOk);
+  EXPECT_EQ(Ask(0), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(WalkLimitTest, EndsWhereAGroupListsOneTwice) {
+  EXPECT_EQ(Ask(0, {3, 1, 2, 3}), kOk);
+  EXPECT_EQ(Ask(3), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+TEST_F(WalkLimitTest, AGroupThatWasMovedMeanwhileStandsInTwoPlaces) {
+  EXPECT_EQ(Ask(0, {1, 2}), kOk);
+  EXPECT_EQ(Ask(1, {3}), kOk);
+  EXPECT_EQ(Ask(3, {4}), kOk);
+  EXPECT_EQ(Ask(4), kOk);
+  EXPECT_EQ(Ask(2, {3}), kOk);
+  EXPECT_EQ(Ask(3, {4}), kOk);
+  EXPECT_EQ(Ask(4), kOk);
+  EXPECT_EQ(limit_.WalkStatus(), kOk);
 }
 
 TEST_F(WalkLimitTest, CountsOnFromAnotherGroup) {

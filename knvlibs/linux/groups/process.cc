@@ -63,6 +63,9 @@ bool TakeField(std::string_view name, std::string_view value, Process& process,
     process.name = Printable(value.empty() ? value : value.substr(1));
   } else if (name == "State") {
     facts.state = Trimmed(value).substr(0, 1);
+  } else if (name == "Uid") {
+    TakeWord(value);  // the real one
+    return ParseNumber(TakeWord(value), process.user.emplace());
   } else if (name == "PPid") {
     return ParseNumber(Trimmed(value), facts.parent);
   } else if (name == "FDSize") {

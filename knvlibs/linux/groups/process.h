@@ -20,6 +20,7 @@ struct Process {
   // It has given back its memory and only waits for its parent, or is about to.
   bool isZombie = false;
   uint64_t threads = 0;
+  Figure user;          // that it acts as
   uint64_t fdSize = 0;  // room for descriptors: no fewer than it has
 
   Figure vmSize;

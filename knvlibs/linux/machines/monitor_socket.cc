@@ -1,7 +1,9 @@
 #include "knvlibs/linux/machines/monitor_socket.h"
 
+#include <fcntl.h>
 #include <poll.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/un.h>
 #include <unistd.h>
 
@@ -9,7 +11,9 @@
 #include <array>
 #include <cerrno>
 #include <chrono>
-#include <cstring>
+#include <cstdio>
+
+#include "knvlibs/linux/host/file_descriptor.h"
 
 namespace ksi {
 
@@ -17,11 +21,18 @@ MonitorSocket::~MonitorSocket() {
   if (fd_ >= 0) close(fd_);
 }
 
-bool MonitorSocket::Connect(const std::string& path, int32_t pid) {
+bool MonitorSocket::Connect(const std::string& path, int32_t pid, uint64_t owner) {
+  // Who owns a QEMU may name any socket for its monitor's, and some act on being connected to
+  // alone. So it is one that belongs to the same user, and it is that one that is connected to.
+  const FileDescriptor file(open(path.c_str(), O_PATH | O_CLOEXEC));
+  struct stat status = {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISSOCK(status.st_mode) ||
+      status.st_uid != owner) {
+    return false;
+  }
   sockaddr_un address = {};
   address.sun_family = AF_UNIX;
-  if (path.size() >= sizeof address.sun_path) return false;
-  std::memcpy(address.sun_path, path.data(), path.size());
+  (void)std::snprintf(address.sun_path, sizeof address.sun_path, "/proc/self/fd/%d", file.Get());
   // It does not block: a listener whose queue is full refuses.
   fd_ = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
   if (fd_ < 0) return false;

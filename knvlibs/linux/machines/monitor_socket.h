@@ -25,8 +25,9 @@ class MonitorSocket : public Channel {
       : clock_(clock), deadline_(deadline) {}
   ~MonitorSocket() override;
 
-  // Connects to the socket at `path`; false if it is not process `pid` that listens there.
-  bool Connect(const std::string& path, int32_t pid);
+  // Connects to the socket at `path`; false if it does not belong to the user `owner`, or it is not
+  // process `pid` that listens there.
+  bool Connect(const std::string& path, int32_t pid, uint64_t owner);
 
   bool Send(std::string_view line) override;
   bool Receive(std::string& line) override;

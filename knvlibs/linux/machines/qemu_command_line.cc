@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <optional>
 #include <string_view>
+#include <unordered_map>
 
 #include "knvlibs/json.h"
 #include "knvlibs/linux/host/text.h"
@@ -182,22 +183,36 @@ MemoryModule ModuleOf(const Properties& device, Figure block) {
   return module;
 }
 
+// More than QEMU has nodes and slots for.
+constexpr size_t kMostBackends = 512;
+
+// The first device of each backend.
+std::unordered_map<std::string, const Properties*> DevicesByBackend(const Parts& parts) {
+  std::unordered_map<std::string, const Properties*> devices;
+  for (const Properties& device : parts.devices) {
+    if (const std::string* backend = Find(device, "memdev")) devices.emplace(*backend, &device);
+  }
+  return devices;
+}
+
 void FindMemory(const Parts& parts, QemuCommandLine& line) {
   MachineMemory& memory = line.memory;
+  if (parts.backends.size() > kMostBackends) {
+    memory.modules.reset();
+    return;
+  }
   memory.base = ParseSize(FindOrEmpty(parts.memory, "size"), kMegabytes);
   // Memory of the machine itself may be cut into backends, one for each of its NUMA nodes.
   std::vector<Figure> nodes;
   Figure nodesSize = 0;
+  const auto devices = DevicesByBackend(parts);
   for (const Backend& backend : parts.backends) {
-    const auto isOurs = [&](const Properties& device) {
-      return FindOrEmpty(device, "memdev") == backend.id;
-    };
-    const auto device = std::ranges::find_if(parts.devices, isOurs);
-    if (device == parts.devices.end()) {
+    const auto device = devices.find(backend.id);
+    if (device == devices.end()) {
       nodes.push_back(backend.size);
       nodesSize = SumOf({nodesSize, backend.size});
-    } else if (IsModule(FindOrEmpty(*device, "driver"))) {
-      memory.modules->push_back(ModuleOf(*device, backend.size));
+    } else if (IsModule(FindOrEmpty(*device->second, "driver"))) {
+      memory.modules->push_back(ModuleOf(*device->second, backend.size));
     }
   }
   if (memory.base) {

@@ -8,6 +8,7 @@
 
 #include <knvlibs/ksi.h>
 #include "knvlibs/json.h"
+#include "knvlibs/linux/groups/process.h"
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/host/wall_clock.h"
 #include "knvlibs/linux/machines/channel.h"
@@ -155,7 +156,10 @@ void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, Gu
   const auto patience = std::min<std::chrono::steady_clock::duration>(kMonitorPatience, left);
   MonitorSocket socket(host.TimeSource(), start + patience);
   // Where the listener cannot be looked up, the connection tells who it is.
-  if (Listens(host, pid, line.monitor).value_or(true) && socket.Connect(line.monitor, pid)) {
+  Process process;
+  if (ReadProcess(host, pid, process) == kOk && process.user &&
+      Listens(host, pid, line.monitor).value_or(true) &&
+      socket.Connect(line.monitor, pid, *process.user)) {
     Converse(host, socket, line, memory);
   }
   left -= host.Now() - start;

@@ -108,7 +108,7 @@ constexpr auto kDistant = LinuxHost::TimePoint() + std::chrono::seconds(30);
 TEST(MonitorSocketTest, LinesComeInTurnHoweverTheyAreSent) {
   const Peer peer([](int fd) { Say(fd, "one\ntwo\nthr") && Say(fd, "ee\nrest"); });
   MonitorSocket socket(StandingClock, kDistant);
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   std::string line;
   for (const char* expected : {"one", "two", "three"}) {
     ASSERT_TRUE(socket.Receive(line));
@@ -124,7 +124,7 @@ TEST(MonitorSocketTest, SaysWholeLines) {
     Say(fd, std::string(buffer, static_cast<size_t>(count)) + "heard\n");
   });
   MonitorSocket socket(StandingClock, kDistant);
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   ASSERT_TRUE(socket.Send("hello"));
   std::string line;
   ASSERT_TRUE(socket.Receive(line));
@@ -135,29 +135,47 @@ TEST(MonitorSocketTest, SaysWholeLines) {
 
 TEST(MonitorSocketTest, WhoDoesNotListenIsNotConnectedTo) {
   const Endpoint endpoint;
-  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect(endpoint.Path(), getpid()));
-  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect("/none", getpid()));
   EXPECT_FALSE(
-      MonitorSocket(StandingClock, kDistant).Connect("/" + std::string(200, 'x'), getpid()));
+      MonitorSocket(StandingClock, kDistant).Connect(endpoint.Path(), getpid(), geteuid()));
+  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect("/none", getpid(), geteuid()));
+  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant)
+                   .Connect("/" + std::string(200, 'x'), getpid(), geteuid()));
+}
+
+TEST(MonitorSocketTest, ASocketOfAnotherUserIsNotKnockedAt) {
+  const Endpoint endpoint;
+  ASSERT_EQ(listen(endpoint.Fd(), 4), 0);
+  // Whoever names it, by whatever name.
+  const std::string link = endpoint.Path() + ".link";
+  ASSERT_EQ(symlink(endpoint.Path().c_str(), link.c_str()), 0);
+  for (const std::string& path : {endpoint.Path(), link}) {
+    MonitorSocket socket(StandingClock, kDistant);
+    EXPECT_FALSE(socket.Connect(path, getpid(), geteuid() + 1));
+  }
+  pollfd waiting = {endpoint.Fd(), POLLIN, 0};
+  EXPECT_EQ(poll(&waiting, 1, 0), 0) << "nobody is to have come";
+  EXPECT_TRUE(MonitorSocket(StandingClock, kDistant).Connect(link, getpid(), geteuid()));
+  EXPECT_EQ(unlink(link.c_str()), 0);
 }
 
 TEST(MonitorSocketTest, AListenerWhoseQueueIsFullIsNotWaitedFor) {
   const Endpoint endpoint;
   ASSERT_EQ(listen(endpoint.Fd(), 0), 0);
   MonitorSocket first(StandingClock, kDistant);
-  ASSERT_TRUE(first.Connect(endpoint.Path(), getpid()));
-  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect(endpoint.Path(), getpid()));
+  ASSERT_TRUE(first.Connect(endpoint.Path(), getpid(), geteuid()));
+  EXPECT_FALSE(
+      MonitorSocket(StandingClock, kDistant).Connect(endpoint.Path(), getpid(), geteuid()));
 }
 
 TEST(MonitorSocketTest, AListenerOfAnotherProcessIsNotTalkedTo) {
   const Peer peer(Listen);
-  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect(peer.Path(), getppid()));
+  EXPECT_FALSE(MonitorSocket(StandingClock, kDistant).Connect(peer.Path(), getppid(), geteuid()));
 }
 
 TEST(MonitorSocketTest, ASilentPeerIsLeftAtTheDeadline) {
   const Peer peer(Listen);
   MonitorSocket socket(StandingClock, StandingClock() + milliseconds(10));
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   std::string line;
   EXPECT_FALSE(socket.Receive(line));
 }
@@ -170,7 +188,7 @@ TEST(MonitorSocketTest, NothingIsReceivedAfterTheDeadline) {
     Listen(fd);
   });
   MonitorSocket socket(StandingClock, StandingClock());
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   while (!isSaid) std::this_thread::yield();
   std::string line;
   EXPECT_FALSE(socket.Receive(line));
@@ -182,7 +200,7 @@ TEST(MonitorSocketTest, APeerThatSaysALittleAllTheTimeIsLeftAtTheDeadline) {
   });
   looks = 0;
   MonitorSocket socket(SteppingClock, LinuxHost::TimePoint() + milliseconds(250));
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   std::string line;
   EXPECT_FALSE(socket.Receive(line));
   EXPECT_EQ(looks, 5);
@@ -196,7 +214,7 @@ TEST(MonitorSocketTest, ALineWithoutEndIsCut) {
       while (Say(fd, text)) said += text.size();
     });
     MonitorSocket socket(StandingClock, kDistant);
-    ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+    ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
     std::string line;
     EXPECT_FALSE(socket.Receive(line));
   }
@@ -211,7 +229,7 @@ TEST(MonitorSocketTest, LinesWithoutEndAreCut) {
     }
   });
   MonitorSocket socket(StandingClock, kDistant);
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   std::string line;
   size_t count = 0;
   while (socket.Receive(line)) ++count;
@@ -221,7 +239,7 @@ TEST(MonitorSocketTest, LinesWithoutEndAreCut) {
 TEST(MonitorSocketTest, WhoHangsUpIsLeft) {
   const Peer peer([](int) {});
   MonitorSocket socket(StandingClock, kDistant);
-  ASSERT_TRUE(socket.Connect(peer.Path(), getpid()));
+  ASSERT_TRUE(socket.Connect(peer.Path(), getpid(), geteuid()));
   std::string line;
   EXPECT_FALSE(socket.Receive(line));
   EXPECT_FALSE(socket.Send("anybody?"));

@@ -113,6 +113,22 @@ TEST(QemuCommandLineTest, AcceleratorsAreNamedInManyWays) {
   EXPECT_EQ(ParseQemuCommandLine({"/usr/libexec/qemu-kvm", "-m", "64"}).usesKvm, std::nullopt);
 }
 
+TEST(QemuCommandLineTest, MoreBackendsThanQemuTakesAreNotTold) {
+  std::vector<std::string> words = {"-m", "1G"};
+  const auto add = [&](int count) {
+    for (int i = 0; i < count; ++i) {
+      const std::string id = "m" + std::to_string(words.size());
+      words.insert(words.end(), {"-object", "memory-backend-ram,size=1M,id=" + id, "-device",
+                                 "pc-dimm,memdev=" + id});
+    }
+  };
+  add(512);
+  EXPECT_EQ(Parse(words).memory.modules->size(), 512u);
+  add(1);
+  EXPECT_EQ(Parse(words).memory.modules, std::nullopt);
+  EXPECT_TRUE(Parse(words).memory.blocks.empty());
+}
+
 TEST(QemuCommandLineTest, NamesMayHaveCommas) {
   EXPECT_EQ(Parse({"-name", "web"}).name, "web");
   EXPECT_EQ(Parse({"-name", "guest=a,,b,debug-threads=on"}).name, "a,b");
