@@ -175,7 +175,7 @@ class WalkedCache : public testing::Test {
   void ExpectEnd(const std::vector<std::string>& options) {
     const harness::Result result = Report(options);
     EXPECT_EQ(result.status, 1);
-    EXPECT_GT(Lines(result.out), 10u);
+    EXPECT_GT(Lines(result.out), 1u);
     EXPECT_LT(Lines(result.out), 20000u);
     EXPECT_LT(Lines(result.err), 20000u);
     EXPECT_NE(result.err.find("tally: groups contain each other, rows are missing: "),
@@ -197,19 +197,32 @@ TEST_F(WalkedCache, GroupsInCirclesEnd) {
   ExpectEnd({});
   ExpectEnd({"-l", "1000"});
   ExpectEnd({"-g", "2"});
-  EXPECT_EQ(Report({"-l", "2"}).status, 0);
+  ExpectEnd({"-l", "2"});
+}
+
+TEST_F(WalkedCache, AGroupInItselfIsDamageHoweverFewRowsItMakes) {
+  {
+    ksicache::CacheWriter writer(file_, true);
+    AddGroup(writer, 0, {1});
+    AddGroup(writer, 1, {1});
+    writer.Commit(TestCapture());
+  }
+  ExpectEnd({});
 }
 
 TEST_F(WalkedCache, LayersOfGroupsEnd) {
   {
     ksicache::CacheWriter writer(file_, true);
-    for (int64_t id = 0; id < 12; ++id) {
-      AddGroup(writer, id, std::vector<uint64_t>(50, static_cast<uint64_t>(id) + 1));
+    // 50 groups a layer, each of which lists all of the next.
+    std::vector<uint64_t> next(50);
+    for (int64_t id = 0; id < 12 * 50; ++id) {
+      std::iota(next.begin(), next.end(), id == 0 ? 1 : ((id - 1) / 50 + 1) * 50 + 1);
+      AddGroup(writer, id, next);
     }
-    AddGroup(writer, 12, {});
     writer.Commit(TestCapture());
   }
   ExpectEnd({});
+  EXPECT_GT(Lines(Report({}).out), 1000u);
 }
 
 // A process that moved while the host was captured stands in two groups.

@@ -72,6 +72,15 @@ bool IsShort(const LinuxHost& host, const Process& process) {
   return !host.IsThisMachine() || (size && *size <= kShortWalkKB);
 }
 
+// Whether the kernel moves memory to the NUMA node that uses it: then kernels that do not tell of
+// merged pages yet leave huge pages, which they have marked for it, out of smaps.
+bool MayBalance(const LinuxHost& host) {
+  Figure balances;
+  return host.IsThisMachine() &&
+         (host.ReadNumberIfAny("/proc/sys/kernel/numa_balancing", balances) != kOk ||
+          balances.value_or(0) != 0);
+}
+
 void TakeSmaps(const std::vector<Mapping>& blocks, GuestMapping& guest) {
   Smaps sum = blocks.front().smaps;
   for (const Mapping& block : std::span(blocks).subspan(1)) sum.Add(block.smaps);
@@ -129,9 +138,16 @@ Status MeasureGuest(const LinuxHost& host, int32_t pid, const QemuMappings& mapp
   }
   guest.memory = std::move(memory);
   if (blocks.empty()) return kOk;
-  if (!isSmaps) return TakePages(host, pid, blocks, guest);
-  TakeSmaps(blocks, guest);
-  return kOk;
+  // The kernel may have joined a block with what lies beside it.
+  const Figure size = guest.memory.Size();
+  if (isSmaps) TakeSmaps(blocks, guest);
+  Status status = kOk;
+  if (!isSmaps || (!guest.merged && MayBalance(host))) {
+    status = TakePages(host, pid, blocks, guest);
+  }
+  guest.resident = LesserOf(guest.resident, size);
+  guest.huge = LesserOf(guest.huge, size);
+  return status;
 }
 
 }  // namespace ksi

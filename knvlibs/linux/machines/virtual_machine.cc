@@ -59,6 +59,7 @@ struct MachineUse {
   ProcessKsm ksm;
   MemcgEvents events;
   const Ksm* sharing = nullptr;  // on the host
+  Figure hugetlb;
 };
 
 Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
@@ -66,6 +67,7 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachin
   Status status = GetMapping(host, tree, machine, use.mapping);
   if (status == kOk) status = tree.ReadKsm(host, tree.At(machine.group), use.ksm);
   if (status == kOk) status = host.Kept().ksm.Get(host, use.sharing);
+  use.hugetlb = tree.ProcessOf(tree.At(machine.group)).hugetlb;
   return status == kOk ? ReadOwnEvents(host, tree, machine, use.events) : status;
 }
 
@@ -81,9 +83,10 @@ Figure TouchedOf(const MachineUse& use) {
 void FillSharing(const MachineUse& use, KSI_VmmTally& record) {
   const Figure resident = use.mapping->resident;
   const Figure zero = use.ksm.zeroPages;
-  // Who merges the memory of a guest merges little else; where that is not so, smaps tells.
-  const Figure merged =
-      use.mapping->merged ? use.mapping->merged : LesserOf(use.ksm.merged, resident);
+  // Who merges the memory of a guest merges little else; where that is not so, smaps tells. Pages
+  // of hugetlb are never merged.
+  const Figure mayBe = DifferenceOf(resident, use.hugetlb);
+  const Figure merged = use.mapping->merged ? use.mapping->merged : LesserOf(use.ksm.merged, mayBe);
   // The kernel's zero page backs guest memory too, but does not count as resident.
   const Figure mapped = SumOf({resident, zero.value_or(0)});
   const Figure saved = SumOf({use.sharing->SavedOf(merged), zero.value_or(0)});
