@@ -135,6 +135,24 @@ TEST_F(GroupsTest, WithoutARecordedIdACgroupHasThatOfItsDirectory) {
   EXPECT_EQ(NameOf(static_cast<int64_t>(status.st_ino)), "jobs");
 }
 
+TEST_F(GroupsTest, ARecordedIdIsOfOneCgroupAlone) {
+  for (const char* id : {"7", "0", "1099511627876", "18446744073709551615"}) {
+    tree_.Write("/sys/fs/cgroup/other/cgroup.id", id);
+    tree_.Write("/sys/fs/cgroup/other/cgroup.procs", "");
+    tree_.Write("/sys/fs/cgroup/other/below/cgroup.procs", "");
+    testing::internal::CaptureStderr();
+    LinuxSource source(tree_.Root());
+    const std::vector<int64_t> groups = GetIds(source, "sched/groups/members/groups", {int64_t{0}});
+    ASSERT_EQ(groups.size(), 3u) << id;
+    EXPECT_EQ(groups[1], kJobs);
+    EXPECT_EQ(
+        testing::internal::GetCapturedStderr(),
+        "cgroup /other: its recorded id is another's or none: what is below it is left out\n");
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {groups[2]}), std::vector<int64_t>());
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
+  }
+}
+
 TEST_F(GroupsTest, WithoutCgroupsProcessesStandBelowTheRoot) {
   std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup");
   LinuxSource source(tree_.Root());

@@ -144,6 +144,14 @@ void GroupTree::AddChildren(const LinuxHost& host, size_t self, std::vector<size
   // A cgroup that has gone since stays as one without children.
   if (status != kOk) return;
   if (self != 0 && id != groups_[self].id) {
+    // The id of a recorded tree, which anybody may have written.
+    if (id <= kRootGroup || id >= kProcessGroup || byId_.contains(id)) {
+      if (host.First("cgroup.id")) {
+        Warning("cgroup %s: its recorded id is another's or none: what is below it is left out\n",
+                Printable(path).c_str());
+      }
+      return;
+    }
     byId_.erase(groups_[self].id);
     byId_.emplace(id, self);
     groups_[self].id = id;
