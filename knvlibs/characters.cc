@@ -16,15 +16,26 @@ constexpr Range kNotShown[] = {
     {0x0, 0x1f},         // controls
     {0x7f, 0x9f},        // more of them: U+009B begins a command like ESC [
     {0xad, 0xad},        // soft hyphen
+    {0x34f, 0x34f},      // no width
     {0x61c, 0x61c},      // direction mark
-    {0x180e, 0x180e},    // no width
+    {0x115f, 0x1160},    // fillers: nothing where a letter would be
+    {0x17b4, 0x17b5},    // no width
+    {0x180b, 0x180f},    // variations, no width
     {0x200b, 0x200f},    // no width, direction marks
     {0x2028, 0x202e},    // ends of lines and paragraphs, directions
     {0x2060, 0x206f},    // no width, directions
+    {0x3164, 0x3164},    // filler
+    {0xfdd0, 0xfdef},    // no characters
+    {0xfe00, 0xfe0f},    // variations
     {0xfeff, 0xfeff},    // no width
+    {0xffa0, 0xffa0},    // filler
     {0xfff9, 0xfffb},    // annotations
     {0xe0000, 0xe007f},  // tags
+    {0xe0100, 0xe01ef},  // variations
 };
+
+// The last two of each 65536 codes are no characters.
+bool IsLastOfPlane(char32_t code) { return (code & 0xfffe) == 0xfffe; }
 
 constexpr Character kBadByte = {0, 1, false};
 
@@ -49,7 +60,8 @@ Character FirstOf(std::string_view text) {
 }
 
 bool IsShown(const Character& character) {
-  return character.isValid && std::ranges::none_of(kNotShown, [&](const Range& range) {
+  return character.isValid && !IsLastOfPlane(character.code) &&
+         std::ranges::none_of(kNotShown, [&](const Range& range) {
            return character.code >= range.first && character.code <= range.last;
          });
 }
