@@ -1,5 +1,6 @@
 // ksicache: the tool for KSI cache files.
 #include <getopt.h>
+#include <signal.h>
 
 #include <algorithm>
 #include <cstdio>
@@ -105,6 +106,8 @@ int Run(int argc, char** argv) {
 }  // namespace ksicache
 
 int main(int argc, char** argv) {
+  // A file that may grow no more is an error like others, with a message and nothing left behind.
+  static_cast<void>(signal(SIGXFSZ, SIG_IGN));
   try {
     const int status = ksicache::Run(argc, argv);
     ksicache::FinishOutput();
