@@ -201,6 +201,33 @@ TEST_F(Ksicache, LoadTakesNoMoreThanACacheFileHas) {
                 R"(readings[0]: there is no node \x1b[2J\xc2\x9b)");
 }
 
+TEST_F(Ksicache, LoadQuotesAHundredBytesOfWhatItRefuses) {
+  const std::string longest(100, 'x');
+  const std::string more = longest + "y";
+  const std::string cut = longest + "...";
+  ExpectRefused(R"({"ksiCache":1,")" + longest + R"(":2})",
+                "\"" + longest + "\" is no member of a cache file");
+  ExpectRefused(R"({"ksiCache":1,")" + more + R"(":2})",
+                "\"" + cut + "\" is no member of a cache file");
+  ExpectRefused(R"({")" + more + R"(":1,")" + more + R"(":1})",
+                "\"" + cut + "\" is given twice in one object");
+  ExpectRefused(JsonWith(R"({"node":")" + more + R"("})"), "readings[0]: there is no node " + cut);
+  ExpectRefused(JsonWith(R"({")" + more + R"(":1})"),
+                "readings[0]: \"" + cut + "\" is no member of a reading");
+  ExpectRefused(JsonWith(R"({"node":"memory/memInfo","keys":[],"value":{")" + more + R"(":1}})"),
+                "readings[0]: memory/memInfo []: value." + cut + ": the record has no such field");
+  ExpectRefused(
+      JsonWith(R"({"node":"memory/memInfo","keys":[")" + more + R"("],"value":{}})"),
+      "readings[0]: memory/memInfo [\"" + longest.substr(2) + "...: keys: the node takes 0");
+  ExpectRefused("{" + more,
+                "parse error at line 1, column 2: syntax error while parsing object key - invalid "
+                "literal; last read: '{x'; expected string literal");
+  ExpectRefused("{\"" + more,
+                "parse error at line 1, column 104: syntax error while parsing object key - "
+                "invalid string: missing closing quote; last read: '\"" +
+                    longest.substr(2) + "...");
+}
+
 TEST_F(Ksicache, LoadRefusesStatusesThatAreNone) {
   for (const char* status : {"", "0x", "0x-5", "0x 5", "0x+5", "bad0003", "0x1bad0003f", "0x5z"}) {
     ExpectRefused(

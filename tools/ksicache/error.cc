@@ -6,6 +6,7 @@
 #include <iterator>
 
 #include <knvlibs/ksi_status_text.h>
+#include "knvlibs/characters.h"
 
 namespace ksicache {
 
@@ -38,6 +39,11 @@ std::string NameOf(std::string_view path, const ksi::Keys& keys) {
     name += ']';
   }
   return name;
+}
+
+std::string Cut(std::string_view text) {
+  constexpr size_t kLongest = 100;
+  return std::string(ksi::CutAtCharacter(text, kLongest)) + (text.size() > kLongest ? "..." : "");
 }
 
 }  // namespace ksicache

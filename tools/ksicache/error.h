@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 #include <utility>
 
 #include "knvlibs/source.h"
@@ -53,6 +54,9 @@ std::string StatusText(ksi::Status status);
 
 // "sched/groups/groupName [5]"
 std::string NameOf(std::string_view path, const ksi::Keys& keys);
+
+// As much of a text as a message quotes, with "..." in place of what is more.
+std::string Cut(std::string_view text);
 
 }  // namespace ksicache
 

@@ -1,5 +1,7 @@
 #include "tools/ksicache/json_reader.h"
 
+#include <algorithm>
+
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
@@ -62,7 +64,11 @@ Json JsonReader::Read(std::FILE* file) {
   return std::move(document_);
 }
 
-void JsonReader::OnError(std::string_view reason) { throw DataError(std::string(reason)); }
+// A quotation of what was read begins with the first quote, if there is one.
+void JsonReader::OnError(std::string_view reason) {
+  const size_t quote = std::min(reason.find('\''), reason.size());
+  throw DataError(std::string(reason.substr(0, quote)) + Cut(reason.substr(quote)));
+}
 
 bool JsonReader::OnStart(Json::Kind kind) {
   if (open_.size() == kDeepest) Fail("is nested too deeply");
@@ -72,7 +78,7 @@ bool JsonReader::OnStart(Json::Kind kind) {
 
 bool JsonReader::OnName(std::string name) {
   if (ksi::FindMember(&open_.back().json, name) != nullptr) {
-    Fail("\"" + name + "\" is given twice in one object");
+    Fail("\"" + Cut(name) + "\" is given twice in one object");
   }
   open_.back().name = std::move(name);
   return true;

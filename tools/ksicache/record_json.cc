@@ -207,7 +207,7 @@ std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json) {
   for (const Json::Member& member : json.members) {
     const std::string& name = member.name;
     const Json& value = member.value;
-    const std::string where = "value." + name;
+    const std::string where = "value." + Cut(name);
     const auto field = std::ranges::find_if(
         node.fields, [&](const ksi::Field& each) { return each.name == name; });
     if (field != node.fields.end() && field->type == ksi::FieldType::kText) {

@@ -52,7 +52,7 @@ Members MembersOf(const Json& reading) {
       members.kind = name;
       members.answer = &value;
     } else {
-      throw DataError("\"" + name + "\" is no member of a reading");
+      throw DataError("\"" + Cut(name) + "\" is no member of a reading");
     }
   }
   return members;
@@ -62,7 +62,7 @@ const ksi::Node& NodeOf(const Members& members) {
   const std::string* path = ksi::TextOf(members.node);
   if (path == nullptr) throw DataError("has no \"node\"");
   const ksi::Node* node = ksi::FindNode(*path);
-  if (node == nullptr) throw DataError("there is no node " + *path);
+  if (node == nullptr) throw DataError("there is no node " + Cut(*path));
   return *node;
 }
 
@@ -144,7 +144,7 @@ void TakeReading(const Json& reading, const JsonEntries& entries, CacheWriter& w
   try {
     TakeAnswer(node, members, entries, writer);
   } catch (const DataError& error) {
-    throw DataError(path + " " + ToText(*members.keys) + ": " + error.what());
+    throw DataError(path + " " + Cut(ToText(*members.keys)) + ": " + error.what());
   }
 }
 
@@ -161,7 +161,7 @@ void TakeMember(const std::string& name, const Json& value, ksi::CacheFile::Capt
   } else if (name == "signature") {
     capture->signature = PlainTextFromJson(value, name);
   } else if (name != "readings" || value.kind != Json::Kind::kArray) {
-    throw DataError("\"" + name + "\" is no member of a cache file");
+    throw DataError("\"" + Cut(name) + "\" is no member of a cache file");
   }
 }
 
