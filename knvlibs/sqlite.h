@@ -7,6 +7,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <new>
 #include <span>
 #include <string_view>
 #include <utility>
@@ -53,11 +54,13 @@ class Statement {
   int Step() { return sqlite3_step(handle_); }
   void Reset() { sqlite3_reset(handle_); }
 
-  // Columns of the row count from 0; views are good until the next step.
+  // Columns of the row count from 0; views are good until the next step. A text for which there is
+  // no memory is std::bad_alloc, and not the empty one.
   int Type(int column) const { return sqlite3_column_type(handle_, column); }
   int64_t Number(int column) const { return sqlite3_column_int64(handle_, column); }
   std::string_view Text(int column) const {
     const auto* text = reinterpret_cast<const char*>(sqlite3_column_text(handle_, column));
+    if (text == nullptr) RequireMemory();
     return text == nullptr ? std::string_view() : std::string_view(text, Size(column));
   }
   // The bytes of a text as they lie, which costs less than to have them end in a NUL.
@@ -71,6 +74,10 @@ class Statement {
   }
 
  private:
+  void RequireMemory() const {
+    if (sqlite3_errcode(sqlite3_db_handle(handle_)) == SQLITE_NOMEM) throw std::bad_alloc();
+  }
+
   size_t Size(int column) const {
     return static_cast<size_t>(sqlite3_column_bytes(handle_, column));
   }

@@ -148,6 +148,33 @@ TEST_P(WritingFaults, LeaveTheFileWholeOrAsItWas) {
   }
 }
 
+// A file that is whole is never called damaged for want of memory.
+TEST_F(Ksicache, CheckTellsWantOfMemoryAsSuch) {
+  const TestDirectory source;
+  WriteContent(source.Path("a.json"), JsonWith(kReadings));
+  Output({"load", source.Path("a.json"), Path("a.ksi")});
+  harness::Program program = Command({"check", Path("a.ksi")});
+  program.environment.emplace_back("LD_PRELOAD=" TALLY_FAIL_NTH);
+  program.environment.emplace_back();
+  program.environment.back() = "FAIL_COUNTS=" + source.Path("counts");
+  EXPECT_EQ(harness::RunProgram(program).status, 0);
+  std::istringstream counts(FileContent(source.Path("counts")));
+  std::string kind;
+  uint64_t count = 0;
+  while (kind != "malloc" && counts >> kind >> count) {
+  }
+  ASSERT_GT(count, 100u);
+  for (uint64_t n = 1; n <= count; ++n) {
+    program.environment.back() = "FAIL=malloc:" + std::to_string(n);
+    const harness::Result result = harness::RunProgram(program);
+    EXPECT_EQ(result.out, "") << n;
+    EXPECT_TRUE(result.status == 0
+                    ? result.err.empty()
+                    : result.status == 1 && result.err.find("out of memory") != std::string::npos)
+        << n << ": " << result.status << ": " << result.err;
+  }
+}
+
 INSTANTIATE_TEST_SUITE_P(Commands, WritingFaults, testing::ValuesIn(kWritings),
                          [](const auto& writing) { return writing.param.name; });
 

@@ -4,6 +4,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <new>
 #include <optional>
 #include <tuple>
 #include <utility>
@@ -16,6 +17,11 @@ namespace ksicache {
 namespace {
 
 [[noreturn]] void ThrowDamaged(const char* why) { throw DataError(std::string("damaged: ") + why); }
+
+[[noreturn]] void ThrowFailed(const ksi::CacheFile& file) {
+  RequireMemory(file);
+  ThrowDamaged(file.ErrorText());
+}
 
 // A cache file is read here and there, which a pipe does not allow.
 bool IsRegular(const std::string& fileName) {
@@ -110,6 +116,11 @@ std::string Reading::Name() const {
   return NameOf(row == nullptr ? "node " + std::to_string(node) : row->path, keys);
 }
 
+void RequireMemory(const ksi::CacheFile& file) {
+  const int code = sqlite3_errcode(file.Handle());
+  if (ksi::StatusOfSqlite(code) == KSI_STATUS_NO_MEMORY) throw std::bad_alloc();
+}
+
 int ForEachFile(const std::vector<std::string>& fileNames,
                 const std::function<bool(const std::string& fileName)>& visit) {
   bool good = true;
@@ -142,7 +153,7 @@ void ForEachReading(const ksi::CacheFile& file, const std::function<void(const R
   int code = rows.Prepare(file.Handle(),
                           "SELECT key1, key2, node, status, answer FROM reading "
                           "ORDER BY key1, key2, node");
-  if (code != SQLITE_OK) ThrowDamaged(file.ErrorText());
+  if (code != SQLITE_OK) ThrowFailed(file);
   std::optional<Place> last;
   while ((code = rows.Step()) == SQLITE_ROW) {
     Reading reading{};
@@ -160,15 +171,19 @@ void ForEachReading(const ksi::CacheFile& file, const std::function<void(const R
     if (reading.type == SQLITE_INTEGER) reading.count = rows.Number(4);
     visit(reading);
   }
-  if (code != SQLITE_DONE) ThrowDamaged(file.ErrorText());
+  if (code != SQLITE_DONE) ThrowFailed(file);
 }
 
 InstanceWalk::InstanceWalk(const ksi::CacheFile& file) : file_(file) {
   if (rows_.Prepare(file.Handle(),
                     "SELECT position, entry FROM instance "
                     "WHERE key1 = ?1 AND key2 = ?2 AND node = ?3 ORDER BY position") != SQLITE_OK) {
-    ThrowDamaged(file.ErrorText());
+    ThrowFailed(file);
   }
+}
+
+void InstanceWalk::Require(int code) const {
+  if (code != SQLITE_OK) ThrowFailed(file_);
 }
 
 void InstanceWalk::ForEach(
@@ -178,20 +193,20 @@ void InstanceWalk::ForEach(
     const int parameter = static_cast<int>(i) + 1;
     const ksi::Key& key = list.keys[i];
     if (i >= list.keys.count) {
-      rows_.Bind(parameter, std::string_view());
+      Require(rows_.Bind(parameter, std::string_view()));
     } else if (key.kind == ksi::KeyKind::kNumber) {
-      rows_.Bind(parameter, key.number);
+      Require(rows_.Bind(parameter, key.number));
     } else {
-      rows_.Bind(parameter, key.text);
+      Require(rows_.Bind(parameter, key.text));
     }
   }
-  rows_.Bind(3, list.node);
+  Require(rows_.Bind(3, list.node));
   int code = SQLITE_OK;
   while ((code = rows_.Step()) == SQLITE_ROW) {
     visit(rows_.Type(0) == SQLITE_INTEGER ? rows_.Number(0) : -1, rows_);
   }
   rows_.Reset();
-  if (code != SQLITE_DONE) ThrowDamaged(file_.ErrorText());
+  if (code != SQLITE_DONE) ThrowFailed(file_);
 }
 
 }  // namespace ksicache

@@ -30,6 +30,9 @@ struct Reading {
   std::string Name() const;
 };
 
+// Fails with std::bad_alloc if that is why the latest statement on the file failed.
+void RequireMemory(const ksi::CacheFile& file);
+
 // Does something with each of some cache files. What is wrong with one is said, and the others have
 // their turn. Gives the exit status: 0 if `visit` was content with all.
 int ForEachFile(const std::vector<std::string>& fileNames,
@@ -51,6 +54,8 @@ class InstanceWalk {
                const std::function<void(int64_t position, const ksi::Statement&)>& visit);
 
  private:
+  void Require(int code) const;
+
   const ksi::CacheFile& file_;
   ksi::Statement rows_;
 };

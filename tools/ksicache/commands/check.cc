@@ -40,6 +40,11 @@ class Checker {
     Report(reading.Name() + ": " + what);
   }
 
+  void ReportFailure() {
+    RequireMemory(file_);
+    Report(file_.ErrorText());
+  }
+
   void CheckIntegrity() {
     ksi::Statement rows;
     int code = rows.Prepare(file_.Handle(), "PRAGMA integrity_check(20)");
@@ -47,7 +52,7 @@ class Checker {
       code = rows.Step();
       if (code == SQLITE_ROW && rows.Text(0) != "ok") Report(std::string(rows.Text(0)));
     }
-    if (code != SQLITE_DONE) Report(file_.ErrorText());
+    if (code != SQLITE_DONE) ReportFailure();
   }
 
   void CheckSignature() {
@@ -155,7 +160,7 @@ class Checker {
                             "r.node = i.node AND r.status = 0 AND typeof(r.answer) = "
                             "'integer')");
     if (code == SQLITE_OK) code = rows.Step();
-    if (code != SQLITE_ROW) return Report(file_.ErrorText());
+    if (code != SQLITE_ROW) return ReportFailure();
     if (rows.Number(0) != 0) {
       Report(std::to_string(rows.Number(0)) + " entries belong to no list");
     }
