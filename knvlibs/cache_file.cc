@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <new>
 
 #include "knvlibs/cache_format.h"
@@ -110,6 +111,15 @@ const char* BadMember(const CacheFile::Capture& capture) {
   if (!IsDate(capture.taken)) return "taken";
   if (!IsPlain(capture.host)) return "host";
   return nullptr;
+}
+
+bool IsTime(const std::string& text) {
+  struct tm parts = {};
+  if (strptime(text.c_str(), cache::kTimeForm, &parts) == nullptr) return false;
+  timegm(&parts);  // makes the 30th of February the 2nd of March
+  std::array<char, 64> written = {};
+  static_cast<void>(strftime(written.data(), written.size(), cache::kTimeForm, &parts));
+  return text == written.data();
 }
 
 Status StatusOfSqlite(int code) {
@@ -249,7 +259,10 @@ Status CacheFile::ReadCapture() {
   capture_.built = rows.Text(1);
   capture_.host = rows.Text(2);
   capture_.taken = rows.Text(3);
-  return BadMember(capture_) == nullptr ? kOk : Damaged("the table capture is not understood");
+  if (BadMember(capture_) != nullptr) return Damaged("the table capture is not understood");
+  code = rows.Step();
+  if (code == SQLITE_ROW) return Damaged("the table capture has more than one row");
+  return code == SQLITE_DONE ? kOk : Failed(code);
 }
 
 Status CacheFile::ReadNodes() {

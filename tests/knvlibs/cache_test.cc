@@ -236,6 +236,7 @@ TEST_F(Cache, HeadThatIsNotUnderstoodIsDamage) {
   const std::string good = FileContent(file_);
   for (const char* sql : {
            "DELETE FROM capture",
+           "INSERT INTO capture SELECT * FROM capture",
            "UPDATE capture SET signature = 'x'",
            "UPDATE capture SET built = 'Nov 21 2026 10:00:0' || char(27)",
            "UPDATE capture SET taken = ''",

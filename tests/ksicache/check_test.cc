@@ -74,6 +74,10 @@ TEST_F(Ksicache, CheckSaysWhatIsWrongAndWhere) {
           "9223372036854775807");
   expect("UPDATE instance SET entry = printf('%05000d', 0) WHERE key1 = 30 AND position = 1",
          "sched/memClients/remapTypes [30]: entry 1 is longer than 4096 bytes");
+  expect("UPDATE instance SET entry = 'small' WHERE key1 = 30",
+         "sched/memClients/remapTypes [30]: entry 1 is the same as entry 0");
+  expect("UPDATE capture SET taken = '2026-02-29T10:00:00Z'",
+         "taken 2026-02-29T10:00:00Z is no date and time");
 
   // And what is wrong below the tables.
   std::string bad = good;
@@ -123,6 +127,38 @@ TEST_F(Ksicache, CheckFindsGroupsThatAreNoTree) {
       check(
           {{0, NumberList({4})}, {8, NumberList({9})}, {9, NumberList({7})}, {7, NumberList({8})}}),
       file + "group 7 stands below itself\n");
+}
+
+TEST_F(Ksicache, CheckFindsWhatAListNamesTwice) {
+  const auto check = [this](const char* node, const Keys& keys, const std::vector<Key>& entries) {
+    ksicache::CacheWriter writer(Path("a.ksi"), true);
+    writer.AddList(NodeAt(node), keys, entries);
+    writer.Commit(TestCapture());
+    const harness::Result result = Run({"check", Path("a.ksi")});
+    EXPECT_EQ(result.status, result.out.empty() ? 0 : 1);
+    EXPECT_EQ(result.err, "");
+    return result.out;
+  };
+  const std::string file = Path("a.ksi") + ": ";
+  const char* clients = "sched/groups/members/memClients";
+  EXPECT_EQ(check(clients, MakeKeys({4}), NumberList({7, 8, 9})), "");
+  EXPECT_EQ(check(clients, MakeKeys({4}), NumberList({7, 8, 7, 7})),
+            file + clients + " [4]: entry 2 is the same as entry 0\n" + file + clients +
+                " [4]: entry 3 is the same as entry 0\n");
+  for (const char* node : {"memory/pmem/volumes", "system/heaps", "system/buddy"}) {
+    EXPECT_EQ(check(node, MakeKeys({}), TextList({"a", "b", "b"})),
+              file + node + ": entry 2 is the same as entry 1\n");
+  }
+  const char* regions = "memory/pmem/volumes/regionStore/regions";
+  EXPECT_EQ(check(regions, MakeKeys({"v"}), TextList({"r", "r"})),
+            file + regions + " [v]: entry 1 is the same as entry 0\n");
+}
+
+TEST_F(Ksicache, CheckFindsTwoCaptures) {
+  WriteSmallHost(Path("host.ksi"));
+  RunSql(Path("host.ksi"), "INSERT INTO capture SELECT * FROM capture");
+  ExpectFailure({"check", Path("host.ksi")},
+                Path("host.ksi") + ": damaged: the table capture has more than one row");
 }
 
 TEST_F(Ksicache, CheckTakesSeveralFiles) {

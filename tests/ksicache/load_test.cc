@@ -110,6 +110,12 @@ TEST_F(Ksicache, LoadNamesWhatIsWrongAndWhere) {
   ExpectRefused(R"({"ksiCache":1,"host":"h","taken":"2026-11-21T10:00:00Z"})", "has no readings");
   ExpectRefused(R"({"ksiCache":1,"host":"h","taken":"today","readings":[]})",
                 "taken: is not as it is in a cache file");
+  for (const std::string taken :
+       {"2026-13-41T99:00:00Z", "2026-02-29T10:00:00Z", "2026-11-21T24:00:00Z",
+        "2026-11-21 10:00:00Z", " 026-11-21T10:00:00Z", "2026-11-21T10:00:00z"}) {
+    ExpectRefused(R"({"ksiCache":1,"host":"h","taken":")" + taken + R"(","readings":[]})",
+                  "taken: is no date and time");
+  }
   ExpectRefused(JsonWith("5"), "readings[0]: is not an object");
   ExpectRefused(JsonWith("[{}]"), "readings[0]: is not an object");
   ExpectRefused(JsonWith("{}"), "readings[0]: has no \"node\"");

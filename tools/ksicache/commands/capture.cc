@@ -9,6 +9,7 @@
 #include <ctime>
 #include <string>
 
+#include "knvlibs/cache_format.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diagnostics.h"
@@ -29,7 +30,7 @@ std::string Now() {
   struct tm parts = {};
   gmtime_r(&now, &parts);
   std::array<char, 32> text;
-  return {text.data(), strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &parts)};
+  return {text.data(), strftime(text.data(), text.size(), ksi::cache::kTimeForm, &parts)};
 }
 
 // The start of a small file, empty if it is none. It may be whatever somebody left in a recorded

@@ -2,6 +2,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <unordered_map>
 #include <utility>
 
 #include "knvlibs/cache_format.h"
@@ -23,7 +24,7 @@ class Checker {
     CheckIntegrity();
     // In a file whose structure is broken the rest may be read twice or never end.
     if (problems_ != 0) return problems_;
-    CheckSignature();
+    CheckCapture();
     CheckNodes();
     ForEachReading(file_, [&](const Reading& reading) { CheckReading(reading); });
     CheckGroupTree();
@@ -55,7 +56,9 @@ class Checker {
     if (code != SQLITE_DONE) ReportFailure();
   }
 
-  void CheckSignature() {
+  void CheckCapture() {
+    const std::string& taken = file_.GetCapture().taken;
+    if (!ksi::IsTime(taken)) Report("taken " + taken + " is no date and time");
     const std::string& signature = file_.GetCapture().signature;
     if (signature != ksi::kDefinitions.signature) {
       Report("signature " + signature + " is not " + std::string(ksi::kDefinitions.signature) +
@@ -105,6 +108,7 @@ class Checker {
       return Report(reading, "has no number of instances");
     }
     uint64_t count = 0;
+    entries_.clear();
     instances_.ForEach(reading, [&](int64_t position, const ksi::Statement& row) {
       if (position < 0 || static_cast<uint64_t>(position) != count) {
         Report(reading, "has entry " + std::to_string(position) + " where entry " +
@@ -127,6 +131,8 @@ class Checker {
       if (row.Type(1) != SQLITE_INTEGER) return Report(reading, entry + " is no number");
       if (ksi::IdOf(node) == ksi::node::sched_groups_members_groups) {
         CheckGroup(reading, row.Number(1));
+      } else {
+        CheckIsNew(reading, position, std::to_string(row.Number(1)));
       }
     } else if (row.Type(1) != SQLITE_TEXT) {
       Report(reading, entry + " is no text");
@@ -135,7 +141,16 @@ class Checker {
     } else if (row.Text(1).size() > ksi::cache::kLongestText) {
       Report(reading,
              entry + " is longer than " + std::to_string(ksi::cache::kLongestText) + " bytes");
+    } else {
+      CheckIsNew(reading, position, std::string(row.Text(1)));
     }
+  }
+
+  void CheckIsNew(const Reading& reading, int64_t position, std::string text) {
+    const auto [first, isNew] = entries_.emplace(std::move(text), position);
+    if (isNew) return;
+    Report(reading, "entry " + std::to_string(position) + " is the same as entry " +
+                        std::to_string(first->second));
   }
 
   void CheckGroup(const Reading& reading, int64_t group) {
@@ -170,6 +185,7 @@ class Checker {
   const ksi::CacheFile& file_;
   InstanceWalk instances_;
   GroupTree groups_;
+  std::unordered_map<std::string, int64_t> entries_;  // of a list, and where each stands first
   size_t problems_ = 0;
 };
 
@@ -186,9 +202,10 @@ const Command kCheck = {
     .arguments = "FILE...",
     .summary = "say what is wrong with each FILE",
     .help = R"(Says all that is wrong with each FILE: its integrity as a database, nodes that
-this version does not know, records of the wrong size, gaps in lists, groups that
-stand in two places or below themselves, and a signature that is not that of
-this version. Says nothing of a file that is whole.
+this version does not know, records of the wrong size, lists with gaps or that
+name something twice, groups that stand in two places or below themselves, a
+time that there is not, and a signature that is not that of this version. Says
+nothing of a file that is whole.
 )",
     .options = {},
     .fewest = 1,

@@ -181,6 +181,7 @@ ksi::CacheFile::Capture TakeHead(const Json& document) {
   if (const char* bad = ksi::BadMember(capture)) {
     throw DataError(std::string(bad) + ": is not as it is in a cache file");
   }
+  if (!ksi::IsTime(capture.taken)) throw DataError("taken: is no date and time");
   return capture;
 }
 
