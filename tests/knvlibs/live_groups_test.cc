@@ -358,13 +358,13 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
 
 TEST_P(PluggedMemoryTest, IsMemoryOfTheGuest) {
   const int64_t start = GetParam().memory;
-  const double before = MappedOnceItHas(start);
+  EXPECT_LT(MappedOnceItHas(start), 65536) << "an idle machine has little of its memory";
   Plug("small", "67108864");
-  EXPECT_GE(MappedOnceItHas(start + 64), before + 65536) << "all of it is there";
+  EXPECT_GE(MappedOnceItHas(start + 64), 65536) << "all of it is there";
   // So much that the process is not walked any more.
   Plug("large", "268435456");
   const double large = MappedOnceItHas(start + 320);
-  EXPECT_GE(large, before + 327680);
+  EXPECT_GE(large, 327680);
   EXPECT_LE(large, static_cast<double>((start + 320) * 1024));
 }
 
