@@ -7,7 +7,9 @@
 #include <cstring>
 #include <filesystem>
 #include <string>
+#include <utility>
 
+#include <knvlibs/ksi.h>
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/groups/groups.h"
 #include "knvlibs/linux/linux_source.h"
@@ -402,6 +404,56 @@ TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
       "/proc/PID/ksm_stat: not permitted for some processes: their shared memory has no value\n$");
 }
 
+// All but its end would pass for a process that has ended.
+TEST_F(GroupsTest, AStatusFileThatIsCutOffIsNotUnderstood) {
+  const std::pair<const char*, const char*> cut[] = {{"", "1"},
+                                                     {"Name:\tx\nState:\tS (sleeping)\n", "3"}};
+  for (const auto& [content, line] : cut) {
+    tree_.Write("/proc/201/status", content);
+    testing::internal::CaptureStderr();
+    LinuxSource source(tree_.Root());
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              std::string("/proc/201/status: line ") + line + " is not understood\n");
+    EXPECT_EQ(source.LossStatus(), KSI_STATUS_INVALID_METADATA);
+  }
+}
+
+TEST_F(GroupsTest, CgroupsThatMayNotBeReadAreLeftOutWithAWord) {
+  const auto asNobody = [&] {
+    constexpr uid_t kNobody = 65534;
+    if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
+    LinuxSource source(tree_.Root());
+    const auto expected = std::vector<int64_t>{kKernelGroup, kProcessGroup + kPid};
+    bool isRight = true;
+    for (int i = 0; i < 2; ++i) {
+      isRight = isRight && GetIds(source, "sched/groups/members/groups", {int64_t{0}}) == expected;
+    }
+    _exit(isRight ? 0 : 1);
+  };
+  tree_.Lock("/sys/fs/cgroup/cgroup.controllers");
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0),
+              "^/sys/fs/cgroup/cgroup.controllers: not permitted: all cgroups are left out\n$");
+  std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/cgroup.controllers");
+  tree_.Write("/sys/fs/cgroup/memory/cgroup.procs", "");
+  tree_.Lock("/sys/fs/cgroup/memory/cgroup.procs");
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0),
+              "^/sys/fs/cgroup/memory/cgroup.procs: not permitted: all cgroups are left out\n$");
+}
+
+// What may not be read was not needed.
+TEST_F(GroupsTest, AHierarchyThatMayNotBeReadIsNotMissedBesideAnother) {
+  tree_.Write("/sys/fs/cgroup/unified/cgroup.controllers", "memory\n");
+  tree_.Lock("/sys/fs/cgroup/cgroup.controllers");
+  const auto asNobody = [&] {
+    constexpr uid_t kNobody = 65534;
+    if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
+    LinuxSource source(tree_.Root());
+    _exit(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size() == 2 ? 0 : 1);
+  };
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0), "^$");
+}
+
 TEST_F(GroupsTest, WhatIsBelowALockedCgroupIsLeftOutWithAWord) {
   tree_.Write("/sys/fs/cgroup/jobs/a/b/cgroup.procs", "");
   tree_.Write("/sys/fs/cgroup/jobs/c/cgroup.procs", "");
@@ -450,8 +502,9 @@ TEST_F(GroupsTest, WhatIsLockedOrPinnedOrHugeIsNotSwappedAndInMemory) {
               "HugetlbPages:\t 64 kB\nThreads:\t1\n");
   EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, 101u);
   // Locked when it comes into memory.
-  tree_.Write("/proc/100/status",
-              "Name:\tx\nVmSize:\t 800 kB\nVmLck:\t 700 kB\nVmPin:\t 0 kB\nVmRSS:\t 40 kB\n");
+  tree_.Write(
+      "/proc/100/status",
+      "Name:\tx\nVmSize:\t 800 kB\nVmLck:\t 700 kB\nVmPin:\t 0 kB\nVmRSS:\t 40 kB\nThreads:\t1\n");
   EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, 40u);
 }
 

@@ -241,6 +241,7 @@ TEST_F(LinuxHostTest, NoMoreBuddiesThanAListHasRoomFor) {
             KSI_STATUS_NOT_FOUND);
   EXPECT_EQ(testing::internal::GetCapturedStderr(),
             "/proc/buddyinfo: more than 99 zones: the others are left out\n");
+  EXPECT_EQ(source.LossStatus(), KSI_STATUS_LIMIT_EXCEEDED);
   ASSERT_EQ(names.size(), 99u);
   EXPECT_EQ(names.back(), "memmap-98-hi");
 }

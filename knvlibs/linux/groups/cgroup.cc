@@ -4,17 +4,24 @@
 #include <initializer_list>
 #include <iterator>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/memory/hugepages.h"
 
 namespace ksi {
 namespace {
 
-bool HasMemoryController(const LinuxHost& host, std::string_view mount) {
-  std::string file(mount);
-  file += "/cgroup.controllers";
+// Reads a file that tells whether a hierarchy is there; notes the first that may not be read.
+bool ReadSign(const LinuxHost& host, const std::string& file, std::string& content,
+              std::string& denied) {
+  const Status status = host.Read(file, content);
+  if (status == KSI_STATUS_PERMISSION_DENIED && denied.empty()) denied = file;
+  return status == kOk;
+}
+
+bool HasMemoryController(const LinuxHost& host, const std::string& mount, std::string& denied) {
   std::string content;
-  if (host.Read(file, content) != kOk) return false;
+  if (!ReadSign(host, mount + "/cgroup.controllers", content, denied)) return false;
   if (content.ends_with('\n')) content.pop_back();
   std::string_view rest = content;
   for (std::string_view word = TakeWord(rest); !word.empty(); word = TakeWord(rest)) {
@@ -42,16 +49,19 @@ std::string HugetlbFile(uint64_t sizeKB) {
 
 CgroupHierarchy CgroupHierarchy::Find(const LinuxHost& host) {
   CgroupHierarchy hierarchy;
-  for (const std::string_view mount : {"/sys/fs/cgroup", "/sys/fs/cgroup/unified"}) {
-    if (!HasMemoryController(host, mount)) continue;
+  std::string denied;
+  for (const char* mount : {"/sys/fs/cgroup", "/sys/fs/cgroup/unified"}) {
+    if (!HasMemoryController(host, mount, denied)) continue;
     hierarchy.version_ = Version::k2;
     hierarchy.mount_ = mount;
     return hierarchy;
   }
   std::string content;
-  if (host.Read("/sys/fs/cgroup/memory/cgroup.procs", content) == kOk) {
+  if (ReadSign(host, "/sys/fs/cgroup/memory/cgroup.procs", content, denied)) {
     hierarchy.version_ = Version::k1;
     hierarchy.mount_ = "/sys/fs/cgroup/memory";
+  } else if (!denied.empty() && host.First("cgroups denied")) {
+    Warning("%s: not permitted: all cgroups are left out\n", denied.c_str());
   }
   return hierarchy;
 }

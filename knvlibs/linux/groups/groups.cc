@@ -198,14 +198,28 @@ Status GroupTree::AddProcesses(const LinuxHost& host) {
   return kOk;
 }
 
+namespace {
+
+// QEMU is never a single thread; most others are and need not be asked.
+bool RunsQemu(const LinuxHost& host, const Process& process, std::vector<std::string>& words) {
+  if (process.threads < 2) return false;
+  const Status status = ReadCommandLine(host, process.pid, words);
+  if (status == KSI_STATUS_PERMISSION_DENIED && host.First("cmdline denied")) {
+    Warning(
+        "/proc/PID/cmdline: not permitted for some processes: virtual machines may be shown as "
+        "user worlds\n");
+  }
+  return status == kOk && IsQemu(words);
+}
+
+}  // namespace
+
 // Whether a process runs a virtual machine.
 bool GroupTree::FindMachine(const LinuxHost& host, const Process& process,
                             VirtualMachine& machine) {
   machine.pid = process.pid;
   std::vector<std::string> words;
-  // QEMU is never a single thread; most others are and need not be asked.
-  machine.isQemu =
-      process.threads > 1 && ReadCommandLine(host, process.pid, words) == kOk && IsQemu(words);
+  machine.isQemu = RunsQemu(host, process, words);
   if (machine.isQemu) machine.commandLine = ParseQemuCommandLine(words);
   return machine.isQemu || kvm_.IsMachine(host, process);
 }

@@ -136,10 +136,13 @@ Status ReadProcess(const LinuxHost& host, int32_t pid, Process& process) {
         !TakeField(line.substr(0, colon), line.substr(colon + 1), process, facts)) {
       return host.NotUnderstoodOnce("status", file, lines.Number());
     }
-    if (line.starts_with(kLastField)) break;
+    if (line.starts_with(kLastField)) {
+      Judge(facts, process);
+      return kOk;
+    }
   }
-  Judge(facts, process);
-  return kOk;
+  // What is cut off would pass for the end of a process.
+  return host.NotUnderstoodOnce("status", file, lines.Number() + 1);
 }
 
 Status ReadCommandLine(const LinuxHost& host, int32_t pid, std::vector<std::string>& words) {

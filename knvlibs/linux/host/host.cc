@@ -5,8 +5,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
+#include <iterator>
 #include <system_error>
 
 #include <knvlibs/ksi.h>
@@ -96,6 +98,7 @@ Status LinuxHost::ReadNumber(std::string_view file, uint64_t& number) const {
   Lines lines(content);
   std::string_view line;
   if (!lines.Next(line) || !ParseNumber(line, number) || lines.Next(line)) {
+    Lose(KSI_STATUS_INVALID_METADATA);
     return NotUnderstood(file, 1);
   }
   return kOk;
@@ -172,6 +175,11 @@ void LinuxHost::Lose(Status why) const {
   if (loss_ == kOk) loss_ = why;
 }
 
+void LinuxHost::TellShortage(std::string_view what, int error) const {
+  constexpr int kShortages[] = {EMFILE, ENFILE, ENOMEM, ENOBUFS, EIO};
+  if (std::ranges::find(kShortages, error) != std::end(kShortages)) TellOnce(what, error);
+}
+
 void LinuxHost::TellOnce(std::string_view file, int error) const {
   Lose(StatusOfErrno(error));
   const std::string reason = std::generic_category().message(error);
@@ -184,6 +192,7 @@ void LinuxHost::BeginReading() { reading_ = std::make_unique<Reading>(); }
 
 Status LinuxHost::NotUnderstoodOnce(std::string_view kind, std::string_view file,
                                     size_t line) const {
+  Lose(KSI_STATUS_INVALID_METADATA);
   return First(kind) ? NotUnderstood(file, line) : KSI_STATUS_INVALID_METADATA;
 }
 

@@ -70,6 +70,10 @@ class LinuxHost {
   // Tells, once in a reading, which file may not be read: the first that the question met.
   void TellDenied() const;
 
+  // Tells, once in a reading, that the system was short of something by this errno. Any other says
+  // how it stands with `what`, and is not told.
+  void TellShortage(std::string_view what, int error) const;
+
   // Notes why something is left out of an answer; the first reason stays.
   void Lose(Status why) const;
   [[nodiscard]] Status LossStatus() const { return loss_; }

@@ -23,6 +23,7 @@ bool MayWalk(const LinuxHost& host) {
         "virtual machines: no time left to look at the memory of all of them: what that would "
         "tell has no value\n");
   }
+  host.Lose(KSI_STATUS_TIMEOUT);
   return false;
 }
 

@@ -116,6 +116,7 @@ bool KvmSearch::IsMachine(const LinuxHost& host, const Process& process) {
 
 void KvmSearch::Miss(const LinuxHost& host) {
   isWhole_ = false;
+  host.Lose(KSI_STATUS_LIMIT_EXCEEDED);
   if (!host.First("kvm descriptors")) return;
   Warning(
       "/proc/PID/fd: too many to look at all: virtual machines of other monitors than QEMU may be "

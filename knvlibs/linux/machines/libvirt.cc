@@ -71,6 +71,7 @@ void TellEnd(const LinuxHost& host, LibvirtAnswer::End end) {
   if (end == LibvirtAnswer::End::kNoLibrary) reason = "its library cannot be loaded";
   if (end == LibvirtAnswer::End::kNoConnection) reason = "it lets nobody in";
   if (end == LibvirtAnswer::End::kTooLate) reason = "it has not told all in time";
+  if (end == LibvirtAnswer::End::kTooLate) host.Lose(KSI_STATUS_TIMEOUT);
   if (reason == nullptr || !host.First("libvirt")) return;
   Warning("libvirt: %s: balloons and guests of its machines may have no value\n", reason);
 }

@@ -1,6 +1,7 @@
 #include "knvlibs/linux/machines/qmp.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <memory>
 #include <optional>
 #include <string>
@@ -150,6 +151,7 @@ void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, Gu
     if (host.First("monitors")) {
       Warning("virtual machines: no time left to ask all of them: their balloons have no value\n");
     }
+    host.Lose(KSI_STATUS_TIMEOUT);
     return;
   }
   const LinuxHost::TimePoint start = host.Now();
@@ -158,9 +160,10 @@ void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, Gu
   // Where the listener cannot be looked up, the connection tells who it is.
   Process process;
   if (ReadProcess(host, pid, process) == kOk && process.user &&
-      Listens(host, pid, line.monitor).value_or(true) &&
-      socket.Connect(line.monitor, pid, *process.user)) {
-    Converse(host, socket, line, memory);
+      Listens(host, pid, line.monitor).value_or(true)) {
+    errno = 0;
+    if (socket.Connect(line.monitor, pid, *process.user)) Converse(host, socket, line, memory);
+    host.TellShortage(line.monitor, errno);
   }
   left -= host.Now() - start;
 }

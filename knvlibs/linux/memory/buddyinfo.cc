@@ -121,6 +121,7 @@ Status ReadBuddies(const LinuxHost& host, Buddies& buddies) {
   while (lines.Next(line)) {
     if (buddies.size() == kMaxBuddies) {
       Warning("%s: more than %zu zones: the others are left out\n", kFile.data(), kMaxBuddies);
+      host.Lose(KSI_STATUS_LIMIT_EXCEEDED);
       break;
     }
     uint64_t numaNode = 0;

@@ -159,6 +159,26 @@ TEST_F(MachineTest, AMachineThatEndsAfterTheScanIsShownAsItStartedIfItCannotHave
   }
 }
 
+TEST_F(MachineTest, WhoseCommandLineMayNotBeReadIsAUserWorldWithAWord) {
+  for (const int32_t pid : {kPid, kPid + 1}) {
+    WriteQemu(pid, "1", "-accel", "kvm");
+    tree_.Lock(ProcessFile(pid, "cmdline"));
+  }
+  const auto asNobody = [&] {
+    constexpr uid_t kNobody = 65534;
+    if (geteuid() == 0 && setuid(kNobody) != 0) _exit(2);
+    const LinuxHost host(tree_.Root());
+    const GroupTree* tree = nullptr;
+    _exit(GroupTree::Get(host, tree) == kOk && tree->VirtualMachines().empty() &&
+                  tree->FindClient(kPid) != nullptr && host.LossStatus() == kOk
+              ? 0
+              : 1);
+  };
+  EXPECT_EXIT(asNobody(), testing::ExitedWithCode(0),
+              "^/proc/PID/cmdline: not permitted for some processes: virtual machines may be shown "
+              "as user worlds\n$");
+}
+
 // Machines of other monitors.
 
 class OtherMonitorTest : public MachineTest {
@@ -226,7 +246,7 @@ TEST_F(OtherMonitorTest, WhatTheKernelListsIsLookedAt) {
 
 TEST_F(OtherMonitorTest, MayBeListedByTheThreadThatMadeTheMachine) {
   Make("/sys/kernel/debug/kvm/101-4");
-  tree_.Write("/proc/101/status", "Name:\tmaker\nTgid:\t100\n");
+  tree_.Write("/proc/101/status", "Name:\tmaker\nTgid:\t100\nThreads:\t2\n");
   EXPECT_TRUE(IsMachine());
 }
 
@@ -238,6 +258,10 @@ TEST_F(OtherMonitorTest, TooManyDescriptorsAreNotLookedAtWhichIsToldOnce) {
   EXPECT_EQ(testing::internal::GetCapturedStderr(),
             "/proc/PID/fd: too many to look at all: virtual machines of other monitors than QEMU "
             "may be shown as user worlds\n");
+  const LinuxHost host(tree_.Root());
+  const GroupTree* tree = nullptr;
+  EXPECT_EQ(GroupTree::Get(host, tree), kOk);
+  EXPECT_EQ(host.LossStatus(), KSI_STATUS_LIMIT_EXCEEDED);
   WriteProcess(kPid, "light-monitor", 2, KvmSearch::kMostDescriptors);
   testing::internal::CaptureStderr();
   EXPECT_TRUE(IsMachine());

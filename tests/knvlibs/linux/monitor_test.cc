@@ -1,19 +1,29 @@
 // Monitors over real sockets, whose other ends say what a test lets them say.
 #include <gtest/gtest.h>
+#include <linux/filter.h>
+#include <linux/seccomp.h>
 #include <poll.h>
+#include <sys/prctl.h>
 #include <sys/socket.h>
+#include <sys/syscall.h>
 #include <sys/un.h>
 #include <unistd.h>
 
 #include <atomic>
+#include <cerrno>
 #include <chrono>
+#include <cstddef>
+#include <cstdint>
 #include <cstring>
 #include <ctime>
 #include <filesystem>
 #include <functional>
 #include <string>
+#include <system_error>
 #include <thread>
+#include <utility>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/machines/listener.h"
 #include "knvlibs/linux/machines/monitor_socket.h"
 #include "knvlibs/linux/machines/qmp.h"
@@ -344,6 +354,50 @@ TEST(MonitorTest, AStrangersSocketIsNotKnockedAt) {
   EXPECT_EQ(endpoint.CountWaiting(), 0);
 }
 
+// From here on the system fails this thread's calls of a number with this errno.
+bool Fail(uint32_t call, uint32_t error) {
+  sock_filter filter[] = {
+      BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
+      BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, call, 0, 1),
+      BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | error),
+      BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW),
+  };
+  const sock_fprog program = {4, filter};
+  return prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 &&
+         prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &program) == 0;
+}
+
+// What two monitors in one reading say of themselves on standard error and in the host's loss.
+[[noreturn]] void AskTwice(uint32_t call, uint32_t error, const std::string& path, Status loss) {
+  if (!Fail(call, error)) _exit(2);
+  const LinuxHost host("/");
+  bool isRight = true;
+  for (int i = 0; i < 2; ++i) {
+    const GuestMemory memory = ReadGuestMemory(host, getppid(), LineOf(path));
+    isRight = isRight && memory.balloon == GuestMemory::Balloon::kUnknown;
+  }
+  _exit(isRight && host.LossStatus() == loss ? 0 : 1);
+}
+
+TEST(MonitorTest, WhatTheSystemIsShortOfIsToldOnce) {
+  const Peer peer(Answering({}));
+  const std::pair<uint32_t, uint32_t> failing[] = {
+      {SYS_socket, ENOMEM}, {SYS_connect, ENFILE}, {SYS_recvfrom, ENOBUFS}};
+  for (const auto& [call, error] : failing) {
+    const std::string reason = std::generic_category().message(static_cast<int>(error));
+    EXPECT_EXIT(
+        AskTwice(call, error, peer.Path(), StatusOfErrno(static_cast<int>(error))),
+        testing::ExitedWithCode(0),
+        "^" + peer.Path() + ": " + reason + ": what cannot be read is left out or has no value\n$");
+  }
+}
+
+TEST(MonitorTest, ARefusalIsNoShortage) {
+  const Peer peer(Answering({}));
+  EXPECT_EXIT(AskTwice(SYS_connect, ECONNREFUSED, peer.Path(), kOk), testing::ExitedWithCode(0),
+              "^$");
+}
+
 TEST(MonitorTest, AllOfAReadingHaveASecondTogether) {
   const Endpoint endpoint;
   ASSERT_EQ(listen(endpoint.Fd(), 8), 0);
@@ -360,6 +414,7 @@ TEST(MonitorTest, AllOfAReadingHaveASecondTogether) {
   EXPECT_EQ(ask(5),
             "virtual machines: no time left to ask all of them: their balloons have no value\n");
   EXPECT_EQ(endpoint.CountWaiting(), 2);
+  EXPECT_EQ(host.LossStatus(), KSI_STATUS_TIMEOUT);
   host.BeginReading();
   EXPECT_EQ(ask(1), "");
   EXPECT_EQ(endpoint.CountWaiting(), 1) << "a new reading has time again";

@@ -88,6 +88,7 @@ TEST(PageMapTest, WithoutTimeThereAreNoFiguresAndAWord) {
     EXPECT_EQ(testing::internal::GetCapturedStderr(), told);
     EXPECT_EQ(counts.resident, std::nullopt);
     EXPECT_EQ(counts.swapped, std::nullopt);
+    EXPECT_EQ(host.LossStatus(), KSI_STATUS_TIMEOUT);
   }
 }
 

@@ -8,7 +8,7 @@ namespace ksi {
 namespace {
 
 constexpr int32_t kPid = 7;
-constexpr char kStatus[] = "Name:\tx\nState:\tS (sleeping)\nVmSize:\t 800 kB\n";
+constexpr char kStatus[] = "Name:\tx\nState:\tS (sleeping)\nVmSize:\t 800 kB\nThreads:\t1\n";
 
 class SmapsTest : public testing::Test {
  protected:
@@ -72,7 +72,7 @@ TEST_F(SmapsTest, AKernelWithoutItHasNoFiguresAndAZombieIsGone) {
   tree_.Write("/proc/7/status", kStatus);
   EXPECT_EQ(ReadMappings(host, kPid, MappingsFile::kSmaps, mappings_), kOk);
   EXPECT_TRUE(mappings_.empty());
-  tree_.Write("/proc/7/status", "Name:\tx\nState:\tZ (zombie)\n");
+  tree_.Write("/proc/7/status", "Name:\tx\nState:\tZ (zombie)\nThreads:\t1\n");
   EXPECT_EQ(ReadMappings(host, kPid, MappingsFile::kSmaps, mappings_), KSI_STATUS_NOT_FOUND);
 }
 
