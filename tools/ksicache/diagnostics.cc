@@ -1,6 +1,7 @@
 #include "tools/ksicache/diagnostics.h"
 
 #include <new>
+#include <string_view>
 #include <utility>
 
 #include <knvlibs/ksi.h>
@@ -10,6 +11,15 @@
 #pragma weak KSI_SetDiagnosticHandler
 
 namespace ksicache {
+namespace {
+
+// By the library's words for it.
+bool IsRefusal(std::string_view text) {
+  constexpr size_t kNone = std::string_view::npos;
+  return text.find(": not permitted") != kNone || text.find(": permission denied") != kNone;
+}
+
+}  // namespace
 
 Diagnostics::Diagnostics() {
   if (&KSI_SetDiagnosticHandler != nullptr) KSI_SetDiagnosticHandler(Receive, this);
@@ -31,6 +41,7 @@ void Diagnostics::Say() {
 void Diagnostics::Receive(void* context, const char* text) {
   auto& self = *static_cast<Diagnostics*>(context);
   ++self.count_;
+  if (IsRefusal(text)) self.tellRefusals_ = true;
   try {
     self.Keep(text);
   } catch (const std::bad_alloc&) {

@@ -23,6 +23,9 @@ class Diagnostics {
   // All, said or not.
   size_t Count() const { return count_; }
 
+  // Whether one of them tells that something may not be read.
+  bool TellRefusals() const { return tellRefusals_; }
+
  private:
   static constexpr size_t kMostKept = 1000;
 
@@ -30,6 +33,7 @@ class Diagnostics {
   void Keep(const char* text);
 
   size_t count_ = 0;
+  bool tellRefusals_ = false;
   size_t dropped_ = 0;  // of those to say
   std::vector<std::string> kept_;
 };

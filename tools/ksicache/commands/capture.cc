@@ -37,18 +37,28 @@ std::string Now() {
 // host, a pipe for example.
 std::string StartOf(const std::string& fileName) {
   const Descriptor file(open(fileName.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  if (!file && (errno == ENOENT || errno == ENOTDIR || errno == ENXIO)) return "";
   struct stat info = {};
-  if (!file || fstat(file.Get(), &info) != 0 || !S_ISREG(info.st_mode)) return "";
+  if (!file || fstat(file.Get(), &info) != 0) throw SystemError(fileName, errno);
+  if (!S_ISREG(info.st_mode)) return "";
   std::array<char, 256> text;
   const ssize_t size = read(file.Get(), text.data(), text.size());
-  return {text.data(), static_cast<size_t>(std::max<ssize_t>(size, 0))};
+  if (size < 0) throw SystemError(fileName, errno);
+  return {text.data(), static_cast<size_t>(size)};
 }
 
-std::string HostName(const std::string* root) {
+// "unknown" if it has none or, which is said and told by `isRead`, if it cannot be read.
+std::string HostName(const std::string* root, bool& isRead) {
   std::array<char, 256> own = {};
   std::string name;
+  isRead = true;
   if (root != nullptr) {
-    name = StartOf(*root + "/proc/sys/kernel/hostname");
+    try {
+      name = StartOf(*root + "/proc/sys/kernel/hostname");
+    } catch (const Error& error) {
+      PrintError(error.what());
+      isRead = false;
+    }
   } else if (gethostname(own.data(), own.size() - 1) == 0) {
     name = own.data();
   }
@@ -72,8 +82,9 @@ class Account {
          std::to_string(writer.Lists()) + " lists of " + host);
   }
 
-  // `diagnostics`: how many the library gave. `loss`: why it left out what could not be read.
-  void OfFailures(const Failures& failures, size_t diagnostics, ksi::Status loss) const {
+  // `loss`: why the library left out what could not be read.
+  void OfFailures(const Failures& failures, const Diagnostics& diagnostics,
+                  ksi::Status loss) const {
     if (failures.absent.Count() != 0) {
       say_("absent     " + std::to_string(failures.absent.Count()) +
            ": not everything has every node");
@@ -82,12 +93,12 @@ class Account {
       say_("refused    " + failures.refused.Text());
     }
     // What is refused of a record that is read otherwise is a figure without a value in it.
-    const bool figures = diagnostics != 0 || geteuid() != 0;
-    if (figures) {
+    const size_t said = diagnostics.Count();
+    if (said != 0 || geteuid() != 0) {
       say_("no value   figures without one may have been refused" +
-           (diagnostics == 0 ? "" : "; diagnostics: " + std::to_string(diagnostics)));
+           (said == 0 ? "" : "; diagnostics: " + std::to_string(said)));
     }
-    if (figures || failures.refused.Count() != 0) OfRights();
+    if (geteuid() != 0 || diagnostics.TellRefusals() || failures.refused.Count() != 0) OfRights();
     if (failures.failed.Count() != 0) say_("failed     " + failures.failed.Text());
     if (loss != ksi::kOk) say_("left out   what could not be read: " + StatusText(loss));
   }
@@ -127,13 +138,14 @@ int Capture(const CommandLine& line) {
   CheckFound(walk);
 
   const HostLibrary::Definitions definitions = library.KernelDefinitions();
-  const std::string host = HostName(root);
+  bool isNameRead = false;
+  const std::string host = HostName(root, isNameRead);
   writer.Commit({definitions.signature, definitions.built, host, taken});
   const Account account(fileName == "-");
   account.OfFile(writer, host);
   const ksi::Status loss = library.LossStatus();
-  account.OfFailures(walk.GetFailures(), diagnostics.Count(), loss);
-  return walk.GetFailures().failed.Count() == 0 && loss == ksi::kOk ? 0 : 1;
+  account.OfFailures(walk.GetFailures(), diagnostics, loss);
+  return walk.GetFailures().failed.Count() == 0 && loss == ksi::kOk && isNameRead ? 0 : 1;
 }
 
 }  // namespace
