@@ -195,6 +195,13 @@ TEST_F(Ksicache, CaptureTakesTheNameOfAHostFromAFileAlone) {
   ASSERT_EQ(unlink(file.c_str()), 0);
   ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
   EXPECT_EQ(name(host), "unknown");
+
+  // What lies outside of the recorded host is no name of it.
+  ASSERT_EQ(unlink(file.c_str()), 0);
+  const HostTree other;
+  other.Write("/secret", "secret\n");
+  ASSERT_EQ(symlink((other.Root() + "/secret").c_str(), file.c_str()), 0);
+  EXPECT_EQ(name(host), "unknown");
 }
 
 TEST_F(Ksicache, CaptureOfThisMachineIsAGoodFile) {

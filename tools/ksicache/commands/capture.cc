@@ -8,8 +8,10 @@
 #include <cerrno>
 #include <ctime>
 #include <string>
+#include <string_view>
 
 #include "knvlibs/cache_format.h"
+#include "knvlibs/linux/host/host_root.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diagnostics.h"
@@ -33,13 +35,14 @@ std::string Now() {
   return {text.data(), strftime(text.data(), text.size(), ksi::cache::kTimeForm, &parts)};
 }
 
-// The start of a small file, empty if it is none. It may be whatever somebody left in a recorded
-// host, a pipe for example.
-std::string StartOf(const std::string& fileName) {
-  const Descriptor file(open(fileName.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (!file && (errno == ENOENT || errno == ENOTDIR || errno == ENXIO)) return "";
+// The start of a small file of a recorded host, empty if it is none. It may be whatever somebody
+// left there: a pipe, or a link to where nothing is to be read.
+std::string StartOf(const std::string& root, std::string_view path) {
+  const std::string fileName = root + std::string(path);
+  const ksi::FileDescriptor file = ksi::HostRoot(root).Open(path, O_RDONLY | O_NONBLOCK);
+  if (!file.IsOpen() && (errno == ENOENT || errno == ENOTDIR || errno == ENXIO)) return "";
   struct stat info = {};
-  if (!file || fstat(file.Get(), &info) != 0) throw SystemError(fileName, errno);
+  if (!file.IsOpen() || fstat(file.Get(), &info) != 0) throw SystemError(fileName, errno);
   if (!S_ISREG(info.st_mode)) return "";
   std::array<char, 256> text;
   const ssize_t size = read(file.Get(), text.data(), text.size());
@@ -54,7 +57,7 @@ std::string HostName(const std::string* root, bool& isRead) {
   isRead = true;
   if (root != nullptr) {
     try {
-      name = StartOf(*root + "/proc/sys/kernel/hostname");
+      name = StartOf(*root, "/proc/sys/kernel/hostname");
     } catch (const Error& error) {
       PrintError(error.what());
       isRead = false;
