@@ -272,10 +272,10 @@ Status CacheSource::FindObject(const Keys& keys, const Object** object) {
 // A cursor on the first reading of an object: one that is there after the object before it, or else
 // the one that has rested longest. Off any row if there is no such object.
 Status CacheSource::FindCursor(const Keys& keys, Cursor*& cursor) {
-  const auto there =
+  auto* const there =
       std::ranges::find_if(cursors_, [&](const Cursor& each) { return each.IsAt(keys); });
   if (there != cursors_.end()) {
-    cursor = &*there;
+    cursor = there;
     return kOk;
   }
   cursor = &cursors_[restedCursor_];

@@ -30,8 +30,8 @@ bool Lines::Next(std::string_view& line) {
 
 std::string_view TakeWord(std::string_view& text) {
   constexpr auto kIsBlank = [](char c) { return c == ' ' || c == '\t'; };
-  const auto start = std::ranges::find_if_not(text, kIsBlank);
-  const auto end = std::find_if(start, text.end(), kIsBlank);
+  const auto* const start = std::ranges::find_if_not(text, kIsBlank);
+  const auto* const end = std::find_if(start, text.end(), kIsBlank);
   const std::string_view word(start, end);
   text = std::string_view(end, text.end());
   return word;
