@@ -47,7 +47,10 @@ constexpr uint64_t kIsZero = 1 << 5;
 constexpr uint64_t kIsHuge = 1 << 6;
 
 // The kernel holds the address space for one request: some milliseconds for so much.
-constexpr uint64_t kMostScanned = uint64_t{128} << 20;
+constexpr uint64_t kMostScanned = uint64_t{32} << 20;
+
+// Who asks again at once may be served before the process that waits: it gets its turn in between.
+constexpr useconds_t kPause = 100;
 
 struct ByteCounts {
   uint64_t resident = 0;
@@ -133,6 +136,7 @@ Status CountEntries(const LinuxHost& host, int pagemap, std::span<const AddressR
       const ssize_t size = pread(pagemap, entries.data(), most * sizeof entries[0],
                                  static_cast<off_t>(at / pageSize * sizeof entries[0]));
       if (size <= 0) return KSI_STATUS_NOT_FOUND;
+      usleep(kPause);
       for (const uint64_t entry :
            std::span(entries).first(static_cast<size_t>(size) / sizeof entries[0])) {
         counter.Take(at, entry);
@@ -152,7 +156,10 @@ std::optional<Status> Scan(const LinuxHost& host, int pagemap, std::span<const A
     while (range.start < range.end) {
       if (!MayWalk(host)) return kOk;
       const Walk walk(host);
-      if (ScanPiece(pagemap, range, bytes)) continue;
+      if (ScanPiece(pagemap, range, bytes)) {
+        usleep(kPause);
+        continue;
+      }
       if (errno == ENOTTY || errno == EINVAL) return std::nullopt;
       return KSI_STATUS_NOT_FOUND;
     }
