@@ -33,6 +33,7 @@ struct Reading {
   Once<Heaps, ReadHeaps> heaps;
   Once<NvdimmDevices, ReadNvdimmDevices> nvdimms;
   Once<Ksm, ReadKsm> ksm;
+  Once<HugetlbCharges, ReadHugetlbCharges> hugetlbCharges;
   Once<GroupTree, GroupTree::Read> groups;
 
   // What is left of the time that monitors may take.

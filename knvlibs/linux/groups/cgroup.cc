@@ -7,6 +7,7 @@
 #include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/linux/memory/hugepages.h"
+#include "knvlibs/linux/reading.h"
 
 namespace ksi {
 namespace {
@@ -46,6 +47,18 @@ std::string HugetlbFile(uint64_t sizeKB) {
 }
 
 }  // namespace
+
+Status ReadHugetlbCharges(const LinuxHost& host, HugetlbCharges& charges) {
+  std::string mounts;
+  if (host.Read("/proc/self/mounts", mounts) == kOk &&
+      mounts.find("memory_hugetlb_accounting") != std::string::npos) {
+    return kOk;
+  }
+  std::vector<uint64_t> sizes;
+  const Status status = ListHugePageSizes(host, kHugePagePools, sizes);
+  for (const uint64_t size : sizes) charges.files.push_back(HugetlbFile(size));
+  return status;
+}
 
 CgroupHierarchy CgroupHierarchy::Find(const LinuxHost& host) {
   CgroupHierarchy hierarchy;
@@ -227,22 +240,15 @@ Status CgroupHierarchy::ReadHugetlb(const LinuxHost& host, std::string_view path
                                     Figure& hugetlb) const {
   hugetlb.reset();
   if (version_ != Version::k2) return kOk;
-  // Since Linux 6.6 hugetlb can be mounted to count as memory.
-  std::string mounts;
-  if (host.Read("/proc/self/mounts", mounts) == kOk &&
-      mounts.find("memory_hugetlb_accounting") != std::string::npos) {
-    hugetlb = 0;
-    return kOk;
-  }
-  std::vector<uint64_t> sizes;
-  Status status = ListHugePageSizes(host, kHugePagePools, sizes);
-  Figure sum = 0;
-  for (const uint64_t size : sizes) {
+  const HugetlbCharges* charges = nullptr;
+  Status status = host.Kept().hugetlbCharges.Get(host, charges);
+  if (status != kOk) return status;
+  hugetlb = 0;
+  for (const std::string& file : charges->files) {
     Figure part;
-    if (status == kOk) status = ReadAmount(host, path, HugetlbFile(size), std::nullopt, part);
-    sum = SumOf({sum, part});
+    if (status == kOk) status = ReadAmount(host, path, file, std::nullopt, part);
+    hugetlb = SumOf({hugetlb, part});
   }
-  hugetlb = sum;
   return status;
 }
 

@@ -53,6 +53,13 @@ struct MemcgSwap {
   Figure current;
 };
 
+// The files of a cgroup that tell of its huge pages of hugetlb, one for each of their sizes. None
+// if these count as memory like others, as they can be mounted to since Linux 6.6.
+struct HugetlbCharges {
+  std::vector<std::string> files;
+};
+[[nodiscard]] Status ReadHugetlbCharges(const LinuxHost& host, HugetlbCharges& charges);
+
 class CgroupHierarchy {
  public:
   // Finds the hierarchy that has the memory controller: version 2, else version 1, else none.

@@ -141,10 +141,9 @@ Status ReadCgroup(const LinuxHost& host, const GroupTree& tree, const Group& gro
 Status ReadOwnTables(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                      Figure& tables) {
   tables.reset();
-  if (machine.cgroup == Group::kNone) return kOk;
-  MemcgEvents events;
-  const Status status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
-  tables = events.secPageTables;
+  const MemcgEvents* events = nullptr;
+  const Status status = GetOwnEvents(host, tree, machine, events);
+  if (status == kOk) tables = events->secPageTables;
   return status;
 }
 
@@ -152,11 +151,11 @@ Status ReadOwnTables(const LinuxHost& host, const GroupTree& tree, const Virtual
 // devices are among it.
 Status ReadHostTables(const LinuxHost& host, const GroupTree& tree, const FigureFile& meminfo,
                       Figure& tables) {
-  FigureFile vmstat;
+  const FigureFile* vmstat = nullptr;
   tables.reset();
   if (!tree.HasAllMachines()) return kOk;
-  const Status status = FigureFile::ReadVmstat(host, vmstat);
-  if (status == kOk && vmstat.FindOr("nr_iommu_pages", 0) == 0) {
+  const Status status = host.Kept().vmstat.Get(host, vmstat);
+  if (status == kOk && vmstat->FindOr("nr_iommu_pages", 0) == 0) {
     tables = meminfo.Find("SecPageTables");
   }
   return status;

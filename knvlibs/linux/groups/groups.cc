@@ -83,6 +83,7 @@ Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
   if (status != kOk) return status;
   tree.FindOwnCgroups();
   tree.LookAtSwap(host);
+  tree.hugetlb_ = tree.ProcessHugetlbOf(tree.groups_[0]);
   for (Group& group : tree.groups_) {
     if (group.children.empty()) group.flags |= KSI_GROUP_LEAF;
   }
@@ -302,8 +303,10 @@ void GroupTree::FindOwnCgroups() {
 // What a machine's swap is compared with, should somebody ask whether it is being swapped.
 void GroupTree::LookAtSwap(const LinuxHost& host) {
   for (VirtualMachine& machine : virtualMachines_) {
-    MachineSwap swap;
-    if (ReadSwap(host, machine, swap) == kOk) machine.swapAtFirst = swap.current;
+    if (machine.cgroup == Group::kNone) continue;
+    MemcgSwap swap;
+    const Status status = cgroups_.ReadSwap(host, At(machine.cgroup).path, swap);
+    if (status == kOk) machine.swapAtFirst = swap.current;
   }
 }
 
@@ -366,8 +369,7 @@ Status GroupTree::ReadHugetlb(const LinuxHost& host, const Group& group, uint64_
   const Status status = cgroups_.ReadHugetlb(host, group.path, hugetlb);
   if (status != kOk || hugetlb) return status;
   // Without the controller the processes tell, unless some have pages in common.
-  const Figure all = ProcessHugetlbOf(groups_[0]);
-  if (all && *all <= inUse) hugetlb = ProcessHugetlbOf(group);
+  if (hugetlb_ && *hugetlb_ <= inUse) hugetlb = ProcessHugetlbOf(group);
   return kOk;
 }
 

@@ -71,6 +71,7 @@ struct VirtualMachine {
   mutable std::optional<QemuMappings> mappings;  // until they have been measured
   mutable std::optional<GuestMapping> mapping;
   mutable std::optional<GuestMemory> guest;
+  mutable std::optional<MemcgEvents> events;  // of its own cgroup
   mutable std::optional<std::optional<bool>> usesKvm;
 };
 
@@ -149,6 +150,7 @@ class GroupTree {
   std::vector<Process> processes_;
   std::vector<VirtualMachine> virtualMachines_;
   std::unordered_map<int64_t, size_t> byId_;
+  Figure hugetlb_;  // of all processes
   // What has been asked for, of each group and of each process.
   mutable std::vector<std::optional<Figure>> reserved_;
   mutable std::vector<std::optional<ProcessKsm>> ksm_;

@@ -1,5 +1,7 @@
 #include "knvlibs/linux/machines/guest.h"
 
+#include <string>
+
 #include "knvlibs/linux/host/wall_clock.h"
 #include "knvlibs/linux/machines/libvirt.h"
 #include "knvlibs/linux/reading.h"
@@ -76,6 +78,30 @@ Status ReadMapping(const LinuxHost& host, const GroupTree& tree, const VirtualMa
   return MeasureGuest(host, machine.pid, *mappings, MemoryOf(line, told), isSure, guest);
 }
 
+// What is not told of a machine is 0 where nothing of any is compressed: without a compressed cache
+// for swap on the host nothing ever was, and with an empty one nothing is.
+Status SettleCompression(const LinuxHost& host, MemcgEvents& events) {
+  if (events.zswapPool) return kOk;
+  std::string enabled;
+  const FigureFile* meminfo = nullptr;
+  const Status found = host.Read("/sys/module/zswap/parameters/enabled", enabled);
+  const Status status = host.Kept().meminfo.Get(host, meminfo);
+  const bool isOff = found == KSI_STATUS_NOT_FOUND || enabled.starts_with('N');
+  const bool isEmpty = status == kOk && meminfo->Find("Zswapped") == 0u;
+  if (isOff || isEmpty) events.zswapPool = events.zswapped = 0;
+  if (isOff) events.zswpin = events.zswpout = events.zswapMax = 0;
+  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
+}
+
+Status ReadOwnEvents(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                     MemcgEvents& events) {
+  Status status = kOk;
+  if (machine.cgroup != Group::kNone) {
+    status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
+  }
+  return status == kOk ? SettleCompression(host, events) : status;
+}
+
 }  // namespace
 
 const GuestMemory& GetGuest(const LinuxHost& host, const GroupTree& tree,
@@ -104,6 +130,18 @@ Status GetMapping(const LinuxHost& host, const GroupTree& tree, const VirtualMac
     machine.mapping = std::move(read);
   }
   mapping = &*machine.mapping;
+  return kOk;
+}
+
+Status GetOwnEvents(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                    const MemcgEvents*& events) {
+  if (!machine.events) {
+    MemcgEvents read;
+    const Status status = ReadOwnEvents(host, tree, machine, read);
+    if (status != kOk) return status;
+    machine.events = read;
+  }
+  events = &*machine.events;
   return kOk;
 }
 

@@ -25,6 +25,11 @@ std::optional<bool> UsesKvm(const LinuxHost& host, const GroupTree& tree,
 [[nodiscard]] Status GetMapping(const LinuxHost& host, const GroupTree& tree,
                                 const VirtualMachine& machine, const GuestMapping*& mapping);
 
+// What happened to the cgroup that was made for it, and what is compressed of it; little is told if
+// there is no such cgroup. Fails with KSI_STATUS_NOT_FOUND if that is gone.
+[[nodiscard]] Status GetOwnEvents(const LinuxHost& host, const GroupTree& tree,
+                                  const VirtualMachine& machine, const MemcgEvents*& events);
+
 }  // namespace ksi
 
 #endif  // KNVLIBS_LINUX_MACHINES_GUEST_H_

@@ -46,11 +46,24 @@ constexpr uint64_t kIsSwapped = 1 << 4;
 constexpr uint64_t kIsZero = 1 << 5;
 constexpr uint64_t kIsHuge = 1 << 6;
 
-// The kernel holds the address space for one request: some milliseconds for so much.
+// The kernel holds the address space for one request: below a millisecond for so much.
 constexpr uint64_t kMostScanned = uint64_t{32} << 20;
 
-// Who asks again at once may be served before the process that waits: it gets its turn in between.
-constexpr useconds_t kPause = 100;
+// A piece of the walk and what comes after it: who asks again at once may be served before a
+// process that waits, which is to have its turn.
+class Piece {
+ public:
+  explicit Piece(const LinuxHost& host) : walk_(host) {}
+  Piece(const Piece&) = delete;
+  Piece& operator=(const Piece&) = delete;
+  ~Piece() {
+    constexpr useconds_t kPause = 100;
+    usleep(kPause);
+  }
+
+ private:
+  Walk walk_;
+};
 
 struct ByteCounts {
   uint64_t resident = 0;
@@ -131,12 +144,11 @@ Status CountEntries(const LinuxHost& host, int pagemap, std::span<const AddressR
   for (const AddressRange& range : ranges) {
     for (uint64_t at = range.start; at < range.end;) {
       if (!MayWalk(host)) return kOk;
-      const Walk walk(host);
+      const Piece piece(host);
       const size_t most = std::min<uint64_t>(entries.size(), (range.end - at) / pageSize);
       const ssize_t size = pread(pagemap, entries.data(), most * sizeof entries[0],
                                  static_cast<off_t>(at / pageSize * sizeof entries[0]));
       if (size <= 0) return KSI_STATUS_NOT_FOUND;
-      usleep(kPause);
       for (const uint64_t entry :
            std::span(entries).first(static_cast<size_t>(size) / sizeof entries[0])) {
         counter.Take(at, entry);
@@ -155,11 +167,8 @@ std::optional<Status> Scan(const LinuxHost& host, int pagemap, std::span<const A
   for (AddressRange range : ranges) {
     while (range.start < range.end) {
       if (!MayWalk(host)) return kOk;
-      const Walk walk(host);
-      if (ScanPiece(pagemap, range, bytes)) {
-        usleep(kPause);
-        continue;
-      }
+      const Piece piece(host);
+      if (ScanPiece(pagemap, range, bytes)) continue;
       if (errno == ENOTTY || errno == EINVAL) return std::nullopt;
       return KSI_STATUS_NOT_FOUND;
     }

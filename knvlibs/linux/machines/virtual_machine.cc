@@ -27,37 +27,11 @@ Status FindMachine(const LinuxHost& host, const Keys& keys, const GroupTree*& tr
   return machine == nullptr ? KSI_STATUS_NOT_FOUND : kOk;
 }
 
-// What is not told of a machine is 0 where nothing of any is compressed: without a compressed cache
-// for swap on the host nothing ever was, and with an empty one nothing is.
-Status SettleCompression(const LinuxHost& host, MemcgEvents& events) {
-  std::string enabled;
-  const FigureFile* meminfo = nullptr;
-  const Status found = host.Read("/sys/module/zswap/parameters/enabled", enabled);
-  const Status status = host.Kept().meminfo.Get(host, meminfo);
-  if (events.zswapPool) return kOk;
-  const bool isOff = found == KSI_STATUS_NOT_FOUND || enabled.starts_with('N');
-  const bool isEmpty = status == kOk && meminfo->Find("Zswapped") == 0u;
-  if (isOff || isEmpty) events.zswapPool = events.zswapped = 0;
-  if (isOff) events.zswpin = events.zswpout = events.zswapMax = 0;
-  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
-}
-
-// What happened to the cgroup that was made for the machine; little is told if there is none.
-Status ReadOwnEvents(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
-                     MemcgEvents& events) {
-  events = MemcgEvents();
-  Status status = kOk;
-  if (machine.cgroup != Group::kNone) {
-    status = tree.Cgroups().ReadEvents(host, tree.At(machine.cgroup).path, events);
-  }
-  return status == kOk ? SettleCompression(host, events) : status;
-}
-
 // What the kernel tells of a machine's use of memory, by its process and by its own cgroup.
 struct MachineUse {
   const GuestMapping* mapping = nullptr;
   ProcessKsm ksm;
-  MemcgEvents events;
+  const MemcgEvents* events = nullptr;
   const Ksm* sharing = nullptr;  // on the host
   Figure hugetlb;
 };
@@ -68,14 +42,14 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachin
   if (status == kOk) status = tree.ReadKsm(host, tree.At(machine.group), use.ksm);
   if (status == kOk) status = host.Kept().ksm.Get(host, use.sharing);
   use.hugetlb = tree.ProcessOf(tree.At(machine.group)).hugetlb;
-  return status == kOk ? ReadOwnEvents(host, tree, machine, use.events) : status;
+  return status == kOk ? GetOwnEvents(host, tree, machine, use.events) : status;
 }
 
 // What of the guest's memory is in use. Only of a small process the pages tell; else its own cgroup
 // does, of what is in memory.
 Figure TouchedOf(const MachineUse& use) {
   if (use.mapping->referenced) return use.mapping->referenced;
-  return LesserOf(use.events.active, use.mapping->resident);
+  return LesserOf(use.events->active, use.mapping->resident);
 }
 
 // What of the guest is in memory and what of it sharing saves. Readers take the latter off the
@@ -125,8 +99,8 @@ Status ReadVmmTally(const LinuxHost& host, const GroupTree& tree, const VirtualM
   record.memSizeLimit = FieldOf(limit ? limit : memory.Size());
   record.touched = FieldOf(TouchedOf(use));
   FillSharing(use, record);
-  record.zipped = FieldOf(use.events.zswapped);
-  record.zipSaved = FieldOf(DifferenceOf(use.events.zswapped, use.events.zswapPool));
+  record.zipped = FieldOf(use.events->zswapped);
+  record.zipSaved = FieldOf(DifferenceOf(use.events->zswapped, use.events->zswapPool));
   FillBalloon(GetGuest(host, tree, machine), memory.BalloonSize(), record);
   return kOk;
 }
@@ -144,7 +118,7 @@ Status ReadGuestTally(const LinuxHost& host, const GroupTree& tree, const Virtua
 // too, until it is written there.
 Figure SwappedOf(const MachineUse& use) {
   if (use.mapping->swapped == 0u) return 0;
-  return DifferenceOf(use.mapping->swapped, use.events.zswapped);
+  return DifferenceOf(use.mapping->swapped, use.events->zswapped);
 }
 
 // The swap that the machine may have, and what of it is free: the host's, or what its own cgroup is
@@ -172,9 +146,9 @@ Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualM
 
   record.isSwapping = swap.current > machine.swapAtFirst && machine.swapAtFirst ? 1 : 0;
   record.swapped = FieldOf(SwappedOf(use));
-  record.swapRead = FieldOf(use.events.swapcached);
-  record.swapIn = FieldOf(use.events.swpin);
-  record.swapOut = FieldOf(use.events.swpout);
+  record.swapRead = FieldOf(use.events->swapcached);
+  record.swapIn = FieldOf(use.events->swpin);
+  record.swapOut = FieldOf(use.events->swpout);
   // Linux swaps all to the same places.
   record.gblSwapRead = record.swapRead;
   record.gblSwapIn = record.swapIn;
@@ -187,20 +161,20 @@ Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualM
 
 Status ReadMemzipInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                       KSI_MemzipInfo& record) {
-  MemcgEvents events;
-  Status status = ReadOwnEvents(host, tree, machine, events);
+  const MemcgEvents* events = nullptr;
+  const Status status = GetOwnEvents(host, tree, machine, events);
   if (status != kOk) return status;
 
-  record.totalCache = FieldOf(events.zswapMax);
-  record.maxCache = FieldOf(events.zswapMax);
-  record.usedCache = FieldOf(events.zswapPool);
-  record.zipped = FieldOf(events.zswpout);
-  record.unZipped = FieldOf(events.zswpin);
+  record.totalCache = FieldOf(events->zswapMax);
+  record.maxCache = FieldOf(events->zswapMax);
+  record.usedCache = FieldOf(events->zswapPool);
+  record.zipped = FieldOf(events->zswpout);
+  record.unZipped = FieldOf(events->zswpin);
   // The kernel counts what it refused for the host alone, and takes no times.
   const auto untoldUnless = [](bool isZero) { return FieldOf(isZero ? Figure(0) : std::nullopt); };
-  record.zipRejected = untoldUnless(events.zswapMax == 0u && events.zswpout == 0u);
-  record.avgZipTime = untoldUnless(events.zswpout == 0u);
-  record.avgUnzipTime = untoldUnless(events.zswpin == 0u);
+  record.zipRejected = untoldUnless(events->zswapMax == 0u && events->zswpout == 0u);
+  record.avgZipTime = untoldUnless(events->zswpout == 0u);
+  record.avgUnzipTime = untoldUnless(events->zswpin == 0u);
   return kOk;
 }
 
@@ -222,18 +196,18 @@ Figure HugeOf(const GroupTree& tree, const VirtualMachine& machine, const GuestM
 Status ReadVmLargePages(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                         KSI_VmLargePages& record) {
   const GuestMapping* mapping = nullptr;
-  MemcgEvents events;
+  const MemcgEvents* events = nullptr;
   Figure threshold;
   Status status = GetMapping(host, tree, machine, mapping);
-  if (status == kOk) status = ReadOwnEvents(host, tree, machine, events);
+  if (status == kOk) status = GetOwnEvents(host, tree, machine, events);
   if (status == kOk) status = ReadTransparent(host, threshold);
   if (status != kOk) return status;
 
   const Figure untold = threshold ? std::nullopt : Figure(0);
   record.nrBackings =
-      FieldOf<uint32_t>(QuotientOf(HugeOf(tree, machine, *mapping, events), kLargePageKB));
+      FieldOf<uint32_t>(QuotientOf(HugeOf(tree, machine, *mapping, *events), kLargePageKB));
   record.maxSwapThreshold = FieldOf<uint32_t>(threshold.value_or(0));
-  record.nrAllocSuccess = FieldOf(threshold ? events.thpAlloc : Figure(0));
+  record.nrAllocSuccess = FieldOf(threshold ? events->thpAlloc : Figure(0));
   record.nrFailPinned = FieldOf(untold);
   record.nrFailSwapped = FieldOf(untold);
   record.nrFailPinnedLate = FieldOf(untold);

@@ -150,8 +150,9 @@ void TakeReading(const Json& reading, const JsonEntries& entries, CacheWriter& w
 
 void TakeMember(const std::string& name, const Json& value, ksi::CacheFile::Capture* capture) {
   if (name == "ksiCache") {
-    if (ksi::NumberOf(&value) != uint64_t{ksi::cache::kSchemaVersion})
+    if (ksi::NumberOf(&value) != uint64_t{ksi::cache::kSchemaVersion}) {
       throw DataError("ksiCache: is not 1");
+    }
   } else if (name == "host") {
     capture->host = PlainTextFromJson(value, name);
   } else if (name == "taken") {
