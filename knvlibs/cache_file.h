@@ -1,20 +1,18 @@
-// An open cache file, of which nothing is trusted.
+// A capture: an open cache file of one moment, of which nothing is trusted.
 #ifndef KNVLIBS_CACHE_FILE_H_
 #define KNVLIBS_CACHE_FILE_H_
 
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include "knvlibs/cache_database.h"
 #include "knvlibs/catalogue.h"
-#include "knvlibs/sqlite.h"
 #include "knvlibs/status.h"
-#include "knvlibs/work_limit.h"
 
 namespace ksi {
-
-enum class Kind : uint8_t { kValue, kList };
 
 class CacheFile {
  public:
@@ -34,14 +32,12 @@ class CacheFile {
     std::string path;
   };
 
-  // Opens a file. Its cost does not depend on the file's size. The status is
-  //   KSI_STATUS_NOT_FOUND, KSI_STATUS_PERMISSION_DENIED, KSI_STATUS_IS_A_DIRECTORY,
-  //   KSI_STATUS_INVALID_METADATA: not a cache file,
-  //   KSI_STATUS_MAJOR_VERSION_MISMATCH: of a newer schema,
-  //   KSI_STATUS_METADATA_READ_ERROR: damaged, or somebody is in the middle of changing it.
-  // `why`, if not null, receives what is wrong with a damaged file.
+  // Opens a file, or what has been opened. The statuses are those of CacheDatabase::Open. `why`, if
+  // not null, receives what is wrong with a damaged file.
   [[nodiscard]] static Status Open(const char* fileName, std::unique_ptr<CacheFile>* file,
                                    std::string* why = nullptr);
+  [[nodiscard]] static Status Make(std::unique_ptr<CacheDatabase> database,
+                                   std::unique_ptr<CacheFile>* file, std::string* why = nullptr);
 
   const Capture& GetCapture() const { return capture_; }
   const std::vector<NodeRow>& NodeRows() const { return nodes_; }
@@ -50,54 +46,19 @@ class CacheFile {
   const NodeRow* FindRow(const Node& node, Kind kind) const;
   const NodeRow* FindRow(int64_t id) const;
 
-  sqlite3* Handle() const { return database_.get(); }
-
-  // Statements on Handle() end with SQLITE_INTERRUPT when, all together since the file was opened
-  // or since this was called, they did more than a file of this size is worth. Fails with
-  // KSI_STATUS_METADATA_READ_ERROR when that has shown that nothing should be read of it any more.
-  [[nodiscard]] Status BeginRead() {
-    return limit_.BeginAgain() ? kOk : Status{KSI_STATUS_METADATA_READ_ERROR};
-  }
-
-  // Why the latest statement failed, for people.
-  const char* ErrorText() const;
-
-  uint64_t Size() const { return size_; }
+  // The limits of CacheDatabase hold.
+  sqlite3* Handle() const { return database_->Handle(); }
+  [[nodiscard]] Status BeginRead() { return database_->BeginRead(); }
+  const char* ErrorText() const { return database_->ErrorText(); }
+  uint64_t Size() const { return database_->Size(); }
 
  private:
-  class Descriptor {
-   public:
-    Descriptor() = default;
-    ~Descriptor();
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
+  explicit CacheFile(std::unique_ptr<CacheDatabase> database) : database_(std::move(database)) {}
 
-    // The regular file of this name, without waiting for anybody.
-    [[nodiscard]] Status Open(const char* fileName);
-    int Number() const { return number_; }
-
-   private:
-    int number_ = -1;
-  };
-
-  CacheFile() = default;
-
-  [[nodiscard]] Status Connect();
-  [[nodiscard]] Status CheckHead();
-  [[nodiscard]] Status CheckChanges(const char* fileName);
-  [[nodiscard]] Status Configure();
-  [[nodiscard]] Status CheckSchema();
   [[nodiscard]] Status ReadCapture();
   [[nodiscard]] Status ReadNodes();
-  [[nodiscard]] Status Failed(int code);
-  [[nodiscard]] Status Damaged(const char* why);
 
-  // Before the database, which uses them.
-  Descriptor descriptor_;
-  WorkLimit limit_;
-  Database database_;
-  uint64_t size_ = 0;
-  std::string why_;
+  std::unique_ptr<CacheDatabase> database_;
   Capture capture_;
   std::vector<NodeRow> nodes_;  // in the order of their identifiers
 };
@@ -108,9 +69,6 @@ const char* BadMember(const CacheFile::Capture& capture);
 
 // Whether it is a date and time that there is, such as "2026-11-21T10:00:00Z".
 bool IsTime(const std::string& text);
-
-// The status for a failed call of SQLite on a cache file.
-[[nodiscard]] Status StatusOfSqlite(int code);
 
 }  // namespace ksi
 

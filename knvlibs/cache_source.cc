@@ -7,7 +7,6 @@
 #include <knvlibs/ksi.h>
 #include "knvlibs/cache_format.h"
 #include "knvlibs/linux/host/text.h"
-#include "knvlibs/node_table.h"
 
 namespace ksi {
 namespace {
@@ -81,20 +80,13 @@ void CacheSource::OwnKey::Take(const Key& key) {
   text = key.text;
 }
 
-Status CacheSource::Open(const char* fileName, std::unique_ptr<CacheSource>* source) {
-  std::unique_ptr<CacheFile> file;
-  const Status status = CacheFile::Open(fileName, &file);
-  if (status != kOk) return status;
-  std::unique_ptr<CacheSource> made(new CacheSource(fileName, std::move(file)));
-
-  for (auto& ids : made->ids_) ids.assign(Catalogue().size(), -1);
-  for (const CacheFile::NodeRow& row : made->file_->NodeRows()) {
+CacheSource::CacheSource(std::string fileName, std::unique_ptr<CacheFile> file)
+    : fileName_(std::move(fileName)), file_(std::move(file)), walk_(file_->Size()) {
+  for (auto& ids : ids_) ids.assign(Catalogue().size(), -1);
+  for (const CacheFile::NodeRow& row : file_->NodeRows()) {
     if (row.node == nullptr) continue;
-    made->ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
+    ids_[static_cast<size_t>(row.kind)][IdOf(*row.node) - 1u] = row.id;
   }
-
-  *source = std::move(made);
-  return kOk;
 }
 
 Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
@@ -120,42 +112,16 @@ Status CacheSource::Instances(const Node& node, const Keys& keys, ParamList& ins
   const size_t before = instances.Count();
   Status status = BeginList(node, keys);
   if (status == kOk) status = List(node, keys, instances);
-  if (status == kOk) EndList(node, instances, before);
+  if (status == kOk) walk_.End(node, instances, before);
   TellWhy(node);
   return status;
 }
 
 // What the walks have to say of a list that is asked for; of the groups WalkStatus tells it.
 Status CacheSource::BeginList(const Node& node, const Keys& keys) {
-  switch (IdOf(node)) {
-    case ksi::node::sched_groups_members_groups:
-      return walk_.Ask(keys[0].number);
-    case ksi::node::sched_groups_members_memClients:
-    case ksi::node::sched_memClients_remapTypes:
-      return walk_.WalkStatus();
-    case ksi::node::memory_pmem_volumes:
-      return volumes_.Ask(0);  // always the first of its walk
-    case ksi::node::memory_pmem_volumes_regionStore_regions:
-      return volumes_.WalkStatus() == kOk ? kOk : Damaged("volumes are listed over and over");
-    default:
-      return kOk;
-  }
-}
-
-// The same of the entries that it has turned out to have.
-void CacheSource::EndList(const Node& node, const ParamList& instances, size_t from) {
-  switch (IdOf(node)) {
-    case ksi::node::sched_groups_members_groups:
-      return walk_.Answer(instances, from);
-    case ksi::node::sched_groups_members_memClients:
-    case ksi::node::sched_memClients_remapTypes:
-      return walk_.PassList(instances.Count() - from);
-    case ksi::node::memory_pmem_volumes:
-    case ksi::node::memory_pmem_volumes_regionStore_regions:
-      return volumes_.PassList(instances.Count() - from);
-    default:
-      return;
-  }
+  const Status status = walk_.Begin(node, keys);
+  if (status == kOk || walk_.WalkStatus() != kOk) return status;
+  return Damaged("volumes are listed over and over");
 }
 
 Status CacheSource::Damaged(const char* why) {

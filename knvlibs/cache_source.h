@@ -15,15 +15,15 @@
 #include <vector>
 
 #include "knvlibs/cache_file.h"
+#include "knvlibs/list_walk.h"
 #include "knvlibs/source.h"
-#include "knvlibs/walk_limit.h"
 
 namespace ksi {
 
 class CacheSource : public Source {
  public:
-  // The statuses of CacheFile::Open.
-  [[nodiscard]] static Status Open(const char* fileName, std::unique_ptr<CacheSource>* source);
+  // From a file that is open; its name is for messages.
+  CacheSource(std::string fileName, std::unique_ptr<CacheFile> file);
 
   // A key that the file does not have is KSI_STATUS_NOT_FOUND; a read that failed when it was
   // captured fails with its status again. The first that fails because the file is damaged or
@@ -32,10 +32,7 @@ class CacheSource : public Source {
   [[nodiscard]] Status Instances(const Node& node, const Keys& keys, ParamList& instances) override;
   // A walk over groups that contain each other, or with clients or volumes that are listed over and
   // over, fails in time, with KSI_STATUS_METADATA_READ_ERROR.
-  void Refresh() override {
-    walk_.Restart();
-    volumes_.Restart();
-  }
+  void Refresh() override { walk_.Restart(); }
   [[nodiscard]] Status WalkStatus() const override { return walk_.WalkStatus(); }
   Definitions KernelDefinitions() const override;
 
@@ -77,15 +74,8 @@ class CacheSource : public Source {
     int Seek(sqlite3* database, const Keys& keys, const int64_t* node);
   };
 
-  CacheSource(const char* fileName, std::unique_ptr<CacheFile> file)
-      : fileName_(fileName),
-        file_(std::move(file)),
-        walk_(file_->Size()),
-        volumes_(file_->Size()) {}
-
   [[nodiscard]] Status Read(const Node& node, const Keys& keys, Buffer record);
   [[nodiscard]] Status BeginList(const Node& node, const Keys& keys);
-  void EndList(const Node& node, const ParamList& instances, size_t from);
   [[nodiscard]] Status Damaged(const char* why);
   [[nodiscard]] Status StatusOfCall(int code);
   void TellWhy(const Node& node);
@@ -101,9 +91,8 @@ class CacheSource : public Source {
 
   std::string fileName_;
   std::unique_ptr<CacheFile> file_;
-  WalkLimit walk_;     // over the groups, with their clients
-  WalkLimit volumes_;  // over the volumes, with their regions
-  std::string why_;    // what is wrong with what is being read, empty: nothing
+  ListWalk walk_;
+  std::string why_;  // what is wrong with what is being read, empty: nothing
   bool told_ = false;
   // The identifiers that the nodes of the catalogue have in the file, -1: not in it.
   std::array<std::vector<int64_t>, 2> ids_;

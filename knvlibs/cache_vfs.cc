@@ -21,6 +21,7 @@ constexpr const char* kVfsName = "ksi-cache";
 struct CacheHandle {
   sqlite3_file base;
   int descriptor;
+  bool grows;
   struct stat opened;
 };
 
@@ -31,6 +32,15 @@ bool IsUnchanged(const CacheHandle& handle) {
   return fstat(handle.descriptor, &now) == 0 && now.st_size == handle.opened.st_size &&
          now.st_mtim.tv_sec == handle.opened.st_mtim.tv_sec &&
          now.st_mtim.tv_nsec == handle.opened.st_mtim.tv_nsec;
+}
+
+// The number of pages in the header may be older than the pages. SQLite asks for the file's size
+// instead where the header seems to be by a version that did not know of that number.
+void DoubtPageCount(char* bytes, size_t size, sqlite3_int64 offset) {
+  constexpr size_t kChangesAt = 24;
+  constexpr size_t kCountValidForAt = 92;
+  if (offset != 0 || size < kCountValidForAt + 4) return;
+  bytes[kCountValidForAt] = static_cast<char>(~bytes[kChangesAt]);
 }
 
 int Read(sqlite3_file* file, void* buffer, int amount, sqlite3_int64 offset) {
@@ -46,7 +56,8 @@ int Read(sqlite3_file* file, void* buffer, int amount, sqlite3_int64 offset) {
     if (got == 0) return SQLITE_CORRUPT;
     done += static_cast<size_t>(got);
   }
-  return IsUnchanged(handle) ? SQLITE_OK : SQLITE_CORRUPT;
+  if (handle.grows) DoubtPageCount(bytes, wanted, offset);
+  return handle.grows || IsUnchanged(handle) ? SQLITE_OK : SQLITE_CORRUPT;
 }
 
 int FileSize(sqlite3_file* file, sqlite3_int64* size) {
@@ -94,7 +105,8 @@ constexpr sqlite3_io_methods kMethods = {.iVersion = 1,
                                          .xFetch = nullptr,
                                          .xUnfetch = nullptr};
 
-// A cache file is called by the number of its descriptor; any other file is a temporary one.
+// A cache file is called by the number of its descriptor, and a "+" if it grows; any other file is
+// a temporary one.
 int Open(sqlite3_vfs* /*vfs*/, const char* name, sqlite3_file* file, int flags, int* outFlags) {
   if ((flags & SQLITE_OPEN_MAIN_DB) == 0) {
     sqlite3_vfs* const system = sqlite3_vfs_find(nullptr);
@@ -108,6 +120,7 @@ int Open(sqlite3_vfs* /*vfs*/, const char* name, sqlite3_file* file, int flags, 
       fstat(handle.descriptor, &handle.opened) != 0) {
     return SQLITE_CANTOPEN;
   }
+  handle.grows = text.ends_with('+');
   handle.base.pMethods = &kMethods;
   if (outFlags != nullptr) *outFlags = flags;
   return SQLITE_OK;
@@ -132,7 +145,7 @@ sqlite3_vfs MakeVfs() {
 
 }  // namespace
 
-int OpenDescriptor(int descriptor, Database* database) {
+int OpenDescriptor(int descriptor, bool grows, Database* database) {
   int code = sqlite3_initialize();
   if (code != SQLITE_OK) return code;
   static sqlite3_vfs vfs = MakeVfs();
@@ -142,11 +155,24 @@ int OpenDescriptor(int descriptor, Database* database) {
   code = sqlite3_vfs_register(&vfs, 0);
   if (code != SQLITE_OK) return code;
   sqlite3* handle = nullptr;
-  code = sqlite3_open_v2(std::to_string(descriptor).c_str(), &handle,
-                         SQLITE_OPEN_READONLY | SQLITE_OPEN_NOMUTEX, kVfsName);
+  const std::string name = std::to_string(descriptor) + (grows ? "+" : "");
+  code =
+      sqlite3_open_v2(name.c_str(), &handle, SQLITE_OPEN_READONLY | SQLITE_OPEN_NOMUTEX, kVfsName);
   sqlite3_vfs_unregister(&vfs);
   database->reset(handle);
   return code;
+}
+
+int OpenContent(std::span<const std::byte> content, Database* database) {
+  sqlite3* handle = nullptr;
+  int code =
+      sqlite3_open_v2(":memory:", &handle, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr);
+  database->reset(handle);
+  if (code != SQLITE_OK) return code;
+  // It is read only, whatever the type of the pointer.
+  auto* bytes = const_cast<unsigned char*>(reinterpret_cast<const unsigned char*>(content.data()));
+  const auto size = static_cast<sqlite3_int64>(content.size());
+  return sqlite3_deserialize(handle, "main", bytes, size, size, SQLITE_DESERIALIZE_READONLY);
 }
 
 }  // namespace ksi

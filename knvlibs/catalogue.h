@@ -39,6 +39,9 @@ const char* NameOf(Instance instance);
 constexpr std::string_view kMemoryStates[] = {KSI_MEMORY_STATES(KSI_STATE)};
 #undef KSI_STATE
 
+// What a node can be asked for.
+enum class Kind : uint8_t { kValue, kList };
+
 // The longest path of keys that selects an instance.
 constexpr size_t kMaxKeys = 2;
 

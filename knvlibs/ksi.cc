@@ -13,9 +13,9 @@
 #include <new>
 #include <utility>
 
-#include "knvlibs/cache_source.h"
 #include "knvlibs/handle.h"
 #include "knvlibs/linux/linux_source.h"
+#include "knvlibs/open_cache.h"
 #include "knvlibs/param_list.h"
 #include "knvlibs/source.h"
 
@@ -123,12 +123,9 @@ Status OpenHost(const char* root, std::unique_ptr<Source>* source) {
   return kOk;
 }
 
-Status OpenCache(const char* fileName, std::unique_ptr<Source>* source) {
+Status OpenSource(const char* fileName, std::unique_ptr<Source>* source) {
   if (fileName == nullptr) return KSI_STATUS_BAD_PARAM;
-  std::unique_ptr<CacheSource> cache;
-  const Status status = CacheSource::Open(fileName, &cache);
-  if (status == kOk) *source = std::move(cache);
-  return status;
+  return OpenCacheSource(fileName, source);
 }
 
 // Gives what `open` opens to the caller.
@@ -175,7 +172,7 @@ uint32_t KSI_UseCache(const char* fileName, int flags) {
   return ksi::Guarded([&]() -> ksi::Status {
     if (flags != 0) return KSI_STATUS_BAD_PARAM;
     std::unique_ptr<ksi::Source> source;
-    const ksi::Status status = ksi::OpenCache(fileName, &source);
+    const ksi::Status status = ksi::OpenSource(fileName, &source);
     if (status == ksi::kOk) ksi::CurrentSource().Become(std::move(source));
     return status;
   });
@@ -216,7 +213,7 @@ uint32_t KSI_OpenHost(const char* root, struct KSI_Source** source) {
 
 uint32_t KSI_OpenCache(const char* fileName, struct KSI_Source** source) {
   return ksi::OpenHandle(source, [&](std::unique_ptr<ksi::Source>* opened) {
-    return ksi::OpenCache(fileName, opened);
+    return ksi::OpenSource(fileName, opened);
   });
 }
 

@@ -14,7 +14,7 @@
 #include <vector>
 
 #include "knvlibs/cache_file.h"
-#include "knvlibs/cache_source.h"
+#include "knvlibs/open_cache.h"
 #include "knvlibs/source.h"
 #include "knvlibs/sqlite.h"
 #include "tools/ksicache/cache_writer.h"
@@ -69,7 +69,7 @@ class SmallHostTest : public testing::Test {
 
   Status Open(const std::string& fileName) {
     source_.reset();
-    return CacheSource::Open(fileName.c_str(), &source_);
+    return OpenCacheSource(fileName.c_str(), &source_);
   }
   Status Open() { return Open(file_); }
 
@@ -89,7 +89,7 @@ class SmallHostTest : public testing::Test {
 
   TestDirectory directory_;
   std::string file_ = directory_.Path("host.ksi");
-  std::unique_ptr<CacheSource> source_;
+  std::unique_ptr<Source> source_;
 };
 
 // A connection to a file as its owner could have one, and SQL run on it.

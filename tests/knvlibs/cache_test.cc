@@ -14,7 +14,7 @@
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/cache_file.h"
 #include "knvlibs/cache_format.h"
-#include "knvlibs/cache_source.h"
+#include "knvlibs/open_cache.h"
 #include "tests/knvlibs/cache_fixture.h"
 
 #if defined(__SANITIZE_ADDRESS__)
@@ -174,7 +174,9 @@ TEST_F(Cache, PipesAndDevicesAreRefusedAtOnce) {
 }
 
 TEST_F(Cache, NewerSchema) {
-  EXPECT_EQ(OpenAfter("PRAGMA user_version = 2"), KSI_STATUS_MAJOR_VERSION_MISMATCH);
+  EXPECT_EQ(OpenAfter("PRAGMA user_version = 3"), KSI_STATUS_MAJOR_VERSION_MISMATCH);
+  // A capture is no recording, whatever it says.
+  EXPECT_EQ(OpenAfter("PRAGMA user_version = 2"), KSI_STATUS_METADATA_READ_ERROR);
   EXPECT_EQ(OpenAfter("PRAGMA user_version = 0"), KSI_STATUS_METADATA_READ_ERROR);
 }
 
@@ -337,7 +339,7 @@ TEST_F(Cache, EntryThatIsNoTextIsDamage) {
 }
 
 // Reads all that the fixture holds, and more. Gives the statuses.
-std::set<Status> ReadAll(CacheSource& source) {
+std::set<Status> ReadAll(Source& source) {
   std::set<Status> statuses;
   std::array<std::byte, kMaxRecordSize> buffer = {};
   for (const Node& node : Catalogue()) {

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "knvlibs/cache_source.h"
+#include "knvlibs/open_cache.h"
 #include "knvlibs/work_limit.h"
 #include "tests/harness/program.h"
 #include "tests/knvlibs/cache_fixture.h"

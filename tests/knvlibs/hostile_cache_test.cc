@@ -13,7 +13,7 @@
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/cache_file.h"
-#include "knvlibs/cache_source.h"
+#include "knvlibs/open_cache.h"
 #include "tests/harness/program.h"
 #include "tests/harness/tally.h"
 #include "tests/knvlibs/cache_fixture.h"
@@ -127,7 +127,7 @@ TEST_F(HostileCache, ReplacedWhileItIsReadStaysTheOneThatWasOpened) {
 
 // Reads all groups of the large host; each gives its own figure or fails with the status for
 // damage. Gives the number that did not fail.
-size_t CountAnswers(CacheSource& source) {
+size_t CountAnswers(Source& source) {
   size_t answers = 0;
   for (int64_t group = 0; group < 20000; ++group) {
     KSI_GroupMemoryStats stats = {};
@@ -200,7 +200,7 @@ TEST_F(HostileCache, PlacesThatAreNoFiles) {
 TEST_F(HostileCache, WithoutADescriptorLeft) {
   // A sanitizer takes descriptors, too, when it looks at the test itself.
   const std::string file = file_;
-  std::unique_ptr<CacheSource> source;
+  std::unique_ptr<Source> source;
   const int lowest = dup(0);
   ASSERT_GE(lowest, 0);
   close(lowest);
@@ -209,7 +209,7 @@ TEST_F(HostileCache, WithoutADescriptorLeft) {
   rlimit none = before;
   none.rlim_cur = static_cast<rlim_t>(lowest);
   ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &none), 0);
-  const Status status = CacheSource::Open(file.c_str(), &source);
+  const Status status = OpenCacheSource(file.c_str(), &source);
   ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &before), 0);
   EXPECT_EQ(status, KSI_STATUS_IO_ERROR);
 }

@@ -10,7 +10,7 @@
 #include <vector>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/cache_source.h"
+#include "knvlibs/open_cache.h"
 #include "knvlibs/walk_limit.h"
 #include "tests/harness/program.h"
 #include "tests/harness/tally.h"
@@ -272,8 +272,8 @@ TEST_F(WalkedCache, VolumesAreWalkedOverAgainAndAgain) {
                    TextList({"1", "2"}));
     writer.Commit(TestCapture());
   }
-  std::unique_ptr<CacheSource> source;
-  ASSERT_EQ(CacheSource::Open(file_.c_str(), &source), kOk);
+  std::unique_ptr<Source> source;
+  ASSERT_EQ(OpenCacheSource(file_.c_str(), &source), kOk);
   for (int walk = 0; walk < 10000; ++walk) {
     ParamList list(ParamList::kNoLimit);
     ASSERT_EQ(source->Instances(NodeAt("memory/pmem/volumes"), {}, list), kOk);
@@ -313,8 +313,8 @@ TEST_F(WalkedCache, LargeHostsAreWalkedOverAgainAndAgain) {
     for (int64_t id = 1; id <= kGroups; ++id) AddGroup(writer, id, {});
     writer.Commit(TestCapture());
   }
-  std::unique_ptr<CacheSource> source;
-  ASSERT_EQ(CacheSource::Open(file_.c_str(), &source), kOk);
+  std::unique_ptr<Source> source;
+  ASSERT_EQ(OpenCacheSource(file_.c_str(), &source), kOk);
   for (int walk = 0; walk < 200; ++walk) {
     for (int64_t id = 0; id <= kGroups; id += walk == 0 ? 1 : 10) {
       ParamList list(ParamList::kNoLimit);

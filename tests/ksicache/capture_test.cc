@@ -9,7 +9,7 @@
 #include <string>
 #include <utility>
 
-#include "knvlibs/cache_source.h"
+#include "knvlibs/open_cache.h"
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/ksicache_fixture.h"
 
@@ -60,8 +60,8 @@ TEST_F(Ksicache, CaptureHasAllThatTheHostTells) {
   const harness::Result result = Run({"capture", Path("a.ksi"), "--root", root});
   ASSERT_EQ(result.status, 0) << result.err;
   EXPECT_EQ(Output({"check", Path("a.ksi")}), "");
-  std::unique_ptr<CacheSource> cache;
-  ASSERT_EQ(CacheSource::Open(Path("a.ksi").c_str(), &cache), kOk);
+  std::unique_ptr<Source> cache;
+  ASSERT_EQ(OpenCacheSource(Path("a.ksi").c_str(), &cache), kOk);
   LinuxSource host(root);
   EXPECT_EQ(HostText(*cache), HostText(host));
 }

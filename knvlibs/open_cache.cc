@@ -1,0 +1,143 @@
+#include "knvlibs/open_cache.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <optional>
+#include <string_view>
+#include <utility>
+
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/cache_source.h"
+#include "knvlibs/linux/host/text.h"
+#include "knvlibs/recording/moment_source.h"
+#include "knvlibs/recording/when.h"
+
+namespace ksi {
+namespace {
+
+// What a name asks for.
+struct Wanted {
+  std::string fileName;
+  std::optional<std::string> when;
+};
+
+Wanted WantedOf(const std::string& name) {
+  const size_t at = name.rfind('@');
+  // A file of that name wins, even if it cannot be opened.
+  if (at == std::string::npos || access(name.c_str(), F_OK) == 0) return {name, {}};
+  return {name.substr(0, at), name.substr(at + 1)};
+}
+
+Status NotATime(const std::string& when, std::string* why) {
+  *why = when + " is no time: it is as 2026-11-21T10:05:30Z, 10:05, -10m, first or last";
+  return KSI_STATUS_BAD_PARAM;
+}
+
+Status NotInSpan(const std::string& when, const Span& span, std::string* why) {
+  *why = "there is no moment at " + when + " or before: the first is of " + TextOfTime(span.first) +
+         ", the last of " + TextOfTime(span.last);
+  return KSI_STATUS_NOT_FOUND;
+}
+
+// The time that a capture was taken at.
+int64_t TimeOfCapture(const CacheFile& capture) {
+  struct tm parts = {};
+  static_cast<void>(strptime(capture.GetCapture().taken.c_str(), cache::kTimeForm, &parts));
+  return int64_t{timegm(&parts)} * 1'000'000;
+}
+
+Status CheckTime(const CacheFile& capture, const std::string& when, std::string* why) {
+  const int64_t taken = TimeOfCapture(capture);
+  const Span span = {taken, taken};
+  const std::optional<int64_t> time = TimeOf(when, span);
+  if (!time) return NotATime(when, why);
+  return *time >= taken ? kOk : NotInSpan(when, span, why);
+}
+
+Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened, std::string* why) {
+  RecordingFile& recording = *opened.recording;
+  const std::vector<RecordingFile::Part>& parts = recording.Parts();
+  if (parts.empty()) {
+    *why = "it has no moments yet";
+    return KSI_STATUS_NOT_FOUND;
+  }
+  // Clocks may be set back.
+  const Span span = {std::ranges::min(parts, {}, &RecordingFile::Part::first).first,
+                     parts.back().last};
+  if (!when || *when == "last") {
+    opened.number = parts.back().End() - 1;
+    return kOk;
+  }
+  if (*when == "first") {
+    opened.number = parts.front().number;
+    return kOk;
+  }
+  const std::optional<int64_t> time = TimeOf(*when, span);
+  if (!time) return NotATime(*when, why);
+  const Status status = recording.FindMoment(*time, opened.number);
+  if (status != kOk) {
+    *why = recording.Why();
+    return status;
+  }
+  return opened.number >= 0 ? kOk : NotInSpan(*when, span, why);
+}
+
+}  // namespace
+
+Status OpenCache(const std::string& name, OpenedCache* opened, std::string* why) {
+  const Wanted wanted = WantedOf(name);
+  auto database = std::make_unique<CacheDatabase>();
+  Status status = database->Open(wanted.fileName.c_str());
+  if (status != kOk) {
+    *why = database->Why();
+    return status;
+  }
+  OpenedCache made;
+  opened->isMoment = database->Version() != cache::kSchemaVersion || wanted.when;
+  made.isMoment = opened->isMoment;
+  if (database->Version() == cache::kSchemaVersion) {
+    status = CacheFile::Make(std::move(database), &made.capture, why);
+    if (status == kOk && wanted.when) status = CheckTime(*made.capture, *wanted.when, why);
+  } else {
+    status = RecordingFile::Make(std::move(database), &made.recording, why);
+    if (status == kOk) status = ChooseMoment(wanted.when, made, why);
+  }
+  if (status == kOk) *opened = std::move(made);
+  return status;
+}
+
+Status ReadCache(const std::string& name, OpenedCache* opened, Moment* moment, std::string* why) {
+  Status status = kOk;
+  // Whoever reads while a recorder writes may see the one half of what it does.
+  for (int tries = 3; tries != 0; --tries) {
+    status = OpenCache(name, opened, why);
+    if (status == kOk && opened->recording == nullptr) return kOk;
+    if (status == kOk) {
+      status = opened->recording->ReadMoment(opened->number, *moment);
+      *why = opened->recording->Why();
+    }
+    if (status != KSI_STATUS_METADATA_READ_ERROR) return status;
+  }
+  return status;
+}
+
+Status OpenCacheSource(const char* name, std::unique_ptr<Source>* source) {
+  OpenedCache opened;
+  Moment moment;
+  std::string why;
+  const Status status = ReadCache(name, &opened, &moment, &why);
+  if (status != kOk) {
+    // Of a damaged capture the program says what the status does.
+    if (!why.empty() && opened.isMoment)
+      Warning("%s: %s\n", Printable(name).c_str(), Printable(why).c_str());
+  } else if (opened.recording == nullptr) {
+    *source = std::make_unique<CacheSource>(name, std::move(opened.capture));
+  } else {
+    *source = std::make_unique<MomentSource>(std::move(moment));
+  }
+  return status;
+}
+
+}  // namespace ksi

@@ -1,0 +1,86 @@
+// Some moments in a row, packed by what they have in common.
+//
+// Most of what is read of a host is as it was a moment ago, and most of the rest differs by little.
+// So what is kept of a moment is what differs from the one before it. Moments that follow each
+// other are kept together in a part, in which all that happened to one figure lies side by side,
+// and the figures of one column too: so they compress best.
+//
+// A part that starts a chunk stands for itself. A part that continues one holds what differs from
+// the moment before its first; a recorder writes such a part for each new moment, until a chunk's
+// moments can be packed together. A part is
+//
+//   size of the first frame, 4 bytes, little-endian
+//   frame: the facts
+//   frame: the changes
+//
+// and the frames (frame.h) hold, in the terms of bytes.h:
+//
+//   facts    1 if it starts a chunk, else 0
+//            if it starts one, the host: the texts signature, built, name, boot; the number of
+//              nodes, and of each the text path, 0 for a value and 1 for a list, the size of its
+//              record, the number of its cells and of each the width times 2, plus 1 for a figure
+//            the number of moments and of each, signed and as difference from the one before,
+//              taken and uptime, then duration, cpu, skipped, loss, refused, failed
+//   changes  the sizes of the seven streams, and the streams:
+//     events   of each moment: how many readings went, and of each how many readings before it
+//                stayed; how many came, and of each the node, the keys and the status; how many
+//                lists changed, and of each the reading and the edit (list_edit.h)
+//     first    the figures that came, column by column, signed
+//     raw      the other cells that came, likewise, as they are
+//     gaps     of each cell that changed: how many lie between it and the one before it
+//     counts   of each cell that changed: how often, less 1
+//     steps    of each change: how many moments lie between it and the cell's one before it
+//     deltas   of each change: by how much, signed, modulo the cell's width
+//
+// Readings are numbered as they come, from 0 in each chunk. A list comes empty. The order of cells
+// is by node, then by their place in the record, then by the number of the reading; readings that
+// had gone before the part have none, and those that failed.
+#ifndef KNVLIBS_RECORDING_CHUNK_H_
+#define KNVLIBS_RECORDING_CHUNK_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+
+#include "knvlibs/recording/bytes.h"
+#include "knvlibs/recording/moment.h"
+
+namespace ksi::chunk {
+
+// The most moments of a part, and of a chunk.
+constexpr size_t kMostMoments = 4096;
+
+// The bytes of the size of the first frame.
+constexpr size_t kPrefixSize = 4;
+
+constexpr size_t kWidestCell = 8;
+
+enum Stream { kEvents, kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kStreams };
+
+inline uint64_t BitsOf(const RecordCell& cell, const Bytes& record) {
+  uint64_t bits = 0;
+  std::memcpy(&bits, record.data() + cell.offset, cell.width);
+  return bits;
+}
+
+inline void PutBits(const RecordCell& cell, uint64_t bits, Bytes& record) {
+  std::memcpy(record.data() + cell.offset, &bits, cell.width);
+}
+
+// The bits as a number that is small where its amount is.
+inline int64_t SignedOf(uint64_t bits, const RecordCell& cell) {
+  const unsigned unused = 64 - 8 * unsigned{cell.width};
+  return static_cast<int64_t>(bits << unused) >> unused;
+}
+
+// Sums and differences that wrap around.
+inline int64_t Plus(int64_t a, int64_t b) {
+  return static_cast<int64_t>(static_cast<uint64_t>(a) + static_cast<uint64_t>(b));
+}
+inline int64_t Minus(int64_t a, int64_t b) {
+  return static_cast<int64_t>(static_cast<uint64_t>(a) - static_cast<uint64_t>(b));
+}
+
+}  // namespace ksi::chunk
+
+#endif  // KNVLIBS_RECORDING_CHUNK_H_

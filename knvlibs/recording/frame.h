@@ -1,0 +1,22 @@
+// Bytes that are compressed by zstd, with a check of what they were.
+#ifndef KNVLIBS_RECORDING_FRAME_H_
+#define KNVLIBS_RECORDING_FRAME_H_
+
+#include "knvlibs/recording/bytes.h"
+#include "knvlibs/status.h"
+
+namespace ksi {
+
+// The most that a frame may hold. The largest hosts take a part of it; what says that it holds more
+// is damaged.
+constexpr size_t kLargestFrame = size_t{64} << 20;
+
+// Packs what is no larger than kLargestFrame; fails with std::bad_alloc.
+Bytes Pack(ByteView content);
+
+// The status is KSI_STATUS_METADATA_READ_ERROR if `packed` is no frame, or not whole.
+[[nodiscard]] Status Unpack(ByteView packed, Bytes& content);
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_RECORDING_FRAME_H_

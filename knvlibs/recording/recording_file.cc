@@ -1,0 +1,212 @@
+#include "knvlibs/recording/recording_file.h"
+
+#include <algorithm>
+#include <array>
+#include <cstring>
+#include <ctime>
+#include <tuple>
+#include <utility>
+
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/cache_format.h"
+#include "knvlibs/recording/chunk.h"
+#include "knvlibs/recording/chunk_reader.h"
+
+namespace ksi {
+namespace {
+
+enum Column { kId, kMoments, kNumber, kChunk, kFirst, kLast, kSize, kBlock };
+
+constexpr const char* kRows =
+    "SELECT id, moments, number, chunk, first, last, size, block FROM part ORDER BY id";
+constexpr const char* kBlockOf = "SELECT data FROM block WHERE id = ?1";
+
+// More than the years of a recording in seconds.
+constexpr int64_t kMostNumber = int64_t{1} << 47;
+constexpr size_t kMostRows = size_t{1} << 20;
+
+bool IsGood(const RecordingFile::Part& part) {
+  return part.moments <= static_cast<int64_t>(chunk::kMostMoments) && part.chunk >= 0 &&
+         part.chunk <= part.number && part.number < kMostNumber && part.first <= part.last &&
+         part.size > 0 && part.size <= RecordingFile::kLargestPart && part.block > 0;
+}
+
+}  // namespace
+
+Status RecordingFile::Make(std::unique_ptr<CacheDatabase> database,
+                           std::unique_ptr<RecordingFile>* file, std::string* why) {
+  if (database->Version() != cache::kRecordingVersion) return KSI_STATUS_INVALID_METADATA;
+  std::unique_ptr<RecordingFile> made(new RecordingFile(std::move(database)));
+  Status status = made->database_->CheckSchema(cache::kRecordingTables);
+  made->database_->AllowReads();
+  if (status == kOk) status = made->ReadRows();
+  if (status != kOk) {
+    if (why != nullptr) *why = made->Why();
+    return status;
+  }
+  made->ChooseParts();
+  *file = std::move(made);
+  return kOk;
+}
+
+Status RecordingFile::ReadRows() {
+  Statement rows;
+  int code = rows.Prepare(database_->Handle(), kRows);
+  if (code != SQLITE_OK) return database_->Failed(code);
+  int64_t last = 0;
+  while ((code = rows.Step()) == SQLITE_ROW) {
+    const Part part = {rows.Number(kId),    rows.Number(kMoments), rows.Number(kNumber),
+                       rows.Number(kChunk), rows.Number(kFirst),   rows.Number(kLast),
+                       rows.Number(kSize),  rows.Number(kBlock)};
+    if (part.id <= std::exchange(last, part.id) || rows_.size() == kMostRows) {
+      return database_->Damaged("the rows of its parts are out of order");
+    }
+    if (part.moments <= 0) continue;
+    if (!IsGood(part)) return Damaged(part, "is not understood");
+    rows_.push_back(part);
+  }
+  return code == SQLITE_DONE ? kOk : database_->Failed(code);
+}
+
+void RecordingFile::ChooseParts() {
+  std::vector<Part> sorted = rows_;
+  std::ranges::sort(sorted, [](const Part& a, const Part& b) {
+    return std::tuple(a.number, -a.moments, a.id) < std::tuple(b.number, -b.moments, b.id);
+  });
+  int64_t end = 0;
+  for (const Part& part : sorted) {
+    if (part.number < end) continue;
+    end = part.End();
+    parts_.push_back(part);
+  }
+}
+
+Status RecordingFile::Damaged(const Part& part, const char* why) {
+  return database_->Damaged("the part of " + TextOfTime(part.first) + " " + why);
+}
+
+Status RecordingFile::ReadPart(const Part& part, Bytes& content) {
+  content.clear();
+  return Walk(part, &content, nullptr);
+}
+
+Status RecordingFile::ReadBlocks(const Part& part, std::vector<int64_t>& blocks) {
+  blocks.clear();
+  return Walk(part, nullptr, &blocks);
+}
+
+// Goes through the blocks of a part; it has as many as its size takes.
+Status RecordingFile::Walk(const Part& part, Bytes* content, std::vector<int64_t>* blocks) {
+  const Status status = database_->BeginRead();
+  if (status != kOk) return status;
+  int code = block_ ? SQLITE_OK : block_.Prepare(database_->Handle(), kBlockOf);
+  int64_t block = part.block;
+  auto left = static_cast<size_t>(part.size);
+  while (code == SQLITE_OK && left != 0) {
+    block_.Reset();
+    code = block_.Bind(1, block);
+    if (code == SQLITE_OK) code = block_.Step();
+    const ByteView data = code == SQLITE_ROW ? block_.Blob(0) : ByteView();
+    if (code == SQLITE_DONE || (code == SQLITE_ROW && data.size() != cache::kBlockSize)) {
+      return Damaged(part, "has not all its blocks");
+    }
+    if (code != SQLITE_ROW) return database_->Failed(code);
+    code = SQLITE_OK;
+    const size_t size = std::min(left, cache::kBlockSize - cache::kBlockHead);
+    const ByteView piece = data.subspan(cache::kBlockHead, size);
+    if (content != nullptr) content->insert(content->end(), piece.begin(), piece.end());
+    if (blocks != nullptr) blocks->push_back(block);
+    uint32_t next = 0;
+    std::memcpy(&next, data.data(), sizeof next);
+    block = next;
+    left -= size;
+  }
+  return code == SQLITE_OK ? kOk : database_->Failed(code);
+}
+
+// The row of a part and what it holds were written one after the other.
+Status RecordingFile::CheckFacts(const Part& part, const std::vector<MomentFacts>& facts) {
+  const bool isOfPart = facts.size() == static_cast<size_t>(part.moments) &&
+                        facts.front().taken == part.first && facts.back().taken == part.last;
+  return isOfPart ? kOk : Damaged(part, "is not what its row says");
+}
+
+Status RecordingFile::ReadFacts(const Part& part, std::vector<MomentFacts>& facts) {
+  Bytes content;
+  HostIdentity host;
+  Status status = ReadPart(part, content);
+  if (status != kOk) return status;
+  status = ChunkReader::TakeFacts(content, host, facts);
+  return status == kOk ? CheckFacts(part, facts) : Damaged(part, "is damaged");
+}
+
+Status RecordingFile::ReadHost(const Part& part, HostIdentity& host) {
+  const Part* start = FindPart(part.chunk);
+  if (start == nullptr || start->number != part.chunk) return Damaged(part, "has no start");
+  Bytes content;
+  std::vector<MomentFacts> facts;
+  const Status status = ReadPart(*start, content);
+  if (status != kOk) return status;
+  host = {};
+  return ChunkReader::TakeFacts(content, host, facts) == kOk && !host.nodes.empty()
+             ? kOk
+             : Damaged(*start, "is damaged");
+}
+
+const RecordingFile::Part* RecordingFile::FindPart(int64_t number) const {
+  const auto after = std::ranges::upper_bound(parts_, number, {}, &Part::number);
+  if (after == parts_.begin()) return nullptr;
+  const Part& part = *std::prev(after);
+  return number < part.End() ? &part : nullptr;
+}
+
+Status RecordingFile::ReadMoment(int64_t number, Moment& moment) {
+  const Part* wanted = FindPart(number);
+  if (wanted == nullptr) return KSI_STATUS_NOT_FOUND;
+  ChunkReader reader;
+  Bytes content;
+  for (int64_t at = wanted->chunk; at <= number;) {
+    const Part* part = FindPart(at);
+    if (part == nullptr || part->number != at || part->chunk != wanted->chunk) {
+      return Damaged(*wanted, "has not all that it continues");
+    }
+    Status status = ReadPart(*part, content);
+    if (status != kOk) return status;
+    status = reader.Take(content, part == wanted ? static_cast<size_t>(number - at) : SIZE_MAX);
+    if (status != kOk) return Damaged(*part, "is damaged");
+    at = part->End();
+  }
+  moment.host = reader.Host();
+  moment.facts = reader.Facts();
+  moment.readings = reader.TakeReadings();
+  return kOk;
+}
+
+Status RecordingFile::FindMoment(int64_t time, int64_t& number) {
+  number = -1;
+  const auto part = std::find_if(parts_.rbegin(), parts_.rend(),
+                                 [time](const Part& each) { return each.first <= time; });
+  if (part == parts_.rend()) return kOk;
+  if (part->last <= time) {
+    number = part->End() - 1;
+    return kOk;
+  }
+  std::vector<MomentFacts> facts;
+  const Status status = ReadFacts(*part, facts);
+  if (status != kOk) return status;
+  const auto after =
+      std::ranges::find_if(facts, [time](const MomentFacts& each) { return each.taken > time; });
+  number = part->number + (after - facts.begin()) - 1;
+  return kOk;
+}
+
+std::string TextOfTime(int64_t time) {
+  constexpr int64_t kSecond = 1'000'000;
+  const time_t seconds = time / kSecond - (time % kSecond < 0 ? 1 : 0);
+  struct tm parts = {};
+  std::array<char, 64> text = {};
+  if (gmtime_r(&seconds, &parts) == nullptr) return std::to_string(time);
+  return {text.data(), strftime(text.data(), text.size(), cache::kTimeForm, &parts)};
+}
+
+}  // namespace ksi

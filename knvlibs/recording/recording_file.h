@@ -1,0 +1,101 @@
+// A recording: an open cache file of many moments, of which nothing is trusted.
+//
+// A recorder may be writing it meanwhile. What it wrote last may then be seen or not, and what it
+// removes may be gone when it is read; all else is as it was.
+#ifndef KNVLIBS_RECORDING_RECORDING_FILE_H_
+#define KNVLIBS_RECORDING_RECORDING_FILE_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "knvlibs/cache_database.h"
+#include "knvlibs/recording/bytes.h"
+#include "knvlibs/recording/moment.h"
+#include "knvlibs/sqlite.h"
+#include "knvlibs/status.h"
+
+namespace ksi {
+
+class RecordingFile {
+ public:
+  // The most bytes of a part.
+  static constexpr int64_t kLargestPart = int64_t{64} << 20;
+
+  // Moments that are kept together (recording/chunk.h). Moments have numbers, in the order in which
+  // they were recorded.
+  struct Part {
+    int64_t id = 0;
+    int64_t moments = 0;  // how many
+    int64_t number = 0;   // of the first
+    int64_t chunk = 0;    // the number of the first moment of its chunk
+    int64_t first = 0;    // when the first and the last were taken, us since 1970
+    int64_t last = 0;
+    int64_t size = 0;   // in bytes
+    int64_t block = 0;  // the first one of it
+
+    int64_t End() const { return number + moments; }
+  };
+
+  // The statuses of CacheDatabase::Open; KSI_STATUS_INVALID_METADATA if it is a capture. `why`, if
+  // not null, receives what is wrong with a damaged file.
+  [[nodiscard]] static Status Make(std::unique_ptr<CacheDatabase> database,
+                                   std::unique_ptr<RecordingFile>* file,
+                                   std::string* why = nullptr);
+
+  // The parts by number, none of whose moments another has. A part of one moment that has been
+  // packed together with others since is none of them.
+  const std::vector<Part>& Parts() const { return parts_; }
+
+  // All rows of parts that are in use, in the order of their identifiers, those that Parts leaves
+  // out too.
+  const std::vector<Part>& Rows() const { return rows_; }
+
+  // What a part holds. Every failure of this and the following is KSI_STATUS_METADATA_READ_ERROR,
+  // and Why tells the reason, but for that of memory and of reading the disk.
+  [[nodiscard]] Status ReadPart(const Part& part, Bytes& content);
+
+  // The blocks of a part, in their order.
+  [[nodiscard]] Status ReadBlocks(const Part& part, std::vector<int64_t>& blocks);
+
+  // The moment with a number that a part has.
+  [[nodiscard]] Status ReadMoment(int64_t number, Moment& moment);
+
+  // The facts of the moments of a part.
+  [[nodiscard]] Status ReadFacts(const Part& part, std::vector<MomentFacts>& facts);
+
+  // The host that the moments of a part are of.
+  [[nodiscard]] Status ReadHost(const Part& part, HostIdentity& host);
+
+  // The number of the latest moment that was taken at `time` or before; -1 if there is none. The
+  // latest is the one recorded last, for clocks may be set back.
+  [[nodiscard]] Status FindMoment(int64_t time, int64_t& number);
+
+  const std::string& Why() const { return database_->Why(); }
+  uint64_t Size() const { return database_->Size(); }
+
+ private:
+  explicit RecordingFile(std::unique_ptr<CacheDatabase> database)
+      : database_(std::move(database)) {}
+
+  [[nodiscard]] Status ReadRows();
+  void ChooseParts();
+  [[nodiscard]] Status Walk(const Part& part, Bytes* content, std::vector<int64_t>* blocks);
+  [[nodiscard]] Status Damaged(const Part& part, const char* why);
+  [[nodiscard]] Status CheckFacts(const Part& part, const std::vector<MomentFacts>& facts);
+  const Part* FindPart(int64_t number) const;
+
+  std::unique_ptr<CacheDatabase> database_;
+  std::vector<Part> rows_;
+  std::vector<Part> parts_;
+  Statement block_;
+};
+
+// "2026-11-21T10:05:30Z" of a time in us since 1970.
+std::string TextOfTime(int64_t time);
+
+}  // namespace ksi
+
+#endif  // KNVLIBS_RECORDING_RECORDING_FILE_H_

@@ -1,0 +1,126 @@
+#include "knvlibs/recording/chunk_reader.h"
+#include "knvlibs/recording/chunk_writer.h"
+
+#include <gtest/gtest.h>
+
+#include <cstring>
+
+#include <knvlibs/ksi_status.h>
+#include "tests/knvlibs/recording/random_host.h"
+
+namespace ksi {
+namespace {
+
+HostIdentity Host() {
+  return {std::string(32, 'a'), "Nov 21 2026 10:00:00", "host", "boot", RecordedNodes()};
+}
+
+MomentFacts FactsOf(size_t i) {
+  const auto number = static_cast<int64_t>(i);
+  return {number * 5'000'000 - (i == 7 ? 3'600'000'000 : 0),
+          number * 5'000'000,
+          i,
+          2 * i,
+          i % 3,
+          i % 5 == 0 ? KSI_STATUS_IO_ERROR : kOk,
+          i % 4,
+          i % 2};
+}
+
+std::vector<Reading> Sorted(std::vector<Reading> readings) {
+  SortReadings(readings);
+  return readings;
+}
+
+constexpr size_t kMoments = 24;
+
+class ChunkTest : public testing::TestWithParam<uint32_t> {
+ protected:
+  ChunkTest() {
+    RandomHost host(GetParam());
+    for (size_t i = 0; i < kMoments; ++i) {
+      moments_.push_back(host.Next());
+      writer_.Add(FactsOf(i), moments_.back());
+      singles_.push_back(writer_.PartFrom(i));
+    }
+  }
+
+  std::vector<std::vector<Reading>> moments_;
+  ChunkWriter writer_{Host()};
+  std::vector<Bytes> singles_;  // of each moment its part
+};
+
+TEST_P(ChunkTest, EachMomentIsAsItWas) {
+  const Bytes part = writer_.PartFrom(0);
+  for (size_t i = 0; i < kMoments; ++i) {
+    ChunkReader reader;
+    ASSERT_EQ(reader.Take(part, i), kOk);
+    EXPECT_EQ(reader.Facts(), FactsOf(i));
+    EXPECT_EQ(reader.Host(), Host());
+    EXPECT_EQ(Sorted(reader.TakeReadings()), moments_[i]) << "moment " << i;
+  }
+}
+
+TEST_P(ChunkTest, PartsOfSingleMomentsContinueEachOther) {
+  for (size_t last = 0; last < kMoments; ++last) {
+    ChunkReader reader;
+    for (size_t i = 0; i <= last; ++i) ASSERT_EQ(reader.Take(singles_[i]), kOk) << i;
+    EXPECT_EQ(reader.Facts(), FactsOf(last));
+    EXPECT_EQ(Sorted(reader.TakeReadings()), moments_[last]) << "moment " << last;
+  }
+}
+
+TEST_P(ChunkTest, AChunkIsContinuedByAPartOfMany) {
+  ChunkReader reader;
+  ASSERT_EQ(reader.Take(singles_[0]), kOk);
+  ASSERT_EQ(reader.Take(singles_[1]), kOk);
+  ASSERT_EQ(reader.Take(writer_.PartFrom(2), 5), kOk);
+  EXPECT_EQ(Sorted(reader.TakeReadings()), moments_[7]);
+}
+
+TEST_P(ChunkTest, FactsAreToldWithoutTheChanges) {
+  HostIdentity host;
+  std::vector<MomentFacts> facts;
+  ASSERT_EQ(ChunkReader::TakeFacts(writer_.PartFrom(0), host, facts), kOk);
+  EXPECT_EQ(host, Host());
+  ASSERT_EQ(facts.size(), kMoments);
+  for (size_t i = 0; i < kMoments; ++i) EXPECT_EQ(facts[i], FactsOf(i));
+}
+
+INSTANTIATE_TEST_SUITE_P(Series, ChunkTest, testing::Range(0u, 1000u, 37u));
+
+TEST(ChunkReaderTest, APartThatIsDamagedIsRefused) {
+  RandomHost host(1);
+  ChunkWriter writer(Host());
+  for (size_t i = 0; i < 5; ++i) writer.Add(FactsOf(i), host.Next());
+  const Bytes part = writer.PartFrom(0);
+  for (size_t size = 0; size < part.size(); ++size) {
+    ChunkReader reader;
+    EXPECT_EQ(reader.Take(ByteView(part).first(size)), KSI_STATUS_METADATA_READ_ERROR) << size;
+  }
+  for (size_t bit = 0; bit < part.size() * 8; ++bit) {
+    Bytes flipped = part;
+    flipped[bit / 8] ^= std::byte{1} << bit % 8;
+    ChunkReader reader;
+    if (reader.Take(flipped) == kOk) {
+      // There are bits of a frame that say nothing of its content.
+      EXPECT_EQ(reader.Facts(), FactsOf(4)) << bit;
+    }
+  }
+}
+
+TEST(ChunkReaderTest, PartsAreTakenInTheirOrderOnly) {
+  RandomHost host(2);
+  ChunkWriter writer(Host());
+  writer.Add(FactsOf(0), host.Next());
+  const Bytes first = writer.PartFrom(0);
+  writer.Add(FactsOf(1), host.Next());
+  ChunkReader reader;
+  EXPECT_EQ(reader.Take(writer.PartFrom(1)), KSI_STATUS_METADATA_READ_ERROR);
+  ChunkReader twice;
+  ASSERT_EQ(twice.Take(first), kOk);
+  EXPECT_EQ(twice.Take(first), KSI_STATUS_METADATA_READ_ERROR);
+}
+
+}  // namespace
+}  // namespace ksi
