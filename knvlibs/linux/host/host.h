@@ -63,6 +63,10 @@ class LinuxHost {
   // Where a link of the kernel's files leads: "socket:[4711]".
   [[nodiscard]] Status ReadLink(std::string_view link, std::string& target) const;
 
+  // The status for an errno of a file or directory, which is told: what is opened here and read
+  // elsewhere fails like all else.
+  [[nodiscard]] Status Failed(std::string_view file, int error) const;
+
   // Whether it is the first time in this reading that `what` is asked for: what is wrong with many
   // files alike is told once.
   bool First(std::string_view what) const;
@@ -101,8 +105,6 @@ class LinuxHost {
   enum class Made : uint8_t { kInOnePiece, kPieceByPiece };
   [[nodiscard]] Status Read(std::string_view file, Made made, std::string& content) const;
 
-  // The status for an errno of a file or directory, which is told.
-  [[nodiscard]] Status Failed(std::string_view file, int error) const;
   void TellOnce(std::string_view file, int error) const;
 
   HostRoot root_;

@@ -134,8 +134,8 @@ bool IsHugeZero(uint64_t frame) {
 }
 
 // The kernel itself hands the entries over in pieces.
-Status CountEntries(const LinuxHost& host, int pagemap, std::span<const AddressRange> ranges,
-                    PageCounts& counts) {
+Status CountEntries(const LinuxHost& host, const std::string& file, int pagemap,
+                    std::span<const AddressRange> ranges, PageCounts& counts) {
   const Figure zeroFrame = FindZeroFrame();
   if (!zeroFrame) return KSI_STATUS_PERMISSION_DENIED;
   const uint64_t pageSize = host.PageKB() * 1024;
@@ -148,9 +148,11 @@ Status CountEntries(const LinuxHost& host, int pagemap, std::span<const AddressR
       const size_t most = std::min<uint64_t>(entries.size(), (range.end - at) / pageSize);
       const ssize_t size = pread(pagemap, entries.data(), most * sizeof entries[0],
                                  static_cast<off_t>(at / pageSize * sizeof entries[0]));
-      if (size <= 0) return KSI_STATUS_NOT_FOUND;
-      for (const uint64_t entry :
-           std::span(entries).first(static_cast<size_t>(size) / sizeof entries[0])) {
+      if (size < 0 && errno == EINTR) continue;
+      if (size < 0) return host.Failed(file, errno);
+      const size_t count = static_cast<size_t>(size) / sizeof entries[0];
+      if (count == 0) return KSI_STATUS_NOT_FOUND;
+      for (const uint64_t entry : std::span(entries).first(count)) {
         counter.Take(at, entry);
         at += pageSize;
       }
@@ -161,16 +163,16 @@ Status CountEntries(const LinuxHost& host, int pagemap, std::span<const AddressR
 }
 
 // None if the kernel does not offer it.
-std::optional<Status> Scan(const LinuxHost& host, int pagemap, std::span<const AddressRange> ranges,
-                           PageCounts& counts) {
+std::optional<Status> Scan(const LinuxHost& host, const std::string& file, int pagemap,
+                           std::span<const AddressRange> ranges, PageCounts& counts) {
   ByteCounts bytes;
   for (AddressRange range : ranges) {
     while (range.start < range.end) {
       if (!MayWalk(host)) return kOk;
       const Piece piece(host);
-      if (ScanPiece(pagemap, range, bytes)) continue;
+      if (ScanPiece(pagemap, range, bytes) || errno == EINTR) continue;
       if (errno == ENOTTY || errno == EINVAL) return std::nullopt;
-      return KSI_STATUS_NOT_FOUND;
+      return host.Failed(file, errno);
     }
   }
   counts = {bytes.resident / 1024, bytes.swapped / 1024, bytes.huge / 1024};
@@ -215,8 +217,8 @@ Status CountPages(const LinuxHost& host, int32_t pid, std::span<const AddressRan
   FileDescriptor pagemap;
   Status status = host.Open(file, pagemap);
   if (status == kOk) {
-    const std::optional<Status> scanned = Scan(host, pagemap.Get(), ranges, counts);
-    status = scanned ? *scanned : CountEntries(host, pagemap.Get(), ranges, counts);
+    const std::optional<Status> scanned = Scan(host, file, pagemap.Get(), ranges, counts);
+    status = scanned ? *scanned : CountEntries(host, file, pagemap.Get(), ranges, counts);
   }
   if (status != KSI_STATUS_PERMISSION_DENIED) return status;
   WarnDenied(host, file);

@@ -2,10 +2,20 @@
 // pagemap as older kernels hand them over.
 #include "knvlibs/linux/machines/page_map.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <linux/filter.h>
+#include <linux/seccomp.h>
+#include <sys/ioctl.h>
 #include <sys/mman.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <cstddef>
+#include <iterator>
+#include <string>
 #include <vector>
 
 #include "knvlibs/linux/reading.h"
@@ -71,6 +81,89 @@ TEST(PageMapTest, AProcessThatIsGoneIsNotFound) {
   PageCounts counts;
   EXPECT_EQ(CountPages(host, INT32_MAX, ranges, counts), KSI_STATUS_NOT_FOUND);
   EXPECT_EQ(counts.resident, std::nullopt);
+}
+
+// From here on the kernel fails these calls of this process with an errno: requests to scan, and
+// reads of more than one entry. 0 is none.
+void FailPagemap(uint32_t scanError, uint32_t readError) {
+  constexpr uint32_t kScanRequest = _IOC(_IOC_READ | _IOC_WRITE, 'f', 16, 96);
+  const auto load = [](size_t at) {
+    return sock_filter BPF_STMT(BPF_LD | BPF_W | BPF_ABS, static_cast<uint32_t>(at));
+  };
+  const auto unless = [](uint16_t relation, uint32_t value, uint8_t skipped) {
+    return sock_filter BPF_JUMP(BPF_JMP | relation | BPF_K, value, 0, skipped);
+  };
+  const auto end = [](uint32_t error) {
+    return sock_filter BPF_STMT(BPF_RET | BPF_K,
+                                error == 0 ? SECCOMP_RET_ALLOW : SECCOMP_RET_ERRNO | error);
+  };
+  constexpr size_t kNumber = offsetof(seccomp_data, nr);
+  constexpr size_t kSecond = offsetof(seccomp_data, args) + sizeof(uint64_t);
+  constexpr size_t kThird = kSecond + sizeof(uint64_t);
+  sock_filter steps[] = {load(kNumber),
+                         unless(BPF_JEQ, SYS_ioctl, 3),
+                         load(kSecond),
+                         unless(BPF_JEQ, kScanRequest, 1),
+                         end(scanError),
+                         load(kNumber),
+                         unless(BPF_JEQ, SYS_pread64, 3),
+                         load(kThird),
+                         unless(BPF_JGT, sizeof(uint64_t), 1),
+                         end(readError),
+                         end(0)};
+  const sock_fprog program = {static_cast<uint16_t>(std::size(steps)), steps};
+  if (prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
+      prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &program) != 0) {
+    _exit(2);
+  }
+}
+
+// Expects a count that fails so to end with `status` and with `told`.
+void ExpectFailedCount(uint32_t scanError, uint32_t readError, Status status,
+                       const std::string& told) {
+  const LinuxHost host("/");
+  host.Kept().walkTime = std::chrono::milliseconds(1);
+  const Memory memory(kMB);
+  const AddressRange ranges[] = {memory.Range()};
+  const auto count = [&] {
+    FailPagemap(scanError, readError);
+    PageCounts counts;
+    const Status end = CountPages(host, getpid(), ranges, counts);
+    const bool isLost = host.LossStatus() != kOk;
+    return end == status && !counts.resident && isLost == !told.empty();
+  };
+  EXPECT_EXIT(_exit(count() ? 0 : 1), testing::ExitedWithCode(0), "^" + told + "$")
+      << scanError << " " << readError;
+}
+
+constexpr char kLeftOut[] = ": what cannot be read is left out or has no value\n";
+constexpr char kNoTime[] =
+    "virtual machines: no time left to look at the memory of all of them: what that would tell has "
+    "no value\n";
+
+TEST(PageMapTest, AScanThatFailsIsToldAndTheProcessIsNotGone) {
+  const std::string file = "/proc/[0-9]+/pagemap: ";
+  ExpectFailedCount(EIO, 0, KSI_STATUS_IO_ERROR, file + "Input/output error" + kLeftOut);
+  ExpectFailedCount(ENOMEM, 0, KSI_STATUS_NO_MEMORY, file + "Cannot allocate memory" + kLeftOut);
+  ExpectFailedCount(ESRCH, 0, KSI_STATUS_NOT_FOUND, "");
+  // Asked again until there is no more time.
+  ExpectFailedCount(EINTR, 0, kOk, kNoTime);
+}
+
+TEST(PageMapTest, SoIsAReadOfEntries) {
+  uint64_t entry = 0;
+  const FileDescriptor pagemap(open("/proc/self/pagemap", O_RDONLY | O_CLOEXEC));
+  const auto page = reinterpret_cast<uintptr_t>(&entry) / static_cast<uintptr_t>(getpagesize());
+  const auto at = static_cast<off_t>(page * sizeof entry);
+  if (pread(pagemap.Get(), &entry, sizeof entry, at) != sizeof entry || entry << 9 == 0) {
+    GTEST_SKIP() << "this kernel tells nobody here which pages are zero pages";
+  }
+  const std::string file = "/proc/[0-9]+/pagemap: ";
+  ExpectFailedCount(ENOTTY, EIO, KSI_STATUS_IO_ERROR, file + "Input/output error" + kLeftOut);
+  ExpectFailedCount(ENOTTY, ENOMEM, KSI_STATUS_NO_MEMORY,
+                    file + "Cannot allocate memory" + kLeftOut);
+  ExpectFailedCount(ENOTTY, ESRCH, KSI_STATUS_NOT_FOUND, "");
+  ExpectFailedCount(ENOTTY, EINTR, kOk, kNoTime);
 }
 
 TEST(PageMapTest, WithoutTimeThereAreNoFiguresAndAWord) {
