@@ -371,6 +371,52 @@ TEST_F(GroupsTest, WhatCannotBeReadIsToldOnceInAReadingAndLeftOut) {
   }
 }
 
+// In a recorded tree. Nothing of what lies outside is shown, and that is told.
+TEST_F(GroupsTest, WhatLeadsOutIsToldOnceInAReadingAndLeftOut) {
+  const HostTree outside;
+  std::filesystem::copy(tree_.Root(), outside.Root(), std::filesystem::copy_options::recursive);
+  const auto link = [&](const std::string& file, const std::string& target) {
+    std::filesystem::create_symlink(target, tree_.Root() + file);
+  };
+  const auto expectTold = [&](const std::string& what) {
+    testing::internal::CaptureStderr();
+    LinuxSource source(tree_.Root());
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}),
+              (std::vector<int64_t>{kKernelGroup, kJobs}));
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}),
+              (std::vector<int64_t>{kProcessGroup + kPid}));
+    EXPECT_EQ(source.LossStatus(), what.empty() ? kOk : KSI_STATUS_NOT_FOUND);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              what.empty() ? ""
+                           : what +
+                                 ": leads out of the recorded tree: what cannot be read is left "
+                                 "out or has no value\n");
+  };
+  link("/proc/self", "4711");
+  link("/sys/fs/cgroup/none", "gone");
+  expectTold("");
+  link("/sys/fs/cgroup/more", outside.Root() + "/sys/fs/cgroup/jobs");
+  expectTold("/sys/fs/cgroup/more");
+  std::filesystem::remove(tree_.Root() + "/sys/fs/cgroup/more");
+  link("/proc/201", outside.Root() + "/proc/100");
+  link("/proc/202", outside.Root() + "/proc/100");
+  expectTold("/proc/201/status");
+  std::filesystem::remove(tree_.Root() + "/proc/201");
+  std::filesystem::remove(tree_.Root() + "/proc/202");
+  tree_.Write("/proc/203/limits", "");
+  link("/proc/203/status", "../../../" + outside.Root() + "/proc/100/status");
+  expectTold("/proc/203/status");
+}
+
+TEST_F(GroupsTest, AProcessMayLieBehindALinkInTheTree) {
+  std::filesystem::rename(tree_.Root() + "/proc/100", tree_.Root() + "/moved");
+  std::filesystem::create_symlink("/moved", tree_.Root() + "/proc/100");
+  LinuxSource source(tree_.Root());
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}),
+            (std::vector<int64_t>{kProcessGroup + kPid}));
+  EXPECT_EQ(source.LossStatus(), kOk);
+}
+
 TEST_F(GroupsTest, AnOrdinaryUserIsShownWhatItMaySee) {
   WriteProcess(101, "other");
   WriteProcess(102, "hidden");

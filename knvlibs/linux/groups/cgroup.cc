@@ -103,6 +103,8 @@ Status CgroupHierarchy::List(const LinuxHost& host, std::string_view path, int64
       status = host.ReadNumber(FileOf(path, entry.name), recorded);
       if (status != kOk) return status;
       id = static_cast<int64_t>(recorded);
+    } else {
+      host.TellIfLeadsOut(directory, entry);
     }
   }
   std::ranges::sort(children, {}, &Child::name);

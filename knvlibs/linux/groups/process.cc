@@ -113,7 +113,8 @@ Status ListProcesses(const LinuxHost& host, std::vector<int32_t>& pids) {
   pids.clear();
   for (const LinuxHost::Entry& entry : entries) {
     int32_t pid = 0;
-    if (entry.isDirectory && ParsePid(entry.name, pid)) pids.push_back(pid);
+    // In a recorded tree it may be a link.
+    if ((entry.isDirectory || entry.isLink) && ParsePid(entry.name, pid)) pids.push_back(pid);
   }
   std::ranges::sort(pids);
   return kOk;

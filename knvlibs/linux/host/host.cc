@@ -37,11 +37,12 @@ class Directory {
   DIR* stream_;
 };
 
-bool IsDirectory(DIR* stream, const dirent& entry) {
-  if (entry.d_type != DT_UNKNOWN) return entry.d_type == DT_DIR;
+// DT_DIR, DT_LNK and the like; not every file system tells at once.
+unsigned char TypeOf(DIR* stream, const dirent& entry) {
+  if (entry.d_type != DT_UNKNOWN) return entry.d_type;
   struct stat status = {};
-  return fstatat(dirfd(stream), entry.d_name, &status, AT_SYMLINK_NOFOLLOW) == 0 &&
-         S_ISDIR(status.st_mode);
+  if (fstatat(dirfd(stream), entry.d_name, &status, AT_SYMLINK_NOFOLLOW) != 0) return DT_UNKNOWN;
+  return static_cast<unsigned char>(IFTODT(status.st_mode));
 }
 
 }  // namespace
@@ -132,7 +133,8 @@ Status LinuxHost::List(std::string_view directory, std::vector<Entry>& entries) 
     if (entry == nullptr) return errno == 0 ? kOk : Failed(directory, errno);
     const std::string_view name = entry->d_name;
     if (name == "." || name == "..") continue;
-    entries.push_back({std::string(name), entry->d_ino, IsDirectory(stream.get(), *entry)});
+    const unsigned char type = TypeOf(stream.get(), *entry);
+    entries.push_back({std::string(name), entry->d_ino, type == DT_DIR, type == DT_LNK});
   }
 }
 
@@ -145,7 +147,10 @@ Status LinuxHost::List(std::string_view directory, Entries wanted,
   names.clear();
   for (Entry& entry : entries) {
     if (entry.name.starts_with('.')) continue;
-    if (wanted == Entries::kDirectories && !entry.isDirectory) continue;
+    if (wanted == Entries::kDirectories && !entry.isDirectory) {
+      TellIfLeadsOut(directory, entry);
+      continue;
+    }
     names.push_back(std::move(entry.name));
   }
   return kOk;
@@ -158,11 +163,25 @@ Status LinuxHost::Failed(std::string_view file, int error) const {
   if (status == KSI_STATUS_PERMISSION_DENIED) {
     // A reader may have another file to turn to, or tell what goes without.
     if (reading_->denied.empty()) reading_->denied = file;
-  } else if (status != KSI_STATUS_NOT_FOUND && error != EOPNOTSUPP) {
+  } else if (status == KSI_STATUS_NOT_FOUND) {
+    TellIfLeadsOut(file);
+  } else if (error != EOPNOTSUPP) {
     // A cgroup of threads, which has no processes of its own to list, says so by EOPNOTSUPP.
     TellOnce(file, error);
   }
   return status;
+}
+
+void LinuxHost::TellIfLeadsOut(std::string_view file) const {
+  if (!root_.LeadsOut(file)) return;
+  Lose(KSI_STATUS_NOT_FOUND);
+  if (!First("leads out")) return;
+  Warning("%s: leads out of the recorded tree: what cannot be read is left out or has no value\n",
+          Printable(file).c_str());
+}
+
+void LinuxHost::TellIfLeadsOut(std::string_view directory, const Entry& entry) const {
+  if (entry.isLink && !IsThisMachine()) TellIfLeadsOut(std::string(directory) + '/' + entry.name);
 }
 
 void LinuxHost::BeginQuestion() { reading_->denied.clear(); }

@@ -57,8 +57,13 @@ class LinuxHost {
     std::string name;
     uint64_t inode = 0;
     bool isDirectory = false;
+    bool isLink = false;
   };
   [[nodiscard]] Status List(std::string_view directory, std::vector<Entry>& entries) const;
+
+  // Tells, once in a reading, of an entry that would be more than a name if it were no link that
+  // leads out of a recorded tree.
+  void TellIfLeadsOut(std::string_view directory, const Entry& entry) const;
 
   // Where a link of the kernel's files leads: "socket:[4711]".
   [[nodiscard]] Status ReadLink(std::string_view link, std::string& target) const;
@@ -106,6 +111,7 @@ class LinuxHost {
   [[nodiscard]] Status Read(std::string_view file, Made made, std::string& content) const;
 
   void TellOnce(std::string_view file, int error) const;
+  void TellIfLeadsOut(std::string_view file) const;
 
   HostRoot root_;
   Clock clock_;

@@ -31,6 +31,7 @@ class Walk {
       ahead_.pop_back();
       if (name == ".") continue;
       if (name == "..") {
+        if (above_.empty()) leftRoot_ = true;
         if (!above_.empty()) above_.pop_back();
         continue;
       }
@@ -50,6 +51,9 @@ class Walk {
     return FileDescriptor(openat(Here(), ".", flags));
   }
 
+  // Whether it came to a step that leads out of the root, and was taken as one from the root.
+  bool LeftRoot() const { return leftRoot_; }
+
  private:
   int Here() const { return above_.empty() ? root_ : above_.back().Get(); }
 
@@ -66,7 +70,10 @@ class Walk {
       errno = ELOOP;
       return false;
     }
-    if (target.starts_with('/')) above_.clear();
+    if (target.starts_with('/')) {
+      above_.clear();
+      leftRoot_ = true;
+    }
     Prepend(target);
     return true;
   }
@@ -86,6 +93,7 @@ class Walk {
   std::vector<FileDescriptor> above_;  // the directories from the root, which is none of them, on
   std::vector<std::string> ahead_;     // the next step is the last
   int links_ = 0;
+  bool leftRoot_ = false;
 };
 
 FileDescriptor OpenByKernel(int root, const std::string& path, int flags) {
@@ -118,6 +126,12 @@ FileDescriptor HostRoot::Open(std::string_view path, int flags) const {
   const bool isOffered = errno != ENOSYS && errno != EPERM && errno != EAGAIN;
   if (file.IsOpen() || isOffered) return file;
   return OpenBelow(root_.Get(), path, flags);
+}
+
+bool HostRoot::LeadsOut(std::string_view path) const {
+  if (!root_.IsOpen()) return false;
+  Walk walk(root_.Get(), path);
+  return !walk.Open(O_PATH | O_CLOEXEC).IsOpen() && errno == ENOENT && walk.LeftRoot();
 }
 
 FileDescriptor OpenBelow(int root, std::string_view path, int flags) {

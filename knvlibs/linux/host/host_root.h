@@ -21,6 +21,10 @@ class HostRoot {
   // root is what links take for "/", and above it is itself.
   FileDescriptor Open(std::string_view path, int flags) const;
 
+  // Whether `path` cannot be opened because a link on its way leads out of a recorded tree, where
+  // the tree has nothing of that name.
+  bool LeadsOut(std::string_view path) const;
+
  private:
   bool isThisMachine_;
   FileDescriptor root_;  // of a recorded tree

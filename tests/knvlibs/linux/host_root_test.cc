@@ -118,6 +118,27 @@ TEST(HostRoot, OneThatIsNotThereTellsSo) {
   EXPECT_EQ(errno, ENOENT);
 }
 
+TEST(HostRoot, LinksLeadOutWhereTheTreeHasNothingOfTheName) {
+  const HostTree tree;
+  tree.Write("/proc/file", "inside");
+  const HostRoot root(tree.Root());
+  const auto link = [&](const char* name, const char* target) {
+    std::filesystem::create_symlink(target, tree.Root() + name);
+  };
+  link("/absolute", "/outside");
+  link("/climbing", "proc/../../outside");
+  link("/inside", "/proc/file");
+  link("/broken", "proc/none");
+  link("/round", "/round");
+  EXPECT_TRUE(root.LeadsOut("/absolute"));
+  EXPECT_TRUE(root.LeadsOut("/absolute/file"));
+  EXPECT_TRUE(root.LeadsOut("/climbing"));
+  for (const char* name : {"/inside", "/broken", "/round", "/none", "/proc/file"}) {
+    EXPECT_FALSE(root.LeadsOut(name)) << name;
+  }
+  EXPECT_FALSE(HostRoot("/").LeadsOut("/none"));
+}
+
 TEST(HostRoot, AHostIsReadBelowItsRootAlone) {
   const HostTree outside;
   const HostTree tree;
@@ -128,8 +149,15 @@ TEST(HostRoot, AHostIsReadBelowItsRootAlone) {
   const LinuxHost host(tree.Root());
   std::string content;
   std::vector<LinuxHost::Entry> entries;
+  testing::internal::CaptureStderr();
+  EXPECT_EQ(host.Read("/proc/none", content), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(host.LossStatus(), kOk);
   EXPECT_EQ(host.Read("/proc/meminfo", content), KSI_STATUS_NOT_FOUND);
   EXPECT_EQ(host.List("/sys", entries), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(host.LossStatus(), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "/proc/meminfo: leads out of the recorded tree: what cannot be read is left out or has "
+            "no value\n");
   EXPECT_EQ(host.ReadLink("/proc/meminfo", content), kOk);
   EXPECT_EQ(content, outside.Root() + "/meminfo");
 }
