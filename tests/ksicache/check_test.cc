@@ -129,6 +129,22 @@ TEST_F(Ksicache, CheckFindsGroupsThatAreNoTree) {
       file + "group 7 stands below itself\n");
 }
 
+TEST_F(Ksicache, CheckFindsClientsOfTwoGroups) {
+  const char* node = "sched/groups/members/memClients";
+  ksicache::CacheWriter writer(Path("a.ksi"), true);
+  writer.AddList(NodeAt(node), MakeKeys({4}), NumberList({7, 8, 8}));
+  writer.AddList(NodeAt(node), MakeKeys({5}), NumberList({9, 7}));
+  writer.AddList(NodeAt(node), MakeKeys({6}), NumberList({7, 10}));
+  writer.Commit(TestCapture());
+  const harness::Result result = Run({"check", Path("a.ksi")});
+  const std::string start = Path("a.ksi") + ": " + node;
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.out, start + " [4]: entry 2 is the same as entry 1\n" +  //
+                            start + " [5]: has client 7, which group 4 has already\n" + start +
+                            " [6]: has client 7, which group 4 has already\n");
+  EXPECT_EQ(result.err, "");
+}
+
 TEST_F(Ksicache, CheckFindsWhatAListNamesTwice) {
   const auto check = [this](const char* node, const Keys& keys, const std::vector<Key>& entries) {
     ksicache::CacheWriter writer(Path("a.ksi"), true);

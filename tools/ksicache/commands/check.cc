@@ -134,6 +134,9 @@ class Checker {
       } else {
         CheckIsNew(reading, position, std::to_string(row.Number(1)));
       }
+      if (ksi::IdOf(node) == ksi::node::sched_groups_members_memClients) {
+        CheckClient(reading, row.Number(1));
+      }
     } else if (row.Type(1) != SQLITE_TEXT) {
       Report(reading, entry + " is no text");
     } else if (row.Text(1).find('\0') != std::string_view::npos) {
@@ -158,6 +161,15 @@ class Checker {
     if (!other) return;
     Report(reading, "has group " + std::to_string(group) + ", which group " +
                         std::to_string(*other) + " has already");
+  }
+
+  // One that stands twice in the same list is none of its concern.
+  void CheckClient(const Reading& reading, int64_t client) {
+    const int64_t group = reading.keys[0].number;
+    const int64_t owner = groupOfClient_.emplace(client, group).first->second;
+    if (owner == group) return;
+    Report(reading, "has client " + std::to_string(client) + ", which group " +
+                        std::to_string(owner) + " has already");
   }
 
   void CheckGroupTree() {
@@ -185,6 +197,7 @@ class Checker {
   const ksi::CacheFile& file_;
   InstanceWalk instances_;
   GroupTree groups_;
+  std::unordered_map<int64_t, int64_t> groupOfClient_;
   std::unordered_map<std::string, int64_t> entries_;  // of a list, and where each stands first
   size_t problems_ = 0;
 };
@@ -203,9 +216,9 @@ const Command kCheck = {
     .summary = "say what is wrong with each FILE",
     .help = R"(Says all that is wrong with each FILE: its integrity as a database, nodes that
 this version does not know, records of the wrong size, lists with gaps or that
-name something twice, groups that stand in two places or below themselves, a
-time that there is not, and a signature that is not that of this version. Says
-nothing of a file that is whole.
+name something twice, groups that stand in two places or below themselves,
+clients of two groups, a time that there is not, and a signature that is not
+that of this version. Says nothing of a file that is whole.
 )",
     .options = {},
     .fewest = 1,
