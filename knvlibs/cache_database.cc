@@ -163,8 +163,10 @@ Status CacheDatabase::CheckChanges(const char* fileName) {
 }
 
 Status CacheDatabase::Failed(int code) {
-  why_ = ErrorText();
-  return StatusOfSqlite(code);
+  const Status status = StatusOfSqlite(code);
+  // The status says it all, and SQLite no more.
+  if (status != KSI_STATUS_NO_MEMORY) why_ = ErrorText();
+  return status;
 }
 
 const char* CacheDatabase::ErrorText() const {
