@@ -1,5 +1,5 @@
-// tally with a cache file that others use, change or hold meanwhile, or on a full disk: its output
-// is right, or there is a message and a status.
+// tally and ksicache with a cache file that others use, change or hold meanwhile, or on a full
+// disk: its output is right, or there is a message and a status.
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/file.h>
@@ -10,6 +10,7 @@
 #include <array>
 #include <chrono>
 #include <filesystem>
+#include <fstream>
 #include <functional>
 #include <string>
 #include <thread>
@@ -81,9 +82,10 @@ class OddCache : public testing::Test {
     EXPECT_EQ(result.err, "Couldn't open cache file " + file_ + ", error code: " + status + "\n");
   }
 
-  // Runs the report into a pipe, does something to its file when the pipe is full and the report in
+  // Runs a program into a pipe, does something to its file when the pipe is full and the program in
   // the middle of it, and then reads on.
-  harness::Result RunAndMeanwhile(const std::function<void()>& meanwhile) {
+  harness::Result RunAndMeanwhile(harness::Program program,
+                                  const std::function<void()>& meanwhile) {
     const std::string pipe = directory_.Path("pipe");
     EXPECT_EQ(mkfifo(pipe.c_str(), 0600), 0);
     const int fd = open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
@@ -98,7 +100,6 @@ class OddCache : public testing::Test {
         out.append(block.data(), static_cast<size_t>(got));
       }
     });
-    harness::Program program = Report();
     program.outPath = pipe;
     harness::Result result = harness::RunProgram(program);
     reader.join();
@@ -150,7 +151,7 @@ TEST_F(OddCache, InTheMiddleOfAChangeIsRefused) {
 }
 
 TEST_F(OddCache, ReplacedInTheMiddleOfAReportIsReadToItsEnd) {
-  ExpectWhole(RunAndMeanwhile([&] {
+  ExpectWhole(RunAndMeanwhile(Report(), [&] {
     WriteContent(directory_.Path("other"), std::string(65536, 'x'));
     std::filesystem::rename(directory_.Path("other"), file_);
   }));
@@ -158,11 +159,24 @@ TEST_F(OddCache, ReplacedInTheMiddleOfAReportIsReadToItsEnd) {
 
 TEST_F(OddCache, TruncatedInTheMiddleOfAReportIsTold) {
   const harness::Result result =
-      RunAndMeanwhile([&] { std::filesystem::resize_file(file_, 8192); });
+      RunAndMeanwhile(Report(), [&] { std::filesystem::resize_file(file_, 8192); });
   EXPECT_GE(result.status, 0);
   EXPECT_NE(result.err, "");
   EXPECT_TRUE(Whole().starts_with(result.out)) << result.out;
   EXPECT_LT(result.out.size(), Whole().size());
+}
+
+TEST_F(OddCache, DumpOfOneThatIsRewrittenMeanwhileFails) {
+  harness::Program dump;
+  dump.path = KSICACHE_PROGRAM;
+  dump.args = {"ksicache", "dump", file_};
+  dump.environment = harness::OwnEnvironment();
+  const harness::Result result = RunAndMeanwhile(dump, [&] {
+    const std::string content = FileContent(file_);
+    std::fstream(file_, std::ios::binary | std::ios::in | std::ios::out) << content;
+  });
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err, "ksicache: " + file_ + ": damaged: database disk image is malformed\n");
 }
 
 // A limit on the size of files is the full disk that every user can have.

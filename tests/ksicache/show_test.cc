@@ -78,6 +78,26 @@ TEST_F(Ksicache, InfoShowsTheGoodOnesOfSeveralFiles) {
                 ": No such file or directory\nksicache: /dev/null: is not a regular file\n");
 }
 
+// Each page in turn is no longer one of a tree.
+TEST_F(Ksicache, NothingShowsADamagedFileAsAWholeOne) {
+  const std::string file = Path("host.ksi");
+  WriteSmallHost(file);
+  const std::string good = FileContent(file);
+  constexpr size_t kPageSize = 4096;
+  ASSERT_GT(good.size(), 3 * kPageSize);
+  for (size_t page = kPageSize; page < good.size(); page += kPageSize) {
+    std::string bad = good;
+    bad[page] = 1;
+    WriteContent(file, bad);
+    for (const std::vector<std::string>& command :
+         {std::vector<std::string>{"dump", file}, {"dump", "--json", file}, {"check", file}}) {
+      const harness::Result result = Run(command);
+      EXPECT_EQ(result.status, 1) << command[0] << " " << page;
+      EXPECT_NE(result.err + (command[0] == "check" ? result.out : ""), "") << page;
+    }
+  }
+}
+
 TEST_F(Ksicache, DumpShowsDecodedFields) {
   WriteSmallHost(Path("host.ksi"));
   EXPECT_EQ(Output({"dump", Path("host.ksi"), "sched/memClients/remapTypes",
