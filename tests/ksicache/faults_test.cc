@@ -176,6 +176,22 @@ TEST_F(Ksicache, CheckTellsWantOfMemoryAsSuch) {
   }
 }
 
+// What is wrong is told even when there is no more memory to word it.
+TEST_F(Ksicache, WithoutMemoryErrorsAreTold) {
+  harness::Program program = Command({"info", Path("none.ksi")});
+  program.environment.emplace_back("LD_PRELOAD=" TALLY_FAIL_NTH);
+  program.environment.emplace_back();
+  const std::string whole = "ksicache: " + Path("none.ksi") + ": No such file or directory\n";
+  harness::Result result;
+  for (int n = 1; result.err != whole; ++n) {
+    program.environment.back() = "FAIL=malloc:" + std::to_string(n) + "+";
+    result = harness::RunProgram(program);
+    EXPECT_EQ(result.status, 1) << n;
+    ASSERT_TRUE(result.err == whole || result.err == "ksicache: out of memory\n")
+        << n << ": " << result.err;
+  }
+}
+
 INSTANTIATE_TEST_SUITE_P(Commands, WritingFaults, testing::ValuesIn(kWritings),
                          [](const auto& writing) { return writing.param.name; });
 

@@ -16,15 +16,6 @@
 namespace ksi {
 namespace {
 
-// A daemon's connection and what it keeps in files.
-struct Daemon {
-  const char* uri;
-  std::string directory;             // of its sockets
-  std::vector<const char*> sockets;  // that a connection which can only read goes to
-  std::string pidFiles;              // below it
-  uint32_t owner;
-};
-
 bool IsOwn(const std::string& path, uint32_t owner, mode_t kind) {
   constexpr mode_t kOthersWrite = S_IWGRP | S_IWOTH;
   struct stat status = {};
@@ -32,8 +23,8 @@ bool IsOwn(const std::string& path, uint32_t owner, mode_t kind) {
          status.st_uid == owner && (kind != S_IFDIR || (status.st_mode & kOthersWrite) == 0);
 }
 
-std::vector<Daemon> AllDaemons() {
-  std::vector<Daemon> daemons;
+std::vector<LibvirtDaemon> AllDaemons() {
+  std::vector<LibvirtDaemon> daemons;
   for (const char* directory : {"/run/libvirt/", "/var/run/libvirt/"}) {
     daemons.push_back(
         {"qemu:///system", directory, {"libvirt-sock-ro", "virtqemud-sock-ro"}, "qemu/", 0});
@@ -49,9 +40,30 @@ std::vector<Daemon> AllDaemons() {
   return daemons;
 }
 
-// Whether a process of the owner listens at one of the sockets. Whose descriptors may not be read
-// is believed if nobody else could have put the socket there.
-bool IsThere(const LinuxHost& host, const GroupTree& tree, const Daemon& daemon) {
+void TellEnd(const LinuxHost& host, LibvirtAnswer::End end) {
+  const char* reason = nullptr;
+  if (end == LibvirtAnswer::End::kNoLibrary) reason = "its library cannot be loaded";
+  if (end == LibvirtAnswer::End::kNoConnection) reason = "it lets nobody in";
+  if (end == LibvirtAnswer::End::kTooLate) reason = "it has not told all in time";
+  if (end == LibvirtAnswer::End::kTooLate) host.Lose(KSI_STATUS_TIMEOUT);
+  if (reason == nullptr || !host.First("libvirt")) return;
+  Warning("libvirt: %s: balloons and guests of its machines may have no value\n", reason);
+}
+
+LibvirtAnswer Ask(const LinuxHost& host, const LibvirtDaemon& daemon) {
+  std::chrono::steady_clock::duration& left = host.Kept().monitorTime;
+  const LinuxHost::TimePoint start = host.Now();
+  const auto patience = std::min<std::chrono::steady_clock::duration>(kLibvirtPatience, left);
+  LibvirtAnswer answer =
+      AskLibvirt(kLibvirtLibrary, daemon.uri, host.TimeSource(), start + patience);
+  left -= host.Now() - start;
+  return answer;
+}
+
+}  // namespace
+
+// Whose descriptors may not be read is believed: nobody else could have put the socket there.
+bool IsThere(const LinuxHost& host, const GroupTree& tree, const LibvirtDaemon& daemon) {
   if (!IsOwn(daemon.directory.substr(0, daemon.directory.size() - 1), daemon.owner, S_IFDIR)) {
     return false;
   }
@@ -65,28 +77,6 @@ bool IsThere(const LinuxHost& host, const GroupTree& tree, const Daemon& daemon)
     });
   });
 }
-
-void TellEnd(const LinuxHost& host, LibvirtAnswer::End end) {
-  const char* reason = nullptr;
-  if (end == LibvirtAnswer::End::kNoLibrary) reason = "its library cannot be loaded";
-  if (end == LibvirtAnswer::End::kNoConnection) reason = "it lets nobody in";
-  if (end == LibvirtAnswer::End::kTooLate) reason = "it has not told all in time";
-  if (end == LibvirtAnswer::End::kTooLate) host.Lose(KSI_STATUS_TIMEOUT);
-  if (reason == nullptr || !host.First("libvirt")) return;
-  Warning("libvirt: %s: balloons and guests of its machines may have no value\n", reason);
-}
-
-LibvirtAnswer Ask(const LinuxHost& host, const Daemon& daemon) {
-  std::chrono::steady_clock::duration& left = host.Kept().monitorTime;
-  const LinuxHost::TimePoint start = host.Now();
-  const auto patience = std::min<std::chrono::steady_clock::duration>(kLibvirtPatience, left);
-  LibvirtAnswer answer =
-      AskLibvirt(kLibvirtLibrary, daemon.uri, host.TimeSource(), start + patience);
-  left -= host.Now() - start;
-  return answer;
-}
-
-}  // namespace
 
 int32_t ProcessOfDomain(const LinuxHost& host, const GroupTree& tree, const std::string& directory,
                         uint32_t owner, const LibvirtDomain& domain) {
@@ -108,7 +98,7 @@ int32_t ProcessOfDomain(const LinuxHost& host, const GroupTree& tree, const std:
 LibvirtDomains ReadLibvirt(const LinuxHost& host, const GroupTree& tree) {
   LibvirtDomains domains;
   if (!host.IsThisMachine()) return domains;
-  for (const Daemon& daemon : AllDaemons()) {
+  for (const LibvirtDaemon& daemon : AllDaemons()) {
     if (!IsThere(host, tree, daemon)) continue;
     const LibvirtAnswer answer = Ask(host, daemon);
     TellEnd(host, answer.end);

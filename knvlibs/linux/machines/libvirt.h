@@ -24,6 +24,19 @@ using LibvirtDomains = std::map<int32_t, LibvirtDomain>;
 // Asks the daemons that run, if they are root's or the user's own; none are started for it.
 LibvirtDomains ReadLibvirt(const LinuxHost& host, const GroupTree& tree);
 
+// A daemon's connection and what it keeps in files.
+struct LibvirtDaemon {
+  const char* uri;
+  std::string directory;             // of its sockets
+  std::vector<const char*> sockets;  // that a connection which can only read goes to
+  std::string pidFiles;              // below it
+  uint32_t owner;
+};
+
+// Whether a process of the daemon's name and owner listens at one of its sockets, in a directory
+// that nobody else may write to.
+bool IsThere(const LinuxHost& host, const GroupTree& tree, const LibvirtDaemon& daemon);
+
 // The process of a domain, by the file in `directory` that the daemon of user `owner` keeps for it,
 // if that is a QEMU that was started for this domain; 0 if not.
 int32_t ProcessOfDomain(const LinuxHost& host, const GroupTree& tree, const std::string& directory,

@@ -1,5 +1,8 @@
 // libvirt: what its descriptions say, what its library may do, and whose machines are believed.
 #include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -208,6 +211,70 @@ TEST_F(DomainProcessTest, IsNotToldByAFileOfSomebodyElse) { EXPECT_EQ(Find(geteu
 TEST_F(DomainProcessTest, IsNotSoughtOutsideOfTheDirectory) {
   domain_.name = "../run/web";
   EXPECT_EQ(Find(), 0);
+}
+
+// Which daemons are asked. The tree calls this process libvirtd; it listens itself.
+
+class DaemonTest : public testing::Test {
+ protected:
+  DaemonTest() {
+    Call("libvirtd");
+    tree_.Write("/run/file", "");
+    EXPECT_EQ(chmod(daemon_.directory.c_str(), 0755), 0);
+    Listen(fd_.Get(), "socket");
+  }
+
+  void Call(const std::string& name) const {
+    tree_.Write(ProcessFile(getpid(), "status"),
+                "Name:\t" + name + "\nState:\tS\nPPid:\t1\nVmSize:\t9 kB\nThreads:\t2\n");
+  }
+
+  void Listen(int fd, const std::string& name) const {
+    sockaddr_un address = {};
+    address.sun_family = AF_UNIX;
+    (daemon_.directory + name).copy(address.sun_path, sizeof address.sun_path - 1);
+    EXPECT_EQ(bind(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+    EXPECT_EQ(listen(fd, 1), 0);
+  }
+
+  bool IsBelieved() const {
+    const LinuxHost host(tree_.Root());
+    const GroupTree* groups = nullptr;
+    EXPECT_EQ(GroupTree::Get(host, groups), kOk);
+    return IsThere(LinuxHost("/"), *groups, daemon_);
+  }
+
+  HostTree tree_;
+  LibvirtDaemon daemon_{"", tree_.Root() + "/run/", {"none", "socket"}, "", geteuid()};
+  FileDescriptor fd_{socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)};
+};
+
+TEST_F(DaemonTest, IsThereWhereItListens) {
+  EXPECT_TRUE(IsBelieved());
+  Call("virtqemud");
+  EXPECT_TRUE(IsBelieved());
+  daemon_.sockets = {"none", "file"};
+  EXPECT_FALSE(IsBelieved());
+  daemon_.sockets = {"socket"};
+  fd_ = FileDescriptor();
+  EXPECT_FALSE(IsBelieved()) << "left behind";
+}
+
+TEST_F(DaemonTest, IsNotWhoIsCalledOtherwise) {
+  Call("other");
+  EXPECT_FALSE(IsBelieved());
+}
+
+TEST_F(DaemonTest, IsNotWhereOthersMayWrite) {
+  for (const mode_t mode : {0775, 0757, 0777}) {
+    EXPECT_EQ(chmod(daemon_.directory.c_str(), mode), 0);
+    EXPECT_FALSE(IsBelieved()) << mode;
+  }
+}
+
+TEST_F(DaemonTest, IsNotSomebodyElse) {
+  ++daemon_.owner;
+  EXPECT_FALSE(IsBelieved());
 }
 
 // What is taken of a domain.
