@@ -53,7 +53,7 @@ class Whole : public JsonEvents {
     if (open_.empty()) {
       value_ = std::move(value);
     } else {
-      open_.back()->members.push_back({std::move(name_), std::move(value)});
+      open_.back()->members.push_back({std::exchange(name_, {}), std::move(value)});
     }
     return true;
   }
@@ -72,7 +72,6 @@ class Whole : public JsonEvents {
 
   bool OnEnd() override {
     open_.pop_back();
-    name_.clear();
     return true;
   }
 

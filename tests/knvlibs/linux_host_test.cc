@@ -431,6 +431,21 @@ TEST_F(LinuxHostTest, SlabCachesAreSeenInTheirDirectoryWhereTheFileMayNotBe) {
       kOk, "^$");
 }
 
+TEST_F(LinuxHostTest, SlabsHaveAsManyPagesAsACountHolds) {
+  WriteSlabinfo("dentry 1 2 64 64 1 : tunables 0 0 0 : slabdata 1 1 0\n");
+  tree_.Lock("/proc/slabinfo");
+  const std::string cache = "/sys/kernel/slab/dentry/";
+  for (const char* file : {"slab_size", "slabs", "total_objects", "objects"}) {
+    tree_.Write(cache + file, "1\n");
+  }
+  std::vector<std::string> names;
+  tree_.Write(cache + "order", "31\n");
+  ExpectAsNobody([&] { return Names("system/heaps", {}, &names); }, kOk, "^$");
+  tree_.Write(cache + "order", "32\n");
+  ExpectAsNobody([&] { return Names("system/heaps", {}, &names); }, KSI_STATUS_INVALID_METADATA,
+                 "^/sys/kernel/slab/dentry/order: line 1 is not understood\n$");
+}
+
 TEST_F(LinuxHostTest, KernelWithoutSlabCachesHasVmallocAlone) {
   WriteMeminfo();
   std::vector<std::string> names;

@@ -50,6 +50,7 @@ TEST(Printable, WhatATerminalMightObeyIsEscaped) {
 TEST(Printable, WhatIsNotUtf8IsEscapedByteByByte) {
   EXPECT_EQ(Printable("\xff\x80"), R"(\xff\x80)");
   EXPECT_EQ(Printable("\xc3"), R"(\xc3)");  // cut off
+  EXPECT_EQ(PrintableJson("\xff\x80"), "\xff\x80") << "no character, and JSON has no bytes";
   EXPECT_EQ(Printable("\xe2\x82z"), R"(\xe2\x82z)");
   EXPECT_EQ(Printable("\xc1\x9b"), R"(\xc1\x9b)");  // too long for its character
   EXPECT_EQ(Printable("\xe0\x82\x9b"), R"(\xe0\x82\x9b)");

@@ -150,20 +150,41 @@ TEST(PageMapTest, AScanThatFailsIsToldAndTheProcessIsNotGone) {
   ExpectFailedCount(EINTR, 0, kOk, kNoTime);
 }
 
-TEST(PageMapTest, SoIsAReadOfEntries) {
+// Whether the kernel tells this process in which frame a page lies.
+bool TellsFrames() {
   uint64_t entry = 0;
   const FileDescriptor pagemap(open("/proc/self/pagemap", O_RDONLY | O_CLOEXEC));
   const auto page = reinterpret_cast<uintptr_t>(&entry) / static_cast<uintptr_t>(getpagesize());
   const auto at = static_cast<off_t>(page * sizeof entry);
-  if (pread(pagemap.Get(), &entry, sizeof entry, at) != sizeof entry || entry << 9 == 0) {
-    GTEST_SKIP() << "this kernel tells nobody here which pages are zero pages";
-  }
+  return pread(pagemap.Get(), &entry, sizeof entry, at) == sizeof entry && entry << 9 != 0;
+}
+
+TEST(PageMapTest, SoIsAReadOfEntries) {
+  if (!TellsFrames()) GTEST_SKIP() << "this kernel tells nobody here which pages are zero pages";
   const std::string file = "/proc/[0-9]+/pagemap: ";
   ExpectFailedCount(ENOTTY, EIO, KSI_STATUS_IO_ERROR, file + "Input/output error" + kLeftOut);
   ExpectFailedCount(ENOTTY, ENOMEM, KSI_STATUS_NO_MEMORY,
                     file + "Cannot allocate memory" + kLeftOut);
   ExpectFailedCount(ENOTTY, ESRCH, KSI_STATUS_NOT_FOUND, "");
   ExpectFailedCount(ENOTTY, EINTR, kOk, kNoTime);
+}
+
+TEST(PageMapTest, EntriesTellWhatAScanTells) {
+  if (!TellsFrames()) GTEST_SKIP() << "this kernel tells nobody here which pages are zero pages";
+  const Memory memory(40 * kMB);
+  memory.Write(0, 20 * kMB);
+  memory.Read(20 * kMB, kMB);
+  memory.Write(22 * kMB, 18 * kMB);
+  const uint64_t start = memory.Range().start;
+  const AddressRange ranges[] = {{start + kMB, start + 2 * kMB},
+                                 {start + 3 * kMB, start + 23 * kMB}};
+  const auto count = [&] {
+    FailPagemap(ENOTTY, 0);
+    PageCounts counts;
+    return CountPages(LinuxHost("/"), getpid(), ranges, counts) == kOk &&
+           counts.resident == 19 * 1024u && counts.swapped == 0u && !counts.huge;
+  };
+  EXPECT_EXIT(_exit(count() ? 0 : 1), testing::ExitedWithCode(0), "^$");
 }
 
 TEST(PageMapTest, WithoutTimeThereAreNoFiguresAndAWord) {
