@@ -202,6 +202,11 @@ TEST_F(Ksicache, CaptureTakesTheNameOfAHostFromAFileAlone) {
   other.Write("/secret", "secret\n");
   ASSERT_EQ(symlink((other.Root() + "/secret").c_str(), file.c_str()), 0);
   EXPECT_EQ(name(host), "unknown");
+  const harness::Result result = Run({"capture", "--force", Path("a.ksi"), "--root", host.Root()});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_NE(result.err.find("ksicache: " + file + ": leads out of the recorded tree\n"),
+            std::string::npos)
+      << result.err;
 }
 
 TEST_F(Ksicache, CaptureOfThisMachineIsAGoodFile) {

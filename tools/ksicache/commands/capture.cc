@@ -39,8 +39,12 @@ std::string Now() {
 // left there: a pipe, or a link to where nothing is to be read.
 std::string StartOf(const std::string& root, std::string_view path) {
   const std::string fileName = root + std::string(path);
-  const ksi::FileDescriptor file = ksi::HostRoot(root).Open(path, O_RDONLY | O_NONBLOCK);
-  if (!file.IsOpen() && (errno == ENOENT || errno == ENOTDIR || errno == ENXIO)) return "";
+  const ksi::HostRoot host(root);
+  const ksi::FileDescriptor file = host.Open(path, O_RDONLY | O_NONBLOCK);
+  if (!file.IsOpen() && (errno == ENOENT || errno == ENOTDIR || errno == ENXIO)) {
+    if (host.LeadsOut(path)) throw Error(fileName + ": leads out of the recorded tree");
+    return "";
+  }
   struct stat info = {};
   if (!file.IsOpen() || fstat(file.Get(), &info) != 0) throw SystemError(fileName, errno);
   if (!S_ISREG(info.st_mode)) return "";
