@@ -18,8 +18,8 @@ class ChunkWriter {
 
   const HostIdentity& Host() const { return host_; }
   size_t Count() const { return moments_.size(); }
-  // REQUIRES: there is a moment.
-  const MomentFacts& First() const { return moments_.front().facts; }
+  // REQUIRES: there is such a moment.
+  const MomentFacts& At(size_t i) const { return moments_[i].facts; }
   const MomentFacts& Last() const { return moments_.back().facts; }
 
   // Takes the next moment of the host, with its readings in the order of SortReadings.

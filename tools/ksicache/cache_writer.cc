@@ -1,6 +1,7 @@
 #include "tools/ksicache/cache_writer.h"
 
 #include <new>
+#include <utility>
 
 #include "knvlibs/cache_format.h"
 #include "tools/ksicache/error.h"
@@ -26,8 +27,7 @@ void CheckText(std::string_view text) {
 
 }  // namespace
 
-CacheWriter::CacheWriter(const std::string& fileName, bool replace, mode_t mode)
-    : file_(fileName, replace, mode) {
+CacheContent::CacheContent(std::string name) : name_(std::move(name)) {
   Open();
   Execute("PRAGMA application_id=" + std::to_string(ksi::cache::kApplicationId));
   Execute("PRAGMA user_version=" + std::to_string(ksi::cache::kSchemaVersion));
@@ -40,7 +40,7 @@ CacheWriter::CacheWriter(const std::string& fileName, bool replace, mode_t mode)
           SQLITE_OK);
 }
 
-void CacheWriter::Open() {
+void CacheContent::Open() {
   sqlite3* handle = nullptr;
   const int code =
       sqlite3_open_v2("capture", &handle,
@@ -53,20 +53,20 @@ void CacheWriter::Open() {
   Execute("PRAGMA journal_mode=OFF");
 }
 
-void CacheWriter::Execute(const std::string& sql) {
+void CacheContent::Execute(const std::string& sql) {
   Require(sqlite3_exec(database_.get(), sql.c_str(), nullptr, nullptr, nullptr) == SQLITE_OK);
 }
 
-void CacheWriter::Require(bool good) {
+void CacheContent::Require(bool good) {
   if (good) return;
   const int code = database_ == nullptr ? SQLITE_NOMEM : sqlite3_extended_errcode(database_.get());
   if (code == SQLITE_NOMEM || code == SQLITE_IOERR_NOMEM) throw std::bad_alloc();
   const std::string reason =
       code == SQLITE_FULL ? "it is larger than 1 GiB" : sqlite3_errmsg(database_.get());
-  throw Error(file_.Name() + ": cannot write: " + reason);
+  throw Error(name_ + ": cannot write: " + reason);
 }
 
-void CacheWriter::WriteNodes() {
+void CacheContent::WriteNodes() {
   ksi::Statement insert;
   Require(insert.Prepare(database_.get(), "INSERT INTO node VALUES(?1, ?2, ?3)") == SQLITE_OK);
   const auto write = [&](const ksi::Node& node, ksi::Kind kind, std::string_view name) {
@@ -82,7 +82,7 @@ void CacheWriter::WriteNodes() {
   }
 }
 
-void CacheWriter::BindKey(ksi::Statement& statement, int parameter, const ksi::Key& key) {
+void CacheContent::BindKey(ksi::Statement& statement, int parameter, const ksi::Key& key) {
   if (key.kind == ksi::KeyKind::kNumber) {
     return Require(statement.Bind(parameter, key.number) == SQLITE_OK);
   }
@@ -90,15 +90,15 @@ void CacheWriter::BindKey(ksi::Statement& statement, int parameter, const ksi::K
   Require(statement.Bind(parameter, key.text) == SQLITE_OK);
 }
 
-void CacheWriter::BindKeys(ksi::Statement& statement, const ksi::Keys& keys) {
+void CacheContent::BindKeys(ksi::Statement& statement, const ksi::Keys& keys) {
   constexpr ksi::Key kAbsent = {ksi::KeyKind::kText, 0, {}};
   for (size_t i = 0; i < ksi::kMaxKeys; ++i) {
     BindKey(statement, static_cast<int>(i) + 1, i < keys.count ? keys[i] : kAbsent);
   }
 }
 
-void CacheWriter::AddReading(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
-                             ksi::Status status) {
+void CacheContent::AddReading(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
+                              ksi::Status status) {
   BindKeys(addReading_, keys);
   Require(addReading_.Bind(kNode, RowId(node, kind)) == SQLITE_OK);
   Require(addReading_.Bind(kStatus, int64_t{status}) == SQLITE_OK);
@@ -108,20 +108,20 @@ void CacheWriter::AddReading(const ksi::Node& node, ksi::Kind kind, const ksi::K
   Require(code == SQLITE_DONE);
 }
 
-void CacheWriter::AddValue(const ksi::Node& node, const ksi::Keys& keys,
-                           std::span<const std::byte> record) {
+void CacheContent::AddValue(const ksi::Node& node, const ksi::Keys& keys,
+                            std::span<const std::byte> record) {
   Require(addReading_.Bind(kAnswer, record) == SQLITE_OK);
   AddReading(node, ksi::Kind::kValue, keys, ksi::kOk);
   ++values_;
 }
 
-void CacheWriter::AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
-                             ksi::Status status) {
+void CacheContent::AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
+                              ksi::Status status) {
   Require(addReading_.BindNull(kAnswer) == SQLITE_OK);
   AddReading(node, kind, keys, status);
 }
 
-void CacheWriter::StartList(const ksi::Node& node, const ksi::Keys& keys, size_t count) {
+void CacheContent::StartList(const ksi::Node& node, const ksi::Keys& keys, size_t count) {
   Require(addReading_.Bind(kAnswer, static_cast<int64_t>(count)) == SQLITE_OK);
   AddReading(node, ksi::Kind::kList, keys, ksi::kOk);
   ++lists_;
@@ -130,7 +130,7 @@ void CacheWriter::StartList(const ksi::Node& node, const ksi::Keys& keys, size_t
   Require(addEntry_.Bind(kNode, RowId(node, ksi::Kind::kList)) == SQLITE_OK);
 }
 
-void CacheWriter::AddEntry(const ksi::Key& entry) {
+void CacheContent::AddEntry(const ksi::Key& entry) {
   Require(addEntry_.Bind(kPosition, position_++) == SQLITE_OK);
   BindKey(addEntry_, kEntry, entry);
   const int code = addEntry_.Step();
@@ -138,13 +138,13 @@ void CacheWriter::AddEntry(const ksi::Key& entry) {
   Require(code == SQLITE_DONE);
 }
 
-void CacheWriter::AddList(const ksi::Node& node, const ksi::Keys& keys,
-                          std::span<const ksi::Key> entries) {
+void CacheContent::AddList(const ksi::Node& node, const ksi::Keys& keys,
+                           std::span<const ksi::Key> entries) {
   StartList(node, keys, entries.size());
   for (const ksi::Key& entry : entries) AddEntry(entry);
 }
 
-void CacheWriter::WriteCapture(const ksi::CacheFile::Capture& capture) {
+void CacheContent::WriteCapture(const ksi::CacheFile::Capture& capture) {
   ksi::Statement insert;
   Require(insert.Prepare(database_.get(), "INSERT INTO capture VALUES(?1, ?2, ?3, ?4)") ==
           SQLITE_OK);
@@ -156,7 +156,7 @@ void CacheWriter::WriteCapture(const ksi::CacheFile::Capture& capture) {
   Require(insert.Step() == SQLITE_DONE);
 }
 
-void CacheWriter::Commit(const ksi::CacheFile::Capture& capture) {
+std::span<const std::byte> CacheContent::Finish(const ksi::CacheFile::Capture& capture) {
   WriteCapture(capture);
   addReading_ = {};
   addEntry_ = {};
@@ -165,7 +165,7 @@ void CacheWriter::Commit(const ksi::CacheFile::Capture& capture) {
   const auto* content = reinterpret_cast<const std::byte*>(
       sqlite3_serialize(database_.get(), kMain, &size, SQLITE_SERIALIZE_NOCOPY));
   Require(content != nullptr);
-  file_.Commit({content, static_cast<size_t>(size)});
+  return {content, static_cast<size_t>(size)};
 }
 
 }  // namespace ksicache

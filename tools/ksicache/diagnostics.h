@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace ksicache {
@@ -19,6 +20,9 @@ class Diagnostics {
 
   // Says those that have not been said.
   void Say();
+
+  // Takes them to say them elsewhere.
+  std::vector<std::string> TakeKept() { return std::exchange(kept_, {}); }
 
   // All, said or not.
   size_t Count() const { return count_; }

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdlib>
 #include <cstring>
+#include <optional>
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/node_table.h"
@@ -41,19 +42,28 @@ ksi::Keys HostWalk::KeysOf(const Object& object) {
   return keys;
 }
 
-void HostWalk::Run() {
+void HostWalk::Run(bool progress) {
   Find({});
   for (const std::string_view state : ksi::kMemoryStates) FindText(ksi::Instance::kState, state);
   FindNumber(ksi::Instance::kGroup, kRootGroup);
-  Progress progress("capturing");
+  std::optional<Progress> bar;
+  if (progress) bar.emplace("capturing");
   size_t done = 0;
   while (!toRead_.empty()) {
-    progress.Show(done, done + toRead_.size());
+    if (bar) bar->Show(done, done + toRead_.size());
     const Object object = std::move(toRead_.back());
     toRead_.pop_back();
     Read(object);
     ++done;
   }
+}
+
+void HostWalk::RequireFound() const {
+  if (foundAnything_) return;
+  const FailedReads& first = failures_.failed.Count() != 0    ? failures_.failed
+                             : failures_.refused.Count() != 0 ? failures_.refused
+                                                              : failures_.absent;
+  throw Error("nothing of the host can be read; failed reads " + first.Text());
 }
 
 void HostWalk::Find(const Object& object) {
@@ -82,7 +92,7 @@ void HostWalk::ReadValue(const ksi::Node& node, const ksi::Keys& keys) {
   const ksi::Buffer record = ksi::Buffer(buffer).first(node.recordSize);
   const ksi::Status status = host_.Value(node, keys, record);
   if (status != ksi::kOk) return AddFailure(node, ksi::Kind::kValue, keys, status);
-  writer_.AddValue(node, keys, record);
+  sink_.AddValue(node, keys, record);
   foundAnything_ = foundAnything_ ||
                    std::ranges::any_of(record, [](std::byte byte) { return byte != std::byte{0}; });
   FindInValue(node, record);
@@ -92,14 +102,14 @@ void HostWalk::ReadList(const ksi::Node& node, const ksi::Keys& keys, const Obje
   HostLibrary::Instances instances;
   const ksi::Status status = host_.List(node, keys, &instances);
   if (status != ksi::kOk) return AddFailure(node, ksi::Kind::kList, keys, status);
-  writer_.AddList(node, keys, instances.Entries());
+  sink_.AddList(node, keys, instances.Entries());
   foundAnything_ = foundAnything_ || !instances.Entries().empty();
   FindInList(node, object, instances.Entries());
 }
 
 void HostWalk::AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
                           ksi::Status status) {
-  writer_.AddFailure(node, kind, keys, status);
+  sink_.AddFailure(node, kind, keys, status);
   failures_.Add(NameOf(node.path, keys), status);
 }
 

@@ -17,22 +17,24 @@
 
 #include "knvlibs/catalogue.h"
 #include "knvlibs/source.h"
-#include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/failures.h"
 #include "tools/ksicache/host_library.h"
+#include "tools/ksicache/reading_sink.h"
 
 namespace ksicache {
 
 class HostWalk {
  public:
-  HostWalk(HostLibrary& host, CacheWriter& writer) : host_(host), writer_(writer) {}
+  HostWalk(HostLibrary& host, ReadingSink& sink) : host_(host), sink_(sink) {}
 
-  void Run();
+  // `progress`: whether to show it to people.
+  void Run(bool progress);
 
   const Failures& GetFailures() const { return failures_; }
 
-  // Whether anything was read that is not nothing: a figure that is not 0, an instance.
-  bool FoundAnything() const { return foundAnything_; }
+  // Fails with an Error if nothing was read but nothing, no figure that is not 0 and no instance:
+  // that must not pass for a host that has nothing.
+  void RequireFound() const;
 
  private:
   // A key of an object, with what it names.
@@ -64,7 +66,7 @@ class HostWalk {
   void AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys, ksi::Status status);
 
   HostLibrary& host_;
-  CacheWriter& writer_;
+  ReadingSink& sink_;
   Failures failures_;
   bool foundAnything_ = false;
   std::vector<Object> toRead_;

@@ -37,8 +37,10 @@ void PrintError(std::string_view message) try {
 
 void PrintNoMemory() { static_cast<void>(std::fputs("ksicache: out of memory\n", stderr)); }
 
-void FinishOutput() {
+void FlushOutput() {
   if (std::fflush(stdout) != 0) ThrowLost();
 }
+
+void FinishOutput() { FlushOutput(); }
 
 }  // namespace ksicache

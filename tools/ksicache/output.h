@@ -18,7 +18,9 @@ void PrintError(std::string_view message);
 // That there is no memory, without any.
 void PrintNoMemory();
 
-// Fails if not all that was printed got out.
+// Fails if not all that was printed gets out.
+void FlushOutput();
+// The same, at the end.
 void FinishOutput();
 
 }  // namespace ksicache

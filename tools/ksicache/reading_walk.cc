@@ -1,9 +1,5 @@
 #include "tools/ksicache/reading_walk.h"
 
-#include <sys/stat.h>
-
-#include <cerrno>
-#include <cstring>
 #include <new>
 #include <optional>
 #include <tuple>
@@ -21,33 +17,6 @@ namespace {
 [[noreturn]] void ThrowFailed(const ksi::CacheFile& file) {
   RequireMemory(file);
   ThrowDamaged(file.ErrorText());
-}
-
-// A cache file is read here and there, which a pipe does not allow.
-bool IsRegular(const std::string& fileName) {
-  struct stat info = {};
-  return stat(fileName.c_str(), &info) != 0 || S_ISREG(info.st_mode);
-}
-
-std::string MeaningOf(ksi::Status status, const std::string& fileName) {
-  switch (status) {
-    case KSI_STATUS_NOT_FOUND:
-      return std::strerror(ENOENT);
-    case KSI_STATUS_PERMISSION_DENIED:
-      return std::strerror(EACCES);
-    case KSI_STATUS_IS_A_DIRECTORY:
-      return std::strerror(EISDIR);
-    case KSI_STATUS_INVALID_METADATA:
-      return IsRegular(fileName) ? "not a cache file" : "is not a regular file";
-    case KSI_STATUS_MAJOR_VERSION_MISMATCH:
-      return "made by a newer version";
-    case KSI_STATUS_METADATA_READ_ERROR:
-      return "damaged";
-    case KSI_STATUS_NO_MEMORY:
-      return "out of memory";
-    default:
-      return "cannot be read";
-  }
 }
 
 // Takes a key column; false if it is no key at all.
@@ -136,16 +105,6 @@ int ForEachFile(const std::vector<std::string>& fileNames,
     }
   }
   return good ? 0 : 1;
-}
-
-std::unique_ptr<ksi::CacheFile> OpenCacheFile(const std::string& fileName) {
-  std::unique_ptr<ksi::CacheFile> file;
-  std::string why;
-  const ksi::Status status = ksi::CacheFile::Open(fileName.c_str(), &file, &why);
-  if (status != ksi::kOk) {
-    throw DataError(MeaningOf(status, fileName) + (why.empty() ? "" : ": " + why));
-  }
-  return file;
 }
 
 void ForEachReading(const ksi::CacheFile& file, const std::function<void(const Reading&)>& visit) {

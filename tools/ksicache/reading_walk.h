@@ -4,7 +4,6 @@
 
 #include <cstddef>
 #include <functional>
-#include <memory>
 #include <span>
 #include <string>
 #include <vector>
@@ -37,9 +36,6 @@ void RequireMemory(const ksi::CacheFile& file);
 // their turn. Gives the exit status: 0 if `visit` was content with all.
 int ForEachFile(const std::vector<std::string>& fileNames,
                 const std::function<bool(const std::string& fileName)>& visit);
-
-// Opens a cache file for looking into it; fails with a DataError that says what is wrong.
-std::unique_ptr<ksi::CacheFile> OpenCacheFile(const std::string& fileName);
 
 // All readings, by keys and then by node. Fails with a DataError on damage.
 void ForEachReading(const ksi::CacheFile& file, const std::function<void(const Reading&)>& visit);

@@ -1,21 +1,17 @@
 // capture: records a host, whatever libknvlibs.so answers of it.
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <array>
-#include <cerrno>
 #include <ctime>
 #include <string>
 #include <string_view>
 
 #include "knvlibs/cache_format.h"
-#include "knvlibs/linux/host/host_root.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diagnostics.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/host_files.h"
 #include "tools/ksicache/host_library.h"
 #include "tools/ksicache/host_walk.h"
 #include "tools/ksicache/new_file.h"
@@ -24,7 +20,6 @@
 namespace ksicache {
 namespace {
 
-constexpr Option kRoot = {"root", "DIR", "capture the host whose files are recorded below DIR"};
 constexpr const Option* kOptions[] = {&kForce, &kMode, &kRoot};
 
 std::string Now() {
@@ -35,57 +30,13 @@ std::string Now() {
   return {text.data(), strftime(text.data(), text.size(), ksi::cache::kTimeForm, &parts)};
 }
 
-// The start of a small file of a recorded host, empty if it is none. It may be whatever somebody
-// left there: a pipe, or a link to where nothing is to be read.
-std::string StartOf(const std::string& root, std::string_view path) {
-  const std::string fileName = root + std::string(path);
-  const ksi::HostRoot host(root);
-  const ksi::FileDescriptor file = host.Open(path, O_RDONLY | O_NONBLOCK);
-  if (!file.IsOpen() && (errno == ENOENT || errno == ENOTDIR || errno == ENXIO)) {
-    if (host.LeadsOut(path)) throw Error(fileName + ": leads out of the recorded tree");
-    return "";
-  }
-  struct stat info = {};
-  if (!file.IsOpen() || fstat(file.Get(), &info) != 0) throw SystemError(fileName, errno);
-  if (!S_ISREG(info.st_mode)) return "";
-  std::array<char, 256> text;
-  const ssize_t size = read(file.Get(), text.data(), text.size());
-  if (size < 0) throw SystemError(fileName, errno);
-  return {text.data(), static_cast<size_t>(size)};
-}
-
-// "unknown" if it has none or, which is said and told by `isRead`, if it cannot be read.
-std::string HostName(const std::string* root, bool& isRead) {
-  std::array<char, 256> own = {};
-  std::string name;
-  isRead = true;
-  if (root != nullptr) {
-    try {
-      name = StartOf(*root, "/proc/sys/kernel/hostname");
-    } catch (const Error& error) {
-      PrintError(error.what());
-      isRead = false;
-    }
-  } else if (gethostname(own.data(), own.size() - 1) == 0) {
-    name = own.data();
-  }
-  name.resize(std::min(name.size(), name.find_first_of(std::string_view("\n\0", 2))));
-  return name.empty() ? "unknown" : name;
-}
-
-void CheckRoot(const std::string& root) {
-  if (access((root + "/proc/meminfo").c_str(), F_OK) == 0) return;
-  if (errno != ENOENT && errno != ENOTDIR) throw SystemError(root, errno);
-  throw Error(root + ": is not the root of a Linux host: it has no proc/meminfo");
-}
-
 // The lines on what was captured; on standard error if the file itself is on standard output.
 class Account {
  public:
   explicit Account(bool onStandardError) : say_(onStandardError ? PrintError : PrintLine) {}
 
   void OfFile(const CacheWriter& writer, const std::string& host) const {
-    say_(writer.FileName() + ": " + std::to_string(writer.Values()) + " values and " +
+    say_(writer.Name() + ": " + std::to_string(writer.Values()) + " values and " +
          std::to_string(writer.Lists()) + " lists of " + host);
   }
 
@@ -119,16 +70,6 @@ class Account {
   void (*say_)(std::string_view);
 };
 
-// A file that holds nothing must not pass for one of a host that has nothing.
-void CheckFound(const HostWalk& walk) {
-  if (walk.FoundAnything()) return;
-  const Failures& failures = walk.GetFailures();
-  const FailedReads& first = failures.failed.Count() != 0    ? failures.failed
-                             : failures.refused.Count() != 0 ? failures.refused
-                                                             : failures.absent;
-  throw Error("nothing of the host can be read; failed reads " + first.Text());
-}
-
 int Capture(const CommandLine& line) {
   const std::string& fileName = line.arguments[0];
   const std::string* root = line.ValueOf(kRoot);
@@ -140,9 +81,9 @@ int Capture(const CommandLine& line) {
   HostLibrary library(root);
   const std::string taken = Now();
   HostWalk walk(library, writer);
-  walk.Run();
+  walk.Run(true);
   diagnostics.Say();
-  CheckFound(walk);
+  walk.RequireFound();
 
   const HostLibrary::Definitions definitions = library.KernelDefinitions();
   bool isNameRead = false;

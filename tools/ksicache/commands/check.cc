@@ -8,8 +8,11 @@
 #include "knvlibs/cache_format.h"
 #include "knvlibs/node_table.h"
 #include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/error.h"
 #include "tools/ksicache/group_tree.h"
+#include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
+#include "tools/ksicache/progress.h"
 #include "tools/ksicache/reading_walk.h"
 
 namespace ksicache {
@@ -202,9 +205,37 @@ class Checker {
   size_t problems_ = 0;
 };
 
+// All parts of a recording, and of each its last moment as a capture.
+bool CheckRecording(const std::string& fileName) {
+  const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName);
+  const std::vector<ksi::RecordingFile::Part>& parts = recording->Parts();
+  Progress progress("checking");
+  size_t problems = 0;
+  for (size_t i = 0; i < parts.size(); ++i) {
+    progress.Show(i, parts.size());
+    const std::string name = fileName + "@" + ksi::TextOfTime(parts[i].last);
+    ksi::Moment moment;
+    if (recording->ReadMoment(parts[i].End() - 1, moment) != ksi::kOk) {
+      PrintLine(name + ": damaged: " + recording->Why());
+      ++problems;
+      continue;
+    }
+    try {
+      const OpenedFile opened(name, moment);
+      problems += Checker(name, opened.File()).Run();
+    } catch (const DataError& error) {
+      PrintLine(name + ": " + error.what());
+      ++problems;
+    }
+  }
+  return problems == 0;
+}
+
 int Check(const CommandLine& line) {
   return ForEachFile(line.arguments, [](const std::string& fileName) {
-    return Checker(fileName, *OpenCacheFile(fileName)).Run() == 0;
+    if (IsRecording(fileName)) return CheckRecording(fileName);
+    const OpenedFile opened(fileName);
+    return Checker(fileName, opened.File()).Run() == 0;
   });
 }
 

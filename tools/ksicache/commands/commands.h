@@ -7,12 +7,17 @@
 namespace ksicache {
 
 extern const Command kCapture;
+extern const Command kRecord;
+extern const Command kMoments;
+extern const Command kExtract;
+extern const Command kJoin;
 extern const Command kInfo;
 extern const Command kDump;
 extern const Command kLoad;
 extern const Command kCheck;
 
-inline constexpr const Command* kCommands[] = {&kCapture, &kInfo, &kDump, &kLoad, &kCheck};
+inline constexpr const Command* kCommands[] = {&kCapture, &kRecord, &kMoments, &kExtract, &kJoin,
+                                              &kInfo, &kDump, &kLoad, &kCheck};
 
 }  // namespace ksicache
 

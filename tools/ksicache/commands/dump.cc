@@ -8,6 +8,7 @@
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/node_names.h"
+#include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/reading_walk.h"
 #include "tools/ksicache/record_json.h"
@@ -184,7 +185,8 @@ constexpr const Option* kOptions[] = {&kJson};
 
 int Dump(const CommandLine& line) {
   return ForEachFile({line.arguments[0]}, [&line](const std::string& fileName) {
-    return Dumper(*OpenCacheFile(fileName), line).Run() == 0;
+    const OpenedFile opened(fileName);
+    return Dumper(opened.File(), line).Run() == 0;
   });
 }
 

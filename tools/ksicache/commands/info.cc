@@ -3,11 +3,13 @@
 
 #include <cerrno>
 #include <limits>
+#include <utility>
 
 #include "knvlibs/cache_format.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/failures.h"
+#include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/reading_walk.h"
 
@@ -48,16 +50,51 @@ int64_t SizeOf(const std::string& fileName) {
   return status.st_size;
 }
 
-void PrintCapture(const ksi::CacheFile::Capture& capture, const std::string& fileName) {
-  const bool own = capture.signature == ksi::kDefinitions.signature;
+void PrintDefinitions(const std::string& built, const std::string& signature) {
+  const bool own = signature == ksi::kDefinitions.signature;
+  PrintLine("built      " + built);
+  PrintLine("signature  " + signature +
+            (own ? "" : ", not " + std::string(ksi::kDefinitions.signature) + " of this version"));
+}
+
+void PrintCapture(const OpenedFile& opened, const std::string& fileName) {
+  const ksi::CacheFile::Capture& capture = opened.File().GetCapture();
   PrintLine("file       " + fileName);
   PrintLine("host       " + capture.host);
   PrintLine("taken      " + capture.taken);
+  if (!opened.IsMoment()) {
+    PrintLine("size       " + std::to_string(SizeOf(fileName)) + " bytes, schema " +
+              std::to_string(ksi::cache::kSchemaVersion));
+  }
+  PrintDefinitions(capture.built, capture.signature);
+}
+
+void PrintRecording(ksi::RecordingFile& recording, const std::string& fileName) {
+  const std::vector<ksi::RecordingFile::Part>& parts = recording.Parts();
+  int64_t moments = 0;
+  int64_t bytes = 0;
+  size_t chunks = 0;
+  for (const ksi::RecordingFile::Part& part : parts) {
+    moments += part.moments;
+    bytes += part.size;
+    chunks += part.number == part.chunk ? 1 : 0;
+  }
+  ksi::HostIdentity host;
+  if (!parts.empty() && recording.ReadHost(parts.back(), host) != ksi::kOk) {
+    throw DataError("damaged: " + recording.Why());
+  }
+  PrintLine("file       " + fileName);
+  PrintLine("host       " + host.name);
+  if (!parts.empty()) {
+    PrintLine("from       " + ksi::TextOfTime(parts.front().first));
+    PrintLine("to         " + ksi::TextOfTime(parts.back().last));
+  }
+  PrintLine("moments    " + std::to_string(moments) + ", in " + std::to_string(parts.size()) +
+            " parts of " + std::to_string(chunks) + " chunks, with " + std::to_string(bytes) +
+            " bytes");
   PrintLine("size       " + std::to_string(SizeOf(fileName)) + " bytes, schema " +
-            std::to_string(ksi::cache::kSchemaVersion));
-  PrintLine("built      " + capture.built);
-  PrintLine("signature  " + capture.signature +
-            (own ? "" : ", not " + std::string(ksi::kDefinitions.signature) + " of this version"));
+            std::to_string(ksi::cache::kRecordingVersion));
+  if (!parts.empty()) PrintDefinitions(host.built, host.signature);
 }
 
 void PrintContents(const Contents& contents) {
@@ -72,11 +109,16 @@ void PrintContents(const Contents& contents) {
 int Info(const CommandLine& line) {
   bool first = true;
   return ForEachFile(line.arguments, [&first](const std::string& fileName) {
-    const std::unique_ptr<ksi::CacheFile> file = OpenCacheFile(fileName);
-    const Contents contents = ContentsOf(*file);
-    if (!first) PrintLine("");
-    first = false;
-    PrintCapture(file->GetCapture(), fileName);
+    if (IsRecording(fileName)) {
+      const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName);
+      if (!std::exchange(first, false)) PrintLine("");
+      PrintRecording(*recording, fileName);
+      return true;
+    }
+    const OpenedFile opened(fileName);
+    const Contents contents = ContentsOf(opened.File());
+    if (!std::exchange(first, false)) PrintLine("");
+    PrintCapture(opened, fileName);
     PrintContents(contents);
     return true;
   });

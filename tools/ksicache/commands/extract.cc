@@ -1,0 +1,42 @@
+// extract: one moment of a recording as a capture.
+#include <string>
+
+#include "tools/ksicache/cache_writer.h"
+#include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/moment_builder.h"
+#include "tools/ksicache/new_file.h"
+#include "tools/ksicache/opened_file.h"
+
+namespace ksicache {
+namespace {
+
+constexpr const Option* kOptions[] = {&kForce, &kMode};
+
+int Extract(const CommandLine& line) {
+  const std::string& target = line.arguments[1];
+  CheckOptionsFor(target, line);
+  const mode_t mode = ModeOf(line);
+  const ksi::Moment moment = ReadMoment(line.arguments[0]);
+  CacheWriter writer(target, line.Has(kForce), mode);
+  PutReadings(moment, writer);
+  writer.Commit(CaptureOf(moment));
+  return 0;
+}
+
+}  // namespace
+
+const Command kExtract = {
+    .name = "extract",
+    .arguments = "FILE@WHEN OUT",
+    .summary = "make a capture of one moment of a recording",
+    .help = R"(Makes OUT, a capture, of one moment of the recording FILE; "-" is standard output.
+Without @WHEN it is the last one.
+)",
+    .options = kOptions,
+    .fewest = 2,
+    .most = 2,
+    .run = Extract,
+};
+
+}  // namespace ksicache

@@ -1,0 +1,250 @@
+// record: takes a moment of this host again and again, into one file.
+#include <sys/stat.h>
+
+#include <array>
+#include <cerrno>
+#include <csignal>
+#include <ctime>
+#include <map>
+#include <memory>
+#include <string>
+
+#include "knvlibs/open_cache.h"
+#include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/diagnostics.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/host_files.h"
+#include "tools/ksicache/host_library.h"
+#include "tools/ksicache/new_file.h"
+#include "tools/ksicache/output.h"
+#include "tools/ksicache/quantity.h"
+#include "tools/ksicache/recorder.h"
+#include "tools/ksicache/sampler.h"
+
+namespace ksicache {
+namespace {
+
+constexpr Option kEvery = {"every", "TIME", "take a moment each TIME instead of 5s"};
+constexpr Option kKeep = {"keep", "TIME", "keep moments for TIME instead of 7d"};
+constexpr Option kMaxSize = {"max-size", "SIZE", "let FILE grow to SIZE instead of 2G"};
+constexpr Option kCount = {"count", "N", "end after N moments"};
+constexpr const Option* kOptions[] = {&kEvery, &kKeep, &kMaxSize, &kCount, &kMode, &kRoot};
+
+constexpr int64_t kSecond = 1'000'000;
+
+// A loss of power takes what was recorded since the last of these.
+constexpr int64_t kSyncEvery = 60 * kSecond;
+
+// What is the same again and again is said so often.
+constexpr int64_t kSayEvery = 3600 * kSecond;
+
+volatile std::sig_atomic_t stopped = 0;
+
+void Stop(int /*signal*/) { stopped = 1; }
+
+// The signals that end a recording in order.
+void CatchSignals() {
+  struct sigaction action = {};
+  action.sa_handler = Stop;
+  for (const int each : {SIGINT, SIGTERM, SIGHUP}) sigaction(each, &action, nullptr);
+}
+
+int64_t Now() {
+  struct timespec now = {};
+  clock_gettime(CLOCK_REALTIME, &now);
+  return int64_t{now.tv_sec} * kSecond + now.tv_nsec / 1000;
+}
+
+// Until a time of the clock on the wall, though it may be set meanwhile, or a signal.
+void SleepUntil(int64_t time) {
+  const struct timespec until = {time / kSecond, time % kSecond * 1000};
+  while (stopped == 0 && clock_nanosleep(CLOCK_REALTIME, TIMER_ABSTIME, &until, nullptr) == EINTR) {
+  }
+}
+
+// What is said again and again.
+class Log {
+ public:
+  void Say(const std::string& line) {
+    const int64_t now = Now();
+    int64_t& last = said_[line];
+    if (last == 0 || now - last >= kSayEvery || now < last) {
+      PrintError(line);
+      last = now;
+    }
+    // Lines that are all different are few in number, or of no use.
+    if (said_.size() > kMostLines) said_.clear();
+  }
+
+ private:
+  static constexpr size_t kMostLines = 1000;
+
+  std::map<std::string, int64_t> said_;
+};
+
+struct Plan {
+  int64_t every;
+  int64_t keep;
+  int64_t maxSize;
+  int64_t count;  // 0: until it is stopped
+};
+
+Plan PlanOf(const CommandLine& line) {
+  const Plan plan = {DurationOf(line, kEvery, 5 * kSecond),
+                     DurationOf(line, kKeep, 7 * 86400 * kSecond),
+                     SizeOf(line, kMaxSize, int64_t{2} << 30), CountOf(line, kCount, 0)};
+  if (plan.maxSize < RecordingStore::kSmallestFile) {
+    throw UsageError("--max-size is at least " +
+                     std::to_string(RecordingStore::kSmallestFile >> 20) + "M");
+  }
+  return plan;
+}
+
+class Recording {
+ public:
+  Recording(const std::string& fileName, const Plan& plan, const std::string* root)
+      : fileName_(fileName),
+        plan_(plan),
+        store_(fileName, plan.maxSize),
+        recorder_(store_),
+        sampler_(root) {
+    ksi::OpenedCache opened;
+    std::string why;
+    const ksi::Status status = ksi::OpenCache(fileName, &opened, &why);
+    if (status == ksi::kOk && opened.recording != nullptr) recorder_.Adopt(*opened.recording);
+    synced_ = Now();
+  }
+
+  // Gives the exit status.
+  int Run() {
+    int64_t taken = 0;
+    for (int64_t next = NextTick(Now()); stopped == 0; next = NextTick(Now())) {
+      // What was due while the last one was taken is left out, and not taken late.
+      if (last_ != 0 && next > last_)
+        skipped_ += static_cast<uint64_t>((next - last_) / plan_.every - 1);
+      SleepUntil(next);
+      if (stopped != 0) break;
+      last_ = next;
+      TakeMoment();
+      if (plan_.count != 0 && ++taken == plan_.count) break;
+    }
+    Finish();
+    return dropped_ == 0 ? 0 : 1;
+  }
+
+ private:
+  // Moments lie on the clock's grid.
+  int64_t NextTick(int64_t now) const { return (now / plan_.every + 1) * plan_.every; }
+
+  void TakeMoment() {
+    Diagnostics diagnostics;
+    try {
+      ksi::Moment moment = sampler_.Take();
+      moment.facts.skipped = skipped_;
+      recorder_.Add(moment.host, moment.facts, moment.readings);
+      skipped_ = 0;
+      ++recorded_;
+      SayAgain();
+      Tidy(moment.facts.taken);
+    } catch (const Error& error) {
+      Drop(error.what());
+    }
+    for (const std::string& line : diagnostics.TakeKept()) log_.Say(line);
+  }
+
+  void Tidy(int64_t now) {
+    recorder_.Tidy();
+    store_.RemoveBefore(now - plan_.keep);
+    if (now - synced_ >= kSyncEvery || now < synced_) {
+      store_.Sync();
+      synced_ = now;
+    }
+  }
+
+  // Once for each trouble.
+  void Drop(const std::string& why) {
+    ++skipped_;
+    ++dropped_;
+    if (isFailing_) return;
+    PrintError(why);
+    PrintError(fileName_ + ": moments are dropped until that is over");
+    isFailing_ = true;
+    failedFrom_ = dropped_ - 1;
+  }
+
+  void SayAgain() {
+    if (!isFailing_) return;
+    PrintError(fileName_ + ": is recorded again; " + std::to_string(dropped_ - failedFrom_) +
+               " moments were dropped");
+    isFailing_ = false;
+  }
+
+  void Finish() {
+    try {
+      recorder_.Pack();
+      store_.Sync();
+    } catch (const Error& error) {
+      PrintError(error.what());
+    }
+    PrintLine(fileName_ + ": " + std::to_string(recorded_) + " moments recorded" +
+              (dropped_ == 0 ? "" : ", " + std::to_string(dropped_) + " dropped") + ", " +
+              std::to_string(store_.Size()) + " bytes");
+  }
+
+  std::string fileName_;
+  Plan plan_;
+  RecordingStore store_;
+  Recorder recorder_;
+  Sampler sampler_;
+  Log log_;
+  int64_t last_ = 0;  // tick
+  int64_t synced_ = 0;
+  uint64_t skipped_ = 0;  // since the last moment that was recorded
+  uint64_t recorded_ = 0;
+  uint64_t dropped_ = 0;
+  uint64_t failedFrom_ = 0;
+  bool isFailing_ = false;
+};
+
+int Record(const CommandLine& line) {
+  const std::string& fileName = line.arguments[0];
+  const std::string* root = line.ValueOf(kRoot);
+  const Plan plan = PlanOf(line);
+  if (fileName == "-") throw UsageError("a recording is a file, not standard output");
+  if (root != nullptr || HostLibrary::OpensHosts()) CheckRoot(root == nullptr ? "/" : *root);
+  bool isNameRead = false;
+  const std::string host = HostName(root, isNameRead);
+  struct stat info = {};
+  if (lstat(fileName.c_str(), &info) != 0) {
+    NewFile(fileName, false, ModeOf(line)).Commit(RecordingStore::Empty(host));
+  }
+  CatchSignals();
+  Recording recording(fileName, plan, root);
+  PrintLine(fileName + ": recording " + host + " every " + std::to_string(plan.every / kSecond) +
+            " s");
+  FlushOutput();
+  return recording.Run();
+}
+
+}  // namespace
+
+const Command kRecord = {
+    .name = "record",
+    .arguments = "FILE",
+    .summary = "record this host over time in FILE",
+    .help =
+        R"(Takes a moment of this host again and again, as capture does, and adds it to FILE,
+which is made if it is not there. Moments lie on the clock's grid; one that would
+be late is left out. It ends with SIGINT or SIGTERM, or after --count moments.
+
+FILE keeps to its bounds: moments older than --keep are removed, and the oldest
+ones where it would grow beyond --max-size. Times are such as 5s, 10m, 6h or 7d,
+sizes such as 500M or 2G.
+)",
+    .options = kOptions,
+    .fewest = 1,
+    .most = 1,
+    .run = Record,
+};
+
+}  // namespace ksicache

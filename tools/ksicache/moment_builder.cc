@@ -1,0 +1,98 @@
+#include "tools/ksicache/moment_builder.h"
+
+#include <algorithm>
+#include <array>
+#include <utility>
+
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+// The places of the catalogue's nodes among those that are recorded, by kind.
+std::array<std::vector<uint32_t>, 2> MakePlaces() {
+  std::array<std::vector<uint32_t>, 2> places;
+  for (auto& each : places) each.resize(ksi::Catalogue().size());
+  const std::vector<ksi::RecordedNode>& nodes = ksi::RecordedNodes();
+  for (uint32_t i = 0; i < nodes.size(); ++i) {
+    places[static_cast<size_t>(nodes[i].kind)][ksi::IdOf(*ksi::FindNode(nodes[i].path)) - 1u] = i;
+  }
+  return places;
+}
+
+uint32_t PlaceOf(const ksi::Node& node, ksi::Kind kind) {
+  static const std::array<std::vector<uint32_t>, 2> places = MakePlaces();
+  return places[static_cast<size_t>(kind)][ksi::IdOf(node) - 1u];
+}
+
+// The keys that a question has, as many as its node takes.
+ksi::Keys KeysOf(const ksi::Question& question, const ksi::Node& node, ksi::Kind kind) {
+  const ksi::Keying& keying = kind == ksi::Kind::kValue ? node.valueKeys : node.listKeys;
+  ksi::Keys keys;
+  for (; keys.count < keying.Count(); ++keys.count) {
+    keys.at[keys.count] = ksi::ViewOf(question.keys[keys.count]);
+    if (keys.at[keys.count].kind != ksi::KindOf(keying.at[keys.count])) {
+      throw DataError("damaged: " + std::string(node.path) + " has keys that it does not take");
+    }
+  }
+  return keys;
+}
+
+void PutReading(const ksi::RecordedNode& recorded, const ksi::Node& node,
+                const ksi::Reading& reading, ReadingSink& sink) {
+  const ksi::Keys keys = KeysOf(reading.question, node, recorded.kind);
+  const ksi::Answer& answer = reading.answer;
+  if (answer.status != ksi::kOk) {
+    sink.AddFailure(node, recorded.kind, keys, answer.status);
+  } else if (recorded.kind == ksi::Kind::kValue) {
+    sink.AddValue(node, keys, answer.record);
+  } else {
+    std::vector<ksi::Key> entries;
+    for (const ksi::OwnKey& entry : answer.entries) entries.push_back(ksi::ViewOf(entry));
+    sink.AddList(node, keys, entries);
+  }
+}
+
+}  // namespace
+
+ksi::Reading& MomentBuilder::Add(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys) {
+  ksi::Reading& reading = readings_.emplace_back();
+  reading.question.node = PlaceOf(node, kind);
+  for (size_t i = 0; i < keys.count; ++i) reading.question.keys[i] = ksi::OwnOf(keys[i]);
+  return reading;
+}
+
+void MomentBuilder::AddValue(const ksi::Node& node, const ksi::Keys& keys,
+                             std::span<const std::byte> record) {
+  Add(node, ksi::Kind::kValue, keys).answer.record.assign(record.begin(), record.end());
+}
+
+void MomentBuilder::AddList(const ksi::Node& node, const ksi::Keys& keys,
+                            std::span<const ksi::Key> entries) {
+  std::vector<ksi::OwnKey>& own = Add(node, ksi::Kind::kList, keys).answer.entries;
+  for (const ksi::Key& entry : entries) own.push_back(ksi::OwnOf(entry));
+}
+
+void MomentBuilder::AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
+                               ksi::Status status) {
+  Add(node, kind, keys).answer.status = status;
+}
+
+std::vector<ksi::Reading> MomentBuilder::Take() {
+  ksi::SortReadings(readings_);
+  return std::exchange(readings_, {});
+}
+
+void PutReadings(const ksi::Moment& moment, ReadingSink& sink) {
+  for (const ksi::Reading& reading : moment.readings) {
+    const ksi::RecordedNode& recorded = moment.host.nodes[reading.question.node];
+    const ksi::Node* node = ksi::FindNode(recorded.path);
+    if (node == nullptr ||
+        recorded.recordSize != (recorded.kind == ksi::Kind::kValue ? node->recordSize : 0)) {
+      throw DataError("its node " + Cut(recorded.path) + " is not of this version");
+    }
+    PutReading(recorded, *node, reading, sink);
+  }
+}
+
+}  // namespace ksicache

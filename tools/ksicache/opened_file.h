@@ -1,0 +1,52 @@
+// Cache files as commands are given them: captures, and moments of recordings, "FILE@WHEN".
+#ifndef TOOLS_KSICACHE_OPENED_FILE_H_
+#define TOOLS_KSICACHE_OPENED_FILE_H_
+
+#include <memory>
+#include <string>
+
+#include "knvlibs/cache_file.h"
+#include "knvlibs/recording/moment.h"
+#include "knvlibs/recording/recording_file.h"
+
+namespace ksicache {
+
+// Every call fails with a DataError that says what is wrong with the file.
+
+// A capture, or a moment as the capture that it would be.
+class OpenedFile {
+ public:
+  explicit OpenedFile(const std::string& name);
+  // The same of a moment that has been read; the name is for messages.
+  OpenedFile(const std::string& name, const ksi::Moment& moment);
+
+  const ksi::CacheFile& File() const { return *file_; }
+
+  // Whether it is a recording's moment.
+  bool IsMoment() const { return !content_.empty(); }
+
+ private:
+  void Open(const std::string& name, const ksi::Moment& moment);
+
+  ksi::Bytes content_;  // of the moment as a capture
+  std::unique_ptr<ksi::CacheFile> file_;
+};
+
+// Whether a recording has this name, and no moment is asked for.
+bool IsRecording(const std::string& name);
+
+// A whole recording.
+std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName);
+
+// One moment of a recording.
+ksi::Moment ReadMoment(const std::string& name);
+
+// A capture as a moment.
+ksi::Moment MomentOf(const ksi::CacheFile& capture);
+
+// What a capture of that moment says of itself.
+ksi::CacheFile::Capture CaptureOf(const ksi::Moment& moment);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_OPENED_FILE_H_

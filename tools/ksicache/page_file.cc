@@ -1,0 +1,213 @@
+#include "tools/ksicache/page_file.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <limits>
+#include <mutex>
+#include <new>
+
+#include "knvlibs/cache_format.h"
+
+namespace ksicache {
+namespace {
+
+constexpr const char* kVfsName = "ksi-recording";
+
+// Where the pages end that the header of a database counts.
+int64_t EndIn(const std::string& header) {
+  constexpr size_t kCountAt = 28;
+  int64_t count = 0;
+  for (size_t i = 0; i < 4 && header.size() >= kCountAt + 4; ++i) {
+    count = count << 8 | static_cast<unsigned char>(header[kCountAt + i]);
+  }
+  return count * static_cast<int64_t>(ksi::cache::kPageSize);
+}
+
+bool WriteAll(int descriptor, const std::string& bytes, int64_t offset) {
+  for (size_t done = 0; done < bytes.size();) {
+    const ssize_t size = pwrite(descriptor, bytes.data() + done, bytes.size() - done,
+                                offset + static_cast<int64_t>(done));
+    if (size < 0 && errno == EINTR) continue;
+    if (size <= 0) {
+      if (size == 0) errno = ENOSPC;
+      return false;
+    }
+    done += static_cast<size_t>(size);
+  }
+  return true;
+}
+
+int Nothing(sqlite3_file* /*file*/) { return SQLITE_OK; }
+int NoLock(sqlite3_file* /*file*/, int /*level*/) { return SQLITE_OK; }
+int NoSync(sqlite3_file* /*file*/, int /*flags*/) { return SQLITE_OK; }
+int NoTruncate(sqlite3_file* /*file*/, sqlite3_int64 /*size*/) { return SQLITE_READONLY; }
+int NoReservedLock(sqlite3_file* /*file*/, int* held) {
+  *held = 0;
+  return SQLITE_OK;
+}
+int NoControl(sqlite3_file* /*file*/, int /*operation*/, void* /*argument*/) {
+  return SQLITE_NOTFOUND;
+}
+int Zero(sqlite3_file* /*file*/) { return 0; }
+
+int NoDelete(sqlite3_vfs* /*vfs*/, const char* /*name*/, int /*sync*/) { return SQLITE_OK; }
+int NoAccess(sqlite3_vfs* /*vfs*/, const char* /*name*/, int /*flags*/, int* found) {
+  *found = 0;
+  return SQLITE_OK;
+}
+int FullName(sqlite3_vfs* /*vfs*/, const char* name, int room, char* fullName) {
+  const size_t size = std::strlen(name) + 1;
+  if (size > static_cast<size_t>(room)) return SQLITE_CANTOPEN;
+  std::memcpy(fullName, name, size);
+  return SQLITE_OK;
+}
+
+}  // namespace
+
+// An open file as SQLite knows it.
+struct PageFile::Handle {
+  sqlite3_file base;
+  PageFile* file;
+};
+
+PageFile& PageFile::Of(sqlite3_file* file) { return *reinterpret_cast<Handle*>(file)->file; }
+
+PageFile::PageFile(int descriptor) : descriptor_(descriptor), vfs_() {}
+
+int PageFile::Open(ksi::Database* database) {
+  int code = sqlite3_initialize();
+  if (code != SQLITE_OK) return code;
+  pages_.clear();
+  std::string header(ksi::cache::kPageSize, '\0');
+  end_ = pread(descriptor_, header.data(), header.size(), 0) < 0 ? 0 : EndIn(header);
+  vfs_ = *sqlite3_vfs_find(nullptr);
+  vfs_.zName = kVfsName;
+  vfs_.szOsFile = std::max(vfs_.szOsFile, static_cast<int>(sizeof(Handle)));
+  vfs_.pAppData = this;
+  vfs_.xOpen = OpenFile;
+  vfs_.xDelete = NoDelete;
+  vfs_.xAccess = NoAccess;
+  vfs_.xFullPathname = FullName;
+  // SQLite finds it by its name; other files have others of that name.
+  static std::mutex mutex;
+  const std::lock_guard<std::mutex> guard(mutex);
+  code = sqlite3_vfs_register(&vfs_, 0);
+  if (code != SQLITE_OK) return code;
+  sqlite3* handle = nullptr;
+  code =
+      sqlite3_open_v2("recording", &handle, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, kVfsName);
+  sqlite3_vfs_unregister(&vfs_);
+  database->reset(handle);
+  return code;
+}
+
+int PageFile::OpenFile(sqlite3_vfs* vfs, const char* name, sqlite3_file* file, int flags,
+                       int* outFlags) {
+  if ((flags & SQLITE_OPEN_MAIN_DB) == 0) {
+    sqlite3_vfs* const system = sqlite3_vfs_find(nullptr);
+    return system->xOpen(system, name, file, flags, outFlags);
+  }
+  static constexpr sqlite3_io_methods kMethods = {.iVersion = 1,
+                                                  .xClose = Nothing,
+                                                  .xRead = Read,
+                                                  .xWrite = Write,
+                                                  .xTruncate = NoTruncate,
+                                                  .xSync = NoSync,
+                                                  .xFileSize = FileSize,
+                                                  .xLock = NoLock,
+                                                  .xUnlock = NoLock,
+                                                  .xCheckReservedLock = NoReservedLock,
+                                                  .xFileControl = NoControl,
+                                                  .xSectorSize = Zero,
+                                                  .xDeviceCharacteristics = Zero,
+                                                  .xShmMap = nullptr,
+                                                  .xShmLock = nullptr,
+                                                  .xShmBarrier = nullptr,
+                                                  .xShmUnmap = nullptr,
+                                                  .xFetch = nullptr,
+                                                  .xUnfetch = nullptr};
+  auto& handle = *reinterpret_cast<Handle*>(file);
+  handle.file = static_cast<PageFile*>(vfs->pAppData);
+  handle.base.pMethods = &kMethods;
+  if (outFlags != nullptr) *outFlags = flags;
+  return SQLITE_OK;
+}
+
+int PageFile::Read(sqlite3_file* file, void* buffer, int amount, sqlite3_int64 offset) {
+  const PageFile& self = Of(file);
+  auto* bytes = static_cast<char*>(buffer);
+  const auto wanted = static_cast<size_t>(amount);
+  // SQLite reads a page, or a part of one.
+  auto page = self.pages_.upper_bound(offset);
+  if (page != self.pages_.begin()) {
+    --page;
+    const auto at = static_cast<size_t>(offset - page->first);
+    if (at + wanted <= page->second.size()) {
+      std::memcpy(bytes, page->second.data() + at, wanted);
+      return SQLITE_OK;
+    }
+  }
+  for (size_t done = 0; done < wanted;) {
+    const ssize_t got = pread(self.descriptor_, bytes + done, wanted - done,
+                              offset + static_cast<sqlite3_int64>(done));
+    if (got < 0 && errno == EINTR) continue;
+    if (got < 0) return SQLITE_IOERR_READ;
+    if (got == 0) {
+      std::memset(bytes + done, 0, wanted - done);
+      return SQLITE_IOERR_SHORT_READ;
+    }
+    done += static_cast<size_t>(got);
+  }
+  return SQLITE_OK;
+}
+
+int PageFile::Write(sqlite3_file* file, const void* buffer, int amount, sqlite3_int64 offset) {
+  try {
+    Of(file).pages_[offset].assign(static_cast<const char*>(buffer), static_cast<size_t>(amount));
+    return SQLITE_OK;
+  } catch (const std::bad_alloc&) {
+    return SQLITE_IOERR_NOMEM;
+  }
+}
+
+int PageFile::FileSize(sqlite3_file* file, sqlite3_int64* size) {
+  const PageFile& self = Of(file);
+  *size = self.SizeOnDisk();
+  if (!self.pages_.empty()) {
+    const auto& [offset, bytes] = *self.pages_.rbegin();
+    *size = std::max<sqlite3_int64>(*size, offset + static_cast<int64_t>(bytes.size()));
+  }
+  return SQLITE_OK;
+}
+
+int64_t PageFile::SizeOnDisk() const {
+  struct stat info = {};
+  return fstat(descriptor_, &info) == 0 ? info.st_size : 0;
+}
+
+bool PageFile::WritePages(int64_t from, int64_t to) const {
+  const auto end = pages_.lower_bound(to);
+  return std::all_of(pages_.lower_bound(from), end, [this](const auto& page) {
+    return WriteAll(descriptor_, page.second, page.first);
+  });
+}
+
+bool PageFile::Flush() {
+  const bool grows = !pages_.empty() && pages_.rbegin()->first >= end_;
+  const auto header = pages_.find(0);
+  const int64_t end = header == pages_.end() ? end_ : EndIn(header->second);
+  // What leads to new pages must not be on the disk before them.
+  const bool isWritten = WritePages(end_, std::numeric_limits<int64_t>::max()) &&
+                         (!grows || Sync()) && WritePages(0, end_);
+  if (isWritten) end_ = end;
+  pages_.clear();
+  return isWritten;
+}
+
+bool PageFile::Sync() const { return fdatasync(descriptor_) == 0; }
+
+}  // namespace ksicache

@@ -1,0 +1,56 @@
+// How SQLite writes a file that others read and copy meanwhile, and that may end at any time.
+//
+// What SQLite writes is kept in memory until Flush, which writes first the pages by which the file
+// grows, of which nobody knows yet, and then the others from the front. With a database that only
+// grows at the end of its tables, and whose rows keep their size, it is whole after each of these
+// writes, without a journal and without locks.
+#ifndef TOOLS_KSICACHE_PAGE_FILE_H_
+#define TOOLS_KSICACHE_PAGE_FILE_H_
+
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "knvlibs/sqlite.h"
+
+namespace ksicache {
+
+class PageFile {
+ public:
+  // The descriptor must stay open as long.
+  explicit PageFile(int descriptor);
+  PageFile(const PageFile&) = delete;
+  PageFile& operator=(const PageFile&) = delete;
+
+  // Opens it as a database, which must not outlive this. Gives SQLite's result code.
+  int Open(ksi::Database* database);
+
+  // Writes what SQLite has written. What cannot be written, errno says why, is forgotten: the
+  // database is to be opened anew.
+  [[nodiscard]] bool Flush();
+
+  // Brings what has been flushed to the disk; false, errno says why.
+  [[nodiscard]] bool Sync() const;
+
+ private:
+  struct Handle;
+
+  static PageFile& Of(sqlite3_file* file);
+  static int OpenFile(sqlite3_vfs* vfs, const char* name, sqlite3_file* file, int flags,
+                      int* outFlags);
+  static int Read(sqlite3_file* file, void* buffer, int amount, sqlite3_int64 offset);
+  static int Write(sqlite3_file* file, const void* buffer, int amount, sqlite3_int64 offset);
+  static int FileSize(sqlite3_file* file, sqlite3_int64* size);
+
+  [[nodiscard]] bool WritePages(int64_t from, int64_t to) const;
+  int64_t SizeOnDisk() const;
+
+  int descriptor_;
+  sqlite3_vfs vfs_;
+  int64_t end_ = 0;                       // of the pages that the header on the disk knows
+  std::map<int64_t, std::string> pages_;  // not yet written, by offset
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_PAGE_FILE_H_

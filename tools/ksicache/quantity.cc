@@ -1,0 +1,58 @@
+#include "tools/ksicache/quantity.h"
+
+#include <algorithm>
+#include <charconv>
+#include <span>
+#include <string_view>
+
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+struct Unit {
+  std::string_view name;
+  int64_t size;
+};
+
+constexpr int64_t kSecond = 1'000'000;
+constexpr Unit kTimes[] = {{"", kSecond},
+                           {"s", kSecond},
+                           {"m", 60 * kSecond},
+                           {"h", 3600 * kSecond},
+                           {"d", 86400 * kSecond}};
+constexpr Unit kSizes[] = {
+    {"", 1}, {"K", 1 << 10}, {"M", 1 << 20}, {"G", 1 << 30}, {"T", int64_t{1} << 40}};
+constexpr Unit kOne[] = {{"", 1}};
+
+int64_t QuantityOf(const CommandLine& line, const Option& option, int64_t standard,
+                   std::span<const Unit> units, const char* form) {
+  const std::string* value = line.ValueOf(option);
+  if (value == nullptr) return standard;
+  int64_t number = 0;
+  const auto [end, error] = std::from_chars(value->data(), value->data() + value->size(), number);
+  const std::string_view name(end, static_cast<size_t>(value->data() + value->size() - end));
+  const auto unit = std::ranges::find(units, name, &Unit::name);
+  int64_t quantity = 0;
+  if (error != std::errc() || unit == units.end() || number <= 0 ||
+      __builtin_mul_overflow(number, unit->size, &quantity)) {
+    throw UsageError(std::string("--") + option.name + " takes " + form + ": " + *value);
+  }
+  return quantity;
+}
+
+}  // namespace
+
+int64_t DurationOf(const CommandLine& line, const Option& option, int64_t standard) {
+  return QuantityOf(line, option, standard, kTimes, "a time such as 5s, 10m, 6h or 7d");
+}
+
+int64_t SizeOf(const CommandLine& line, const Option& option, int64_t standard) {
+  return QuantityOf(line, option, standard, kSizes, "a size such as 500M or 2G");
+}
+
+int64_t CountOf(const CommandLine& line, const Option& option, int64_t standard) {
+  return QuantityOf(line, option, standard, kOne, "a number from 1 on");
+}
+
+}  // namespace ksicache

@@ -1,0 +1,24 @@
+// Times and sizes as people write them in options.
+#ifndef TOOLS_KSICACHE_QUANTITY_H_
+#define TOOLS_KSICACHE_QUANTITY_H_
+
+#include <cstdint>
+#include <string>
+
+#include "tools/ksicache/command.h"
+
+namespace ksicache {
+
+// The value of an option, or `standard` if it was not given. Each fails with a UsageError that
+// names the option.
+//
+// "5s", "10m", "6h" or "7d" in us; a number alone is seconds.
+int64_t DurationOf(const CommandLine& line, const Option& option, int64_t standard);
+// "500M" or "2G" in bytes of 1024; a number alone is bytes.
+int64_t SizeOf(const CommandLine& line, const Option& option, int64_t standard);
+// A number that is not 0.
+int64_t CountOf(const CommandLine& line, const Option& option, int64_t standard);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_QUANTITY_H_

@@ -1,0 +1,89 @@
+#include "tools/ksicache/recorder.h"
+
+#include <utility>
+
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+// So much is packed at once, whatever the number of moments: it is held in memory.
+constexpr size_t kMostBytes = size_t{4} << 20;
+
+}  // namespace
+
+Recorder::Recorder(RecordingStore& store) : store_(store) {
+  if (!store.Parts().empty()) next_ = store.Parts().back().End();
+}
+
+// What a chunk's moments have in common; in one the clock only goes on.
+bool Recorder::Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& facts) const {
+  return chunk_ != nullptr && chunk_->Count() < kChunkMoments && chunk_->Host() == host &&
+         chunk_->Last().taken < facts.taken;
+}
+
+void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
+                   const std::vector<ksi::Reading>& readings) {
+  if (!Continues(host, facts)) Begin(host);
+  // Until it is written, what the next one would differ from is not in the file.
+  std::unique_ptr<ksi::ChunkWriter> chunk = std::move(chunk_);
+  const size_t place = chunk->Count();
+  chunk->Add(facts, readings);
+  const ksi::Bytes content = chunk->PartFrom(place);
+  store_.Add({0, 1, next_, chunkNumber_, facts.taken, facts.taken, 0, 0}, content);
+  ++next_;
+  bytes_ += content.size();
+  chunk_ = std::move(chunk);
+}
+
+void Recorder::Begin(const ksi::HostIdentity& host) {
+  try {
+    Pack();
+  } catch (const Error&) {
+    // It stays as it is, and a moment is worth more.
+  }
+  chunk_ = std::make_unique<ksi::ChunkWriter>(host);
+  chunkNumber_ = next_;
+  packed_ = 0;
+  bytes_ = 0;
+}
+
+void Recorder::Tidy() {
+  if (chunk_ != nullptr && (chunk_->Count() - packed_ >= kPartMoments || bytes_ > kMostBytes)) {
+    Pack();
+  }
+}
+
+void Recorder::Pack() {
+  if (chunk_ == nullptr || chunk_->Count() - packed_ < 2) return;
+  const auto count = static_cast<int64_t>(chunk_->Count() - packed_);
+  store_.Replace({0, count, chunkNumber_ + static_cast<int64_t>(packed_), chunkNumber_,
+                  chunk_->At(packed_).taken, chunk_->Last().taken, 0, 0},
+                 chunk_->PartFrom(packed_));
+  packed_ = chunk_->Count();
+  bytes_ = 0;
+}
+
+void Recorder::Adopt(ksi::RecordingFile& recording) {
+  const std::vector<RecordingStore::Part>& parts = recording.Parts();
+  size_t from = parts.size();
+  while (from > 0 && parts[from - 1].moments == 1) --from;
+  for (; from < parts.size(); ++from) {
+    ksi::Moment moment;
+    if (recording.ReadMoment(parts[from].number, moment) != ksi::kOk) {
+      throw Error(recording.Why());
+    }
+    ksi::SortReadings(moment.readings);
+    if (chunk_ == nullptr ||
+        parts[from].number != chunkNumber_ + static_cast<int64_t>(chunk_->Count()) ||
+        !Continues(moment.host, moment.facts)) {
+      Begin(moment.host);
+      chunkNumber_ = parts[from].number;
+    }
+    chunk_->Add(moment.facts, moment.readings);
+  }
+  Pack();
+  chunk_ = nullptr;
+}
+
+}  // namespace ksicache

@@ -1,0 +1,57 @@
+// Adds moments to a recording, one by one.
+//
+// A moment is written as soon as there is one, as what differs from the one before it. When some
+// minutes are together they are packed anew, by column, which takes a fraction of the room; and
+// after some such parts a chunk begins that stands for itself, so that any moment is found quickly
+// and old ones can go.
+#ifndef TOOLS_KSICACHE_RECORDER_H_
+#define TOOLS_KSICACHE_RECORDER_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <vector>
+
+#include "knvlibs/recording/chunk_writer.h"
+#include "knvlibs/recording/moment.h"
+#include "tools/ksicache/recording_store.h"
+
+namespace ksicache {
+
+class Recorder {
+ public:
+  // The moments of a part, and of a chunk.
+  static constexpr size_t kPartMoments = 60;
+  static constexpr size_t kChunkMoments = 240;
+
+  // Goes on where the recording ends.
+  explicit Recorder(RecordingStore& store);
+
+  // Adds a moment, whose readings are in the order of SortReadings. Fails with an Error: then it is
+  // not there, and a later one may be.
+  void Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
+           const std::vector<ksi::Reading>& readings);
+
+  // Packs what has been added, if it is time, or anyway. Fail with an Error, and nothing is lost.
+  void Tidy();
+  void Pack();
+
+  // Packs what somebody who was stopped left at the end of the recording; the same. `recording` is
+  // what the store writes, as it was when it was opened.
+  void Adopt(ksi::RecordingFile& recording);
+
+ private:
+  bool Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& facts) const;
+  void Begin(const ksi::HostIdentity& host);
+
+  RecordingStore& store_;
+  std::unique_ptr<ksi::ChunkWriter> chunk_;  // none: the next moment starts one
+  int64_t chunkNumber_ = 0;                  // of its first moment
+  int64_t next_ = 0;                         // the number of the next moment
+  size_t packed_ = 0;                        // moments of the chunk that are packed together
+  size_t bytes_ = 0;                         // of the parts of those that are not
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_RECORDER_H_

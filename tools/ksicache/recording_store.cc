@@ -1,0 +1,376 @@
+#include "tools/ksicache/recording_store.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <new>
+#include <unordered_set>
+#include <utility>
+
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/cache_format.h"
+#include "tools/ksicache/error.h"
+
+namespace ksicache {
+namespace {
+
+using ksi::cache::kBlockHead;
+using ksi::cache::kBlockSize;
+
+constexpr size_t kPieceSize = kBlockSize - kBlockHead;
+
+// By so many rows the tables grow; those of parts are for a week at first, before the first block:
+// who copies the file from its front has then a row before what it leads to.
+constexpr size_t kMoreBlocks = 64;
+constexpr size_t kFirstParts = 2048;
+constexpr size_t kMoreParts = 256;
+
+// A block with what leads to it, in the file.
+constexpr int64_t kBlockOnDisk = 4700;
+
+// A free row of parts, with numbers as large as they come.
+constexpr const char* kAddPart =
+    "INSERT INTO part VALUES(NULL, 0, 140737488355327, 140737488355327, 9223372036854775807, "
+    "9223372036854775807, 140737488355327, 140737488355327)";
+constexpr const char* kAddBlock = "INSERT INTO block VALUES(NULL, zeroblob(?1))";
+constexpr const char* kSetPart =
+    "UPDATE part SET moments = ?2, number = ?3, chunk = ?4, first = ?5, last = ?6, size = ?7, "
+    "block = ?8 WHERE id = ?1";
+constexpr const char* kFreePart = "UPDATE part SET moments = 0 WHERE id = ?1";
+
+// Where the lock lies, beyond all that a file can hold.
+constexpr off_t kLockAt = off_t{1} << 61;
+
+struct CloseBlob {
+  void operator()(sqlite3_blob* blob) const { sqlite3_blob_close(blob); }
+};
+
+[[nodiscard]] bool AddRows(sqlite3* database, const char* sql, size_t count) {
+  ksi::Statement insert;
+  int code = insert.Prepare(database, sql);
+  if (code == SQLITE_OK && sql == kAddBlock) {
+    code = insert.Bind(1, static_cast<int64_t>(kBlockSize));
+  }
+  for (size_t i = 0; i < count && (code == SQLITE_OK || code == SQLITE_DONE); ++i) {
+    code = insert.Step();
+    insert.Reset();
+  }
+  return code == SQLITE_DONE;
+}
+
+void RunInMemory(sqlite3* database, const std::string& sql) {
+  // A database in memory fails for want of it.
+  if (sqlite3_exec(database, sql.c_str(), nullptr, nullptr, nullptr) != SQLITE_OK) {
+    throw std::bad_alloc();
+  }
+}
+
+}  // namespace
+
+ksi::Bytes RecordingStore::Empty(const std::string& host) {
+  sqlite3* handle = nullptr;
+  const int code =
+      sqlite3_open_v2("recording", &handle, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, "memdb");
+  const ksi::Database database(handle);
+  if (code != SQLITE_OK) throw std::bad_alloc();
+  RunInMemory(handle, "PRAGMA page_size=" + std::to_string(ksi::cache::kPageSize));
+  RunInMemory(handle, "PRAGMA application_id=" + std::to_string(ksi::cache::kApplicationId));
+  RunInMemory(handle, "PRAGMA user_version=" + std::to_string(ksi::cache::kRecordingVersion));
+  RunInMemory(handle, "BEGIN");
+  for (const ksi::cache::Table& table : ksi::cache::kRecordingTables) {
+    RunInMemory(handle, std::string(table.sql));
+  }
+  ksi::Statement insert;
+  if (insert.Prepare(handle, "INSERT INTO recording VALUES(?1, strftime('%Y-%m-%dT%H:%M:%SZ'))") !=
+          SQLITE_OK ||
+      insert.Bind(1, std::string_view(host)) != SQLITE_OK || insert.Step() != SQLITE_DONE) {
+    throw std::bad_alloc();
+  }
+  insert = {};
+  if (!AddRows(handle, kAddPart, kFirstParts) || !AddRows(handle, kAddBlock, kMoreBlocks)) {
+    throw std::bad_alloc();
+  }
+  RunInMemory(handle, "COMMIT");
+  sqlite3_int64 size = 0;
+  const auto* content = reinterpret_cast<const std::byte*>(
+      sqlite3_serialize(handle, "main", &size, SQLITE_SERIALIZE_NOCOPY));
+  if (content == nullptr) throw std::bad_alloc();
+  return {content, content + size};
+}
+
+RecordingStore::RecordingStore(const std::string& fileName, int64_t maxSize)
+    : RecordingStore(
+          fileName, open(fileName.c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY),
+          maxSize) {}
+
+RecordingStore::RecordingStore(const std::string& name, int file, int64_t maxSize)
+    : name_(name), maxSize_(maxSize), file_(file) {
+  if (!file_) throw SystemError(name_, errno);
+  struct stat info = {};
+  if (fstat(file_.Get(), &info) != 0) throw SystemError(name_, errno);
+  if (!S_ISREG(info.st_mode)) throw Error(name_ + ": is not a regular file");
+  Lock();
+  TakeStock();
+}
+
+// Two locks: one that is this opening's, and one that tells whose it is.
+void RecordingStore::Lock() {
+  struct flock lock = {};
+  lock.l_type = F_WRLCK;
+  lock.l_whence = SEEK_SET;
+  lock.l_start = kLockAt;
+  lock.l_len = 1;
+  const bool isAlone = fcntl(file_.Get(), F_OFD_SETLK, &lock) == 0;
+  if (!isAlone && errno != EAGAIN && errno != EACCES) throw SystemError(name_, errno);
+  lock.l_start = kLockAt + 1;
+  if (isAlone && fcntl(file_.Get(), F_SETLK, &lock) == 0) return;
+  const bool isTold = fcntl(file_.Get(), F_GETLK, &lock) == 0 && lock.l_type != F_UNLCK;
+  throw Error(name_ + ": is being recorded by " +
+              (isTold && lock.l_pid > 0 ? "process " + std::to_string(lock.l_pid)
+                                        : std::string("another process")));
+}
+
+// What there is in the file, and what is free in it.
+void RecordingStore::TakeStock() {
+  auto opened = std::make_unique<ksi::CacheDatabase>();
+  // By what is open: another file may have its name.
+  ksi::Status status = opened->Open(("/proc/self/fd/" + std::to_string(file_.Get())).c_str());
+  std::string why = opened->Why();
+  std::unique_ptr<ksi::RecordingFile> recording;
+  if (status == ksi::kOk) status = ksi::RecordingFile::Make(std::move(opened), &recording, &why);
+  if (status == KSI_STATUS_INVALID_METADATA) throw DataError(name_ + ": is no recording");
+  if (status != ksi::kOk) {
+    throw DataError(name_ + ": " + (why.empty() ? StatusText(status) : "damaged: " + why));
+  }
+  parts_ = recording->Parts();
+  replaced_.clear();
+  blocksOf_.clear();
+  std::unordered_set<int64_t> used;
+  for (const Part& row : recording->Rows()) {
+    std::vector<int64_t>& blocks = blocksOf_[row.id];
+    // Those of a damaged part that are found; the others nobody finds.
+    static_cast<void>(recording->ReadBlocks(row, blocks));
+    used.insert(blocks.begin(), blocks.end());
+    if (std::ranges::find(parts_, row.id, &Part::id) == parts_.end()) replaced_.push_back(row);
+  }
+  Connect();
+  rows_.clear();
+  blocks_.clear();
+  ksi::Statement rows;
+  Require(rows.Prepare(database_.get(), "SELECT id FROM part WHERE moments = 0 ORDER BY id") ==
+          SQLITE_OK);
+  while (rows.Step() == SQLITE_ROW) rows_.push_back(rows.Number(0));
+  Require(rows.Prepare(database_.get(), "SELECT id FROM block ORDER BY id") == SQLITE_OK);
+  while (rows.Step() == SQLITE_ROW) {
+    if (!used.contains(rows.Number(0))) blocks_.push_back(rows.Number(0));
+  }
+}
+
+void RecordingStore::Connect() {
+  database_.reset();
+  pages_ = std::make_unique<PageFile>(file_.Get());
+  Require(pages_->Open(&database_) == SQLITE_OK);
+  // Nothing is written before a transaction ends, and nobody else writes.
+  for (const char* sql :
+       {"PRAGMA locking_mode=EXCLUSIVE", "PRAGMA journal_mode=OFF", "PRAGMA synchronous=OFF",
+        "PRAGMA cache_spill=OFF", "PRAGMA cache_size=-4096"}) {
+    Execute(sql);
+  }
+}
+
+void RecordingStore::Ready() {
+  if (database_ == nullptr) TakeStock();
+}
+
+void RecordingStore::Execute(const char* sql) {
+  Require(sqlite3_exec(database_.get(), sql, nullptr, nullptr, nullptr) == SQLITE_OK);
+}
+
+void RecordingStore::Require(bool good) {
+  if (good) return;
+  const int code = database_ == nullptr ? SQLITE_NOMEM : sqlite3_errcode(database_.get());
+  const std::string reason = database_ == nullptr ? "" : sqlite3_errmsg(database_.get());
+  database_.reset();
+  if ((code & 0xff) == SQLITE_NOMEM) throw std::bad_alloc();
+  throw Error(name_ + ": cannot be written: " + reason);
+}
+
+void RecordingStore::Fail(int error) {
+  database_.reset();
+  throw SystemError(name_, error);
+}
+
+// Ends the transaction, and writes what it changed.
+void RecordingStore::Flush() {
+  Execute("COMMIT");
+  if (!pages_->Flush()) Fail(errno);
+}
+
+void RecordingStore::Sync() {
+  if (fdatasync(file_.Get()) != 0) throw SystemError(name_, errno);
+}
+
+int64_t RecordingStore::Size() const {
+  struct stat info = {};
+  return fstat(file_.Get(), &info) == 0 ? info.st_size : 0;
+}
+
+void RecordingStore::Add(Part part, ksi::ByteView content) {
+  Ready();
+  part.size = static_cast<int64_t>(content.size());
+  const std::vector<int64_t> blocks = TakeBlocks((content.size() + kPieceSize - 1) / kPieceSize);
+  part.block = blocks.front();
+  WriteBlocks(blocks, content);
+  part.id = TakeRow();
+  Execute("BEGIN");
+  WriteRow(part);
+  Flush();
+  blocksOf_[part.id] = blocks;
+  const auto place = std::ranges::upper_bound(parts_, part.number, {}, &Part::number);
+  parts_.insert(place, part);
+}
+
+void RecordingStore::Replace(Part part, ksi::ByteView content) {
+  Ready();
+  Remove(std::exchange(replaced_, {}));
+  Add(part, content);
+  Sync();
+  const auto isReplaced = [&part](const Part& each) {
+    return each.number >= part.number && each.End() <= part.End() && each.moments < part.moments;
+  };
+  std::ranges::copy_if(parts_, std::back_inserter(replaced_), isReplaced);
+  std::erase_if(parts_, isReplaced);
+  KeepSpare((content.size() + kPieceSize - 1) / kPieceSize);
+}
+
+// At the bound of its size the file has always room for some moments, so that blocks are not
+// written as soon as they are free: who copies the file may just read them.
+void RecordingStore::KeepSpare(size_t count) {
+  while (blocks_.size() < 2 * count && !CanGrow(2 * count) && HasOldChunk()) RemoveFirstChunk();
+}
+
+void RecordingStore::RemoveBefore(int64_t time) {
+  Ready();
+  const auto isOld = [this, time] {
+    const int64_t chunk = parts_.front().chunk;
+    return std::ranges::all_of(
+        parts_, [=](const Part& each) { return each.chunk != chunk || each.last < time; });
+  };
+  while (HasOldChunk() && isOld()) RemoveFirstChunk();
+}
+
+bool RecordingStore::HasOldChunk() const {
+  return !parts_.empty() && parts_.front().chunk != parts_.back().chunk;
+}
+
+void RecordingStore::RemoveFirstChunk() {
+  std::vector<Part> removed;
+  const int64_t chunk = parts_.front().chunk;
+  for (std::vector<Part>* list : {&parts_, &replaced_}) {
+    const auto isOfIt = [chunk](const Part& each) { return each.chunk == chunk; };
+    std::ranges::copy_if(*list, std::back_inserter(removed), isOfIt);
+    std::erase_if(*list, isOfIt);
+  }
+  Remove(removed);
+}
+
+void RecordingStore::Remove(const std::vector<Part>& parts) {
+  if (parts.empty()) return;
+  Execute("BEGIN");
+  ksi::Statement update;
+  Require(update.Prepare(database_.get(), kFreePart) == SQLITE_OK);
+  for (const Part& part : parts) {
+    Require(update.Bind(1, part.id) == SQLITE_OK && update.Step() == SQLITE_DONE);
+    update.Reset();
+  }
+  update = {};
+  Flush();
+  // Else it might come back, after a loss of power, with other blocks.
+  Sync();
+  for (const Part& part : parts) {
+    rows_.push_back(part.id);
+    const std::vector<int64_t>& blocks = blocksOf_[part.id];
+    blocks_.insert(blocks_.end(), blocks.begin(), blocks.end());
+    blocksOf_.erase(part.id);
+  }
+}
+
+bool RecordingStore::CanGrow(size_t count) const {
+  return Size() + static_cast<int64_t>(count) * kBlockOnDisk <= maxSize_;
+}
+
+std::vector<int64_t> RecordingStore::TakeBlocks(size_t count) {
+  while (blocks_.size() < count) {
+    const size_t more = std::max(count - blocks_.size(), kMoreBlocks);
+    if (CanGrow(more)) {
+      Execute("BEGIN");
+      Require(AddRows(database_.get(), kAddBlock, more));
+      const int64_t last = sqlite3_last_insert_rowid(database_.get());
+      Flush();
+      for (auto id = last - static_cast<int64_t>(more) + 1; id <= last; ++id) blocks_.push_back(id);
+    } else if (HasOldChunk()) {
+      RemoveFirstChunk();
+    } else {
+      throw Error(name_ + ": there is no room for a moment in " + std::to_string(maxSize_) +
+                  " bytes");
+    }
+  }
+  const auto end = blocks_.begin() + static_cast<ptrdiff_t>(count);
+  std::vector<int64_t> taken(blocks_.begin(), end);
+  blocks_.erase(blocks_.begin(), end);
+  return taken;
+}
+
+int64_t RecordingStore::TakeRow() {
+  if (rows_.empty()) {
+    Execute("BEGIN");
+    Require(AddRows(database_.get(), kAddPart, kMoreParts));
+    const int64_t last = sqlite3_last_insert_rowid(database_.get());
+    Flush();
+    for (auto id = last - static_cast<int64_t>(kMoreParts) + 1; id <= last; ++id) {
+      rows_.push_back(id);
+    }
+  }
+  const int64_t row = rows_.front();
+  rows_.pop_front();
+  return row;
+}
+
+void RecordingStore::WriteBlocks(const std::vector<int64_t>& blocks, ksi::ByteView content) {
+  Execute("BEGIN");
+  sqlite3_blob* handle = nullptr;
+  const int code =
+      sqlite3_blob_open(database_.get(), "main", "block", "data", blocks.front(), 1, &handle);
+  std::unique_ptr<sqlite3_blob, CloseBlob> blob(handle);
+  Require(code == SQLITE_OK);
+  ksi::Bytes data;
+  for (size_t i = 0; i < blocks.size(); ++i) {
+    const ksi::ByteView piece =
+        content.subspan(i * kPieceSize, std::min(kPieceSize, content.size() - i * kPieceSize));
+    const auto next = static_cast<uint32_t>(i + 1 < blocks.size() ? blocks[i + 1] : 0);
+    data.resize(kBlockHead);
+    std::memcpy(data.data(), &next, kBlockHead);
+    data.insert(data.end(), piece.begin(), piece.end());
+    Require((i == 0 || sqlite3_blob_reopen(handle, blocks[i]) == SQLITE_OK) &&
+            sqlite3_blob_write(handle, data.data(), static_cast<int>(data.size()), 0) == SQLITE_OK);
+  }
+  blob.reset();
+  Flush();
+}
+
+void RecordingStore::WriteRow(const Part& part) {
+  ksi::Statement update;
+  Require(update.Prepare(database_.get(), kSetPart) == SQLITE_OK);
+  int parameter = 0;
+  for (const int64_t number : {part.id, part.moments, part.number, part.chunk, part.first,
+                               part.last, part.size, part.block}) {
+    Require(update.Bind(++parameter, number) == SQLITE_OK);
+  }
+  Require(update.Step() == SQLITE_DONE);
+}
+
+}  // namespace ksicache

@@ -1,0 +1,93 @@
+// The rows of a recording that is being written.
+#ifndef TOOLS_KSICACHE_RECORDING_STORE_H_
+#define TOOLS_KSICACHE_RECORDING_STORE_H_
+
+#include <sys/types.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <memory>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "knvlibs/recording/recording_file.h"
+#include "knvlibs/sqlite.h"
+#include "tools/ksicache/new_file.h"
+#include "tools/ksicache/page_file.h"
+
+namespace ksicache {
+
+// Every call may fail with an Error. What it was to write is then not there, or whole, and all else
+// is as it was.
+class RecordingStore {
+ public:
+  using Part = ksi::RecordingFile::Part;
+
+  // The smallest bound of a file's size that leaves room for moments.
+  static constexpr int64_t kSmallestFile = int64_t{4} << 20;
+
+  // The content of an empty recording of `host`.
+  static ksi::Bytes Empty(const std::string& host);
+
+  // Opens a recording to write it, alone: fails if somebody else does, with his process. Its file
+  // grows to `maxSize` bytes and no further.
+  RecordingStore(const std::string& fileName, int64_t maxSize);
+  // The same of a file that is open already, which this closes.
+  RecordingStore(const std::string& name, int file, int64_t maxSize);
+
+  // The rows in use, by the number of their first moment.
+  const std::vector<Part>& Parts() const { return parts_; }
+
+  // Adds a part; its id, size and block are chosen here. Old parts make room, from the first on.
+  void Add(Part part, ksi::ByteView content);
+
+  // Adds it in the place of those that it holds the moments of. Those stay until the next Replace,
+  // for whoever copies the file meanwhile.
+  void Replace(Part part, ksi::ByteView content);
+
+  // Removes the chunks whose moments are all older than that.
+  void RemoveBefore(int64_t time);
+
+  // Brings all to the disk.
+  void Sync();
+
+  int64_t Size() const;
+
+ private:
+  void Lock();
+  void TakeStock();
+  void Connect();
+  void Ready();
+  void Execute(const char* sql);
+  void Require(bool good);
+  void Flush();
+  [[noreturn]] void Fail(int error);
+
+  bool HasOldChunk() const;
+  void RemoveFirstChunk();
+  void Remove(const std::vector<Part>& parts);
+  bool CanGrow(size_t blocks) const;
+  void KeepSpare(size_t blocks);
+  std::vector<int64_t> TakeBlocks(size_t count);
+  int64_t TakeRow();
+  void WriteBlocks(const std::vector<int64_t>& blocks, ksi::ByteView content);
+  void WriteRow(const Part& part);
+
+  std::string name_;
+  int64_t maxSize_;
+  Descriptor file_;
+  std::unique_ptr<PageFile> pages_;
+  ksi::Database database_;  // none after a failure: what it knows is not what stands there
+  std::vector<Part> parts_;
+  std::vector<Part> replaced_;                                  // that stay until the next Replace
+  std::unordered_map<int64_t, std::vector<int64_t>> blocksOf_;  // by the row of the part
+  // What is free, the one that has been so for longest first.
+  std::deque<int64_t> rows_;
+  std::deque<int64_t> blocks_;
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_RECORDING_STORE_H_
