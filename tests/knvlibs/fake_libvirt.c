@@ -1,4 +1,5 @@
 // A library with the names of libvirt's, which answers as the connection's address bids it.
+#include <errno.h>
 #include <signal.h>
 #include <stdlib.h>
 #include <string.h>
@@ -58,6 +59,7 @@ int virDomainGetUUIDString(void* domain, char* text) {
 
 int virDomainMemoryStats(void* domain, struct Stat* stats, unsigned count, unsigned flags) {
   static const struct Stat kAll[] = {{6, 1024}, {4, 7}, {5, 900}, {8, 300}, {9, 1095}, {7, 8}};
+  errno = EINTR;  // of something inside
   if (flags != 0 || *(const char*)domain == 1 || count < 6) return -1;
   memcpy(stats, kAll, sizeof kAll);
   return Is("boasts") ? 1000000 : 6;

@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <cerrno>
 #include <chrono>
 #include <string>
 
@@ -77,6 +78,7 @@ TEST(DomainXmlTest, WhatIsNotUnderstoodTellsOfNoModules) {
 LinuxHost::TimePoint StandingClock() { return LinuxHost::TimePoint(); }
 
 LibvirtAnswer AskFake(const char* mode, std::chrono::milliseconds patience) {
+  errno = EINTR;  // of something that was before
   return AskLibvirt(TALLY_FAKE_LIBVIRT, mode, StandingClock, StandingClock() + patience);
 }
 
