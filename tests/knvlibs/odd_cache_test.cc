@@ -135,6 +135,14 @@ TEST_F(OddCache, LockedByAnotherProcessIsRead) {
   close(fd);
 }
 
+#ifdef TALLY_SHORT_READS
+TEST_F(OddCache, ThatComesInPiecesIsRead) {
+  harness::Program report = Report();
+  report.environment.emplace_back("LD_PRELOAD=" TALLY_SHORT_READS);
+  ExpectWhole(harness::RunProgram(report));
+}
+#endif
+
 TEST_F(OddCache, WrittenAheadIsReadAndStaysAlone) {
   RunSql(file_, "PRAGMA journal_mode = WAL; UPDATE node SET id = id");
   ExpectWhole(harness::RunProgram(Report()));

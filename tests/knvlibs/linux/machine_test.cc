@@ -200,6 +200,13 @@ class OtherMonitorTest : public MachineTest {
   }
 };
 
+TEST_F(OtherMonitorTest, AProcessThatIsGoneHoldsNone) {
+  Process gone;
+  gone.pid = INT32_MAX;
+  EXPECT_EQ(HoldsMachine(LinuxHost("/"), gone), false);
+  EXPECT_EQ(HoldsMachine(LinuxHost(tree_.Root()), gone), std::nullopt) << "nobody recorded it";
+}
+
 TEST_F(OtherMonitorTest, IsKnownByItsDescriptor) {
   EXPECT_TRUE(IsMachine());
   EXPECT_EQ(Get<int32_t>("worldGroups/vmmLeaderID", kPid), kPid);
