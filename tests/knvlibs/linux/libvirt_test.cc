@@ -268,7 +268,7 @@ TEST_F(DaemonTest, IsNotWhoIsCalledOtherwise) {
 }
 
 TEST_F(DaemonTest, IsNotWhereOthersMayWrite) {
-  for (const mode_t mode : {0775, 0757, 0777}) {
+  for (const mode_t mode : {0775U, 0757U, 0777U}) {
     EXPECT_EQ(chmod(daemon_.directory.c_str(), mode), 0);
     EXPECT_FALSE(IsBelieved()) << mode;
   }
