@@ -106,14 +106,16 @@ class ChunkReader::Columns {
       : streams_(streams), count_(count), last_(last) {}
 
   [[nodiscard]] bool Take(ChunkReader& reader) {
-    std::vector<std::vector<Tracked*>> columns(reader.host_.nodes.size());
-    for (Tracked& each : reader.readings_) {
-      if (each.hasCells) columns[each.reading.question.node].push_back(&each);
+    std::vector<std::vector<size_t>> columns(reader.host_.nodes.size());
+    for (size_t i = 0; i < reader.states_.size(); ++i) {
+      if (reader.states_[i].hasCells) columns[reader.readings_[i].question.node].push_back(i);
     }
     NextGap();
     for (size_t node = 0; node < columns.size(); ++node) {
       for (const RecordCell& cell : reader.host_.nodes[node].cells) {
-        for (Tracked* each : columns[node]) TakeCell(cell, *each);
+        for (const size_t i : columns[node]) {
+          TakeCell(cell, reader.states_[i], reader.readings_[i].answer.record);
+        }
       }
     }
     return IsGood() && !hasGap_;
@@ -125,11 +127,10 @@ class ChunkReader::Columns {
     gap_ = hasGap_ ? streams_[chunk::kGaps].Unsigned() : UINT64_MAX;
   }
 
-  void TakeCell(const RecordCell& cell, Tracked& tracked) {
-    Bytes& record = tracked.reading.answer.record;
-    if (tracked.cameNow) TakeFirst(cell, record);
+  void TakeCell(const RecordCell& cell, const State& state, Bytes& record) {
+    if (state.cameNow) TakeFirst(cell, record);
     if (gap_-- != 0) return;
-    size_t moment = tracked.cameNow ? tracked.came + 1 : 0;
+    size_t moment = state.cameNow ? state.came + 1 : 0;
     const uint64_t count = streams_[chunk::kCounts].Bounded(count_) + 1;
     uint64_t bits = chunk::BitsOf(cell, record);
     for (uint64_t i = 0; i < count && streams_[chunk::kDeltas].IsGood(); ++i, ++moment) {
@@ -191,10 +192,11 @@ Status ChunkReader::Take(ByteView part, size_t last) {
       !Columns(streams, facts.size(), last).Take(*this)) {
     return kDamaged;
   }
-  for (Tracked& each : readings_) {
-    each.cameNow = false;
-    if (!each.isThere) each.reading = {};
-    each.hasCells = each.hasCells && each.isThere;
+  for (size_t i = 0; i < states_.size(); ++i) {
+    State& state = states_[i];
+    state.cameNow = false;
+    state.hasCells = state.hasCells && state.isThere;
+    if (!state.isThere) readings_[i] = {};
   }
   return kOk;
 }
@@ -215,30 +217,32 @@ bool ChunkReader::TakeGone(ByteReader& in, bool isWanted) {
   for (uint64_t i = 0; i < count && in.IsGood(); ++i, ++number) {
     number += in.Bounded(readings_.size());
     if (number >= readings_.size()) return false;
-    if (isWanted) readings_[number].isThere = false;
+    if (isWanted) states_[number].isThere = false;
   }
   return in.IsGood();
 }
 
 bool ChunkReader::TakeCome(ByteReader& in, size_t moment, bool isWanted) {
-  const uint64_t count = in.Bounded(kMostReadings - readings_.size());
+  constexpr size_t kSmallest = 4;  // bytes of one that comes
+  const uint64_t count =
+      in.Bounded(std::min(kMostReadings - readings_.size(), in.Left() / kSmallest));
+  if (readings_.empty()) {
+    readings_.reserve(count);
+    states_.reserve(count);
+  }
   int64_t number = 0;
   for (uint64_t i = 0; i < count && in.IsGood(); ++i) {
-    Tracked come;
-    come.reading.question.node = static_cast<uint32_t>(in.Unsigned());
-    for (OwnKey& key : come.reading.question.keys) key = TakeEntry(in, number);
-    come.reading.answer.status =
-        static_cast<Status>(in.Bounded(std::numeric_limits<Status>::max()));
-    if (!in.IsGood() || come.reading.question.node >= host_.nodes.size()) return false;
-    const RecordedNode& node = host_.nodes[come.reading.question.node];
-    come.hasCells = come.reading.answer.status == kOk && node.recordSize != 0;
-    if (come.hasCells) come.reading.answer.record.resize(node.recordSize);
+    Reading& come = readings_.emplace_back();
+    come.question.node = static_cast<uint32_t>(in.Unsigned());
+    for (OwnKey& key : come.question.keys) key = TakeEntry(in, number);
+    come.answer.status = static_cast<Status>(in.Bounded(std::numeric_limits<Status>::max()));
+    if (!in.IsGood() || come.question.node >= host_.nodes.size()) return false;
+    const RecordedNode& node = host_.nodes[come.question.node];
+    const bool hasCells = come.answer.status == kOk && node.recordSize != 0;
+    if (hasCells) come.answer.record.resize(node.recordSize);
     bytes_ += node.recordSize;
     if (bytes_ > kMostBytes) return false;
-    come.isThere = isWanted;
-    come.cameNow = true;
-    come.came = moment;
-    readings_.push_back(std::move(come));
+    states_.push_back({isWanted, true, hasCells, moment});
   }
   return in.IsGood();
 }
@@ -252,7 +256,7 @@ bool ChunkReader::TakeEdits(ByteReader& in, bool isWanted) {
       PassEdit(in);
       continue;
     }
-    Answer& answer = readings_[number].reading.answer;
+    Answer& answer = readings_[number].answer;
     bytes_ -= SizeOf(answer.entries);
     if (!TakeEdit(in, answer.entries)) return false;
     const size_t size = SizeOf(answer.entries);
@@ -264,12 +268,15 @@ bool ChunkReader::TakeEdits(ByteReader& in, bool isWanted) {
 }
 
 std::vector<Reading> ChunkReader::TakeReadings() {
-  std::vector<Reading> readings;
-  for (Tracked& each : readings_) {
-    if (each.isThere) readings.push_back(std::move(each.reading));
+  size_t kept = 0;
+  for (size_t i = 0; i < readings_.size(); ++i) {
+    if (!states_[i].isThere) continue;
+    if (kept != i) readings_[kept] = std::move(readings_[i]);
+    ++kept;
   }
-  readings_.clear();
-  return readings;
+  readings_.resize(kept);
+  states_.clear();
+  return std::exchange(readings_, {});
 }
 
 }  // namespace ksi

@@ -39,9 +39,8 @@ class ChunkReader {
  private:
   class Columns;
 
-  // A reading of the chunk; of one that came after the last moment that is taken nothing is kept.
-  struct Tracked {
-    Reading reading;
+  // What there is to know of a reading of the chunk besides it.
+  struct State {
     bool isThere = false;
     bool cameNow = false;  // with the part that is being taken
     bool hasCells = false;
@@ -56,7 +55,9 @@ class ChunkReader {
   HostIdentity host_;
   MomentFacts facts_;
   bool hasStarted_ = false;
-  std::vector<Tracked> readings_;
+  // By their numbers; of those that are not there nothing is kept.
+  std::vector<Reading> readings_;
+  std::vector<State> states_;
   size_t bytes_ = 0;
   size_t work_ = 0;
 };
