@@ -277,7 +277,6 @@ Status CgroupHierarchy::ReadEvents(const LinuxHost& host, std::string_view path,
   events.zswpin = pages("zswpin");
   events.zswpout = pages("zswpout");
   events.active = KBOf(stat, {"active_anon", "active_file"});
-  events.thp = KBOf(stat, {"anon_thp", "shmem_thp"});
   events.secPageTables = KBOf(stat, {"sec_pagetables"});
   events.thpAlloc = SumOf({stat.Find("thp_fault_alloc"), stat.Find("thp_collapse_alloc")});
   return kOk;

@@ -43,7 +43,6 @@ struct MemcgEvents {
   Figure thpAlloc;  // times
   // What is there now.
   Figure active;         // on the lists of pages in use
-  Figure thp;            // in transparent huge pages
   Figure secPageTables;  // of KVM
 };
 

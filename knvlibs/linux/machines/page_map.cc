@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <functional>
 #include <optional>
 #include <string>
 
@@ -100,6 +101,16 @@ bool ScanPiece(int pagemap, AddressRange& range, ByteCounts& counts) {
   return true;
 }
 
+// An entry of pagemap: the frame that a page in memory lies in.
+uint64_t FrameOf(uint64_t entry) { return entry & ((uint64_t{1} << 55) - 1); }
+
+// The zero page is nobody's own and no file's.
+bool MayBeZero(uint64_t entry) {
+  constexpr uint64_t kIsExclusive = uint64_t{1} << 56;
+  constexpr uint64_t kIsFile = uint64_t{1} << 61;
+  return (entry & (kIsExclusive | kIsFile)) == 0;
+}
+
 // The frame that a page of this program lies in, if the kernel tells.
 Figure FrameOf(const void* page) {
   const FileDescriptor pagemap(open("/proc/self/pagemap", O_RDONLY | O_CLOEXEC));
@@ -109,8 +120,7 @@ Figure FrameOf(const void* page) {
       sizeof entry) {
     return std::nullopt;
   }
-  const uint64_t frame = entry & ((uint64_t{1} << 55) - 1);
-  return frame == 0 ? std::nullopt : Figure(frame);
+  return FrameOf(entry) == 0 ? std::nullopt : Figure(FrameOf(entry));
 }
 
 // Memory that was only ever read is the zero page.
@@ -124,14 +134,19 @@ Figure FindZeroFrame() {
   return frame;
 }
 
-bool IsHugeZero(uint64_t frame) {
-  constexpr uint64_t kZeroPageFlag = uint64_t{1} << 24;
-  const FileDescriptor flags(open("/proc/kpageflags", O_RDONLY | O_CLOEXEC));
-  uint64_t word = 0;
-  return pread(flags.Get(), &word, sizeof word, static_cast<off_t>(frame * sizeof word)) ==
-             sizeof word &&
-         (word & kZeroPageFlag) != 0;
-}
+// What the kernel says of frames.
+class FrameFlags {
+ public:
+  Figure operator()(uint64_t frame) const {
+    uint64_t flags = 0;
+    const auto at = static_cast<off_t>(frame * sizeof flags);
+    if (pread(file_.Get(), &flags, sizeof flags, at) != sizeof flags) return std::nullopt;
+    return flags;
+  }
+
+ private:
+  FileDescriptor file_{open("/proc/kpageflags", O_RDONLY | O_CLOEXEC)};
+};
 
 // The kernel itself hands the entries over in pieces.
 Status CountEntries(const LinuxHost& host, const std::string& file, int pagemap,
@@ -139,7 +154,8 @@ Status CountEntries(const LinuxHost& host, const std::string& file, int pagemap,
   const Figure zeroFrame = FindZeroFrame();
   if (!zeroFrame) return KSI_STATUS_PERMISSION_DENIED;
   const uint64_t pageSize = host.PageKB() * 1024;
-  EntryCounter counter(pageSize, *zeroFrame, IsHugeZero);
+  const FrameFlags flags;
+  EntryCounter counter(pageSize, *zeroFrame, std::ref(flags));
   std::array<uint64_t, 4096> entries;
   for (const AddressRange& range : ranges) {
     for (uint64_t at = range.start; at < range.end;) {
@@ -158,7 +174,8 @@ Status CountEntries(const LinuxHost& host, const std::string& file, int pagemap,
       }
     }
   }
-  counts = {counter.Resident() * host.PageKB(), counter.Swapped() * host.PageKB(), std::nullopt};
+  counts = {counter.Resident() * host.PageKB(), counter.Swapped() * host.PageKB(),
+            ProductOf(counter.Huge(), host.PageKB())};
   return kOk;
 }
 
@@ -187,16 +204,32 @@ void WarnDenied(const LinuxHost& host, const std::string& file) {
 
 }  // namespace
 
-bool EntryCounter::IsZero(uint64_t address, uint64_t entry) {
-  constexpr uint64_t kIsExclusive = uint64_t{1} << 56;
-  constexpr uint64_t kIsFile = uint64_t{1} << 61;
-  const uint64_t frame = entry & ((uint64_t{1} << 55) - 1);
-  const bool mayBeZero = (entry & (kIsExclusive | kIsFile)) == 0;
-  const uint64_t frames = kHugePage / pageSize_;
-  if (address % kHugePage == 0) {
-    isInHugeZero_ = mayBeZero && frame % frames == 0 && frame != zeroFrame_ && isHugeZero_(frame);
+// What begins with the entry of an address at which a huge page may.
+EntryCounter::Within EntryCounter::FindBeginning(uint64_t entry) {
+  constexpr uint64_t kIsHugetlb = uint64_t{1} << 17;
+  constexpr uint64_t kIsTransparent = uint64_t{1} << 22;
+  constexpr uint64_t kIsZeroPage = uint64_t{1} << 24;
+  next_ = FrameOf(entry);
+  if (next_ % (kHugePage / pageSize_) != 0 || next_ == zeroFrame_) return Within::kSmall;
+  const Figure flags = flagsOf_(next_);
+  if (!flags) huge_.reset();
+  if ((flags.value_or(0) & kIsZeroPage) != 0) {
+    return MayBeZero(entry) ? Within::kHugeZero : Within::kSmall;
   }
-  return mayBeZero && (frame == zeroFrame_ || isInHugeZero_);
+  return (flags.value_or(0) & (kIsHugetlb | kIsTransparent)) != 0 ? Within::kHuge : Within::kSmall;
+}
+
+void EntryCounter::TakePresent(uint64_t entry) {
+  if (MayBeZero(entry) && (FrameOf(entry) == zeroFrame_ || within_ == Within::kHugeZero)) return;
+  ++resident_;
+  // Of a huge page that was cut, what is left is mapped page by page.
+  if (within_ != Within::kHuge || FrameOf(entry) != next_) {
+    within_ = Within::kSmall;
+    return;
+  }
+  ++next_;
+  const uint64_t frames = kHugePage / pageSize_;
+  if (next_ % frames == 0) huge_ = SumOf({huge_, frames});
 }
 
 void EntryCounter::Take(uint64_t address, uint64_t entry) {
@@ -204,10 +237,11 @@ void EntryCounter::Take(uint64_t address, uint64_t entry) {
   constexpr uint64_t kIsInMemory = uint64_t{1} << 63;
   if ((entry & kIsInSwap) != 0) ++swapped_;
   if ((entry & kIsInMemory) == 0) {
-    isInHugeZero_ = false;
-  } else if (!IsZero(address, entry)) {
-    ++resident_;
+    within_ = Within::kSmall;
+    return;
   }
+  if (address % kHugePage == 0) within_ = FindBeginning(entry);
+  TakePresent(entry);
 }
 
 Status CountPages(const LinuxHost& host, int32_t pid, std::span<const AddressRange> ranges,

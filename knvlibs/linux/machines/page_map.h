@@ -4,7 +4,9 @@
 #define KNVLIBS_LINUX_MACHINES_PAGE_MAP_H_
 
 #include <cstdint>
+#include <functional>
 #include <span>
+#include <utility>
 
 #include "knvlibs/linux/host/host.h"
 #include "knvlibs/status.h"
@@ -20,7 +22,7 @@ struct AddressRange {
 struct PageCounts {
   Figure resident;
   Figure swapped;
-  Figure huge;  // of the resident, in pages of 2 MB or more; only Linux 6.7 and later tell
+  Figure huge;  // of the resident, in pages of 2 MB or more
 };
 
 // Counts the pages in these ranges. No figures where pagemap may not be read, where it does not
@@ -32,25 +34,34 @@ struct PageCounts {
 // Counts pages by the entries of a pagemap file, which come in the order of their addresses.
 class EntryCounter {
  public:
-  // `zeroFrame` is the frame of the zero page; `isHugeZero` tells of a frame at which a huge page
-  // begins whether that is the huge zero page.
-  EntryCounter(uint64_t pageSize, uint64_t zeroFrame, bool (*isHugeZero)(uint64_t frame))
-      : pageSize_(pageSize), zeroFrame_(zeroFrame), isHugeZero_(isHugeZero) {}
+  // The flags of a frame as /proc/kpageflags has them; none if they cannot be read.
+  using FlagsOf = std::function<Figure(uint64_t frame)>;
+
+  // `zeroFrame` is the frame of the zero page. `flagsOf` is asked where a huge page may begin.
+  EntryCounter(uint64_t pageSize, uint64_t zeroFrame, FlagsOf flagsOf)
+      : pageSize_(pageSize), zeroFrame_(zeroFrame), flagsOf_(std::move(flagsOf)) {}
 
   void Take(uint64_t address, uint64_t entry);
 
+  // Pages.
   uint64_t Resident() const { return resident_; }
   uint64_t Swapped() const { return swapped_; }
+  Figure Huge() const { return huge_; }  // of the resident; none if the flags were not told
 
  private:
-  bool IsZero(uint64_t address, uint64_t entry);
+  enum class Within : uint8_t { kSmall, kHuge, kHugeZero };
+
+  Within FindBeginning(uint64_t entry);
+  void TakePresent(uint64_t entry);
 
   uint64_t pageSize_;
   uint64_t zeroFrame_;
-  bool (*isHugeZero_)(uint64_t frame);
-  bool isInHugeZero_ = false;
+  FlagsOf flagsOf_;
+  Within within_ = Within::kSmall;
+  uint64_t next_ = 0;  // the frame that comes next in the huge page
   uint64_t resident_ = 0;
   uint64_t swapped_ = 0;
+  Figure huge_ = 0;
 };
 
 }  // namespace ksi

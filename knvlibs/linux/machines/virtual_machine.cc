@@ -184,15 +184,6 @@ Status ReadTransparent(const LinuxHost& host, Figure& swapThreshold) {
                               swapThreshold);
 }
 
-// What of the guest's memory is in huge pages. Before Linux 6.7 only a small process tells; else
-// its own cgroup does, and hugetlb pages are the guest's if QEMU has any.
-Figure HugeOf(const GroupTree& tree, const VirtualMachine& machine, const GuestMapping& mapping,
-              const MemcgEvents& events) {
-  if (mapping.huge) return mapping.huge;
-  const Process& process = tree.ProcessOf(tree.At(machine.group));
-  return LesserOf(SumOf({events.thp, process.hugetlb}), mapping.resident);
-}
-
 Status ReadVmLargePages(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                         KSI_VmLargePages& record) {
   const GuestMapping* mapping = nullptr;
@@ -204,8 +195,7 @@ Status ReadVmLargePages(const LinuxHost& host, const GroupTree& tree, const Virt
   if (status != kOk) return status;
 
   const Figure untold = threshold ? std::nullopt : Figure(0);
-  record.nrBackings =
-      FieldOf<uint32_t>(QuotientOf(HugeOf(tree, machine, *mapping, *events), kLargePageKB));
+  record.nrBackings = FieldOf<uint32_t>(QuotientOf(mapping->huge, kLargePageKB));
   record.maxSwapThreshold = FieldOf<uint32_t>(threshold.value_or(0));
   record.nrAllocSuccess = FieldOf(threshold ? events->thpAlloc : Figure(0));
   record.nrFailPinned = FieldOf(untold);

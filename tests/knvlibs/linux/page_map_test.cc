@@ -182,7 +182,26 @@ TEST(PageMapTest, EntriesTellWhatAScanTells) {
     FailPagemap(ENOTTY, 0);
     PageCounts counts;
     return CountPages(LinuxHost("/"), getpid(), ranges, counts) == kOk &&
-           counts.resident == 19 * 1024u && counts.swapped == 0u && !counts.huge;
+           counts.resident == 19 * 1024u && counts.swapped == 0u && counts.huge == 0u;
+  };
+  EXPECT_EXIT(_exit(count() ? 0 : 1), testing::ExitedWithCode(0), "^$");
+}
+
+TEST(PageMapTest, EntriesTellOfHugePagesWhatAScanTells) {
+  if (!TellsFrames()) GTEST_SKIP() << "this kernel tells nobody here which pages are zero pages";
+  const Memory memory(32 * kMB);
+  madvise(reinterpret_cast<void*>(memory.Range().start), 32 * kMB, MADV_HUGEPAGE);
+  memory.Write(0, 32 * kMB);
+  const AddressRange ranges[] = {memory.Range()};
+  const LinuxHost host("/");
+  PageCounts scanned;
+  ASSERT_EQ(CountPages(host, getpid(), ranges, scanned), kOk);
+  if (scanned.huge.value_or(0) == 0) GTEST_SKIP() << "this machine has no huge pages to give";
+  const auto count = [&] {
+    FailPagemap(ENOTTY, 0);
+    PageCounts counts;
+    return CountPages(host, getpid(), ranges, counts) == kOk && counts.resident == 32 * 1024u &&
+           counts.huge == scanned.huge;
   };
   EXPECT_EXIT(_exit(count() ? 0 : 1), testing::ExitedWithCode(0), "^$");
 }
@@ -222,7 +241,33 @@ constexpr uint64_t kFile = uint64_t{1} << 61;
 constexpr uint64_t kExclusive = uint64_t{1} << 56;
 constexpr uint64_t kZeroFrame = 4711;
 
-bool IsAt1024(uint64_t frame) { return frame == 1024; }
+constexpr uint64_t kHugeZero = 1024;
+constexpr uint64_t kTransparent = 2048;
+constexpr uint64_t kHugetlb = 4096;
+constexpr uint64_t kCannotBeRead = 8192;
+
+// /proc/kpageflags
+Figure FlagsOf(uint64_t frame) {
+  switch (frame) {
+    case kHugeZero:
+      return uint64_t{1} << 24 | uint64_t{1} << 22;
+    case kTransparent:
+      return uint64_t{1} << 22;
+    case kHugetlb:
+      return uint64_t{1} << 17;
+    case kCannotBeRead:
+      return std::nullopt;
+    default:
+      return 0;
+  }
+}
+
+// The entries of so many frames side by side.
+std::vector<uint64_t> Entries(uint64_t first, uint64_t count) {
+  std::vector<uint64_t> entries;
+  for (uint64_t i = 0; i < count; ++i) entries.push_back(kPresent | (first + i));
+  return entries;
+}
 
 class EntryCounterTest : public testing::Test {
  protected:
@@ -234,7 +279,7 @@ class EntryCounterTest : public testing::Test {
     }
   }
 
-  EntryCounter counter_{4096, kZeroFrame, IsAt1024};
+  EntryCounter counter_{4096, kZeroFrame, FlagsOf};
 };
 
 TEST_F(EntryCounterTest, PagesAreResidentOrSwappedOrNothing) {
@@ -251,9 +296,7 @@ TEST_F(EntryCounterTest, TheZeroPageIsNotResident) {
 }
 
 TEST_F(EntryCounterTest, NeitherIsTheHugeZeroPage) {
-  std::vector<uint64_t> huge;
-  for (uint64_t i = 0; i < 512; ++i) huge.push_back(kPresent | (1024 + i));
-  Take(4 * kMB, huge);
+  Take(4 * kMB, Entries(kHugeZero, 512));
   EXPECT_EQ(counter_.Resident(), 0u);
   Take(6 * kMB, {kPresent | 512, kPresent | 513});
   EXPECT_EQ(counter_.Resident(), 2u) << "a huge page of another frame";
@@ -261,6 +304,37 @@ TEST_F(EntryCounterTest, NeitherIsTheHugeZeroPage) {
   EXPECT_EQ(counter_.Resident(), 3u) << "no huge page begins there";
   Take(10 * kMB, {kPresent | kExclusive | 1024});
   EXPECT_EQ(counter_.Resident(), 4u) << "the huge zero page is nobody's own";
+  EXPECT_EQ(counter_.Huge(), 0u);
+}
+
+TEST_F(EntryCounterTest, HugePagesAreTransparentOrOfHugetlb) {
+  Take(4 * kMB, Entries(kTransparent, 512));
+  EXPECT_EQ(counter_.Huge(), 512u);
+  Take(6 * kMB, Entries(kHugetlb, 512));
+  EXPECT_EQ(counter_.Huge(), 1024u);
+  Take(8 * kMB, Entries(512, 512));
+  EXPECT_EQ(counter_.Huge(), 1024u) << "frames side by side are no huge page by that";
+  EXPECT_EQ(counter_.Resident(), 3 * 512u);
+}
+
+TEST_F(EntryCounterTest, WhatIsLeftOfAHugePageIsNone) {
+  std::vector<uint64_t> cut = Entries(kTransparent, 512);
+  cut[100] = 0;
+  Take(4 * kMB, cut);
+  cut[100] = kPresent | kExclusive | 7;
+  Take(6 * kMB, cut);
+  Take(8 * kMB, Entries(kTransparent, 511));
+  Take(10 * kMB + 4096, Entries(kTransparent, 511));
+  Take(12 * kMB, Entries(kTransparent + 1, 512));
+  EXPECT_EQ(counter_.Huge(), 0u);
+  EXPECT_EQ(counter_.Resident(), 511u + 512 + 511 + 511 + 512);
+}
+
+TEST_F(EntryCounterTest, WithoutFlagsHugePagesAreNotKnown) {
+  Take(4 * kMB, Entries(kTransparent, 512));
+  Take(6 * kMB, Entries(kCannotBeRead, 512));
+  EXPECT_EQ(counter_.Huge(), std::nullopt);
+  EXPECT_EQ(counter_.Resident(), 2 * 512u);
 }
 
 }  // namespace
