@@ -266,7 +266,7 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
                                             "-accel",
                                             GetParam().accelerator,
                                             "-M",
-                                            "pc",
+                                            "pc,nvdimm=on",
                                             "-m",
                                             memory,
                                             "-display",
@@ -316,10 +316,12 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
     ASSERT_TRUE(Eventually([&] { return TryCommand(command); })) << command;
   }
 
-  void Plug(const std::string& id, const std::string& size) {
+  // `device` is the driver and what it is told more.
+  void Plug(const std::string& id, const std::string& size,
+            const std::string& device = R"("pc-dimm")") {
     Command(R"({"execute":"object-add","arguments":{"qom-type":"memory-backend-ram","id":")" + id +
             R"(","prealloc":true,"size":)" + size + "}}");
-    Command(R"({"execute":"device_add","arguments":{"driver":"pc-dimm","memdev":")" + id +
+    Command(R"({"execute":"device_add","arguments":{"driver":)" + device + R"(,"memdev":")" + id +
             R"(","id":"dimm-)" + id + R"("}})");
   }
 
@@ -366,6 +368,10 @@ TEST_P(PluggedMemoryTest, IsMemoryOfTheGuest) {
   const double large = MappedOnceItHas(start + 320);
   EXPECT_GE(large, 327680);
   EXPECT_LE(large, static_cast<double>((start + 320) * 1024));
+  // Its label takes of it, and what remains is whole pieces of 2 MB.
+  Plug("persistent", "134217728", R"("nvdimm","label-size":131072)");
+  const double persistent = MappedOnceItHas(start + 320 + 126);
+  EXPECT_GE(persistent - large, 126 * 1024);
 }
 
 INSTANTIATE_TEST_SUITE_P(
