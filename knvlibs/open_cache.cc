@@ -108,13 +108,15 @@ Status OpenCache(const std::string& name, OpenedCache* opened, std::string* why)
   return status;
 }
 
-Status ReadCache(const std::string& name, OpenedCache* opened, Moment* moment, std::string* why) {
+Status ReadCache(const std::string& name, OpenedCache* opened, ChunkReader* moment,
+                 std::string* why) {
   Status status = kOk;
   // Whoever reads while a recorder writes may see the one half of what it does.
   for (int tries = 3; tries != 0; --tries) {
     status = OpenCache(name, opened, why);
     if (status == kOk && opened->recording == nullptr) return kOk;
     if (status == kOk) {
+      *moment = {};
       status = opened->recording->ReadMoment(opened->number, *moment);
       *why = opened->recording->Why();
     }
@@ -125,7 +127,7 @@ Status ReadCache(const std::string& name, OpenedCache* opened, Moment* moment, s
 
 Status OpenCacheSource(const char* name, std::unique_ptr<Source>* source) {
   OpenedCache opened;
-  Moment moment;
+  ChunkReader moment;
   std::string why;
   const Status status = ReadCache(name, &opened, &moment, &why);
   if (status != kOk) {
@@ -135,7 +137,7 @@ Status OpenCacheSource(const char* name, std::unique_ptr<Source>* source) {
   } else if (opened.recording == nullptr) {
     *source = std::make_unique<CacheSource>(name, std::move(opened.capture));
   } else {
-    *source = std::make_unique<MomentSource>(std::move(moment));
+    *source = std::make_unique<MomentSource>(name, std::move(moment));
   }
   return status;
 }

@@ -28,7 +28,7 @@ struct OpenedCache {
 [[nodiscard]] Status OpenCache(const std::string& name, OpenedCache* opened, std::string* why);
 
 // The same with the moment, if it is one of a recording. Somebody may be recording it meanwhile.
-[[nodiscard]] Status ReadCache(const std::string& name, OpenedCache* opened, Moment* moment,
+[[nodiscard]] Status ReadCache(const std::string& name, OpenedCache* opened, ChunkReader* moment,
                                std::string* why);
 
 // The same as a source; says by a diagnostic what is wrong with a recording, or with a time.

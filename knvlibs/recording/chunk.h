@@ -21,10 +21,11 @@
 //              record, the number of its cells and of each the width times 2, plus 1 for a figure
 //            the number of moments and of each, signed and as difference from the one before,
 //              taken and uptime, then duration, cpu, skipped, loss, refused, failed
-//   changes  the sizes of the seven streams, and the streams:
-//     events   of each moment: how many readings went, and of each how many readings before it
-//                stayed; how many came, and of each the node, the keys and the status; how many
-//                lists changed, and of each the reading and the edit (list_edit.h)
+//   changes  the size of the events; of each node the sizes of its six streams; the events; the
+//            streams, first those of the first kind of all nodes, then those of the next
+//     events   of each moment: how many readings went, and of each how many readings lie between it
+//              and the one before it; how many came, and of each the node, the keys and the status;
+//              how many lists changed, and of each the reading and the edit (list_edit.h)
 //     first    the figures that came, column by column, signed
 //     raw      the other cells that came, likewise, as they are
 //     gaps     of each cell that changed: how many lie between it and the one before it
@@ -32,9 +33,10 @@
 //     steps    of each change: how many moments lie between it and the cell's one before it
 //     deltas   of each change: by how much, signed, modulo the cell's width
 //
-// Readings are numbered as they come, from 0 in each chunk. A list comes empty. The order of cells
-// is by node, then by their place in the record, then by the number of the reading; readings that
-// had gone before the part have none, and those that failed.
+// Readings are numbered as they come, from 0 in each chunk. A list comes empty. The cells of a node
+// are ordered by their place in the record, then by the number of the reading; readings that had
+// gone before the part have none, and those that failed. So who wants a few nodes reads their
+// streams and no others.
 #ifndef KNVLIBS_RECORDING_CHUNK_H_
 #define KNVLIBS_RECORDING_CHUNK_H_
 
@@ -55,7 +57,7 @@ constexpr size_t kPrefixSize = 4;
 
 constexpr size_t kWidestCell = 8;
 
-enum Stream { kEvents, kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kStreams };
+enum Stream { kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kStreams };
 
 inline uint64_t BitsOf(const RecordCell& cell, const Bytes& record) {
   uint64_t bits = 0;

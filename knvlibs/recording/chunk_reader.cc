@@ -89,36 +89,43 @@ Status UnpackPart(ByteView part, Bytes& facts, Bytes* changes) {
   return status;
 }
 
-size_t SizeOf(const std::vector<OwnKey>& entries) {
-  return std::accumulate(entries.begin(), entries.end(), size_t{0},
-                         [](size_t sum, const OwnKey& entry) {
-                           const auto* text = std::get_if<std::string>(&entry);
-                           return sum + sizeof entry + (text == nullptr ? 0 : text->size());
-                         });
+size_t SizeOf(const std::vector<Key>& entries) {
+  return std::accumulate(
+      entries.begin(), entries.end(), size_t{0},
+      [](size_t sum, const Key& entry) { return sum + sizeof entry + entry.text.size(); });
 }
 
 }  // namespace
 
-// The streams of the cells.
+// The streams of a node of a part.
 class ChunkReader::Columns {
  public:
-  Columns(std::array<ByteReader, chunk::kStreams>& streams, size_t count, size_t last)
-      : streams_(streams), count_(count), last_(last) {}
-
-  [[nodiscard]] bool Take(ChunkReader& reader) {
-    std::vector<std::vector<size_t>> columns(reader.host_.nodes.size());
-    for (size_t i = 0; i < reader.states_.size(); ++i) {
-      if (reader.states_[i].hasCells) columns[reader.readings_[i].question.node].push_back(i);
-    }
+  Columns(Part& part, size_t node)
+      : streams_(part.streams[node]), count_(part.count), last_(part.last) {
     NextGap();
-    for (size_t node = 0; node < columns.size(); ++node) {
-      for (const RecordCell& cell : reader.host_.nodes[node].cells) {
-        for (const size_t i : columns[node]) {
-          TakeCell(cell, reader.states_[i], reader.readings_[i].answer.record);
-        }
-      }
+  }
+
+  // The next cell. `cameNow`: the reading came with the part, at its moment `came`.
+  void TakeCell(const RecordCell& cell, bool cameNow, size_t came, std::span<std::byte> bytes) {
+    if (cameNow) TakeFirst(cell, bytes);
+    if (gap_-- != 0) return;
+    size_t moment = cameNow ? came + 1 : 0;
+    const uint64_t count = streams_[chunk::kCounts].Bounded(count_) + 1;
+    uint64_t bits = 0;
+    std::memcpy(&bits, bytes.data(), cell.width);
+    for (uint64_t i = 0; i < count && streams_[chunk::kDeltas].IsGood(); ++i, ++moment) {
+      moment += streams_[chunk::kSteps].Bounded(count_);
+      const auto delta = static_cast<uint64_t>(streams_[chunk::kDeltas].Signed());
+      if (moment <= last_) bits += delta;
     }
-    return IsGood() && !hasGap_;
+    std::memcpy(bytes.data(), &bits, cell.width);
+    NextGap();
+  }
+
+  // Whether all has been taken, and nothing was wanting.
+  bool IsAtEnd() const {
+    return !hasGap_ &&
+           std::ranges::all_of(streams_, [](const ByteReader& stream) { return stream.IsAtEnd(); });
   }
 
  private:
@@ -127,38 +134,17 @@ class ChunkReader::Columns {
     gap_ = hasGap_ ? streams_[chunk::kGaps].Unsigned() : UINT64_MAX;
   }
 
-  void TakeCell(const RecordCell& cell, const State& state, Bytes& record) {
-    if (state.cameNow) TakeFirst(cell, record);
-    if (gap_-- != 0) return;
-    size_t moment = state.cameNow ? state.came + 1 : 0;
-    const uint64_t count = streams_[chunk::kCounts].Bounded(count_) + 1;
-    uint64_t bits = chunk::BitsOf(cell, record);
-    for (uint64_t i = 0; i < count && streams_[chunk::kDeltas].IsGood(); ++i, ++moment) {
-      moment += streams_[chunk::kSteps].Bounded(count_);
-      const auto delta = static_cast<uint64_t>(streams_[chunk::kDeltas].Signed());
-      if (moment <= last_) bits += delta;
-    }
-    chunk::PutBits(cell, bits, record);
-    NextGap();
-  }
-
-  void TakeFirst(const RecordCell& cell, Bytes& record) {
+  void TakeFirst(const RecordCell& cell, std::span<std::byte> bytes) {
     if (cell.isFigure) {
-      chunk::PutBits(cell, static_cast<uint64_t>(streams_[chunk::kFirst].Signed()), record);
+      const int64_t figure = streams_[chunk::kFirst].Signed();
+      std::memcpy(bytes.data(), &figure, cell.width);
     } else {
-      const ByteView raw = streams_[chunk::kRaw].Raw(cell.width);
-      std::ranges::copy(raw, record.begin() + cell.offset);
+      std::ranges::copy(streams_[chunk::kRaw].Raw(cell.width), bytes.begin());
     }
-  }
-
-  bool IsGood() const {
-    return std::all_of(
-        streams_.begin() + chunk::kFirst, streams_.end(),
-        [](const ByteReader& stream) { return stream.IsGood() && stream.Left() == 0; });
   }
 
   std::array<ByteReader, chunk::kStreams>& streams_;
-  size_t count_;  // of moments
+  size_t count_;
   size_t last_;
   uint64_t gap_ = 0;
   bool hasGap_ = false;
@@ -173,37 +159,44 @@ Status ChunkReader::TakeFacts(ByteView part, HostIdentity& host, std::vector<Mom
 
 Status ChunkReader::Take(ByteView part, size_t last) {
   Bytes index;
-  Bytes changes;
+  Part taken;
   bool starts = false;
   std::vector<MomentFacts> facts;
-  const Status status = UnpackPart(part, index, &changes);
+  const Status status = UnpackPart(part, index, &taken.changes);
   if (status != kOk) return status;
-  if (!TakeIndex(ByteReader(index), starts, host_, facts) || starts == hasStarted_) return kDamaged;
-  hasStarted_ = true;
-  last = std::min(last, facts.size() - 1);
-  facts_ = facts[last];
-
-  ByteReader in(changes);
-  std::array<uint64_t, chunk::kStreams> sizes;
-  for (uint64_t& size : sizes) size = in.Unsigned();
-  std::array<ByteReader, chunk::kStreams> streams;
-  for (size_t i = 0; i < streams.size(); ++i) streams[i] = ByteReader(in.Raw(sizes[i]));
-  if (!in.IsAtEnd() || !TakeEvents(streams[chunk::kEvents], facts.size(), last) ||
-      !Columns(streams, facts.size(), last).Take(*this)) {
+  if (!TakeIndex(ByteReader(index), starts, host_, facts) || starts != parts_.empty()) {
     return kDamaged;
   }
-  for (size_t i = 0; i < states_.size(); ++i) {
-    State& state = states_[i];
-    state.cameNow = false;
-    state.hasCells = state.hasCells && state.isThere;
-    if (!state.isThere) readings_[i] = {};
-  }
-  return kOk;
+  nodes_.resize(host_.nodes.size());
+  taken.count = facts.size();
+  taken.last = std::min(last, facts.size() - 1);
+  facts_ = facts[taken.last];
+  ByteReader events;
+  const bool isGood = TakeStreams(taken, events);
+  parts_.push_back(std::move(taken));
+  return StatusIf(isGood && TakeEvents(events, parts_.back()));
 }
 
-bool ChunkReader::TakeEvents(ByteReader in, size_t count, size_t last) {
-  for (size_t moment = 0; moment < count; ++moment) {
-    const bool isWanted = moment <= last;
+bool ChunkReader::TakeStreams(Part& part, ByteReader& events) const {
+  ByteReader in(part.changes);
+  const uint64_t eventsSize = in.Unsigned();
+  std::vector<std::array<uint64_t, chunk::kStreams>> sizes(host_.nodes.size());
+  for (auto& each : sizes) {
+    for (uint64_t& size : each) size = in.Unsigned();
+  }
+  events = ByteReader(in.Raw(eventsSize));
+  part.streams.resize(sizes.size());
+  for (size_t kind = 0; kind < chunk::kStreams; ++kind) {
+    for (size_t node = 0; node < sizes.size(); ++node) {
+      part.streams[node][kind] = ByteReader(in.Raw(sizes[node][kind]));
+    }
+  }
+  return in.IsAtEnd();
+}
+
+bool ChunkReader::TakeEvents(ByteReader in, const Part& part) {
+  for (size_t moment = 0; moment < part.count; ++moment) {
+    const bool isWanted = moment <= part.last;
     if (!TakeGone(in, isWanted) || !TakeCome(in, moment, isWanted) || !TakeEdits(in, isWanted)) {
       return false;
     }
@@ -212,37 +205,40 @@ bool ChunkReader::TakeEvents(ByteReader in, size_t count, size_t last) {
 }
 
 bool ChunkReader::TakeGone(ByteReader& in, bool isWanted) {
+  const auto part = static_cast<uint32_t>(parts_.size() - 1);
   const uint64_t count = in.Bounded(readings_.size());
   uint64_t number = 0;
   for (uint64_t i = 0; i < count && in.IsGood(); ++i, ++number) {
     number += in.Bounded(readings_.size());
     if (number >= readings_.size()) return false;
-    if (isWanted) states_[number].isThere = false;
+    if (!isWanted) continue;
+    readings_[number].wentIn = std::min(readings_[number].wentIn, part);
+    lists_.erase(number);
   }
   return in.IsGood();
 }
 
 bool ChunkReader::TakeCome(ByteReader& in, size_t moment, bool isWanted) {
   constexpr size_t kSmallest = 4;  // bytes of one that comes
+  const auto part = static_cast<uint32_t>(parts_.size() - 1);
   const uint64_t count =
       in.Bounded(std::min(kMostReadings - readings_.size(), in.Left() / kSmallest));
-  if (readings_.empty()) {
-    readings_.reserve(count);
-    states_.reserve(count);
-  }
+  if (readings_.empty()) readings_.reserve(count);
   int64_t number = 0;
   for (uint64_t i = 0; i < count && in.IsGood(); ++i) {
-    Reading& come = readings_.emplace_back();
-    come.question.node = static_cast<uint32_t>(in.Unsigned());
-    for (OwnKey& key : come.question.keys) key = TakeEntry(in, number);
-    come.answer.status = static_cast<Status>(in.Bounded(std::numeric_limits<Status>::max()));
-    if (!in.IsGood() || come.question.node >= host_.nodes.size()) return false;
-    const RecordedNode& node = host_.nodes[come.question.node];
-    const bool hasCells = come.answer.status == kOk && node.recordSize != 0;
-    if (hasCells) come.answer.record.resize(node.recordSize);
-    bytes_ += node.recordSize;
+    ReadingState& come = readings_.emplace_back();
+    const uint64_t node = in.Unsigned();
+    for (Key& key : come.keys) key = TakeEntry(in, number);
+    come.status = static_cast<Status>(in.Bounded(std::numeric_limits<Status>::max()));
+    if (!in.IsGood() || node >= nodes_.size()) return false;
+    come.node = static_cast<uint32_t>(node);
+    come.place = static_cast<uint32_t>(nodes_[node].readings.size());
+    come.cameIn = part;
+    come.came = static_cast<uint32_t>(moment);
+    if (!isWanted) come.wentIn = part;
+    nodes_[node].readings.push_back(readings_.size() - 1);
+    bytes_ += host_.nodes[node].recordSize;
     if (bytes_ > kMostBytes) return false;
-    states_.push_back({isWanted, true, hasCells, moment});
   }
   return in.IsGood();
 }
@@ -256,10 +252,10 @@ bool ChunkReader::TakeEdits(ByteReader& in, bool isWanted) {
       PassEdit(in);
       continue;
     }
-    Answer& answer = readings_[number].answer;
-    bytes_ -= SizeOf(answer.entries);
-    if (!TakeEdit(in, answer.entries)) return false;
-    const size_t size = SizeOf(answer.entries);
+    std::vector<Key>& entries = lists_[number];
+    bytes_ -= SizeOf(entries);
+    if (!TakeEdit(in, entries)) return false;
+    const size_t size = SizeOf(entries);
     bytes_ += size;
     work_ += size;
     if (bytes_ > kMostBytes || work_ > kMostWork) return false;
@@ -267,16 +263,70 @@ bool ChunkReader::TakeEdits(ByteReader& in, bool isWanted) {
   return in.IsGood();
 }
 
-std::vector<Reading> ChunkReader::TakeReadings() {
-  size_t kept = 0;
-  for (size_t i = 0; i < readings_.size(); ++i) {
-    if (!states_[i].isThere) continue;
-    if (kept != i) readings_[kept] = std::move(readings_[i]);
-    ++kept;
+// Brings the records of a node up to the last part.
+bool ChunkReader::TakeRecords(size_t node) {
+  NodeRecords& to = nodes_[node];
+  const RecordedNode& known = host_.nodes[node];
+  to.records.resize(to.readings.size() * known.recordSize);
+  for (; to.partsTaken < parts_.size(); ++to.partsTaken) {
+    const size_t part = to.partsTaken;
+    std::vector<const ReadingState*> present;
+    for (const size_t number : to.readings) {
+      const ReadingState& each = readings_[number];
+      if (each.status == kOk && each.cameIn <= part && each.wentIn >= part) {
+        present.push_back(&each);
+      }
+    }
+    Columns columns(parts_[part], node);
+    for (const RecordCell& cell : known.cells) {
+      for (const ReadingState* each : present) {
+        columns.TakeCell(
+            cell, each->cameIn == part, each->came,
+            std::span(to.records).subspan(each->place * size_t{known.recordSize} + cell.offset));
+      }
+    }
+    if (!columns.IsAtEnd()) return false;
   }
-  readings_.resize(kept);
-  states_.clear();
-  return std::exchange(readings_, {});
+  return true;
+}
+
+Status ChunkReader::ReadNode(size_t node, std::vector<size_t>& numbers) {
+  numbers.clear();
+  if (!TakeRecords(node)) return kDamaged;
+  for (const size_t number : nodes_[node].readings) {
+    if (readings_[number].wentIn == kStays) numbers.push_back(number);
+  }
+  return kOk;
+}
+
+ChunkReader::View ChunkReader::At(size_t number) const {
+  const ReadingState& state = readings_[number];
+  View view = {state.keys, state.status, {}, {}};
+  if (state.status != kOk) return view;
+  const size_t size = host_.nodes[state.node].recordSize;
+  view.record = ByteView(nodes_[state.node].records).subspan(state.place * size, size);
+  const auto list = lists_.find(number);
+  if (list != lists_.end()) view.entries = list->second;
+  return view;
+}
+
+Status ChunkReader::ReadAll(std::vector<Reading>& readings) {
+  readings.clear();
+  std::vector<size_t> numbers;
+  for (uint32_t node = 0; node < nodes_.size(); ++node) {
+    const Status status = ReadNode(node, numbers);
+    if (status != kOk) return status;
+    for (const size_t number : numbers) {
+      const View view = At(number);
+      Reading& reading = readings.emplace_back();
+      reading.question.node = node;
+      for (size_t i = 0; i < kMaxKeys; ++i) reading.question.keys[i] = OwnOf(view.keys[i]);
+      reading.answer.status = view.status;
+      reading.answer.record.assign(view.record.begin(), view.record.end());
+      for (const Key& entry : view.entries) reading.answer.entries.push_back(OwnOf(entry));
+    }
+  }
+  return kOk;
 }
 
 }  // namespace ksi

@@ -48,26 +48,18 @@ void PutNumbers(const std::vector<size_t>& numbers, ByteWriter& out) {
 
 }  // namespace
 
-// The streams of the changes from a moment on.
+// The streams of a node's cells from a moment on.
 class ChunkWriter::Columns {
  public:
-  Columns(const ChunkWriter& writer, size_t from) : writer_(writer), from_(from) {
-    streams_[chunk::kEvents].Raw(writer.EventsFrom(from));
-    Collect();
-    for (size_t node = 0; node < columns_.size(); ++node) {
-      const std::vector<RecordCell>& cells = writer.host_.nodes[node].cells;
-      for (uint32_t i = 0; i < cells.size(); ++i) {
-        for (Series& series : columns_[node]) PutCell(cells[i], i, series);
-      }
+  Columns(const ChunkWriter& writer, size_t node, size_t from) : from_(from) {
+    for (const size_t number : writer.byNode_[node]) Collect(writer.readings_[number]);
+    const std::vector<RecordCell>& cells = writer.host_.nodes[node].cells;
+    for (uint32_t i = 0; i < cells.size(); ++i) {
+      for (Series& each : series_) PutCell(cells[i], i, each);
     }
   }
 
-  Bytes All() const {
-    ByteWriter all;
-    for (const ByteWriter& stream : streams_) all.Unsigned(stream.All().size());
-    for (const ByteWriter& stream : streams_) all.Raw(stream.All());
-    return all.All();
-  }
+  const Bytes& Stream(size_t kind) const { return streams_[kind].All(); }
 
  private:
   // The changes of a reading, by cell; those up to `next` have been put.
@@ -77,16 +69,13 @@ class ChunkWriter::Columns {
     size_t next = 0;
   };
 
-  // The readings that have cells here, by node.
-  void Collect() {
-    columns_.resize(writer_.host_.nodes.size());
-    for (const Tracked& each : writer_.readings_) {
-      if (each.went < from_ || each.reading.answer.status != kOk) continue;
-      const auto begin = std::ranges::lower_bound(each.changes, from_, {}, &Change::moment);
-      Series series = {&each, {begin, each.changes.end()}};
-      std::ranges::stable_sort(series.changes, {}, &Change::cell);
-      columns_[each.reading.question.node].push_back(std::move(series));
-    }
+  void Collect(const Tracked& tracked) {
+    if (tracked.went < from_ || tracked.reading.answer.status != kOk) return;
+    const auto begin = std::ranges::lower_bound(tracked.changes, from_, {}, &Change::moment);
+    Series& made = series_.emplace_back();
+    made.reading = &tracked;
+    made.changes.assign(begin, tracked.changes.end());
+    std::ranges::stable_sort(made.changes, {}, &Change::cell);
   }
 
   void PutCell(const RecordCell& cell, uint32_t index, Series& series) {
@@ -117,9 +106,8 @@ class ChunkWriter::Columns {
     }
   }
 
-  const ChunkWriter& writer_;
   size_t from_;
-  std::vector<std::vector<Series>> columns_;
+  std::vector<Series> series_;
   std::array<ByteWriter, chunk::kStreams> streams_;
   uint64_t gap_ = 0;
 };
@@ -155,6 +143,7 @@ void ChunkWriter::Add(const MomentFacts& facts, const std::vector<Reading>& read
 size_t ChunkWriter::Come(const Reading& reading, Event& event) {
   const size_t number = readings_.size();
   event.come.push_back(number);
+  byNode_[reading.question.node].push_back(number);
   Tracked& come = readings_.emplace_back();
   come.reading.question = reading.question;
   come.reading.answer.status = reading.answer.status;
@@ -224,7 +213,21 @@ Bytes ChunkWriter::FactsFrom(size_t from) const {
   return out.All();
 }
 
-Bytes ChunkWriter::ChangesFrom(size_t from) const { return Columns(*this, from).All(); }
+Bytes ChunkWriter::ChangesFrom(size_t from) const {
+  std::vector<Columns> columns;
+  for (size_t node = 0; node < byNode_.size(); ++node) columns.emplace_back(*this, node, from);
+  const Bytes events = EventsFrom(from);
+  ByteWriter out;
+  out.Unsigned(events.size());
+  for (const Columns& each : columns) {
+    for (size_t kind = 0; kind < chunk::kStreams; ++kind) out.Unsigned(each.Stream(kind).size());
+  }
+  out.Raw(events);
+  for (size_t kind = 0; kind < chunk::kStreams; ++kind) {
+    for (const Columns& each : columns) out.Raw(each.Stream(kind));
+  }
+  return out.All();
+}
 
 Bytes ChunkWriter::EventsFrom(size_t from) const {
   ByteWriter out;

@@ -14,7 +14,7 @@ namespace ksi {
 
 class ChunkWriter {
  public:
-  explicit ChunkWriter(HostIdentity host) : host_(std::move(host)) {}
+  explicit ChunkWriter(HostIdentity host) : host_(std::move(host)), byNode_(host_.nodes.size()) {}
 
   const HostIdentity& Host() const { return host_; }
   size_t Count() const { return moments_.size(); }
@@ -72,6 +72,7 @@ class ChunkWriter {
   HostIdentity host_;
   std::vector<Event> moments_;
   std::vector<Tracked> readings_;
+  std::vector<std::vector<size_t>> byNode_;  // their numbers
   std::vector<size_t> current_;  // the readings that are there, in the order of SortReadings
 };
 

@@ -43,9 +43,10 @@ void PutEntry(const OwnKey& entry, int64_t& before, ByteWriter& out) {
   }
 }
 
-OwnKey TakeEntry(ByteReader& in, int64_t& before) {
-  if (in.Bounded(1) == 1) return std::string(in.Text());
-  return before = chunk::Plus(before, in.Signed());
+Key TakeEntry(ByteReader& in, int64_t& before) {
+  if (in.Bounded(1) == 1) return {KeyKind::kText, 0, in.Text()};
+  before = chunk::Plus(before, in.Signed());
+  return {KeyKind::kNumber, before, {}};
 }
 
 void PutEdit(const Entries& before, const Entries& after, ByteWriter& out) {
@@ -73,8 +74,8 @@ void PutEdit(const Entries& before, const Entries& after, ByteWriter& out) {
   PutStep({}, out);
 }
 
-bool TakeEdit(ByteReader& in, Entries& entries) {
-  Entries after;
+bool TakeEdit(ByteReader& in, std::vector<Key>& entries) {
+  std::vector<Key> after;
   int64_t number = 0;
   for (size_t at = 0;;) {
     Step step;

@@ -14,14 +14,15 @@
 
 namespace ksi {
 
-// One entry, or key; `before` is the number before it.
+// One entry, or key; `before` is the number before it. The text of one that is taken lies in what
+// is read.
 void PutEntry(const OwnKey& entry, int64_t& before, ByteWriter& out);
-OwnKey TakeEntry(ByteReader& in, int64_t& before);
+Key TakeEntry(ByteReader& in, int64_t& before);
 
 void PutEdit(const std::vector<OwnKey>& before, const std::vector<OwnKey>& after, ByteWriter& out);
 
 // Changes the list; false if the edit is not one of it.
-[[nodiscard]] bool TakeEdit(ByteReader& in, std::vector<OwnKey>& entries);
+[[nodiscard]] bool TakeEdit(ByteReader& in, std::vector<Key>& entries);
 
 // Passes over an edit of a list that is not known.
 void PassEdit(ByteReader& in);

@@ -2,85 +2,98 @@
 
 #include <algorithm>
 #include <compare>
-#include <cstring>
 #include <utility>
 
+#include <knvlibs/ksi.h>
 #include <knvlibs/ksi_status.h>
+#include "knvlibs/linux/host/text.h"
 
 namespace ksi {
 namespace {
 
-constexpr uint32_t kNowhere = UINT32_MAX;
+constexpr size_t kNowhere = SIZE_MAX;
 
-// What holds so many lists is at least so large.
-uint64_t SizeOf(const Moment& moment) {
-  uint64_t size = 0;
-  for (const Reading& reading : moment.readings) size += 1 + reading.answer.entries.size();
-  return size * sizeof(OwnKey);
+constexpr Key kAbsent{KeyKind::kText, 0, {}};
+
+std::strong_ordering Compare(const Key& a, const Key& b) {
+  if (a.kind != b.kind) return a.kind <=> b.kind;
+  return a.kind == KeyKind::kNumber ? a.number <=> b.number : a.text <=> b.text;
 }
 
-std::strong_ordering Compare(const OwnKey& own, const Key& key) {
-  if (const auto* number = std::get_if<int64_t>(&own)) {
-    return key.kind == KeyKind::kNumber ? *number <=> key.number : std::strong_ordering::less;
-  }
-  return key.kind == KeyKind::kText ? std::string_view(std::get<std::string>(own)) <=> key.text
-                                    : std::strong_ordering::greater;
-}
-
-// In the order of questions.
-std::strong_ordering Compare(const Question& question, uint32_t node, const Keys& keys) {
-  constexpr Key kAbsent{KeyKind::kText, 0, {}};
-  if (question.node != node) return question.node <=> node;
-  for (size_t i = 0; i < kMaxKeys; ++i) {
-    const auto order = Compare(question.keys[i], i < keys.count ? keys[i] : kAbsent);
-    if (order != 0) return order;
-  }
-  return std::strong_ordering::equal;
+std::strong_ordering Compare(const std::array<Key, kMaxKeys>& a,
+                             const std::array<Key, kMaxKeys>& b) {
+  const auto first = Compare(a[0], b[0]);
+  return first != 0 ? first : Compare(a[1], b[1]);
 }
 
 }  // namespace
 
-MomentSource::MomentSource(Moment moment) : moment_(std::move(moment)), walk_(SizeOf(moment_)) {
-  SortReadings(moment_.readings);
+MomentSource::MomentSource(std::string fileName, ChunkReader moment)
+    : fileName_(std::move(fileName)),
+      moment_(std::move(moment)),
+      walk_(moment_.Size()),
+      readings_(moment_.Host().nodes.size()) {
   for (auto& places : places_) places.assign(Catalogue().size(), kNowhere);
-  for (uint32_t i = 0; i < moment_.host.nodes.size(); ++i) {
-    const RecordedNode& recorded = moment_.host.nodes[i];
+  for (size_t i = 0; i < readings_.size(); ++i) {
+    const RecordedNode& recorded = moment_.Host().nodes[i];
     const Node* node = FindNode(recorded.path);
     if (node != nullptr) places_[static_cast<size_t>(recorded.kind)][IdOf(*node) - 1u] = i;
   }
 }
 
-const Answer* MomentSource::Find(const Node& node, Kind kind, const Keys& keys) const {
-  const uint32_t place = places_[static_cast<size_t>(kind)][IdOf(node) - 1u];
-  const auto found = std::partition_point(
-      moment_.readings.begin(), moment_.readings.end(),
-      [&](const Reading& each) { return Compare(each.question, place, keys) < 0; });
-  const bool isThere =
-      found != moment_.readings.end() && Compare(found->question, place, keys) == 0;
-  return isThere ? &found->answer : nullptr;
+Status MomentSource::Damaged(const Node& node) {
+  if (!std::exchange(told_, true)) {
+    Warning("%s: %.*s: is damaged\n", Printable(fileName_).c_str(),
+            static_cast<int>(node.path.size()), node.path.data());
+  }
+  return KSI_STATUS_METADATA_READ_ERROR;
+}
+
+// The reading of a node's value or list; one that failed fails again.
+Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, ChunkReader::View& view) {
+  const size_t place = places_[static_cast<size_t>(kind)][IdOf(node) - 1u];
+  if (place == kNowhere) return KSI_STATUS_NOT_FOUND;
+  std::optional<std::vector<size_t>>& readings = readings_[place];
+  const auto keysOf = [this](size_t number) { return moment_.At(number).keys; };
+  const auto before = [](const auto& a, const auto& b) { return Compare(a, b) < 0; };
+  if (!readings) {
+    std::vector<size_t> numbers;
+    if (moment_.ReadNode(place, numbers) != kOk) return Damaged(node);
+    if (!std::ranges::is_sorted(numbers, before, keysOf)) {
+      std::ranges::sort(numbers, before, keysOf);
+    }
+    readings = std::move(numbers);
+  }
+  std::array<Key, kMaxKeys> wanted = {kAbsent, kAbsent};
+  std::copy_n(keys.at, keys.count, wanted.begin());
+  const auto found = std::ranges::lower_bound(*readings, wanted, before, keysOf);
+  if (found == readings->end() || Compare(keysOf(*found), wanted) != 0) {
+    return KSI_STATUS_NOT_FOUND;
+  }
+  view = moment_.At(*found);
+  return view.status;
 }
 
 Status MomentSource::Value(const Node& node, const Keys& keys, Buffer record) {
-  const Answer* answer = Find(node, Kind::kValue, keys);
-  if (answer == nullptr) return KSI_STATUS_NOT_FOUND;
-  if (answer->status != kOk) return answer->status;
-  if (answer->record.size() != record.size()) return KSI_STATUS_LENGTH_MISMATCH;
-  std::ranges::copy(answer->record, record.begin());
+  ChunkReader::View view = {};
+  const Status status = Find(node, Kind::kValue, keys, view);
+  if (status != kOk) return status;
+  if (view.record.size() != record.size()) return KSI_STATUS_LENGTH_MISMATCH;
+  std::ranges::copy(view.record, record.begin());
   return kOk;
 }
 
 Status MomentSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
+  ChunkReader::View view = {};
   Status status = walk_.Begin(node, keys);
+  if (status == kOk) status = Find(node, Kind::kList, keys, view);
   if (status != kOk) return status;
-  const Answer* answer = Find(node, Kind::kList, keys);
-  if (answer == nullptr) return KSI_STATUS_NOT_FOUND;
-  if (answer->status != kOk) return answer->status;
   const size_t before = instances.Count();
-  for (const OwnKey& entry : answer->entries) {
-    const Key key = ViewOf(entry);
-    if (key.kind != KindOf(node.entries)) return KSI_STATUS_METADATA_READ_ERROR;
-    status = key.kind == KeyKind::kNumber ? instances.AddNumber(static_cast<uint64_t>(key.number))
-                                          : instances.AddText(key.text);
+  for (const Key& entry : view.entries) {
+    if (entry.kind != KindOf(node.entries)) return Damaged(node);
+    status = entry.kind == KeyKind::kNumber
+                 ? instances.AddNumber(static_cast<uint64_t>(entry.number))
+                 : instances.AddText(entry.text);
     if (status != kOk) return status;
   }
   walk_.End(node, instances, before);

@@ -160,10 +160,9 @@ const RecordingFile::Part* RecordingFile::FindPart(int64_t number) const {
   return number < part.End() ? &part : nullptr;
 }
 
-Status RecordingFile::ReadMoment(int64_t number, Moment& moment) {
+Status RecordingFile::ReadMoment(int64_t number, ChunkReader& reader) {
   const Part* wanted = FindPart(number);
   if (wanted == nullptr) return KSI_STATUS_NOT_FOUND;
-  ChunkReader reader;
   Bytes content;
   for (int64_t at = wanted->chunk; at <= number;) {
     const Part* part = FindPart(at);
@@ -176,10 +175,16 @@ Status RecordingFile::ReadMoment(int64_t number, Moment& moment) {
     if (status != kOk) return Damaged(*part, "is damaged");
     at = part->End();
   }
+  return kOk;
+}
+
+Status RecordingFile::ReadMoment(int64_t number, Moment& moment) {
+  ChunkReader reader;
+  const Status status = ReadMoment(number, reader);
+  if (status != kOk) return status;
   moment.host = reader.Host();
   moment.facts = reader.Facts();
-  moment.readings = reader.TakeReadings();
-  return kOk;
+  return reader.ReadAll(moment.readings) == kOk ? kOk : Damaged(*FindPart(number), "is damaged");
 }
 
 Status RecordingFile::FindMoment(int64_t time, int64_t& number) {

@@ -13,6 +13,7 @@
 
 #include "knvlibs/cache_database.h"
 #include "knvlibs/recording/bytes.h"
+#include "knvlibs/recording/chunk_reader.h"
 #include "knvlibs/recording/moment.h"
 #include "knvlibs/sqlite.h"
 #include "knvlibs/status.h"
@@ -60,7 +61,8 @@ class RecordingFile {
   // The blocks of a part, in their order.
   [[nodiscard]] Status ReadBlocks(const Part& part, std::vector<int64_t>& blocks);
 
-  // The moment with a number that a part has.
+  // The moment with a number that a part has: to look into, or as a whole.
+  [[nodiscard]] Status ReadMoment(int64_t number, ChunkReader& reader);
   [[nodiscard]] Status ReadMoment(int64_t number, Moment& moment);
 
   // The facts of the moments of a part.

@@ -54,6 +54,20 @@ std::string MeaningOf(ksi::Status status, const std::string& fileName) {
   throw DataError(isTime ? why : MeaningOf(status, name) + (why.empty() ? "" : ": " + why));
 }
 
+ksi::OpenedCache OpenAny(const std::string& name, ksi::ChunkReader& moment) {
+  ksi::OpenedCache opened;
+  std::string why;
+  const ksi::Status status = ksi::ReadCache(name, &opened, &moment, &why);
+  if (status != ksi::kOk) Throw(status, name, why);
+  return opened;
+}
+
+ksi::Moment WholeOf(ksi::ChunkReader& reader) {
+  ksi::Moment moment = {reader.Host(), reader.Facts(), {}};
+  if (reader.ReadAll(moment.readings) != ksi::kOk) throw DataError("damaged");
+  return moment;
+}
+
 // The moment as a capture in memory.
 ksi::Bytes ContentOf(const ksi::Moment& moment, const std::string& name) {
   CacheContent content(name);
@@ -108,16 +122,13 @@ void Count(ksi::Status status, ksi::MomentFacts& facts) {
 }  // namespace
 
 OpenedFile::OpenedFile(const std::string& name) {
-  ksi::OpenedCache opened;
-  ksi::Moment moment;
-  std::string why;
-  const ksi::Status status = ksi::ReadCache(name, &opened, &moment, &why);
-  if (status != ksi::kOk) Throw(status, name, why);
+  ksi::ChunkReader moment;
+  ksi::OpenedCache opened = OpenAny(name, moment);
   if (opened.recording == nullptr) {
     file_ = std::move(opened.capture);
-    return;
+  } else {
+    Open(name, WholeOf(moment));
   }
-  Open(name, moment);
 }
 
 OpenedFile::OpenedFile(const std::string& name, const ksi::Moment& moment) { Open(name, moment); }
@@ -150,13 +161,9 @@ std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName) {
 }
 
 ksi::Moment ReadMoment(const std::string& name) {
-  ksi::OpenedCache opened;
-  ksi::Moment moment;
-  std::string why;
-  const ksi::Status status = ksi::ReadCache(name, &opened, &moment, &why);
-  if (status != ksi::kOk) Throw(status, name, why);
-  if (opened.recording == nullptr) throw DataError("is no recording");
-  return moment;
+  ksi::ChunkReader moment;
+  if (OpenAny(name, moment).recording == nullptr) throw DataError("is no recording");
+  return WholeOf(moment);
 }
 
 ksi::Moment MomentOf(const ksi::CacheFile& capture) {
