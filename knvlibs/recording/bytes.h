@@ -23,8 +23,12 @@ class ByteWriter {
     for (; number >= 0x80; number >>= 7) Byte(static_cast<uint8_t>(number | 0x80));
     Byte(static_cast<uint8_t>(number));
   }
-  void Signed(int64_t number) {
-    Unsigned(static_cast<uint64_t>(number) << 1 ^ static_cast<uint64_t>(number >> 63));
+  void Signed(int64_t number) { Unsigned(Folded(number)); }
+  // The bytes after the first one go elsewhere.
+  void Signed(int64_t number, ByteWriter& more) {
+    const uint64_t folded = Folded(number);
+    Byte(static_cast<uint8_t>(folded < 0x80 ? folded : folded | 0x80));
+    if (folded >= 0x80) more.Unsigned(folded >> 7);
   }
   void Byte(uint8_t byte) { bytes_.push_back(std::byte{byte}); }
   void Raw(ByteView bytes) { bytes_.insert(bytes_.end(), bytes.begin(), bytes.end()); }
@@ -34,9 +38,12 @@ class ByteWriter {
   }
 
   const Bytes& All() const { return bytes_; }
-  void Clear() { bytes_.clear(); }
 
  private:
+  static uint64_t Folded(int64_t number) {
+    return static_cast<uint64_t>(number) << 1 ^ static_cast<uint64_t>(number >> 63);
+  }
+
   Bytes bytes_;
 };
 
@@ -57,16 +64,20 @@ class ByteReader {
     }
     return Fail();
   }
-  int64_t Signed() {
-    const uint64_t number = Unsigned();
-    return static_cast<int64_t>(number >> 1 ^ (~(number & 1) + 1));
+  int64_t Signed() { return Unfolded(Unsigned()); }
+  int64_t Signed(ByteReader& more) {
+    const uint8_t first = Byte();
+    return Unfolded(first < 0x80 ? first : more.Unsigned() << 7 | (first & 0x7fu));
   }
   // An unsigned number that is at most `most`.
   uint64_t Bounded(uint64_t most) {
     const uint64_t number = Unsigned();
     return number <= most ? number : Fail();
   }
-  uint8_t Byte() { return static_cast<uint8_t>(Bounded(0xff)); }
+  uint8_t Byte() {
+    if (at_ == bytes_.size()) return static_cast<uint8_t>(Fail());
+    return static_cast<uint8_t>(bytes_[at_++]);
+  }
   ByteView Raw(size_t size) {
     if (size > Left()) {
       Fail();
@@ -85,6 +96,10 @@ class ByteReader {
   bool IsAtEnd() const { return good_ && Left() == 0; }
 
  private:
+  static int64_t Unfolded(uint64_t number) {
+    return static_cast<int64_t>(number >> 1 ^ (~(number & 1) + 1));
+  }
+
   uint64_t Fail() {
     good_ = false;
     at_ = bytes_.size();

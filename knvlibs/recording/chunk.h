@@ -21,7 +21,7 @@
 //              record, the number of its cells and of each the width times 2, plus 1 for a figure
 //            the number of moments and of each, signed and as difference from the one before,
 //              taken and uptime, then duration, cpu, skipped, loss, refused, failed
-//   changes  the size of the events; of each node the sizes of its six streams; the events; the
+//   changes  the size of the events; of each node the sizes of its seven streams; the events; the
 //            streams, first those of the first kind of all nodes, then those of the next
 //     events   of each moment: how many readings went, and of each how many readings lie between it
 //              and the one before it; how many came, and of each the node, the keys and the status;
@@ -31,7 +31,8 @@
 //     gaps     of each cell that changed: how many lie between it and the one before it
 //     counts   of each cell that changed: how often, less 1
 //     steps    of each change: how many moments lie between it and the cell's one before it
-//     deltas   of each change: by how much, signed, modulo the cell's width
+//     deltas   of each change: by how much, signed, modulo the cell's width; of each the first byte
+//     more     and the bytes that follow it, which are distributed otherwise
 //
 // Readings are numbered as they come, from 0 in each chunk. A list comes empty. The cells of a node
 // are ordered by their place in the record, then by the number of the reading; readings that had
@@ -57,7 +58,7 @@ constexpr size_t kPrefixSize = 4;
 
 constexpr size_t kWidestCell = 8;
 
-enum Stream { kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kStreams };
+enum Stream { kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kMore, kStreams };
 
 inline uint64_t BitsOf(const RecordCell& cell, const Bytes& record) {
   uint64_t bits = 0;

@@ -115,7 +115,8 @@ class ChunkReader::Columns {
     std::memcpy(&bits, bytes.data(), cell.width);
     for (uint64_t i = 0; i < count && streams_[chunk::kDeltas].IsGood(); ++i, ++moment) {
       moment += streams_[chunk::kSteps].Bounded(count_);
-      const auto delta = static_cast<uint64_t>(streams_[chunk::kDeltas].Signed());
+      const auto delta =
+          static_cast<uint64_t>(streams_[chunk::kDeltas].Signed(streams_[chunk::kMore]));
       if (moment <= last_) bits += delta;
     }
     std::memcpy(bytes.data(), &bits, cell.width);

@@ -93,7 +93,7 @@ class ChunkWriter::Columns {
     size_t moment = std::max(series.reading->came + 1, from_);
     for (const Change& change : std::span(series.changes).subspan(begin, series.next - begin)) {
       streams_[chunk::kSteps].Unsigned(change.moment - moment);
-      streams_[chunk::kDeltas].Signed(change.delta);
+      streams_[chunk::kDeltas].Signed(change.delta, streams_[chunk::kMore]);
       moment = change.moment + 1;
     }
   }
@@ -190,8 +190,10 @@ void ChunkWriter::CompareLists(size_t number, const std::vector<OwnKey>& entries
 }
 
 Bytes ChunkWriter::PartFrom(size_t from) const {
-  const Bytes facts = Pack(FactsFrom(from));
-  const Bytes changes = Pack(ChangesFrom(from));
+  const Bytes index = FactsFrom(from);
+  const ByteView pieces[] = {index};
+  const Bytes facts = Pack(pieces);
+  const Bytes changes = ChangesFrom(from);
   const auto size = static_cast<uint32_t>(facts.size());
   ByteWriter part;
   part.Raw(std::as_bytes(std::span(&size, 1)));
@@ -213,20 +215,23 @@ Bytes ChunkWriter::FactsFrom(size_t from) const {
   return out.All();
 }
 
+// The frame of the changes.
 Bytes ChunkWriter::ChangesFrom(size_t from) const {
   std::vector<Columns> columns;
   for (size_t node = 0; node < byNode_.size(); ++node) columns.emplace_back(*this, node, from);
   const Bytes events = EventsFrom(from);
-  ByteWriter out;
-  out.Unsigned(events.size());
+  ByteWriter head;
+  std::array<ByteWriter, chunk::kStreams> streams;
+  head.Unsigned(events.size());
   for (const Columns& each : columns) {
-    for (size_t kind = 0; kind < chunk::kStreams; ++kind) out.Unsigned(each.Stream(kind).size());
+    for (size_t kind = 0; kind < chunk::kStreams; ++kind) {
+      head.Unsigned(each.Stream(kind).size());
+      streams[kind].Raw(each.Stream(kind));
+    }
   }
-  out.Raw(events);
-  for (size_t kind = 0; kind < chunk::kStreams; ++kind) {
-    for (const Columns& each : columns) out.Raw(each.Stream(kind));
-  }
-  return out.All();
+  std::vector<ByteView> pieces = {head.All(), events};
+  for (const ByteWriter& stream : streams) pieces.emplace_back(stream.All());
+  return Pack(pieces);
 }
 
 Bytes ChunkWriter::EventsFrom(size_t from) const {

@@ -11,8 +11,10 @@ namespace ksi {
 // is damaged.
 constexpr size_t kLargestFrame = size_t{64} << 20;
 
-// Packs what is no larger than kLargestFrame; fails with std::bad_alloc.
-Bytes Pack(ByteView content);
+// Packs pieces, one after the other, that are together no larger than kLargestFrame. What is of one
+// kind compresses best by itself, so each larger one has blocks of its own. Fails with
+// std::bad_alloc, and with std::length_error.
+Bytes Pack(std::span<const ByteView> pieces);
 
 // The status is KSI_STATUS_METADATA_READ_ERROR if `packed` is no frame, or not whole.
 [[nodiscard]] Status Unpack(ByteView packed, Bytes& content);

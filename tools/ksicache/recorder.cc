@@ -1,5 +1,7 @@
 #include "tools/ksicache/recorder.h"
 
+#include <stdexcept>
+#include <string>
 #include <utility>
 
 #include "tools/ksicache/error.h"
@@ -29,7 +31,12 @@ void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
   std::unique_ptr<ksi::ChunkWriter> chunk = std::move(chunk_);
   const size_t place = chunk->Count();
   chunk->Add(facts, readings);
-  const ksi::Bytes content = chunk->PartFrom(place);
+  ksi::Bytes content;
+  try {
+    content = chunk->PartFrom(place);
+  } catch (const std::length_error& error) {
+    throw Error(std::string("a moment of this host is ") + error.what());
+  }
   store_.Add({0, 1, next_, chunkNumber_, facts.taken, facts.taken, 0, 0}, content);
   ++next_;
   bytes_ += content.size();

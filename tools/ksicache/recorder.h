@@ -21,7 +21,7 @@ namespace ksicache {
 class Recorder {
  public:
   // The moments of a part, and of a chunk.
-  static constexpr size_t kPartMoments = 60;
+  static constexpr size_t kPartMoments = 40;
   static constexpr size_t kChunkMoments = 240;
 
   // Goes on where the recording ends.

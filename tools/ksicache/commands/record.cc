@@ -6,7 +6,7 @@
 #include <csignal>
 #include <ctime>
 #include <map>
-#include <memory>
+#include <new>
 #include <string>
 
 #include "knvlibs/open_cache.h"
@@ -148,6 +148,8 @@ class Recording {
       Tidy(moment.facts.taken);
     } catch (const Error& error) {
       Drop(error.what());
+    } catch (const std::bad_alloc&) {
+      Drop(fileName_ + ": out of memory");
     }
     for (const std::string& line : diagnostics.TakeKept()) log_.Say(line);
   }
