@@ -50,7 +50,7 @@ function __ksicache_words
     set -e words[1]
     while set -q words[1]
         switch $words[1]
-            case --root --mode
+            case --root --mode --every --keep --max-size --count
                 set -e words[1]
             case '-*'
             case '*'
@@ -75,11 +75,11 @@ end
 function __ksicache_wants_file
     set -l words (__ksicache_words)
     switch "$words[1]"
-        case capture dump
+        case capture record dump
             not set -q words[2]
-        case info check
+        case info check moments join
             true
-        case load
+        case load extract
             not set -q words[3]
         case '*'
             false
@@ -88,7 +88,11 @@ end
 
 set -l no_command 'test -z "$(__ksicache_words)"'
 complete -c ksicache -f
-complete -c ksicache -n $no_command -a capture -d 'Record this host'
+complete -c ksicache -n $no_command -a capture -d 'Capture this host'
+complete -c ksicache -n $no_command -a record -d 'Record this host over time'
+complete -c ksicache -n $no_command -a moments -d 'List the moments of a recording'
+complete -c ksicache -n $no_command -a extract -d 'Make a capture of a moment'
+complete -c ksicache -n $no_command -a join -d 'Make a recording of captures'
 complete -c ksicache -n $no_command -a info -d 'Say which host a file is of'
 complete -c ksicache -n $no_command -a dump -d 'Show what a file holds'
 complete -c ksicache -n $no_command -a load -d 'Make a file from JSON'
@@ -97,7 +101,11 @@ complete -c ksicache -n $no_command -s h -l help -d 'Print a summary'
 complete -c ksicache -n $no_command -l version -d 'Print the version'
 complete -c ksicache -n __ksicache_wants_file -F
 complete -c ksicache -n __ksicache_wants_node -a '(__ksicache_nodes)'
-complete -c ksicache -n '__ksicache_command capture load' -l force -d 'Replace the file'
-complete -c ksicache -n '__ksicache_command capture load' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
-complete -c ksicache -n '__ksicache_command capture' -l root -x -a '(__fish_complete_directories)' -d 'Capture the host recorded there'
+complete -c ksicache -n '__ksicache_command capture load extract join' -l force -d 'Replace the file'
+complete -c ksicache -n '__ksicache_command capture record load extract join' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
+complete -c ksicache -n '__ksicache_command capture record' -l root -x -a '(__fish_complete_directories)' -d 'Take the host whose files are there'
+complete -c ksicache -n '__ksicache_command record' -l every -x -a '1s 5s 10s 30s 1m' -d 'Take a moment so often'
+complete -c ksicache -n '__ksicache_command record' -l keep -x -a '1d 7d 30d' -d 'Keep moments so long'
+complete -c ksicache -n '__ksicache_command record' -l max-size -x -a '500M 1G 2G' -d 'Let the file grow so large'
+complete -c ksicache -n '__ksicache_command record' -l count -x -d 'End after so many moments'
 complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'

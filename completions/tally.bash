@@ -343,14 +343,22 @@ _tally() {
   esac
 }
 
+# What the options of ksicache may be given.
+declare -gA _ksicache_values=(
+  [--mode]='0600 0640 0644'
+  [--every]='1s 5s 10s 30s 1m'
+  [--keep]='1d 7d 30d'
+  [--max-size]='500M 1G 2G'
+)
+
 _ksicache() {
-  local _tally_line word command='' count=0 skip='' i
+  local _tally_line word command='' count=0 skip='' head='' i
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
     if [[ -n $skip ]]; then
       skip=
-    elif [[ $word == --root || $word == --mode ]]; then
+    elif [[ $word =~ ^--(root|mode|every|keep|max-size|count)$ ]]; then
       skip=$word
     elif [[ $word != -* ]]; then
       if [[ -z $command ]]; then command=$word; else count=$((count + 1)); fi
@@ -358,25 +366,29 @@ _ksicache() {
   done
 
   word=${_tally_line[-1]}
-  if [[ $skip == --mode ]]; then
-    _tally_reply '' "$word" '0600 0640 0644'
+  if [[ -z $skip && $word == --*=* ]]; then
+    skip=${word%%=*} head=${word%%=*}= word=${word#*=}
+  fi
+  if [[ $skip == --root ]]; then
+    _tally_reply_files "$head" "$word" -d
   elif [[ -n $skip ]]; then
-    _tally_reply_files '' "$word" -d
-  elif [[ $word == --mode=* ]]; then
-    _tally_reply --mode= "${word#*=}" '0600 0640 0644'
-  elif [[ $word == --root=* ]]; then
-    _tally_reply_files --root= "${word#*=}" -d
+    _tally_reply "$head" "$word" "${_ksicache_values[$skip]-}"
   elif [[ $word == -* ]]; then
     case $command in
       capture) _tally_reply '' "$word" '--force --mode --root' ;;
+      record) _tally_reply '' "$word" '--every --keep --max-size --count --mode --root' ;;
       dump) _tally_reply '' "$word" --json ;;
-      load) _tally_reply '' "$word" '--force --mode' ;;
+      load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac
   else
     case $command$count in
-      0) _tally_reply '' "$word" 'capture info dump load check' ;;
-      capture0 | info* | dump0 | check* | load0 | load1) _tally_reply_files '' "$word" -f ;;
+      0)
+        _tally_reply '' "$word" 'capture record moments extract join info dump load check'
+        ;;
+      capture0 | record0 | moments* | extract[01] | join* | info* | dump0 | check* | load[01])
+        _tally_reply_files '' "$word" -f
+        ;;
       dump*) _tally_reply '' "$word" "$_ksicache_nodes" ;;
     esac
   fi
