@@ -37,7 +37,8 @@ struct KSI_ParamList;
  * They answer from the current source, which all threads share: the host that the library runs on,
  * until KSI_UseCache names a cache file. Reads of different threads wait for each other. */
 
-/* Answers every later read from the cache file `fileName`. `flags` is 0. */
+/* Answers every later read from the cache file `fileName`, which may be "FILE@WHEN", a moment of a
+ * recording: see ksicache(8). `flags` is 0. */
 KSI_NODISCARD uint32_t KSI_UseCache(const char* fileName, int flags);
 
 /* The bytes of a build date and its end. */
