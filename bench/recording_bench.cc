@@ -17,11 +17,14 @@
 #include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <iterator>
 #include <memory>
 #include <random>
 #include <string>
 #include <vector>
 
+#include <knvlibs/ksi_records.h>
+#include "knvlibs/node_table.h"
 #include "knvlibs/open_cache.h"
 #include "knvlibs/recording/moment.h"
 #include "tools/ksicache/cache_writer.h"
@@ -51,6 +54,7 @@ class Model {
   size_t Step() {
     size_t changes = 0;
     for (ksi::Reading& reading : readings_) {
+      if (IsSettled(reading)) continue;
       size_t place = 0;
       for (const ksi::RecordCell& cell : nodes_[reading.question.node].cells) {
         if (!cell.isFigure) continue;
@@ -68,6 +72,14 @@ class Model {
   }
 
  private:
+  static bool IsSettled(const ksi::Reading& reading) {
+    const uint16_t node =
+        ksi::IdOf(*ksi::FindNode(ksi::RecordedNodes()[reading.question.node].path));
+    return node == ksi::node::sched_groups_groupFlags ||
+           node == ksi::node::sched_groups_groupLeaderID ||
+           node == ksi::node::worldGroups_vmmLeaderID || node == ksi::node::memory_memInfo;
+  }
+
   // In KB.
   uint64_t Change() {
     const uint64_t kind = random_() % 100;
@@ -75,9 +87,11 @@ class Model {
     return 4 * (1 + random_() % most);
   }
 
-  // How many of what has a key there are.
+  // How many of what has a key there are. Each machine has three remap types.
   static int CountOf(const ksi::Keying& keying) {
     switch (keying.at[0]) {
+      case ksi::Instance::kState:
+        return static_cast<int>(std::size(ksi::kMemoryStates));
       case ksi::Instance::kNone:
         return 1;
       case ksi::Instance::kGroup:
@@ -99,15 +113,60 @@ class Model {
       ksi::Reading& reading = readings_.emplace_back();
       reading.question.node = place;
       for (size_t k = 0; k < keying.Count(); ++k) {
-        const int number = k == 0 && keying.Count() == 2 ? i / 3 : i;
-        if (ksi::KindOf(keying.at[k]) == ksi::KeyKind::kNumber) {
-          reading.question.keys[k] = int64_t{number};
-        } else {
-          reading.question.keys[k] = "name" + std::to_string(k == 0 ? number : i % 3);
-        }
+        const int number = k == 1 ? i % 3 : keying.Count() == 2 ? i / 3 : i;
+        reading.question.keys[k] = NameOf(keying.at[k], number);
       }
       reading.answer.record.resize(recorded.recordSize);
       Fill(recorded, reading.answer.record);
+      FillList(node, recorded.kind, i, reading.answer.entries);
+      Settle(ksi::IdOf(node), i, reading.answer.record);
+    }
+  }
+
+  // The root has all other groups, and the first groups a machine each.
+  static void FillList(const ksi::Node& node, ksi::Kind kind, int number,
+                       std::vector<ksi::OwnKey>& entries) {
+    if (kind != ksi::Kind::kList) return;
+    const auto add = [&](int first, int end) {
+      for (int i = first; i < end; ++i) entries.push_back(NameOf(node.entries, i));
+    };
+    if (node.entries == ksi::Instance::kGroup && number == 0) add(1, kGroups);
+    if (node.entries == ksi::Instance::kClient && number > 0 && number < kMachines) {
+      add(number, number + 1);
+    }
+    if (node.entries == ksi::Instance::kHeap) add(0, kHeaps);
+    if (node.entries == ksi::Instance::kRemapType) add(0, 3);
+  }
+
+  static ksi::OwnKey NameOf(ksi::Instance instance, int number) {
+    if (ksi::KindOf(instance) == ksi::KeyKind::kNumber) return int64_t{number};
+    if (instance == ksi::Instance::kState) {
+      return std::string(ksi::kMemoryStates[static_cast<size_t>(number)]);
+    }
+    return "name" + std::to_string(number);
+  }
+
+  // What reports go by is no figure.
+  static void Settle(uint16_t node, int number, ksi::Bytes& record) {
+    const auto put = [&record](const auto& value) {
+      std::memcpy(record.data(), &value, sizeof value);
+    };
+    switch (node) {
+      case ksi::node::sched_groups_groupFlags:
+        put(static_cast<uint32_t>(number > 0 && number < kMachines ? KSI_GROUP_VM : 0));
+        break;
+      case ksi::node::sched_groups_groupLeaderID:
+      case ksi::node::worldGroups_vmmLeaderID:
+        put(int32_t{number});
+        break;
+      case ksi::node::memory_memInfo: {
+        KSI_MemInfo info = {};
+        info.numNodes = 2;
+        put(info);
+        break;
+      }
+      default:
+        break;
     }
   }
 
