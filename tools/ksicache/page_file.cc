@@ -9,6 +9,8 @@
 #include <limits>
 #include <mutex>
 #include <new>
+#include <utility>
+#include <vector>
 
 #include "knvlibs/cache_format.h"
 
@@ -17,14 +19,45 @@ namespace {
 
 constexpr const char* kVfsName = "ksi-recording";
 
-// Where the pages end that the header of a database counts.
-int64_t EndIn(const std::string& header) {
-  constexpr size_t kCountAt = 28;
-  int64_t count = 0;
-  for (size_t i = 0; i < 4 && header.size() >= kCountAt + 4; ++i) {
-    count = count << 8 | static_cast<unsigned char>(header[kCountAt + i]);
+// Numbers in pages: that of the pages in the header of a database, and those of pages that pages of
+// a table lead to.
+constexpr size_t kCountAt = 28;
+constexpr size_t kLastChildAt = 8;
+
+uint32_t NumberAt(const std::string& page, size_t at) {
+  uint32_t number = 0;
+  for (size_t i = 0; i < 4 && at + 4 <= page.size(); ++i) {
+    number = number << 8 | static_cast<unsigned char>(page[at + i]);
   }
-  return count * static_cast<int64_t>(ksi::cache::kPageSize);
+  return number;
+}
+
+void PutNumber(uint32_t number, size_t at, std::string& page) {
+  for (size_t i = 4; i-- > 0; number >>= 8) page[at + i] = static_cast<char>(number);
+}
+
+int64_t OffsetOf(uint32_t page) {
+  return (int64_t{page} - 1) * static_cast<int64_t>(ksi::cache::kPageSize);
+}
+
+// Where the pages end that the header of a database counts.
+int64_t EndIn(const std::string& header) { return OffsetOf(NumberAt(header, kCountAt) + 1); }
+
+// Whether it is a page of a table that leads to others; the first one never is.
+bool IsInner(const std::pair<const int64_t, std::string>& entry) {
+  constexpr char kInner = 5;
+  const auto& [offset, page] = entry;
+  return offset != 0 && page.size() == ksi::cache::kPageSize && page[0] == kInner;
+}
+
+// Where in such a page the numbers stand of those that it leads to.
+std::vector<size_t> ChildrenIn(const std::string& page) {
+  constexpr size_t kCellsAt = 3;
+  constexpr size_t kFirstCellAt = 12;
+  std::vector<size_t> places = {kLastChildAt};
+  const size_t cells = NumberAt(page, kCellsAt) >> 16;
+  for (size_t i = 0; i < cells; ++i) places.push_back(NumberAt(page, kFirstCellAt + 2 * i) >> 16);
+  return places;
 }
 
 bool WriteAll(int descriptor, const std::string& bytes, int64_t offset) {
@@ -196,13 +229,42 @@ bool PageFile::WritePages(int64_t from, int64_t to) const {
   });
 }
 
+void PageFile::MoveInner() {
+  std::map<uint32_t, uint32_t> moved;
+  std::vector<std::string*> inner;
+  for (auto& entry : pages_) {
+    if (IsInner(entry)) inner.push_back(&entry.second);
+  }
+  const auto header = pages_.find(0);
+  if (header == pages_.end()) return;
+  uint32_t count = NumberAt(header->second, kCountAt);
+  for (std::string* page : inner) {
+    for (const size_t place : ChildrenIn(*page)) {
+      const uint32_t child = NumberAt(*page, place);
+      const auto changed = pages_.find(OffsetOf(child));
+      if (changed == pages_.end() || changed->first >= end_ || !IsInner(*changed)) continue;
+      moved[child] = ++count;
+      PutNumber(count, place, *page);
+    }
+  }
+  for (const auto& [from, to] : moved) {
+    auto page = pages_.extract(OffsetOf(from));
+    page.key() = OffsetOf(to);
+    pages_.insert(std::move(page));
+  }
+  PutNumber(count, kCountAt, header->second);
+  hasMoved_ = !moved.empty();
+}
+
 bool PageFile::Flush() {
   const bool grows = !pages_.empty() && pages_.rbegin()->first >= end_;
+  if (grows) MoveInner();
   const auto header = pages_.find(0);
   const int64_t end = header == pages_.end() ? end_ : EndIn(header->second);
-  // What leads to new pages must not be on the disk before them.
-  const bool isWritten = WritePages(end_, std::numeric_limits<int64_t>::max()) &&
-                         (!grows || Sync()) && WritePages(0, end_);
+  // What leads to new pages, or counts them, must not be on the disk before them.
+  const bool isWritten = (!grows || (WritePages(end_, std::numeric_limits<int64_t>::max()) &&
+                                     Sync() && WritePages(0, 1) && Sync())) &&
+                         WritePages(grows ? 1 : 0, end_);
   if (isWritten) end_ = end;
   pages_.clear();
   return isWritten;

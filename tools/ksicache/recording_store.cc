@@ -23,10 +23,9 @@ using ksi::cache::kBlockSize;
 
 constexpr size_t kPieceSize = kBlockSize - kBlockHead;
 
-// By so many rows the tables grow; those of parts are for a week at first, before the first block:
-// who copies the file from its front has then a row before what it leads to.
+// By so many rows the tables grow; those of parts are for a week at first.
 constexpr size_t kMoreBlocks = 64;
-constexpr size_t kFirstParts = 2048;
+constexpr size_t kFirstParts = 2304;
 constexpr size_t kMoreParts = 256;
 
 // A block with what leads to it, in the file.
@@ -83,6 +82,9 @@ ksi::Bytes RecordingStore::Empty(const std::string& host) {
   RunInMemory(handle, "BEGIN");
   for (const ksi::cache::Table& table : ksi::cache::kRecordingTables) {
     RunInMemory(handle, std::string(table.sql));
+    // Before there is a page for blocks: who copies the file from its front has then each row
+    // before what leads to its blocks.
+    if (table.name == "part" && !AddRows(handle, kAddPart, kFirstParts)) throw std::bad_alloc();
   }
   ksi::Statement insert;
   if (insert.Prepare(handle, "INSERT INTO recording VALUES(?1, strftime('%Y-%m-%dT%H:%M:%SZ'))") !=
@@ -91,9 +93,7 @@ ksi::Bytes RecordingStore::Empty(const std::string& host) {
     throw std::bad_alloc();
   }
   insert = {};
-  if (!AddRows(handle, kAddPart, kFirstParts) || !AddRows(handle, kAddBlock, kMoreBlocks)) {
-    throw std::bad_alloc();
-  }
+  if (!AddRows(handle, kAddBlock, kMoreBlocks)) throw std::bad_alloc();
   RunInMemory(handle, "COMMIT");
   sqlite3_int64 size = 0;
   const auto* content = reinterpret_cast<const std::byte*>(
@@ -163,11 +163,14 @@ void RecordingStore::TakeStock() {
   ksi::Statement rows;
   Require(rows.Prepare(database_.get(), "SELECT id FROM part WHERE moments = 0 ORDER BY id") ==
           SQLITE_OK);
-  while (rows.Step() == SQLITE_ROW) rows_.push_back(rows.Number(0));
-  Require(rows.Prepare(database_.get(), "SELECT id FROM block ORDER BY id") == SQLITE_OK);
-  while (rows.Step() == SQLITE_ROW) {
+  int code = SQLITE_OK;
+  while ((code = rows.Step()) == SQLITE_ROW) rows_.push_back(rows.Number(0));
+  Require(code == SQLITE_DONE &&
+          rows.Prepare(database_.get(), "SELECT id FROM block ORDER BY id") == SQLITE_OK);
+  while ((code = rows.Step()) == SQLITE_ROW) {
     if (!used.contains(rows.Number(0))) blocks_.push_back(rows.Number(0));
   }
+  Require(code == SQLITE_DONE);
 }
 
 void RecordingStore::Connect() {
@@ -208,6 +211,7 @@ void RecordingStore::Fail(int error) {
 void RecordingStore::Flush() {
   Execute("COMMIT");
   if (!pages_->Flush()) Fail(errno);
+  if (pages_->HasMoved()) Connect();
 }
 
 void RecordingStore::Sync() {
@@ -221,10 +225,16 @@ int64_t RecordingStore::Size() const {
 
 void RecordingStore::Add(Part part, ksi::ByteView content) {
   Ready();
+  Put(part, content, false);
+}
+
+void RecordingStore::Put(Part part, ksi::ByteView content, bool replaces) {
   part.size = static_cast<int64_t>(content.size());
   const std::vector<int64_t> blocks = TakeBlocks((content.size() + kPieceSize - 1) / kPieceSize);
   part.block = blocks.front();
   WriteBlocks(blocks, content);
+  // Its row hides those of older parts, which are on the disk already.
+  if (replaces) Sync();
   part.id = TakeRow();
   Execute("BEGIN");
   WriteRow(part);
@@ -237,7 +247,7 @@ void RecordingStore::Add(Part part, ksi::ByteView content) {
 void RecordingStore::Replace(Part part, ksi::ByteView content) {
   Ready();
   Remove(std::exchange(replaced_, {}));
-  Add(part, content);
+  Put(part, content, true);
   Sync();
   const auto isReplaced = [&part](const Part& each) {
     return each.number >= part.number && each.End() <= part.End() && each.moments < part.moments;

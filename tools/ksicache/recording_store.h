@@ -65,6 +65,7 @@ class RecordingStore {
   void Flush();
   [[noreturn]] void Fail(int error);
 
+  void Put(Part part, ksi::ByteView content, bool replaces);
   bool HasOldChunk() const;
   void RemoveFirstChunk();
   void Remove(const std::vector<Part>& parts);

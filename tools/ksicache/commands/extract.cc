@@ -17,7 +17,9 @@ int Extract(const CommandLine& line) {
   const std::string& target = line.arguments[1];
   CheckOptionsFor(target, line);
   const mode_t mode = ModeOf(line);
-  const ksi::Moment moment = ReadMoment(line.arguments[0]);
+  ksi::Moment moment = ReadMoment(line.arguments[0]);
+  // The same moment is the same file, however the recording keeps it.
+  ksi::SortReadings(moment.readings);
   CacheWriter writer(target, line.Has(kForce), mode);
   PutReadings(moment, writer);
   writer.Commit(CaptureOf(moment));
