@@ -272,7 +272,7 @@ void Read(const std::string& fileName, int moments) {
 
 int main(int argc, char** argv) {
   if (argc < 2 || argc > 3) {
-    std::fputs("usage: recording_bench FILE [MOMENTS]\n", stderr);
+    static_cast<void>(std::fputs("usage: recording_bench FILE [MOMENTS]\n", stderr));
     return 2;
   }
   try {
@@ -281,7 +281,7 @@ int main(int argc, char** argv) {
     Read(argv[1], std::max(1, moments));
     return 0;
   } catch (const std::exception& error) {
-    std::fprintf(stderr, "recording_bench: %s\n", error.what());
+    static_cast<void>(std::fprintf(stderr, "recording_bench: %s\n", error.what()));
     return 1;
   }
 }

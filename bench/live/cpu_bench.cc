@@ -17,8 +17,6 @@
 #include <string>
 #include <vector>
 
-extern char** environ;
-
 namespace {
 
 struct Contender {
@@ -44,7 +42,7 @@ void Run(Contender& contender) {
   rusage usage;
   if (posix_spawnp(&child, arguments[0], &actions, nullptr, arguments.data(), environ) != 0 ||
       wait4(child, &status, 0, &usage) < 0 || status != 0) {
-    std::fprintf(stderr, "cpu_bench: %s failed\n", arguments[0]);
+    static_cast<void>(std::fprintf(stderr, "cpu_bench: %s failed\n", arguments[0]));
     std::exit(1);
   }
   posix_spawn_file_actions_destroy(&actions);
@@ -81,7 +79,7 @@ int main(int argc, char** argv) {
   const int processes = argc == 5 ? std::atoi(argv[1]) : -1;
   const int rounds = argc == 5 ? std::atoi(argv[2]) : 0;
   if (processes < 0 || rounds <= 0) {
-    std::fputs("Usage: cpu_bench PROCESSES ROUNDS TALLY KSICACHE\n", stderr);
+    static_cast<void>(std::fputs("Usage: cpu_bench PROCESSES ROUNDS TALLY KSICACHE\n", stderr));
     return 2;
   }
   StartSleepers(processes);

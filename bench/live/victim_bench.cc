@@ -32,8 +32,6 @@
 #include <thread>
 #include <vector>
 
-extern char** environ;
-
 namespace {
 
 using Clock = std::chrono::steady_clock;
@@ -201,7 +199,7 @@ int main(int argc, char** argv) {
   const size_t gigabytes = argc == 4 ? std::strtoul(argv[1], nullptr, 10) : 0;
   const int seconds = argc == 4 ? std::atoi(argv[2]) : 0;
   if (gigabytes == 0 || seconds == 0) {
-    std::fputs("Usage: victim_bench GIGABYTES SECONDS TALLY\n", stderr);
+    static_cast<void>(std::fputs("Usage: victim_bench GIGABYTES SECONDS TALLY\n", stderr));
     return 2;
   }
   char file[] = "/dev/shm/victim.XXXXXX";

@@ -3,11 +3,11 @@
 #define KNVLIBS_RECORDING_MOMENT_H_
 
 #include <array>
-#include <compare>
 #include <cstddef>
 #include <cstdint>
 #include <span>
 #include <string>
+#include <tuple>
 #include <variant>
 #include <vector>
 
@@ -52,7 +52,10 @@ struct Question {
   uint32_t node = 0;  // its place among the recorded nodes
   std::array<OwnKey, kMaxKeys> keys = {std::string(), std::string()};
 
-  friend auto operator<=>(const Question&, const Question&) = default;
+  friend bool operator==(const Question&, const Question&) = default;
+  friend bool operator<(const Question& a, const Question& b) {
+    return std::tie(a.node, a.keys) < std::tie(b.node, b.keys);
+  }
 };
 
 // The answer: the record or the entries, nothing if `status` is not kOk.

@@ -23,7 +23,7 @@ std::strong_ordering Compare(const Key& a, const Key& b) {
 std::strong_ordering Compare(const std::array<Key, kMaxKeys>& a,
                              const std::array<Key, kMaxKeys>& b) {
   const auto first = Compare(a[0], b[0]);
-  return first != 0 ? first : Compare(a[1], b[1]);
+  return std::is_eq(first) ? Compare(a[1], b[1]) : first;
 }
 
 }  // namespace
@@ -55,7 +55,7 @@ Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, ChunkRe
   if (place == kNowhere) return KSI_STATUS_NOT_FOUND;
   std::optional<std::vector<size_t>>& readings = readings_[place];
   const auto keysOf = [this](size_t number) { return moment_.At(number).keys; };
-  const auto before = [](const auto& a, const auto& b) { return Compare(a, b) < 0; };
+  const auto before = [](const auto& a, const auto& b) { return std::is_lt(Compare(a, b)); };
   if (!readings) {
     std::vector<size_t> numbers;
     if (moment_.ReadNode(place, numbers) != kOk) return Damaged(node);
@@ -67,7 +67,7 @@ Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, ChunkRe
   std::array<Key, kMaxKeys> wanted = {kAbsent, kAbsent};
   std::copy_n(keys.at, keys.count, wanted.begin());
   const auto found = std::ranges::lower_bound(*readings, wanted, before, keysOf);
-  if (found == readings->end() || Compare(keysOf(*found), wanted) != 0) {
+  if (found == readings->end() || std::is_neq(Compare(keysOf(*found), wanted))) {
     return KSI_STATUS_NOT_FOUND;
   }
   view = moment_.At(*found);

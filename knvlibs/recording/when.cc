@@ -17,7 +17,7 @@ constexpr int64_t kDay = 24 * kHour;
 // run of digits.
 bool Match(std::string_view text, std::string_view pattern, std::initializer_list<int*> numbers) {
   if (text.size() != pattern.size()) return false;
-  auto number = numbers.begin();
+  const auto* number = numbers.begin();
   bool inNumber = false;
   for (size_t i = 0; i < text.size(); ++i) {
     if (pattern[i] != '#') {
@@ -88,7 +88,7 @@ std::optional<int64_t> LatestOf(Clock clock, int64_t last) {
   const std::optional<int64_t> time = clock.Time();
   if (!time || *time - (kSecond - 1) <= last) return time;
   // The day before, by its noon, which every day has.
-  const time_t noon = seconds - int64_t{day.tm_hour} * 3600 - 12 * 3600;
+  const time_t noon = seconds - (int64_t{day.tm_hour} + 12) * 3600;
   if ((clock.isUtc ? gmtime_r(&noon, &day) : localtime_r(&noon, &day)) == nullptr) {
     return std::nullopt;
   }

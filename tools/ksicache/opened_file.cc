@@ -108,6 +108,7 @@ void AddList(const Reading& reading, InstanceWalk& instances, MomentBuilder& bui
     throw DataError("damaged: " + reading.Name() + ": is a list with gaps");
   }
   std::vector<ksi::Key> entries;
+  entries.reserve(own.size());
   for (const ksi::OwnKey& entry : own) entries.push_back(ksi::ViewOf(entry));
   builder.AddList(*reading.row->node, reading.keys, entries);
 }

@@ -107,8 +107,8 @@ RecordingStore::RecordingStore(const std::string& fileName, int64_t maxSize)
           fileName, open(fileName.c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY),
           maxSize) {}
 
-RecordingStore::RecordingStore(const std::string& name, int file, int64_t maxSize)
-    : name_(name), maxSize_(maxSize), file_(file) {
+RecordingStore::RecordingStore(std::string name, int file, int64_t maxSize)
+    : name_(std::move(name)), maxSize_(maxSize), file_(file) {
   if (!file_) throw SystemError(name_, errno);
   struct stat info = {};
   if (fstat(file_.Get(), &info) != 0) throw SystemError(name_, errno);

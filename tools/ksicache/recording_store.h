@@ -35,7 +35,7 @@ class RecordingStore {
   // grows to `maxSize` bytes and no further.
   RecordingStore(const std::string& fileName, int64_t maxSize);
   // The same of a file that is open already, which this closes.
-  RecordingStore(const std::string& name, int file, int64_t maxSize);
+  RecordingStore(std::string name, int file, int64_t maxSize);
 
   // The rows in use, by the number of their first moment.
   const std::vector<Part>& Parts() const { return parts_; }
@@ -69,8 +69,8 @@ class RecordingStore {
   bool HasOldChunk() const;
   void RemoveFirstChunk();
   void Remove(const std::vector<Part>& parts);
-  bool CanGrow(size_t blocks) const;
-  void KeepSpare(size_t blocks);
+  bool CanGrow(size_t count) const;
+  void KeepSpare(size_t count);
   std::vector<int64_t> TakeBlocks(size_t count);
   int64_t TakeRow();
   void WriteBlocks(const std::vector<int64_t>& blocks, ksi::ByteView content);
