@@ -4,6 +4,7 @@
 #include <string>
 #include <utility>
 
+#include <knvlibs/ksi_status.h>
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
@@ -71,15 +72,19 @@ void Recorder::Pack() {
   bytes_ = 0;
 }
 
-void Recorder::Adopt(ksi::RecordingFile& recording) {
+size_t Recorder::Adopt(ksi::RecordingFile& recording) {
+  size_t damaged = 0;
   const std::vector<RecordingStore::Part>& parts = recording.Parts();
   size_t from = parts.size();
   while (from > 0 && parts[from - 1].moments == 1) --from;
   for (; from < parts.size(); ++from) {
     ksi::Moment moment;
-    if (recording.ReadMoment(parts[from].number, moment) != ksi::kOk) {
-      throw Error(recording.Why());
+    const ksi::Status status = recording.ReadMoment(parts[from].number, moment);
+    if (status == KSI_STATUS_METADATA_READ_ERROR) {
+      ++damaged;
+      continue;
     }
+    if (status != ksi::kOk) throw Error(recording.Why());
     ksi::SortReadings(moment.readings);
     if (chunk_ == nullptr ||
         parts[from].number != chunkNumber_ + static_cast<int64_t>(chunk_->Count()) ||
@@ -91,6 +96,7 @@ void Recorder::Adopt(ksi::RecordingFile& recording) {
   }
   Pack();
   chunk_ = nullptr;
+  return damaged;
 }
 
 }  // namespace ksicache

@@ -37,8 +37,9 @@ class Recorder {
   void Pack();
 
   // Packs what somebody who was stopped left at the end of the recording; the same. `recording` is
-  // what the store writes, as it was when it was opened.
-  void Adopt(ksi::RecordingFile& recording);
+  // what the store writes, as it was when it was opened. Gives how many moments are damaged, as a
+  // loss of power may leave the last ones; those stay as they are.
+  size_t Adopt(ksi::RecordingFile& recording);
 
  private:
   bool Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& facts) const;

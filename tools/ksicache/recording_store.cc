@@ -41,8 +41,18 @@ constexpr const char* kSetPart =
     "block = ?8 WHERE id = ?1";
 constexpr const char* kFreePart = "UPDATE part SET moments = 0 WHERE id = ?1";
 
-// Where the lock lies, beyond all that a file can hold.
+// Where the locks lie, beyond all that a file can hold.
 constexpr off_t kLockAt = off_t{1} << 61;
+constexpr off_t kTellingLockAt = kLockAt + 1;
+
+struct flock LockAt(off_t place) {
+  struct flock lock = {};
+  lock.l_type = F_WRLCK;
+  lock.l_whence = SEEK_SET;
+  lock.l_start = place;
+  lock.l_len = 1;
+  return lock;
+}
 
 struct CloseBlob {
   void operator()(sqlite3_blob* blob) const { sqlite3_blob_close(blob); }
@@ -119,19 +129,19 @@ RecordingStore::RecordingStore(std::string name, int file, int64_t maxSize)
 
 // Two locks: one that is this opening's, and one that tells whose it is.
 void RecordingStore::Lock() {
-  struct flock lock = {};
-  lock.l_type = F_WRLCK;
-  lock.l_whence = SEEK_SET;
-  lock.l_start = kLockAt;
-  lock.l_len = 1;
-  const bool isAlone = fcntl(file_.Get(), F_OFD_SETLK, &lock) == 0;
-  if (!isAlone && errno != EAGAIN && errno != EACCES) throw SystemError(name_, errno);
-  lock.l_start = kLockAt + 1;
-  if (isAlone && fcntl(file_.Get(), F_SETLK, &lock) == 0) return;
+  struct flock lock = LockAt(kLockAt);
+  if (fcntl(file_.Get(), F_OFD_SETLK, &lock) == 0) return TellWhose();
+  if (errno != EAGAIN && errno != EACCES) throw SystemError(name_, errno);
+  lock = LockAt(kTellingLockAt);
   const bool isTold = fcntl(file_.Get(), F_GETLK, &lock) == 0 && lock.l_type != F_UNLCK;
   throw Error(name_ + ": is being recorded by " +
               (isTold && lock.l_pid > 0 ? "process " + std::to_string(lock.l_pid)
                                         : std::string("another process")));
+}
+
+void RecordingStore::TellWhose() {
+  struct flock lock = LockAt(kTellingLockAt);
+  static_cast<void>(fcntl(file_.Get(), F_SETLK, &lock));
 }
 
 // What there is in the file, and what is free in it.
@@ -157,6 +167,8 @@ void RecordingStore::TakeStock() {
     used.insert(blocks.begin(), blocks.end());
     if (std::ranges::find(parts_, row.id, &Part::id) == parts_.end()) replaced_.push_back(row);
   }
+  recording.reset();
+  TellWhose();
   Connect();
   rows_.clear();
   blocks_.clear();

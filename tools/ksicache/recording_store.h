@@ -53,6 +53,10 @@ class RecordingStore {
   // Brings all to the disk.
   void Sync();
 
+  // Lets others know which process this is. They do not any more once this process has closed any
+  // descriptor of the file.
+  void TellWhose();
+
   int64_t Size() const;
 
  private:

@@ -111,7 +111,9 @@ class Recording {
     ksi::OpenedCache opened;
     std::string why;
     const ksi::Status status = ksi::OpenCache(fileName, &opened, &why);
-    if (status == ksi::kOk && opened.recording != nullptr) recorder_.Adopt(*opened.recording);
+    if (status == ksi::kOk && opened.recording != nullptr) Adopt(*opened.recording);
+    opened = {};
+    store_.TellWhose();
     synced_ = Now();
   }
 
@@ -133,6 +135,13 @@ class Recording {
   }
 
  private:
+  void Adopt(ksi::RecordingFile& recording) {
+    const size_t damaged = recorder_.Adopt(recording);
+    if (damaged == 0) return;
+    PrintError(fileName_ + ": its last " + std::to_string(damaged) +
+               " moments are damaged, and stay so");
+  }
+
   // Moments lie on the clock's grid.
   int64_t NextTick(int64_t now) const { return (now / plan_.every + 1) * plan_.every; }
 
