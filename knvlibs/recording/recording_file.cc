@@ -99,6 +99,8 @@ Status RecordingFile::ReadBlocks(const Part& part, std::vector<int64_t>& blocks)
 Status RecordingFile::Walk(const Part& part, Bytes* content, std::vector<int64_t>* blocks) {
   const Status status = database_->BeginRead();
   if (status != kOk) return status;
+  // Blocks that lead to each other in a circle would be enough for any size.
+  if (static_cast<uint64_t>(part.size) > Size()) return Damaged(part, "is larger than the file");
   int code = block_ ? SQLITE_OK : block_.Prepare(database_->Handle(), kBlockOf);
   int64_t block = part.block;
   auto left = static_cast<size_t>(part.size);

@@ -4,8 +4,10 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <memory>
+#include <random>
 #include <string>
 #include <vector>
 
@@ -43,6 +45,25 @@ class RecordingTest : public Ksicache {
       moment.readings = host.Next();
     }
     return moments;
+  }
+
+  // A moment that takes some KB, however it is packed.
+  static Moment NoiseAt(int64_t number) {
+    std::mt19937_64 random(static_cast<uint64_t>(number));
+    Moment moment;
+    moment.host = Host();
+    moment.facts.taken = kStart + number * kSecond;
+    const auto node =
+        std::ranges::find(RecordedNodes(), "sched/groups/stats/memoryStats", &RecordedNode::path);
+    for (int64_t group = 0; group < 8; ++group) {
+      Reading& reading = moment.readings.emplace_back();
+      reading.question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
+      reading.question.keys[0] = group;
+      for (size_t i = 0; i < node->recordSize; ++i) {
+        reading.answer.record.push_back(static_cast<std::byte>(random()));
+      }
+    }
+    return moment;
   }
 
   static void MakeEmpty(const std::string& fileName) {

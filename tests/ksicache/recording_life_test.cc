@@ -82,25 +82,6 @@ class RecordingLife : public RecordingTest {
     return moment;
   }
 
-  // A moment that takes some KB, however it is packed.
-  static Moment NoiseAt(int64_t number) {
-    std::mt19937_64 random(static_cast<uint64_t>(number));
-    Moment moment;
-    moment.host = Host();
-    moment.facts.taken = kStart + number * kSecond;
-    const auto node =
-        std::ranges::find(RecordedNodes(), "sched/groups/stats/memoryStats", &RecordedNode::path);
-    for (int64_t group = 0; group < 8; ++group) {
-      Reading& reading = moment.readings.emplace_back();
-      reading.question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
-      reading.question.keys[0] = group;
-      for (size_t i = 0; i < node->recordSize; ++i) {
-        reading.answer.record.push_back(static_cast<std::byte>(random()));
-      }
-    }
-    return moment;
-  }
-
   // Goes on with the recording, as fast as it can; `done_` is the end of the moments that are
   // there.
   void RecordOn(int64_t maxSize, int64_t count = INT64_MAX) const {

@@ -4,6 +4,7 @@
 #include <string>
 #include <unordered_map>
 #include <utility>
+#include <vector>
 
 #include "knvlibs/cache_format.h"
 #include "knvlibs/node_table.h"
@@ -215,7 +216,9 @@ bool CheckRecording(const std::string& fileName) {
     progress.Show(i, parts.size());
     const std::string name = fileName + "@" + ksi::TextOfTime(parts[i].last);
     ksi::Moment moment;
-    if (recording->ReadMoment(parts[i].End() - 1, moment) != ksi::kOk) {
+    std::vector<ksi::MomentFacts> facts;
+    if (recording->ReadFacts(parts[i], facts) != ksi::kOk ||
+        recording->ReadMoment(parts[i].End() - 1, moment) != ksi::kOk) {
       PrintLine(name + ": damaged: " + recording->Why());
       ++problems;
       continue;

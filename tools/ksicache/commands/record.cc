@@ -138,8 +138,8 @@ class Recording {
   void Adopt(ksi::RecordingFile& recording) {
     const size_t damaged = recorder_.Adopt(recording);
     if (damaged == 0) return;
-    PrintError(fileName_ + ": its last " + std::to_string(damaged) +
-               " moments are damaged, and stay so");
+    PrintError(fileName_ +
+               ": its last moments are damaged, and stay so: " + std::to_string(damaged));
   }
 
   // Moments lie on the clock's grid.

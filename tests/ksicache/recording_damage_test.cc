@@ -1,0 +1,288 @@
+// Recordings that are damaged, or that somebody made to do harm: each ends with a status, in
+// bounded memory and time.
+//
+// FULL_SWEEP=1 in the environment flips 100,000 bits instead of some.
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <functional>
+#include <random>
+#include <string>
+#include <vector>
+
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/recording/frame.h"
+#include "tests/knvlibs/host_tree.h"
+#include "tests/ksicache/recording_fixture.h"
+#include "tests/ksicache/write_log.h"
+#include "tools/ksicache/error.h"
+
+namespace ksi {
+namespace {
+
+using ksicache::Recorder;
+using ksicache::RecordingStore;
+using Part = RecordingFile::Part;
+
+constexpr size_t kPage = 4096;
+
+// Reads all moments of a recording, and tries to go on with it, whatever becomes of that.
+void Use(const std::string& name) {
+  auto database = std::make_unique<CacheDatabase>();
+  std::unique_ptr<RecordingFile> file;
+  if (database->Open(name.c_str()) != kOk || database->Version() != cache::kRecordingVersion ||
+      RecordingFile::Make(std::move(database), &file) != kOk) {
+    return;
+  }
+  for (const Part& part : file->Parts()) {
+    std::vector<MomentFacts> facts;
+    HostIdentity host;
+    Moment moment;
+    static_cast<void>(file->ReadFacts(part, facts));
+    static_cast<void>(file->ReadHost(part, host));
+    static_cast<void>(file->ReadMoment(part.number, moment));
+    static_cast<void>(file->ReadMoment(part.End() - 1, moment));
+    int64_t number = 0;
+    static_cast<void>(file->FindMoment(part.first, number));
+  }
+}
+
+// In a process of its own that may take neither much memory nor long.
+void ExpectBounded(const std::function<void()>& run) {
+  const pid_t child = fork();
+  if (child == 0) {
+#ifndef TALLY_SANITIZED
+    const rlimit memory = {rlim_t{1} << 30, rlim_t{1} << 30};
+    setrlimit(RLIMIT_AS, &memory);
+#endif
+    const rlimit seconds = {20, 20};
+    setrlimit(RLIMIT_CPU, &seconds);
+    run();
+    _exit(0);
+  }
+  int status = 0;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  ASSERT_EQ(status, 0);
+}
+
+class RecordingDamage : public RecordingTest {
+ protected:
+  // Some moments that are packed, and some that are not.
+  RecordingDamage() {
+    MakeEmpty(file_);
+    RecordingStore store(file_, kUnbounded);
+    Recorder recorder(store);
+    for (int64_t i = 0; i < 10; ++i) {
+      moments_.push_back(NoiseAt(i));
+      recorder.Add(moments_.back().host, moments_.back().facts, moments_.back().readings);
+      if (i == 6) recorder.Pack();
+    }
+    content_ = FileContent(file_);
+  }
+
+  // The pages that are not as in an empty recording, and the first ones.
+  std::vector<size_t> PagesInUse() const {
+    const Bytes empty = RecordingStore::Empty("h");
+    std::vector<size_t> pages;
+    for (size_t at = 0; at < content_.size(); at += kPage) {
+      if (at < 3 * kPage || at >= empty.size() ||
+          std::memcmp(content_.data() + at, empty.data() + at, kPage) != 0) {
+        pages.push_back(at);
+      }
+    }
+    return pages;
+  }
+
+  // Expects the file to be found damaged after this change of its owner, and nothing worse.
+  void ExpectDamaged(const std::string& sql) {
+    SCOPED_TRACE(sql);
+    WriteContent(file_, content_);
+    RunSql(file_, sql);
+    const harness::Result check = Run({"check", file_});
+    EXPECT_EQ(check.status, 1);
+    EXPECT_NE((check.out + check.err).find("damaged: "), std::string::npos)
+        << check.out << check.err;
+    for (const char* command : {"dump", "moments", "info"}) {
+      const int status = Run({command, file_}).status;
+      EXPECT_TRUE(status == 0 || status == 1) << command << ": " << status;
+    }
+    ExpectBounded([this] { Use(file_); });
+  }
+
+  std::vector<Moment> moments_;
+  const std::string file_ = Path("r.ksi");
+  std::string content_;
+};
+
+TEST_F(RecordingDamage, TruncatedAtEachPage) {
+  size_t refused = 0;
+  for (size_t size = 0; size < content_.size(); size += kPage) {
+    SCOPED_TRACE(size);
+    WriteContent(file_, content_.substr(0, size));
+    const harness::Result check = Run({"check", file_});
+    ASSERT_TRUE(check.status == 0 || check.status == 1) << check.status;
+    if (check.status == 1) ++refused;
+    ASSERT_NO_FATAL_FAILURE(ExpectBounded([this] { Use(file_); }));
+  }
+  EXPECT_GE(refused, PagesInUse().size());
+  EXPECT_LT(refused, content_.size() / kPage);
+}
+
+TEST_F(RecordingDamage, FlippedBits) {
+  const std::vector<size_t> pages = PagesInUse();
+  const int flips = std::getenv("FULL_SWEEP") == nullptr ? 600 : 100'000;
+  constexpr int kAtOnce = 200;
+  for (int i = 0; i < flips; i += kAtOnce) {
+    SCOPED_TRACE("seed " + std::to_string(i));
+    ASSERT_NO_FATAL_FAILURE(ExpectBounded([&] {
+      std::mt19937 random(static_cast<uint32_t>(i));
+      const Image image(content_);
+      for (int n = 0; n < kAtOnce; ++n) {
+        const size_t at = pages[random() % pages.size()] + random() % kPage;
+        const auto flipped = static_cast<char>(content_[at] ^ 1 << random() % 8);
+        image.Apply({static_cast<off_t>(at), std::string(1, flipped)});
+        Use(image.Name());
+        image.Apply({static_cast<off_t>(at), std::string(1, content_[at])});
+      }
+    }));
+  }
+}
+
+TEST_F(RecordingDamage, RowsThatLie) {
+  const std::string ofFirst = " WHERE id = (SELECT id FROM part WHERE moments > 1)";
+  for (const char* change : {"number = -5",
+                             "number = 140737488355328",
+                             "chunk = -1",
+                             "chunk = number + 1",
+                             "moments = 4097",
+                             "moments = 9223372036854775807",
+                             "size = 0",
+                             "size = -1",
+                             "size = 67108865",
+                             "size = 9223372036854775807",
+                             "size = 3",
+                             "block = 0",
+                             "block = -7",
+                             "block = 1099511627776",
+                             "first = last + 1",
+                             "first = first + 1",
+                             "moments = moments + 1",
+                             "moments = moments - 1",
+                             "size = size - 1",
+                             "size = size * 2",
+                             "block = block + 1",
+                             "size = 67108864"}) {
+    ExpectDamaged(std::string("UPDATE part SET ") + change + ofFirst);
+  }
+  ExpectDamaged("UPDATE part SET moments = 0 WHERE number = 0");  // what follows has no start
+  ExpectDamaged("DELETE FROM block");
+  ExpectDamaged("UPDATE block SET data = zeroblob(100)");
+  ExpectDamaged("UPDATE block SET data = zeroblob(9000)");
+  ExpectDamaged("UPDATE block SET data = zeroblob(4572)");
+  ExpectDamaged("UPDATE block SET data = 'text'");
+  ExpectDamaged(
+      "UPDATE part SET id = id + 9223372036854700000 WHERE id > 3; UPDATE part SET size = "
+      "size + 1" +
+      ofFirst);
+}
+
+// Blocks that lead to themselves, of a part that is as large as parts are.
+TEST_F(RecordingDamage, BlocksInACircle) {
+  ExpectDamaged(
+      "UPDATE part SET size = 67108864, block = 1; "
+      "UPDATE block SET data = cast(x'01000000' || zeroblob(4568) AS BLOB)");
+}
+
+TEST_F(RecordingDamage, NumbersThatOverlapAreThereOnce) {
+  RunSql(file_, "UPDATE part SET number = 7 WHERE moments = 1");
+  ExpectBounded([this] { Use(file_); });
+  const std::unique_ptr<RecordingFile> file = OpenFile(file_);
+  ASSERT_NE(file, nullptr);
+  EXPECT_EQ(file->Parts().size(), 2u);
+}
+
+// What zeros are packed into is small; how large they are is known before.
+TEST_F(RecordingDamage, FramesOfZeros) {
+  for (const size_t size : {kLargestFrame, kLargestFrame + 1}) {
+    SCOPED_TRACE(size);
+    const Bytes frame = Pack(Bytes(size));
+    ASSERT_LT(frame.size(), 100'000u);
+    Bytes part(4);
+    const auto frameSize = static_cast<uint32_t>(frame.size());
+    std::memcpy(part.data(), &frameSize, sizeof frameSize);
+    for (int i = 0; i < 2; ++i) part.insert(part.end(), frame.begin(), frame.end());
+    WriteContent(file_, content_);
+    RecordingStore(file_, kUnbounded).Add({0, 1, 1000, 1000, 0, 0, 0, 0}, part);
+    ExpectBounded([this] { Use(file_); });
+    const harness::Result check = Run({"check", file_});
+    EXPECT_EQ(check.status, 1);
+    EXPECT_EQ(check.out, file_ +
+                             "@1970-01-01T00:00:00Z: damaged: the part of "
+                             "1970-01-01T00:00:00Z is damaged\n");
+  }
+}
+
+TEST_F(RecordingDamage, CheckNamesTheMoment) {
+  const std::unique_ptr<RecordingFile> file = OpenFile(file_);
+  ASSERT_NE(file, nullptr);
+  const Part last = file->Parts().back();
+  RunSql(file_, "UPDATE block SET data = zeroblob(4572) WHERE id = " + std::to_string(last.block));
+  const std::string time = TextOfTime(last.first);
+  const harness::Result check = Run({"check", file_});
+  EXPECT_EQ(check.status, 1);
+  EXPECT_NE(check.out.find(file_ + "@" + time + ": damaged: the part of " + time + " is damaged\n"),
+            std::string::npos)
+      << check.out;
+  // The moments before it are as they were, and recording goes on.
+  std::vector<Moment> before(moments_.end() - 3, moments_.end() - 1);
+  ExpectMoments(*OpenFile(file_), before, static_cast<int64_t>(moments_.size()) - 3);
+  const harness::Result result = Run(
+      {"record", "--root", RecordedHost("systemd-server"), "--every", "1s", "--count", "1", file_});
+  EXPECT_EQ(result.status, 0);
+  EXPECT_EQ(result.err, "ksicache: " + file_ + ": its last moments are damaged, and stay so: 1\n");
+  Output({"dump", file_});
+}
+
+class RecordingNames : public RecordingTest {
+ protected:
+  RecordingNames() { Record(file_, MakeMoments(1, 3)); }
+
+  const std::string file_ = Path("r.ksi");
+};
+
+TEST_F(RecordingNames, AFileThatHasTheWholeNameWins) {
+  const std::string name = file_ + "@first";
+  WriteSmallHost(name);
+  EXPECT_NE(Output({"info", name}).find("test.example.org"), std::string::npos);
+  EXPECT_EQ(Output({"dump", name}), Output({"dump", name + "@last"}));
+  std::filesystem::remove(name);
+  EXPECT_EQ(Output({"dump", name}), Output({"dump", file_ + "@2026-11-21T10:00:00Z"}));
+  std::filesystem::rename(file_, name);
+  EXPECT_EQ(Output({"dump", name}), Output({"dump", name + "@-0s"}));
+  EXPECT_NE(Output({"dump", name}), Output({"dump", name + "@first"}));
+}
+
+TEST_F(RecordingNames, ErrorsNameTheSpan) {
+  const std::string early = file_ + "@2026-11-21T09:59:59Z";
+  const std::string span = "the first is of 2026-11-21T10:00:00Z, the last of 2026-11-21T10:00:10Z";
+  ExpectFailure({"dump", early},
+                early + ": there is no moment at 2026-11-21T09:59:59Z or before: " + span);
+  ExpectFailure({"extract", file_ + "@-1h", Path("out.ksi")},
+                "there is no moment at -1h or before: " + span);
+  ExpectFailure({"dump", file_ + "@noon"},
+                file_ +
+                    "@noon: noon is no time: it is as 2026-11-21T10:05:30Z, 10:05, -10m, first "
+                    "or last");
+  ExpectFailure({"dump", Path("none@first")}, Path("none@first") + ": No such file or directory");
+  MakeEmpty(Path("empty.ksi"));
+  ExpectFailure({"dump", Path("empty.ksi")}, Path("empty.ksi") + ": it has no moments yet");
+  // Later than the last is the last.
+  EXPECT_EQ(Output({"dump", file_ + "@2030-01-01T00:00"}), Output({"dump", file_}));
+}
+
+}  // namespace
+}  // namespace ksi
