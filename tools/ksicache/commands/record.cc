@@ -82,6 +82,40 @@ class Log {
   std::map<std::string, int64_t> said_;
 };
 
+// What the moments of an hour cost. Told with the first moment of the next one, by the clock.
+class HourlyAccount {
+ public:
+  void Add(const std::string& fileName, const ksi::MomentFacts& facts, int64_t size) {
+    if (moments_ != 0 && facts.taken / kHour != from_ / kHour) {
+      Tell(fileName, size);
+      *this = {};
+    }
+    if (moments_++ == 0) from_ = facts.taken;
+    skipped_ += facts.skipped;
+    duration_ += facts.duration;
+    cpu_ += facts.cpu;
+  }
+
+ private:
+  static constexpr int64_t kHour = 3600 * kSecond;
+
+  void Tell(const std::string& fileName, int64_t size) const {
+    const auto each = [this](uint64_t sum) {
+      return std::to_string(sum / moments_ / 1000) + " ms";
+    };
+    PrintLine(fileName + ": " + std::to_string(moments_) + " moments since " +
+              ksi::TextOfTime(from_) + ", " + std::to_string(skipped_) + " skipped; each took " +
+              each(duration_) + ", " + each(cpu_) + " of CPU; " + std::to_string(size) + " bytes");
+    FlushOutput();
+  }
+
+  int64_t from_ = 0;
+  uint64_t moments_ = 0;
+  uint64_t skipped_ = 0;
+  uint64_t duration_ = 0;
+  uint64_t cpu_ = 0;
+};
+
 struct Plan {
   int64_t every;
   int64_t keep;
@@ -153,6 +187,7 @@ class Recording {
       recorder_.Add(moment.host, moment.facts, moment.readings);
       skipped_ = 0;
       ++recorded_;
+      account_.Add(fileName_, moment.facts, store_.Size());
       SayAgain();
       Tidy(moment.facts.taken);
     } catch (const Error& error) {
@@ -208,6 +243,7 @@ class Recording {
   Recorder recorder_;
   Sampler sampler_;
   Log log_;
+  HourlyAccount account_;
   int64_t last_ = 0;  // tick
   int64_t synced_ = 0;
   uint64_t skipped_ = 0;  // since the last moment that was recorded
