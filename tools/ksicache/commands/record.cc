@@ -31,12 +31,13 @@ constexpr Option kCount = {"count", "N", "end after N moments"};
 constexpr const Option* kOptions[] = {&kEvery, &kKeep, &kMaxSize, &kCount, &kMode, &kRoot};
 
 constexpr int64_t kSecond = 1'000'000;
+constexpr int64_t kHour = 3600 * kSecond;
 
 // A loss of power takes what was recorded since the last of these.
 constexpr int64_t kSyncEvery = 60 * kSecond;
 
 // What is the same again and again is said so often.
-constexpr int64_t kSayEvery = 3600 * kSecond;
+constexpr int64_t kSayEvery = kHour;
 
 volatile std::sig_atomic_t stopped = 0;
 
@@ -97,8 +98,6 @@ class HourlyAccount {
   }
 
  private:
-  static constexpr int64_t kHour = 3600 * kSecond;
-
   void Tell(const std::string& fileName, int64_t size) const {
     const auto each = [this](uint64_t sum) {
       return std::to_string(sum / moments_ / 1000) + " ms";
