@@ -17,7 +17,7 @@ extern const Command kLoad;
 extern const Command kCheck;
 
 inline constexpr const Command* kCommands[] = {&kCapture, &kRecord, &kMoments, &kExtract, &kJoin,
-                                              &kInfo, &kDump, &kLoad, &kCheck};
+                                               &kInfo,    &kDump,   &kLoad,    &kCheck};
 
 }  // namespace ksicache
 
