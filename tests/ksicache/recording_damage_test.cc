@@ -6,11 +6,13 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <functional>
 #include <random>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -207,10 +209,19 @@ TEST_F(RecordingDamage, NumbersThatOverlapAreThereOnce) {
 
 // What zeros are packed into is small; how large they are is known before.
 TEST_F(RecordingDamage, FramesOfZeros) {
-  for (const size_t size : {kLargestFrame, kLargestFrame + 1}) {
-    SCOPED_TRACE(size);
-    const Bytes frame = Pack(Bytes(size));
+  const Bytes zeros(kLargestFrame);
+  const ByteView pieces[] = {zeros};
+  for (const uint32_t more : {0u, 1u}) {
+    SCOPED_TRACE(more);
+    Bytes frame = Pack(pieces);
     ASSERT_LT(frame.size(), 100'000u);
+    // The head has the size of what is packed.
+    uint32_t size = kLargestFrame;
+    const auto head = std::as_bytes(std::span(&size, 1));
+    const auto found = std::search(frame.begin(), frame.begin() + 16, head.begin(), head.end());
+    ASSERT_NE(found, frame.begin() + 16);
+    size += more;
+    std::ranges::copy(head, found);
     Bytes part(4);
     const auto frameSize = static_cast<uint32_t>(frame.size());
     std::memcpy(part.data(), &frameSize, sizeof frameSize);

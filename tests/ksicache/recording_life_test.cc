@@ -155,10 +155,13 @@ TEST_F(RecordingLife, ReadersMeanwhileSeeWholeMoments) {
     const int64_t wanted =
         i % 3 == 0 ? end - 1 : static_cast<int64_t>(random() % static_cast<uint64_t>(end));
     OpenedCache opened;
+    ChunkReader reader;
     Moment moment;
     std::string why;
     const std::string when = TextOfTime(kStart + wanted * kSecond);
-    ASSERT_EQ(ReadCache(file_ + "@" + when, &opened, &moment, &why), kOk) << when << ": " << why;
+    ASSERT_EQ(ReadCache(file_ + "@" + when, &opened, &reader, &why), kOk) << when << ": " << why;
+    ASSERT_EQ(reader.ReadAll(moment.readings), kOk) << when;
+    moment.facts = reader.Facts();
     const Moment expected = MomentAt(wanted);
     SortReadings(moment.readings);
     ASSERT_EQ(moment.facts, expected.facts) << when;
