@@ -15,9 +15,12 @@ TEST_F(Ksicache, HelpAndVersion) {
   EXPECT_EQ(Output({"--version"}), "ksicache " KSICACHE_VERSION "\n");
 }
 
+constexpr const char* kCommands[] = {"capture", "record", "moments", "extract", "join",
+                                     "info",    "dump",   "load",    "check"};
+
 TEST_F(Ksicache, HelpSaysAll) {
   std::string text = Output({"--help"});
-  for (const char* command : {"capture", "info", "dump", "load", "check"}) {
+  for (const char* command : kCommands) {
     text += "\n" + Output({command, "--help"});
   }
   harness::ExpectGolden("ksicache/help.txt", text);
@@ -34,7 +37,7 @@ Options:
   -h, --help  show this message
 )");
   const std::string help = Output({"--help"});
-  for (const std::string command : {"capture", "info", "dump", "load", "check"}) {
+  for (const std::string command : kCommands) {
     const std::string own = Output({"-h", command});
     const std::string usage = own.substr(0, own.find('\n')).substr(strlen("Usage: "));
     EXPECT_TRUE(usage.starts_with("ksicache " + command + " ")) << usage;
@@ -57,6 +60,16 @@ TEST_F(Ksicache, WrongCommandLines) {
                 "not as in: ksicache load JSON FILE [--force] [--mode MODE]", 2);
   ExpectFailure({"info", "--force", "x"}, "info does not take --force", 2);
   ExpectFailure({"load", "--root", "/", "a", "b"}, "load does not take --root", 2);
+  ExpectFailure({"record", "-"}, "a recording is a file, not standard output", 2);
+  ExpectFailure({"record", "--every", "0s", "a"},
+                "--every takes a time such as 5s, 10m, 6h or 7d: 0s", 2);
+  ExpectFailure({"record", "--keep", "1w", "a"},
+                "--keep takes a time such as 5s, 10m, 6h or 7d: 1w", 2);
+  ExpectFailure({"record", "--max-size", "2", "a"}, "--max-size is at least 4M", 2);
+  ExpectFailure({"record", "--max-size", "9999999T", "a"},
+                "--max-size takes a size such as 500M or 2G: 9999999T", 2);
+  ExpectFailure({"record", "--count", "-1", "a"}, "--count takes a number from 1 on: -1", 2);
+  ExpectFailure({"moments", "--every", "1s", "a"}, "moments does not take --every", 2);
   ExpectFailure({"info", "--fast", "x"}, "unknown or incomplete option --fast", 2);
   ExpectFailure({"capture", "x", "--root"}, "unknown or incomplete option --root", 2);
   for (const char* mode : {"", "9", "1777", "u+r", "0640 "}) {
