@@ -123,8 +123,7 @@ struct Plan {
 };
 
 Plan PlanOf(const CommandLine& line) {
-  const Plan plan = {DurationOf(line, kEvery, 5 * kSecond),
-                     DurationOf(line, kKeep, int64_t{7} * 86400 * kSecond),
+  const Plan plan = {DurationOf(line, kEvery, 5 * kSecond), DurationOf(line, kKeep, 7 * kDay),
                      SizeOf(line, kMaxSize, int64_t{2} << 30), CountOf(line, kCount, 0)};
   if (plan.maxSize < RecordingStore::kSmallestFile) {
     throw UsageError("--max-size is at least " +
