@@ -32,6 +32,7 @@ constexpr const Option* kOptions[] = {&kEvery, &kKeep, &kMaxSize, &kCount, &kMod
 
 constexpr int64_t kSecond = 1'000'000;
 constexpr int64_t kHour = 3600 * kSecond;
+constexpr int64_t kDay = 24 * kHour;
 
 // A loss of power takes what was recorded since the last of these.
 constexpr int64_t kSyncEvery = 60 * kSecond;
