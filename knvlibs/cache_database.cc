@@ -131,6 +131,13 @@ Status CacheDatabase::Open(const char* fileName) {
   return code == SQLITE_OK ? Configure() : Failed(code);
 }
 
+uint32_t CacheDatabase::VersionOf(const char* fileName) {
+  CacheDatabase database;
+  Status status = database.descriptor_.Open(fileName);
+  if (status == kOk) status = database.CheckHead();
+  return status == kOk ? database.version_ : 0;
+}
+
 Status CacheDatabase::OpenBytes(std::span<const std::byte> content) {
   version_ = cache::kSchemaVersion;
   size_ = content.size();

@@ -27,7 +27,10 @@ class CacheDatabase {
   //   KSI_STATUS_METADATA_READ_ERROR: damaged, or somebody is in the middle of changing it.
   [[nodiscard]] Status Open(const char* fileName);
 
-  // The same of the bytes of a file, which must live as long.
+  // The version that a file says its schema is of; 0 if it is none of this library.
+  static uint32_t VersionOf(const char* fileName);
+
+  // The same as Open, of the bytes of a file, which must live as long.
   [[nodiscard]] Status OpenBytes(std::span<const std::byte> content);
 
   // The version of its schema.

@@ -57,9 +57,7 @@ TEST_F(RecordCommand, GoesOnBehindWhatIsDamaged) {
          "number = 1 AND moments = 1)");
   const harness::Result result = Record(10, {file, "--every", "1s", "--count", "2"});
   EXPECT_EQ(result.status, 0);
-  EXPECT_EQ(result.err, "ksicache: " + file +
-                            ": what was recorded last stays as it is: the part of "
-                            "2026-11-21T09:00:03Z is damaged\n");
+  EXPECT_EQ(result.err, "ksicache: " + file + ": its last moments are damaged, and stay so: 2\n");
   // What came before it and what came after it is there.
   Output({"extract", file + "@first", Path("first.ksi")});
   Output({"extract", file + "@last", Path("last.ksi")});

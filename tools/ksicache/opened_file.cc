@@ -144,9 +144,7 @@ void OpenedFile::Open(const std::string& name, const ksi::Moment& moment) {
 }
 
 bool IsRecording(const std::string& name) {
-  ksi::CacheDatabase database;
-  return database.Open(name.c_str()) == ksi::kOk &&
-         database.Version() == ksi::cache::kRecordingVersion;
+  return ksi::CacheDatabase::VersionOf(name.c_str()) == ksi::cache::kRecordingVersion;
 }
 
 std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName) {
