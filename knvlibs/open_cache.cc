@@ -120,7 +120,7 @@ Status ReadCache(const std::string& name, OpenedCache* opened, ChunkReader* mome
       status = opened->recording->ReadMoment(opened->number, *moment);
       *why = opened->recording->Why();
     }
-    if (status != KSI_STATUS_METADATA_READ_ERROR) return status;
+    if (status != KSI_STATUS_METADATA_READ_ERROR || !opened->isMoment) return status;
   }
   return status;
 }
