@@ -168,6 +168,8 @@ Status ChunkReader::Take(ByteView part, size_t last) {
   if (!TakeIndex(ByteReader(index), starts, host_, facts) || starts != parts_.empty()) {
     return kDamaged;
   }
+  bytes_ += taken.changes.size();
+  if (bytes_ > kMostBytes) return kDamaged;
   nodes_.resize(host_.nodes.size());
   taken.count = facts.size();
   taken.last = std::min(last, facts.size() - 1);

@@ -23,8 +23,9 @@ namespace ksi {
 
 class ChunkReader {
  public:
-  // What a damaged part may make its reader take: readings, bytes of their records and entries, and
-  // bytes of the lists that it changes one after the other. The largest hosts need a part of it.
+  // What a damaged part may make its reader take: readings, bytes of what is unpacked and
+  // of their records and entries, and bytes of the lists that it changes one after the other. The
+  // largest hosts need a part of it.
   static constexpr size_t kMostReadings = size_t{1} << 20;
   static constexpr size_t kMostBytes = size_t{256} << 20;
   static constexpr size_t kMostWork = size_t{2} << 30;

@@ -25,6 +25,9 @@ constexpr const char* kBlockOf = "SELECT data FROM block WHERE id = ?1";
 constexpr int64_t kMostNumber = int64_t{1} << 47;
 constexpr size_t kMostRows = size_t{1} << 20;
 
+// By so much a file may have grown since its size was looked at.
+constexpr uint64_t kGrowth = uint64_t{1} << 20;
+
 bool IsGood(const RecordingFile::Part& part) {
   return part.moments <= static_cast<int64_t>(chunk::kMostMoments) && part.chunk >= 0 &&
          part.chunk <= part.number && part.number < kMostNumber && part.first <= part.last &&
@@ -54,6 +57,7 @@ Status RecordingFile::ReadRows() {
   int code = rows.Prepare(database_->Handle(), kRows);
   if (code != SQLITE_OK) return database_->Failed(code);
   int64_t last = 0;
+  uint64_t total = 0;
   while ((code = rows.Step()) == SQLITE_ROW) {
     const Part part = {rows.Number(kId),    rows.Number(kMoments), rows.Number(kNumber),
                        rows.Number(kChunk), rows.Number(kFirst),   rows.Number(kLast),
@@ -63,6 +67,8 @@ Status RecordingFile::ReadRows() {
     }
     if (part.moments <= 0) continue;
     if (!IsGood(part)) return Damaged(part, "is not understood");
+    total += static_cast<uint64_t>(part.size);
+    if (total > Size() + kGrowth) return database_->Damaged("its parts are larger than it");
     rows_.push_back(part);
   }
   return code == SQLITE_DONE ? kOk : database_->Failed(code);

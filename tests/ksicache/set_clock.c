@@ -1,8 +1,9 @@
 /* Stands before the C library: the clock on the wall stands still at SET_CLOCK, seconds since 1970,
- * but who sleeps until a time wakes up at it at once. */
+ * but who waits for a time is at it at once. */
 #define _GNU_SOURCE
 #include <stdlib.h>
 #include <sys/syscall.h>
+#include <sys/timerfd.h>
 #include <time.h>
 #include <unistd.h>
 
@@ -19,12 +20,11 @@ __attribute__((visibility("default"))) int clock_gettime(clockid_t clock, struct
   return 0;
 }
 
-__attribute__((visibility("default"))) int clock_nanosleep(clockid_t clock, int flags,
-                                                           const struct timespec* time,
-                                                           struct timespec* left) {
-  if (clock != CLOCK_REALTIME || flags != TIMER_ABSTIME) {
-    return (int)syscall(SYS_clock_nanosleep, clock, flags, time, left);
-  }
-  now = *time;
-  return 0;
+__attribute__((visibility("default"))) int timerfd_settime(int timer, int flags,
+                                                           const struct itimerspec* due,
+                                                           struct itimerspec* before) {
+  static const struct itimerspec at_once = {{0, 0}, {0, 1}};
+  now = due->it_value;
+  (void)flags;
+  return (int)syscall(SYS_timerfd_settime, timer, 0, &at_once, before);
 }

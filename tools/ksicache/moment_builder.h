@@ -2,6 +2,7 @@
 #ifndef TOOLS_KSICACHE_MOMENT_BUILDER_H_
 #define TOOLS_KSICACHE_MOMENT_BUILDER_H_
 
+#include <cstddef>
 #include <vector>
 
 #include "knvlibs/recording/moment.h"
@@ -11,6 +12,9 @@ namespace ksicache {
 
 class MomentBuilder : public ReadingSink {
  public:
+  // With room for so many readings.
+  explicit MomentBuilder(size_t room = 0) { readings_.reserve(room); }
+
   void AddValue(const ksi::Node& node, const ksi::Keys& keys,
                 std::span<const std::byte> record) override;
   void AddList(const ksi::Node& node, const ksi::Keys& keys,

@@ -35,11 +35,12 @@ ksi::Moment Sampler::Take() {
   const int64_t cpu = MicrosecondsOf(CLOCK_PROCESS_CPUTIME_ID);
 
   HostLibrary library(RootToOpen(root_));
-  MomentBuilder builder;
+  MomentBuilder builder(count_);
   HostWalk walk(library, builder);
   walk.Run(false);
   walk.RequireFound();
   moment.readings = builder.Take();
+  count_ = moment.readings.size();
 
   facts.refused = walk.GetFailures().refused.Count();
   facts.failed = walk.GetFailures().failed.Count();

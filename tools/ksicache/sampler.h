@@ -2,6 +2,7 @@
 #ifndef TOOLS_KSICACHE_SAMPLER_H_
 #define TOOLS_KSICACHE_SAMPLER_H_
 
+#include <cstddef>
 #include <string>
 
 #include "knvlibs/recording/moment.h"
@@ -18,6 +19,7 @@ class Sampler {
 
  private:
   const std::string* root_;
+  size_t count_ = 0;  // of the readings of the last moment
 };
 
 }  // namespace ksicache

@@ -32,16 +32,25 @@ std::string SpanText(int64_t time) {
 // what there is to remark.
 class Lister {
  public:
-  explicit Lister(ksi::RecordingFile& file) : file_(file) {}
+  Lister(const std::string& fileName, ksi::RecordingFile& file)
+      : fileName_(fileName), file_(file) {}
 
-  void Run() {
+  // False if something is damaged, which is said.
+  bool Run() {
     PrintLine("taken                     bytes   took ms    cpu ms  remarks");
     Progress progress("listing");
+    bool isGood = true;
     const std::vector<ksi::RecordingFile::Part>& parts = file_.Parts();
     for (size_t i = 0; i < parts.size(); ++i) {
       progress.Show(i, parts.size());
-      ListPart(parts[i]);
+      try {
+        ListPart(parts[i]);
+      } catch (const DataError& error) {
+        PrintError(fileName_ + ": " + error.what());
+        isGood = false;
+      }
     }
+    return isGood;
   }
 
  private:
@@ -91,6 +100,7 @@ class Lister {
     return remarks;
   }
 
+  const std::string& fileName_;
   ksi::RecordingFile& file_;
   bool isFirst_ = true;
   ksi::MomentFacts last_;
@@ -99,8 +109,7 @@ class Lister {
 
 int Moments(const CommandLine& line) {
   return ForEachFile(line.arguments, [](const std::string& fileName) {
-    Lister(*OpenRecording(fileName)).Run();
-    return true;
+    return Lister(fileName, *OpenRecording(fileName)).Run();
   });
 }
 

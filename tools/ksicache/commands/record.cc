@@ -2,14 +2,13 @@
 #include <sys/stat.h>
 
 #include <array>
-#include <cerrno>
-#include <csignal>
 #include <ctime>
 #include <map>
 #include <new>
 #include <string>
 
 #include "knvlibs/open_cache.h"
+#include "tools/ksicache/alarm.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diagnostics.h"
 #include "tools/ksicache/error.h"
@@ -40,29 +39,13 @@ constexpr int64_t kSyncEvery = 60 * kSecond;
 // What is the same again and again is said so often.
 constexpr int64_t kSayEvery = kHour;
 
-volatile std::sig_atomic_t stopped = 0;
-
-void Stop(int /*signal*/) { stopped = 1; }
-
-// The signals that end a recording in order.
-void CatchSignals() {
-  struct sigaction action = {};
-  action.sa_handler = Stop;
-  for (const int each : {SIGINT, SIGTERM, SIGHUP}) sigaction(each, &action, nullptr);
-}
-
-int64_t Now() {
+int64_t TimeOf(clockid_t clock) {
   struct timespec now = {};
-  clock_gettime(CLOCK_REALTIME, &now);
+  clock_gettime(clock, &now);
   return int64_t{now.tv_sec} * kSecond + now.tv_nsec / 1000;
 }
 
-// Until a time of the clock on the wall, though it may be set meanwhile, or a signal.
-void SleepUntil(int64_t time) {
-  const struct timespec until = {time / kSecond, time % kSecond * 1000};
-  while (stopped == 0 && clock_nanosleep(CLOCK_REALTIME, TIMER_ABSTIME, &until, nullptr) == EINTR) {
-  }
-}
+int64_t Now() { return TimeOf(CLOCK_REALTIME); }
 
 // What is said again and again.
 class Log {
@@ -135,7 +118,8 @@ Plan PlanOf(const CommandLine& line) {
 
 class Recording {
  public:
-  Recording(const std::string& fileName, const Plan& plan, const std::string* root)
+  Recording(const std::string& fileName, const Plan& plan, const std::string* root,
+            const std::string& host)
       : fileName_(fileName),
         plan_(plan),
         store_(fileName, plan.maxSize),
@@ -144,7 +128,10 @@ class Recording {
     ksi::OpenedCache opened;
     std::string why;
     const ksi::Status status = ksi::OpenCache(fileName, &opened, &why);
-    if (status == ksi::kOk && opened.recording != nullptr) Adopt(*opened.recording);
+    if (status == ksi::kOk && opened.recording != nullptr) {
+      TellOtherHost(*opened.recording, host);
+      Adopt(*opened.recording);
+    }
     opened = {};
     store_.TellWhose();
     synced_ = Now();
@@ -153,13 +140,12 @@ class Recording {
   // Gives the exit status.
   int Run() {
     int64_t taken = 0;
-    for (int64_t next = NextTick(Now()); stopped == 0; next = NextTick(Now())) {
-      // What was due while the last one was taken is left out, and not taken late.
-      if (last_ != 0 && next > last_)
-        skipped_ += static_cast<uint64_t>((next - last_) / plan_.every - 1);
-      SleepUntil(next);
-      if (stopped != 0) break;
-      last_ = next;
+    for (;;) {
+      // Moments lie on the clock's grid.
+      const Alarm::Event event = alarm_.WaitUntil((Now() / plan_.every + 1) * plan_.every);
+      if (event == Alarm::Event::kStopped) break;
+      if (event == Alarm::Event::kClockSet) continue;
+      CountSkipped();
       TakeMoment();
       if (plan_.count != 0 && ++taken == plan_.count) break;
     }
@@ -168,6 +154,14 @@ class Recording {
   }
 
  private:
+  // Hosts are given other names, and files other hosts.
+  void TellOtherHost(ksi::RecordingFile& recording, const std::string& host) const {
+    ksi::HostIdentity last;
+    if (recording.ReadHost(recording.Parts().back(), last) != ksi::kOk || last.name == host) return;
+    PrintError(fileName_ + ": its last moment is of the host " + last.name + ", those to come of " +
+               host);
+  }
+
   void Adopt(ksi::RecordingFile& recording) {
     const size_t damaged = recorder_.Adopt(recording);
     if (damaged == 0) return;
@@ -175,8 +169,14 @@ class Recording {
                ": its last moments are damaged, and stay so: " + std::to_string(damaged));
   }
 
-  // Moments lie on the clock's grid.
-  int64_t NextTick(int64_t now) const { return (now / plan_.every + 1) * plan_.every; }
+  // What was due while the last one was taken is left out, and not taken late. A clock that was set
+  // leaves nothing out.
+  void CountSkipped() {
+    const int64_t now = TimeOf(CLOCK_BOOTTIME);
+    const int64_t ticks = (now - last_ + plan_.every / 2) / plan_.every;
+    if (last_ != 0 && ticks > 1) skipped_ += static_cast<uint64_t>(ticks - 1);
+    last_ = now;
+  }
 
   void TakeMoment() {
     Diagnostics diagnostics;
@@ -197,12 +197,17 @@ class Recording {
     for (const std::string& line : diagnostics.TakeKept()) log_.Say(line);
   }
 
+  // What fails here fails again with the next moment, and loses none.
   void Tidy(int64_t now) {
-    recorder_.Tidy();
-    store_.RemoveBefore(now - plan_.keep);
-    if (now - synced_ >= kSyncEvery || now < synced_) {
-      store_.Sync();
-      synced_ = now;
+    try {
+      recorder_.Tidy();
+      store_.RemoveBefore(now - plan_.keep);
+      if (now - synced_ >= kSyncEvery || now < synced_) {
+        store_.Sync();
+        synced_ = now;
+      }
+    } catch (const Error& error) {
+      log_.Say(error.what());
     }
   }
 
@@ -243,7 +248,8 @@ class Recording {
   Sampler sampler_;
   Log log_;
   HourlyAccount account_;
-  int64_t last_ = 0;  // tick
+  Alarm alarm_;
+  int64_t last_ = 0;  // when a moment was due, by the time since the host started
   int64_t synced_ = 0;
   uint64_t skipped_ = 0;  // since the last moment that was recorded
   uint64_t recorded_ = 0;
@@ -264,8 +270,7 @@ int Record(const CommandLine& line) {
   if (lstat(fileName.c_str(), &info) != 0) {
     NewFile(fileName, false, ModeOf(line)).Commit(RecordingStore::Empty(host));
   }
-  CatchSignals();
-  Recording recording(fileName, plan, root);
+  Recording recording(fileName, plan, root, host);
   PrintLine(fileName + ": recording " + host + " every " + std::to_string(plan.every / kSecond) +
             " s");
   FlushOutput();
