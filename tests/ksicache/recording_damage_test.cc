@@ -254,7 +254,10 @@ TEST_F(RecordingDamage, CheckNamesTheMoment) {
   const harness::Result result = Run(
       {"record", "--root", RecordedHost("systemd-server"), "--every", "1s", "--count", "1", file_});
   EXPECT_EQ(result.status, 0);
-  EXPECT_EQ(result.err, "ksicache: " + file_ + ": its last moments are damaged, and stay so: 1\n");
+  EXPECT_EQ(result.err, "ksicache: " + file_ +
+                            ": its last moment is of the host h, those to come of unknown\n"
+                            "ksicache: " +
+                            file_ + ": its last moments are damaged, and stay so: 1\n");
   Output({"dump", file_});
 }
 
