@@ -7,17 +7,15 @@
 #include <cerrno>
 #include <cstring>
 #include <limits>
-#include <mutex>
 #include <new>
 #include <utility>
 #include <vector>
 
 #include "knvlibs/cache_format.h"
+#include "knvlibs/sqlite_file.h"
 
 namespace ksicache {
 namespace {
-
-constexpr const char* kVfsName = "ksi-recording";
 
 // Numbers in pages: that of the pages in the header of a database, and those of pages that pages of
 // a table lead to.
@@ -74,31 +72,13 @@ bool WriteAll(int descriptor, const std::string& bytes, int64_t offset) {
   return true;
 }
 
-int Nothing(sqlite3_file* /*file*/) { return SQLITE_OK; }
-int NoLock(sqlite3_file* /*file*/, int /*level*/) { return SQLITE_OK; }
-int NoSync(sqlite3_file* /*file*/, int /*flags*/) { return SQLITE_OK; }
-int NoTruncate(sqlite3_file* /*file*/, sqlite3_int64 /*size*/) { return SQLITE_READONLY; }
-int NoReservedLock(sqlite3_file* /*file*/, int* held) {
-  *held = 0;
-  return SQLITE_OK;
-}
-int NoControl(sqlite3_file* /*file*/, int /*operation*/, void* /*argument*/) {
-  return SQLITE_NOTFOUND;
-}
-int Zero(sqlite3_file* /*file*/) { return 0; }
+int NoCharacteristics(sqlite3_file* /*file*/) { return 0; }
 
 int NoDelete(sqlite3_vfs* /*vfs*/, const char* /*name*/, int /*sync*/) { return SQLITE_OK; }
 int NoAccess(sqlite3_vfs* /*vfs*/, const char* /*name*/, int /*flags*/, int* found) {
   *found = 0;
   return SQLITE_OK;
 }
-int FullName(sqlite3_vfs* /*vfs*/, const char* name, int room, char* fullName) {
-  const size_t size = std::strlen(name) + 1;
-  if (size > static_cast<size_t>(room)) return SQLITE_CANTOPEN;
-  std::memcpy(fullName, name, size);
-  return SQLITE_OK;
-}
-
 }  // namespace
 
 // An open file as SQLite knows it.
@@ -112,57 +92,25 @@ PageFile& PageFile::Of(sqlite3_file* file) { return *reinterpret_cast<Handle*>(f
 PageFile::PageFile(int descriptor) : descriptor_(descriptor), vfs_() {}
 
 int PageFile::Open(ksi::Database* database) {
-  int code = sqlite3_initialize();
+  const int code = sqlite3_initialize();
   if (code != SQLITE_OK) return code;
   pages_.clear();
   std::string header(ksi::cache::kPageSize, '\0');
   end_ = pread(descriptor_, header.data(), header.size(), 0) < 0 ? 0 : EndIn(header);
-  vfs_ = *sqlite3_vfs_find(nullptr);
-  vfs_.zName = kVfsName;
-  vfs_.szOsFile = std::max(vfs_.szOsFile, static_cast<int>(sizeof(Handle)));
+  vfs_ = ksi::sqlite_file::MakeVfs("ksi-recording", static_cast<int>(sizeof(Handle)), OpenFile);
   vfs_.pAppData = this;
-  vfs_.xOpen = OpenFile;
   vfs_.xDelete = NoDelete;
   vfs_.xAccess = NoAccess;
-  vfs_.xFullPathname = FullName;
-  // SQLite finds it by its name; other files have others of that name.
-  static std::mutex mutex;
-  const std::lock_guard<std::mutex> guard(mutex);
-  code = sqlite3_vfs_register(&vfs_, 0);
-  if (code != SQLITE_OK) return code;
-  sqlite3* handle = nullptr;
-  code =
-      sqlite3_open_v2("recording", &handle, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, kVfsName);
-  sqlite3_vfs_unregister(&vfs_);
-  database->reset(handle);
-  return code;
+  return ksi::sqlite_file::OpenDatabase(vfs_, "recording", SQLITE_OPEN_READWRITE, database);
 }
 
 int PageFile::OpenFile(sqlite3_vfs* vfs, const char* name, sqlite3_file* file, int flags,
                        int* outFlags) {
   if ((flags & SQLITE_OPEN_MAIN_DB) == 0) {
-    sqlite3_vfs* const system = sqlite3_vfs_find(nullptr);
-    return system->xOpen(system, name, file, flags, outFlags);
+    return ksi::sqlite_file::OpenOther(name, file, flags, outFlags);
   }
-  static constexpr sqlite3_io_methods kMethods = {.iVersion = 1,
-                                                  .xClose = Nothing,
-                                                  .xRead = Read,
-                                                  .xWrite = Write,
-                                                  .xTruncate = NoTruncate,
-                                                  .xSync = NoSync,
-                                                  .xFileSize = FileSize,
-                                                  .xLock = NoLock,
-                                                  .xUnlock = NoLock,
-                                                  .xCheckReservedLock = NoReservedLock,
-                                                  .xFileControl = NoControl,
-                                                  .xSectorSize = Zero,
-                                                  .xDeviceCharacteristics = Zero,
-                                                  .xShmMap = nullptr,
-                                                  .xShmLock = nullptr,
-                                                  .xShmBarrier = nullptr,
-                                                  .xShmUnmap = nullptr,
-                                                  .xFetch = nullptr,
-                                                  .xUnfetch = nullptr};
+  static constexpr sqlite3_io_methods kMethods = ksi::sqlite_file::MethodsOf(
+      {.read = Read, .write = Write, .size = FileSize, .characteristics = NoCharacteristics});
   auto& handle = *reinterpret_cast<Handle*>(file);
   handle.file = static_cast<PageFile*>(vfs->pAppData);
   handle.base.pMethods = &kMethods;
@@ -184,18 +132,11 @@ int PageFile::Read(sqlite3_file* file, void* buffer, int amount, sqlite3_int64 o
       return SQLITE_OK;
     }
   }
-  for (size_t done = 0; done < wanted;) {
-    const ssize_t got = pread(self.descriptor_, bytes + done, wanted - done,
-                              offset + static_cast<sqlite3_int64>(done));
-    if (got < 0 && errno == EINTR) continue;
-    if (got < 0) return SQLITE_IOERR_READ;
-    if (got == 0) {
-      std::memset(bytes + done, 0, wanted - done);
-      return SQLITE_IOERR_SHORT_READ;
-    }
-    done += static_cast<size_t>(got);
-  }
-  return SQLITE_OK;
+  int got = 0;
+  const int code = ksi::sqlite_file::ReadAt(self.descriptor_, buffer, amount, offset, &got);
+  if (code != SQLITE_OK || got == amount) return code;
+  std::memset(bytes + got, 0, wanted - static_cast<size_t>(got));
+  return SQLITE_IOERR_SHORT_READ;
 }
 
 int PageFile::Write(sqlite3_file* file, const void* buffer, int amount, sqlite3_int64 offset) {
