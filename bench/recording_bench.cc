@@ -47,13 +47,13 @@ class Model {
     ksi::SortReadings(readings_);
   }
 
-  const std::vector<ksi::Reading>& Readings() const { return readings_; }
+  const std::vector<ksi::MomentReading>& Readings() const { return readings_; }
   size_t Figures() const { return figures_; }
 
   // The next moment; gives the number of figures that changed.
   size_t Step() {
     size_t changes = 0;
-    for (ksi::Reading& reading : readings_) {
+    for (ksi::MomentReading& reading : readings_) {
       if (IsSettled(reading)) continue;
       size_t place = 0;
       for (const ksi::RecordCell& cell : nodes_[reading.question.node].cells) {
@@ -72,7 +72,7 @@ class Model {
   }
 
  private:
-  static bool IsSettled(const ksi::Reading& reading) {
+  static bool IsSettled(const ksi::MomentReading& reading) {
     const uint16_t node =
         ksi::IdOf(*ksi::FindNode(ksi::RecordedNodes()[reading.question.node].path));
     return node == ksi::node::sched_groups_groupFlags ||
@@ -110,7 +110,7 @@ class Model {
     const ksi::Node& node = *ksi::FindNode(recorded.path);
     const ksi::Keying& keying = recorded.kind == ksi::Kind::kValue ? node.valueKeys : node.listKeys;
     for (int i = 0; i < CountOf(keying); ++i) {
-      ksi::Reading& reading = readings_.emplace_back();
+      ksi::MomentReading& reading = readings_.emplace_back();
       reading.question.node = place;
       for (size_t k = 0; k < keying.Count(); ++k) {
         const int number = k == 1 ? i % 3 : keying.Count() == 2 ? i / 3 : i;
@@ -186,7 +186,7 @@ class Model {
 
   const std::vector<ksi::RecordedNode>& nodes_ = ksi::RecordedNodes();
   std::mt19937_64 random_{1};
-  std::vector<ksi::Reading> readings_;
+  std::vector<ksi::MomentReading> readings_;
   size_t figures_ = 0;
 };
 

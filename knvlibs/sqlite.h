@@ -14,8 +14,9 @@
 
 namespace ksi {
 
+// Statements may live longer.
 struct CloseDatabase {
-  void operator()(sqlite3* database) const { sqlite3_close(database); }
+  void operator()(sqlite3* database) const { sqlite3_close_v2(database); }
 };
 using Database = std::unique_ptr<sqlite3, CloseDatabase>;
 

@@ -313,7 +313,7 @@ ChunkReader::View ChunkReader::At(size_t number) const {
   return view;
 }
 
-Status ChunkReader::ReadAll(std::vector<Reading>& readings) {
+Status ChunkReader::ReadAll(std::vector<MomentReading>& readings) {
   readings.clear();
   std::vector<size_t> numbers;
   for (uint32_t node = 0; node < nodes_.size(); ++node) {
@@ -321,7 +321,7 @@ Status ChunkReader::ReadAll(std::vector<Reading>& readings) {
     if (status != kOk) return status;
     for (const size_t number : numbers) {
       const View view = At(number);
-      Reading& reading = readings.emplace_back();
+      MomentReading& reading = readings.emplace_back();
       reading.question.node = node;
       for (size_t i = 0; i < kMaxKeys; ++i) reading.question.keys[i] = OwnOf(view.keys[i]);
       reading.answer.status = view.status;

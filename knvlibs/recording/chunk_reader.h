@@ -66,7 +66,7 @@ class ChunkReader {
   View At(size_t number) const;
 
   // All readings, in no certain order. Fails as Take.
-  [[nodiscard]] Status ReadAll(std::vector<Reading>& readings);
+  [[nodiscard]] Status ReadAll(std::vector<MomentReading>& readings);
 
  private:
   class Columns;

@@ -112,13 +112,13 @@ class ChunkWriter::Columns {
   uint64_t gap_ = 0;
 };
 
-void ChunkWriter::Add(const MomentFacts& facts, const std::vector<Reading>& readings) {
+void ChunkWriter::Add(const MomentFacts& facts, const std::vector<MomentReading>& readings) {
   Event event;
   event.facts = facts;
   std::vector<size_t> current;
   current.reserve(readings.size());
   auto old = current_.begin();
-  for (const Reading& reading : readings) {
+  for (const MomentReading& reading : readings) {
     for (; old != current_.end() && readings_[*old].reading.question < reading.question; ++old) {
       Go(*old, event);
     }
@@ -140,7 +140,7 @@ void ChunkWriter::Add(const MomentFacts& facts, const std::vector<Reading>& read
   moments_.push_back(std::move(event));
 }
 
-size_t ChunkWriter::Come(const Reading& reading, Event& event) {
+size_t ChunkWriter::Come(const MomentReading& reading, Event& event) {
   const size_t number = readings_.size();
   event.come.push_back(number);
   byNode_[reading.question.node].push_back(number);
@@ -241,7 +241,7 @@ Bytes ChunkWriter::EventsFrom(size_t from) const {
     out.Unsigned(event.come.size());
     int64_t number = 0;
     for (const size_t each : event.come) {
-      const Reading& reading = readings_[each].reading;
+      const MomentReading& reading = readings_[each].reading;
       out.Unsigned(reading.question.node);
       for (const OwnKey& key : reading.question.keys) PutEntry(key, number, out);
       out.Unsigned(reading.answer.status);

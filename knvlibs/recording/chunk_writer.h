@@ -23,7 +23,7 @@ class ChunkWriter {
   const MomentFacts& Last() const { return moments_.back().facts; }
 
   // Takes the next moment of the host, with its readings in the order of SortReadings.
-  void Add(const MomentFacts& facts, const std::vector<Reading>& readings);
+  void Add(const MomentFacts& facts, const std::vector<MomentReading>& readings);
 
   // The moments from `from` to the last as a part; from 0 on it starts the chunk.
   Bytes PartFrom(size_t from) const;
@@ -40,7 +40,7 @@ class ChunkWriter {
 
   // A reading of the chunk, with what happened to it, by moments.
   struct Tracked {
-    Reading reading;
+    MomentReading reading;
     Bytes first;           // the record that it came with
     size_t came = 0;       // the moment that it is there from
     size_t went = kStays;  // the first one that it is not there in
@@ -60,7 +60,7 @@ class ChunkWriter {
 
   class Columns;
 
-  size_t Come(const Reading& reading, Event& event);
+  size_t Come(const MomentReading& reading, Event& event);
   void Go(size_t number, Event& event);
   bool Compare(size_t number, const Answer& answer, Event& event);
   void CompareRecords(Tracked& tracked, const Bytes& record) const;

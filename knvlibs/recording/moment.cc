@@ -57,8 +57,10 @@ OwnKey OwnOf(const Key& key) {
   return std::string(key.text);
 }
 
-void SortReadings(std::vector<Reading>& readings) {
-  const auto before = [](const Reading& a, const Reading& b) { return a.question < b.question; };
+void SortReadings(std::vector<MomentReading>& readings) {
+  const auto before = [](const MomentReading& a, const MomentReading& b) {
+    return a.question < b.question;
+  };
   if (!std::ranges::is_sorted(readings, before)) std::ranges::sort(readings, before);
 }
 

@@ -67,11 +67,11 @@ struct Answer {
   friend bool operator==(const Answer&, const Answer&) = default;
 };
 
-struct Reading {
+struct MomentReading {
   Question question;
   Answer answer;
 
-  friend bool operator==(const Reading&, const Reading&) = default;
+  friend bool operator==(const MomentReading&, const MomentReading&) = default;
 };
 
 // Whose moments they are; those of one chunk have it in common.
@@ -102,11 +102,11 @@ struct MomentFacts {
 struct Moment {
   HostIdentity host;
   MomentFacts facts;
-  std::vector<Reading> readings;
+  std::vector<MomentReading> readings;
 };
 
 // Brings the readings into the order in which moments are kept: by node and then by keys.
-void SortReadings(std::vector<Reading>& readings);
+void SortReadings(std::vector<MomentReading>& readings);
 
 }  // namespace ksi
 

@@ -46,7 +46,12 @@ struct Clock {
     const time_t seconds = isUtc ? timegm(&wanted) : mktime(&wanted);
     // What is no date has become another one; clocks that are put forward leave out an hour only.
     if (wanted.tm_mday != parts.tm_mday || wanted.tm_mon != parts.tm_mon) return std::nullopt;
-    return int64_t{seconds} * kSecond + kSecond - 1;
+    int64_t time = 0;
+    if (__builtin_mul_overflow(int64_t{seconds}, kSecond, &time) ||
+        __builtin_add_overflow(time, kSecond - 1, &time)) {
+      return std::nullopt;
+    }
+    return time;
   }
 };
 

@@ -56,7 +56,7 @@ class RecordingTest : public Ksicache {
     const auto node =
         std::ranges::find(RecordedNodes(), "sched/groups/stats/memoryStats", &RecordedNode::path);
     for (int64_t group = 0; group < 8; ++group) {
-      Reading& reading = moment.readings.emplace_back();
+      MomentReading& reading = moment.readings.emplace_back();
       reading.question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
       reading.question.keys[0] = group;
       for (size_t i = 0; i < node->recordSize; ++i) {

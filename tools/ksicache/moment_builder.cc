@@ -39,7 +39,7 @@ ksi::Keys KeysOf(const ksi::Question& question, const ksi::Node& node, ksi::Kind
 }
 
 void PutReading(const ksi::RecordedNode& recorded, const ksi::Node& node,
-                const ksi::Reading& reading, ReadingSink& sink) {
+                const ksi::MomentReading& reading, ReadingSink& sink) {
   const ksi::Keys keys = KeysOf(reading.question, node, recorded.kind);
   const ksi::Answer& answer = reading.answer;
   if (answer.status != ksi::kOk) {
@@ -55,8 +55,9 @@ void PutReading(const ksi::RecordedNode& recorded, const ksi::Node& node,
 
 }  // namespace
 
-ksi::Reading& MomentBuilder::Add(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys) {
-  ksi::Reading& reading = readings_.emplace_back();
+ksi::MomentReading& MomentBuilder::Add(const ksi::Node& node, ksi::Kind kind,
+                                       const ksi::Keys& keys) {
+  ksi::MomentReading& reading = readings_.emplace_back();
   reading.question.node = PlaceOf(node, kind);
   for (size_t i = 0; i < keys.count; ++i) reading.question.keys[i] = ksi::OwnOf(keys[i]);
   return reading;
@@ -78,13 +79,13 @@ void MomentBuilder::AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi:
   Add(node, kind, keys).answer.status = status;
 }
 
-std::vector<ksi::Reading> MomentBuilder::Take() {
+std::vector<ksi::MomentReading> MomentBuilder::Take() {
   ksi::SortReadings(readings_);
   return std::exchange(readings_, {});
 }
 
 void PutReadings(const ksi::Moment& moment, ReadingSink& sink) {
-  for (const ksi::Reading& reading : moment.readings) {
+  for (const ksi::MomentReading& reading : moment.readings) {
     const ksi::RecordedNode& recorded = moment.host.nodes[reading.question.node];
     const ksi::Node* node = ksi::FindNode(recorded.path);
     if (node == nullptr ||

@@ -23,12 +23,12 @@ class MomentBuilder : public ReadingSink {
                   ksi::Status status) override;
 
   // What was added, in the order of SortReadings. Leaves nothing here.
-  std::vector<ksi::Reading> Take();
+  std::vector<ksi::MomentReading> Take();
 
  private:
-  ksi::Reading& Add(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys);
+  ksi::MomentReading& Add(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys);
 
-  std::vector<ksi::Reading> readings_;
+  std::vector<ksi::MomentReading> readings_;
 };
 
 // Gives the readings of a moment to a sink; fails with a DataError if they are of nodes that this

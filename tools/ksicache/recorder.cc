@@ -26,7 +26,7 @@ bool Recorder::Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& 
 }
 
 void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
-                   const std::vector<ksi::Reading>& readings) {
+                   const std::vector<ksi::MomentReading>& readings) {
   if (!Continues(host, facts)) Begin(host);
   // Until it is written, what the next one would differ from is not in the file.
   std::unique_ptr<ksi::ChunkWriter> chunk = std::move(chunk_);

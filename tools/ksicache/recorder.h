@@ -30,7 +30,7 @@ class Recorder {
   // Adds a moment, whose readings are in the order of SortReadings. Fails with an Error: then it is
   // not there, and a later one may be.
   void Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
-           const std::vector<ksi::Reading>& readings);
+           const std::vector<ksi::MomentReading>& readings);
 
   // Packs what has been added, if it is time, or anyway. Fail with an Error, and nothing is lost.
   void Tidy();

@@ -27,8 +27,8 @@ MomentFacts FactsOf(size_t i) {
           i % 2};
 }
 
-std::vector<Reading> ReadingsOf(ChunkReader& reader) {
-  std::vector<Reading> readings;
+std::vector<MomentReading> ReadingsOf(ChunkReader& reader) {
+  std::vector<MomentReading> readings;
   EXPECT_EQ(reader.ReadAll(readings), kOk);
   SortReadings(readings);
   return readings;
@@ -47,7 +47,7 @@ class ChunkTest : public testing::TestWithParam<uint32_t> {
     }
   }
 
-  std::vector<std::vector<Reading>> moments_;
+  std::vector<std::vector<MomentReading>> moments_;
   ChunkWriter writer_{Host()};
   std::vector<Bytes> singles_;  // of each moment its part
 };
@@ -104,7 +104,7 @@ TEST(ChunkReaderTest, APartThatIsDamagedIsRefused) {
     Bytes flipped = part;
     flipped[bit / 8] ^= std::byte{1} << bit % 8;
     ChunkReader reader;
-    std::vector<Reading> readings;
+    std::vector<MomentReading> readings;
     if (reader.Take(flipped) == kOk && reader.ReadAll(readings) == kOk) {
       // There are bits of a frame that say nothing of its content.
       EXPECT_EQ(reader.Facts(), FactsOf(4)) << bit;

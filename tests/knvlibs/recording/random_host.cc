@@ -12,13 +12,14 @@ const Node& CatalogueNode(uint32_t node) { return *FindNode(RecordedNodes()[node
 
 }  // namespace
 
-const std::vector<Reading>& RandomHost::Next() {
-  std::erase_if(readings_, [this](const Reading&) { return OneIn(40); });
-  for (Reading& reading : readings_) Change(reading);
+const std::vector<MomentReading>& RandomHost::Next() {
+  std::erase_if(readings_, [this](const MomentReading&) { return OneIn(40); });
+  for (MomentReading& reading : readings_) Change(reading);
   const size_t wanted = 20 + Below(60);
   while (readings_.size() < wanted) {
-    Reading reading = MakeReading(static_cast<uint32_t>(Below(RecordedNodes().size())));
-    if (std::ranges::find(readings_, reading.question, &Reading::question) == readings_.end()) {
+    MomentReading reading = MakeReading(static_cast<uint32_t>(Below(RecordedNodes().size())));
+    if (std::ranges::find(readings_, reading.question, &MomentReading::question) ==
+        readings_.end()) {
       readings_.push_back(std::move(reading));
     }
   }
@@ -34,11 +35,11 @@ OwnKey RandomHost::MakeKey(Instance instance) {
   return static_cast<int64_t>(number == 5 ? uint64_t{1} << 63 : number * 1000);
 }
 
-Reading RandomHost::MakeReading(uint32_t node) {
+MomentReading RandomHost::MakeReading(uint32_t node) {
   const Node& known = CatalogueNode(node);
   const RecordedNode& recorded = RecordedNodes()[node];
   const Keying& keying = recorded.kind == Kind::kValue ? known.valueKeys : known.listKeys;
-  Reading reading;
+  MomentReading reading;
   reading.question.node = node;
   for (size_t i = 0; i < kMaxKeys; ++i) reading.question.keys[i] = MakeKey(keying.at[i]);
   reading.answer.record.resize(recorded.recordSize);
@@ -46,7 +47,7 @@ Reading RandomHost::MakeReading(uint32_t node) {
   return reading;
 }
 
-void RandomHost::Change(Reading& reading) {
+void RandomHost::Change(MomentReading& reading) {
   const RecordedNode& node = RecordedNodes()[reading.question.node];
   Answer& answer = reading.answer;
   if (OneIn(30)) {

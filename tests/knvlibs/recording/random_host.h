@@ -18,20 +18,20 @@ class RandomHost {
   explicit RandomHost(uint32_t seed) : random_(seed) {}
 
   // The readings of the next moment, in their order.
-  const std::vector<Reading>& Next();
+  const std::vector<MomentReading>& Next();
 
  private:
   uint64_t Below(uint64_t bound) { return random_() % bound; }
   bool OneIn(uint64_t chance) { return Below(chance) == 0; }
 
-  Reading MakeReading(uint32_t node);
+  MomentReading MakeReading(uint32_t node);
   OwnKey MakeKey(Instance instance);
-  void Change(Reading& reading);
+  void Change(MomentReading& reading);
   void ChangeRecord(const RecordedNode& node, Bytes& record);
   void ChangeList(std::vector<OwnKey>& entries, bool isOfNumbers);
 
   std::mt19937_64 random_;
-  std::vector<Reading> readings_;
+  std::vector<MomentReading> readings_;
 };
 
 }  // namespace ksi
