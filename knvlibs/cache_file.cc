@@ -1,8 +1,6 @@
 #include "knvlibs/cache_file.h"
 
 #include <algorithm>
-#include <array>
-#include <ctime>
 #include <utility>
 
 #include <knvlibs/ksi_status.h>
@@ -36,15 +34,6 @@ const char* BadMember(const CacheFile::Capture& capture) {
   if (!IsDate(capture.taken)) return "taken";
   if (!IsPlain(capture.host)) return "host";
   return nullptr;
-}
-
-bool IsTime(const std::string& text) {
-  struct tm parts = {};
-  if (strptime(text.c_str(), cache::kTimeForm, &parts) == nullptr) return false;
-  timegm(&parts);  // makes the 30th of February the 2nd of March
-  std::array<char, 64> written = {};
-  static_cast<void>(strftime(written.data(), written.size(), cache::kTimeForm, &parts));
-  return text == written.data();
 }
 
 Status CacheFile::Open(const char* fileName, std::unique_ptr<CacheFile>* file, std::string* why) {

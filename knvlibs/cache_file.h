@@ -67,9 +67,6 @@ class CacheFile {
 // hexadecimal digits, dates have their 20 characters, and no text a NUL or more than kLongestText.
 const char* BadMember(const CacheFile::Capture& capture);
 
-// Whether it is a date and time that there is, such as "2026-11-21T10:00:00Z".
-bool IsTime(const std::string& text);
-
 }  // namespace ksi
 
 #endif  // KNVLIBS_CACHE_FILE_H_

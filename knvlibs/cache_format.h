@@ -62,9 +62,6 @@ constexpr std::string_view kList = "list";
 constexpr size_t kSignatureSize = 32;
 constexpr size_t kDateSize = KSI_BUILD_DATE_SIZE - 1;
 
-// When a capture was taken, for strftime(3) of UTC.
-constexpr const char* kTimeForm = "%Y-%m-%dT%H:%M:%SZ";
-
 // The longest key, entry or other text.
 constexpr size_t kLongestText = 4096;
 

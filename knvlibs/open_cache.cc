@@ -13,6 +13,7 @@
 #include "knvlibs/linux/host/text.h"
 #include "knvlibs/recording/moment_source.h"
 #include "knvlibs/recording/when.h"
+#include "knvlibs/times.h"
 
 namespace ksi {
 namespace {
@@ -41,15 +42,8 @@ Status NotInSpan(const std::string& when, const Span& span, std::string* why) {
   return KSI_STATUS_NOT_FOUND;
 }
 
-// The time that a capture was taken at.
-int64_t TimeOfCapture(const CacheFile& capture) {
-  struct tm parts = {};
-  static_cast<void>(strptime(capture.GetCapture().taken.c_str(), cache::kTimeForm, &parts));
-  return int64_t{timegm(&parts)} * 1'000'000;
-}
-
 Status CheckTime(const CacheFile& capture, const std::string& when, std::string* why) {
-  const int64_t taken = TimeOfCapture(capture);
+  const int64_t taken = TimeOfText(capture.GetCapture().taken).value_or(0);
   const Span span = {taken, taken};
   const std::optional<int64_t> time = TimeOf(when, span);
   if (!time) return NotATime(when, why);

@@ -56,18 +56,12 @@ constexpr size_t kMostMoments = 4096;
 // The bytes of the size of the first frame.
 constexpr size_t kPrefixSize = 4;
 
-constexpr size_t kWidestCell = 8;
-
 enum Stream { kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kMore, kStreams };
 
 inline uint64_t BitsOf(const RecordCell& cell, const Bytes& record) {
   uint64_t bits = 0;
   std::memcpy(&bits, record.data() + cell.offset, cell.width);
   return bits;
-}
-
-inline void PutBits(const RecordCell& cell, uint64_t bits, Bytes& record) {
-  std::memcpy(record.data() + cell.offset, &bits, cell.width);
 }
 
 // The bits as a number that is small where its amount is.

@@ -29,7 +29,7 @@ bool TakeCells(ByteReader& in, RecordedNode& node) {
   for (uint64_t i = 0; i < count && in.IsGood(); ++i) {
     const uint8_t written = in.Byte();
     const auto width = static_cast<uint8_t>(written / 2);
-    if (width == 0 || width > chunk::kWidestCell || at + width > node.recordSize) return false;
+    if (width == 0 || width > RecordCell::kWidest || at + width > node.recordSize) return false;
     node.cells.push_back({static_cast<uint16_t>(at), width, written % 2 == 1});
     at += width;
   }

@@ -5,12 +5,10 @@
 namespace ksi {
 namespace {
 
-constexpr size_t kWidestCell = 8;
-
 void AddRaw(size_t from, size_t to, std::vector<RecordCell>& cells) {
-  for (; from < to; from += kWidestCell) {
+  for (; from < to; from += RecordCell::kWidest) {
     cells.push_back({static_cast<uint16_t>(from),
-                     static_cast<uint8_t>(std::min(kWidestCell, to - from)), false});
+                     static_cast<uint8_t>(std::min(RecordCell::kWidest, to - from)), false});
   }
 }
 
@@ -45,6 +43,14 @@ std::vector<RecordedNode> NodesOfCatalogue() {
 const std::vector<RecordedNode>& RecordedNodes() {
   static const std::vector<RecordedNode> nodes = NodesOfCatalogue();
   return nodes;
+}
+
+NodePlaces::NodePlaces(std::span<const RecordedNode> nodes) {
+  for (auto& places : places_) places.assign(Catalogue().size(), kNowhere);
+  for (size_t i = 0; i < nodes.size(); ++i) {
+    const Node* node = FindNode(nodes[i].path);
+    if (node != nullptr) places_[static_cast<size_t>(nodes[i].kind)][IdOf(*node) - 1u] = i;
+  }
 }
 
 Key ViewOf(const OwnKey& key) {

@@ -21,6 +21,8 @@ namespace ksi {
 // A part of a record that changes by itself: a figure, or up to 8 bytes of a text or of what has no
 // known meaning.
 struct RecordCell {
+  static constexpr size_t kWidest = 8;
+
   uint16_t offset;
   uint8_t width;
   bool isFigure;
@@ -40,6 +42,22 @@ struct RecordedNode {
 
 // The nodes that this version records: the values and the lists of the catalogue.
 const std::vector<RecordedNode>& RecordedNodes();
+
+// The places of the catalogue's nodes among those of a recording.
+class NodePlaces {
+ public:
+  static constexpr size_t kNowhere = SIZE_MAX;
+
+  explicit NodePlaces(std::span<const RecordedNode> nodes);
+
+  // kNowhere if it is not among them.
+  size_t Of(const Node& node, Kind kind) const {
+    return places_[static_cast<size_t>(kind)][IdOf(node) - 1u];
+  }
+
+ private:
+  std::array<std::vector<size_t>, 2> places_;  // by kind
+};
 
 // A key, or an entry of a list.
 using OwnKey = std::variant<int64_t, std::string>;

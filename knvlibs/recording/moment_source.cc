@@ -11,8 +11,6 @@
 namespace ksi {
 namespace {
 
-constexpr size_t kNowhere = SIZE_MAX;
-
 constexpr Key kAbsent{KeyKind::kText, 0, {}};
 
 std::strong_ordering Compare(const Key& a, const Key& b) {
@@ -32,14 +30,8 @@ MomentSource::MomentSource(std::string fileName, ChunkReader moment)
     : fileName_(std::move(fileName)),
       moment_(std::move(moment)),
       walk_(moment_.Size()),
-      readings_(moment_.Host().nodes.size()) {
-  for (auto& places : places_) places.assign(Catalogue().size(), kNowhere);
-  for (size_t i = 0; i < readings_.size(); ++i) {
-    const RecordedNode& recorded = moment_.Host().nodes[i];
-    const Node* node = FindNode(recorded.path);
-    if (node != nullptr) places_[static_cast<size_t>(recorded.kind)][IdOf(*node) - 1u] = i;
-  }
-}
+      places_(moment_.Host().nodes),
+      readings_(moment_.Host().nodes.size()) {}
 
 Status MomentSource::Damaged(const Node& node) {
   if (!std::exchange(told_, true)) {
@@ -51,8 +43,8 @@ Status MomentSource::Damaged(const Node& node) {
 
 // The reading of a node's value or list; one that failed fails again.
 Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, ChunkReader::View& view) {
-  const size_t place = places_[static_cast<size_t>(kind)][IdOf(node) - 1u];
-  if (place == kNowhere) return KSI_STATUS_NOT_FOUND;
+  const size_t place = places_.Of(node, kind);
+  if (place == NodePlaces::kNowhere) return KSI_STATUS_NOT_FOUND;
   std::optional<std::vector<size_t>>& readings = readings_[place];
   const auto keysOf = [this](size_t number) { return moment_.At(number).keys; };
   const auto before = [](const auto& a, const auto& b) { return std::is_lt(Compare(a, b)); };

@@ -37,9 +37,8 @@ class MomentSource : public Source {
   ChunkReader moment_;
   ListWalk walk_;
   bool told_ = false;
-  // The places that the nodes of the catalogue have among those of the moment, by kind.
-  std::array<std::vector<size_t>, 2> places_;
-  // Of each of those nodes the readings by their keys, once they have been asked for.
+  NodePlaces places_;
+  // Of each node of the moment the readings by their keys, once they have been asked for.
   std::vector<std::optional<std::vector<size_t>>> readings_;
 };
 

@@ -1,9 +1,7 @@
 #include "knvlibs/recording/recording_file.h"
 
 #include <algorithm>
-#include <array>
 #include <cstring>
-#include <ctime>
 #include <tuple>
 #include <utility>
 
@@ -11,6 +9,7 @@
 #include "knvlibs/cache_format.h"
 #include "knvlibs/recording/chunk.h"
 #include "knvlibs/recording/chunk_reader.h"
+#include "knvlibs/times.h"
 
 namespace ksi {
 namespace {
@@ -211,15 +210,6 @@ Status RecordingFile::FindMoment(int64_t time, int64_t& number) {
       std::ranges::find_if(facts, [time](const MomentFacts& each) { return each.taken > time; });
   number = part->number + (after - facts.begin()) - 1;
   return kOk;
-}
-
-std::string TextOfTime(int64_t time) {
-  constexpr int64_t kSecond = 1'000'000;
-  const time_t seconds = time / kSecond - (time % kSecond < 0 ? 1 : 0);
-  struct tm parts = {};
-  std::array<char, 64> text = {};
-  if (gmtime_r(&seconds, &parts) == nullptr) return std::to_string(time);
-  return {text.data(), strftime(text.data(), text.size(), cache::kTimeForm, &parts)};
 }
 
 }  // namespace ksi

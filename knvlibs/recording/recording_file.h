@@ -95,9 +95,6 @@ class RecordingFile {
   Statement block_;
 };
 
-// "2026-11-21T10:05:30Z" of a time in us since 1970.
-std::string TextOfTime(int64_t time);
-
 }  // namespace ksi
 
 #endif  // KNVLIBS_RECORDING_RECORDING_FILE_H_

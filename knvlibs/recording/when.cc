@@ -5,13 +5,10 @@
 #include <ctime>
 #include <initializer_list>
 
+#include "knvlibs/times.h"
+
 namespace ksi {
 namespace {
-
-constexpr int64_t kSecond = 1'000'000;
-constexpr int64_t kMinute = 60 * kSecond;
-constexpr int64_t kHour = 60 * kMinute;
-constexpr int64_t kDay = 24 * kHour;
 
 // Reads a pattern: a digit for each '#', else the character itself. The numbers are those of each
 // run of digits.
@@ -93,7 +90,7 @@ std::optional<int64_t> LatestOf(Clock clock, int64_t last) {
   const std::optional<int64_t> time = clock.Time();
   if (!time || *time - (kSecond - 1) <= last) return time;
   // The day before, by its noon, which every day has.
-  const time_t noon = seconds - (int64_t{day.tm_hour} + 12) * 3600;
+  const time_t noon = seconds - (int64_t{day.tm_hour} + 12) * (kHour / kSecond);
   if ((clock.isUtc ? gmtime_r(&noon, &day) : localtime_r(&noon, &day)) == nullptr) {
     return std::nullopt;
   }

@@ -18,6 +18,7 @@
 
 #include <knvlibs/ksi_status.h>
 #include "knvlibs/recording/frame.h"
+#include "knvlibs/times.h"
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/recording_fixture.h"
 #include "tests/ksicache/write_log.h"

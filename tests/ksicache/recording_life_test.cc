@@ -20,6 +20,7 @@
 #include <vector>
 
 #include <knvlibs/ksi_status.h>
+#include "knvlibs/times.h"
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/recording_fixture.h"
 #include "tools/ksicache/error.h"

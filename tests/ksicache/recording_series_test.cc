@@ -10,6 +10,7 @@
 #include <string>
 #include <vector>
 
+#include "knvlibs/times.h"
 #include "tests/harness/report_names.h"
 #include "tests/harness/tally.h"
 #include "tests/ksicache/recording_fixture.h"

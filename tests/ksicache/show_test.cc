@@ -41,6 +41,14 @@ TEST_F(Ksicache, InfoTellsWhatAFileIs) {
             std::string::npos);
 }
 
+TEST_F(Ksicache, InfoTellsTheSizeOfACaptureAskedForByItsTime) {
+  WriteSmallHost(Path("host.ksi"));
+  const std::string all = Output({"info", Path("host.ksi")});
+  const std::string head = "file       " + Path("host.ksi");
+  ASSERT_TRUE(all.starts_with(head + "\n"));
+  EXPECT_EQ(Output({"info", Path("host.ksi@last")}), head + "@last" + all.substr(head.size()));
+}
+
 TEST_F(Ksicache, InfoTellsFailedReadsApart) {
   WriteSmallHost(Path("host.ksi"));
   const std::string update = "UPDATE reading SET answer = NULL, status = ";

@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <csignal>
 
+#include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
@@ -25,8 +26,7 @@ Alarm::Alarm() {
 }
 
 Alarm::Event Alarm::WaitUntil(int64_t time) {
-  constexpr int64_t kSecond = 1'000'000;
-  const struct itimerspec due = {{0, 0}, {time / kSecond, time % kSecond * 1000}};
+  const struct itimerspec due = {{0, 0}, {time / ksi::kSecond, time % ksi::kSecond * 1000}};
   if (timerfd_settime(timer_.Get(), TFD_TIMER_ABSTIME | TFD_TIMER_CANCEL_ON_SET, &due, nullptr) !=
       0) {
     throw SystemError("a timer", errno);

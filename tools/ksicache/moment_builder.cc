@@ -1,7 +1,6 @@
 #include "tools/ksicache/moment_builder.h"
 
 #include <algorithm>
-#include <array>
 #include <utility>
 
 #include "tools/ksicache/error.h"
@@ -9,20 +8,21 @@
 namespace ksicache {
 namespace {
 
-// The places of the catalogue's nodes among those that are recorded, by kind.
-std::array<std::vector<uint32_t>, 2> MakePlaces() {
-  std::array<std::vector<uint32_t>, 2> places;
-  for (auto& each : places) each.resize(ksi::Catalogue().size());
-  const std::vector<ksi::RecordedNode>& nodes = ksi::RecordedNodes();
-  for (uint32_t i = 0; i < nodes.size(); ++i) {
-    places[static_cast<size_t>(nodes[i].kind)][ksi::IdOf(*ksi::FindNode(nodes[i].path)) - 1u] = i;
-  }
-  return places;
+uint32_t PlaceOf(const ksi::Node& node, ksi::Kind kind) {
+  static const ksi::NodePlaces places(ksi::RecordedNodes());
+  return static_cast<uint32_t>(places.Of(node, kind));
 }
 
-uint32_t PlaceOf(const ksi::Node& node, ksi::Kind kind) {
-  static const std::array<std::vector<uint32_t>, 2> places = MakePlaces();
-  return places[static_cast<size_t>(kind)][ksi::IdOf(node) - 1u];
+// The recorded nodes as those of the catalogue.
+std::vector<const ksi::Node*> NodesOf(const std::vector<ksi::RecordedNode>& recorded) {
+  std::vector<const ksi::Node*> nodes;
+  for (const ksi::RecordedNode& each : recorded) {
+    const ksi::Node* node = ksi::FindNode(each.path);
+    const bool isSame = node != nullptr &&
+                        each.recordSize == (each.kind == ksi::Kind::kValue ? node->recordSize : 0);
+    nodes.push_back(isSame ? node : nullptr);
+  }
+  return nodes;
 }
 
 // The keys that a question has, as many as its node takes.
@@ -85,11 +85,11 @@ std::vector<ksi::MomentReading> MomentBuilder::Take() {
 }
 
 void PutReadings(const ksi::Moment& moment, ReadingSink& sink) {
+  const std::vector<const ksi::Node*> nodes = NodesOf(moment.host.nodes);
   for (const ksi::MomentReading& reading : moment.readings) {
     const ksi::RecordedNode& recorded = moment.host.nodes[reading.question.node];
-    const ksi::Node* node = ksi::FindNode(recorded.path);
-    if (node == nullptr ||
-        recorded.recordSize != (recorded.kind == ksi::Kind::kValue ? node->recordSize : 0)) {
+    const ksi::Node* node = nodes[reading.question.node];
+    if (node == nullptr) {
       throw DataError("its node " + Cut(recorded.path) + " is not of this version");
     }
     PutReading(recorded, *node, reading, sink);

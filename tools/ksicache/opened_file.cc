@@ -10,7 +10,7 @@
 
 #include <knvlibs/ksi_status.h>
 #include "knvlibs/open_cache.h"
-#include "knvlibs/recording/when.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/failures.h"
@@ -165,14 +165,18 @@ ksi::Moment ReadMoment(const std::string& name) {
   return WholeOf(moment);
 }
 
+int64_t TakenOf(const ksi::CacheFile& capture) {
+  const std::string& text = capture.GetCapture().taken;
+  const std::optional<int64_t> taken = ksi::TimeOfText(text);
+  if (!taken) throw DataError("damaged: taken " + text + " is no date and time");
+  return *taken;
+}
+
 ksi::Moment MomentOf(const ksi::CacheFile& capture) {
   const ksi::CacheFile::Capture& head = capture.GetCapture();
-  const std::optional<int64_t> taken = ksi::TimeOf(head.taken, {0, 0});
-  if (!taken) throw DataError("damaged: taken " + head.taken + " is no date and time");
   ksi::Moment moment;
   moment.host = {head.signature, head.built, head.host, "", ksi::RecordedNodes()};
-  // A time is the end of its second.
-  moment.facts.taken = *taken / 1'000'000 * 1'000'000;
+  moment.facts.taken = TakenOf(capture);
   MomentBuilder builder;
   InstanceWalk instances(capture);
   ForEachReading(capture, [&](const Reading& reading) {

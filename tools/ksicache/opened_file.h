@@ -41,6 +41,9 @@ std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName);
 // One moment of a recording.
 ksi::Moment ReadMoment(const std::string& name);
 
+// When a capture was taken, us since 1970.
+int64_t TakenOf(const ksi::CacheFile& capture);
+
 // A capture as a moment.
 ksi::Moment MomentOf(const ksi::CacheFile& capture);
 

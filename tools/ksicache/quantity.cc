@@ -5,6 +5,7 @@
 #include <span>
 #include <string_view>
 
+#include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
@@ -15,12 +16,11 @@ struct Unit {
   int64_t size;
 };
 
-constexpr int64_t kSecond = 1'000'000;
-constexpr Unit kTimes[] = {{"", kSecond},
-                           {"s", kSecond},
-                           {"m", 60 * kSecond},
-                           {"h", 3600 * kSecond},
-                           {"d", 86400 * kSecond}};
+constexpr Unit kTimes[] = {{"", ksi::kSecond},
+                           {"s", ksi::kSecond},
+                           {"m", ksi::kMinute},
+                           {"h", ksi::kHour},
+                           {"d", ksi::kDay}};
 constexpr Unit kSizes[] = {
     {"", 1}, {"K", 1 << 10}, {"M", 1 << 20}, {"G", 1 << 30}, {"T", int64_t{1} << 40}};
 constexpr Unit kOne[] = {{"", 1}};

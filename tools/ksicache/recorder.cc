@@ -13,6 +13,14 @@ namespace {
 // So much is packed at once, whatever the number of moments: it is held in memory.
 constexpr size_t kMostBytes = size_t{4} << 20;
 
+ksi::Bytes PartOf(const ksi::ChunkWriter& chunk, size_t first) {
+  try {
+    return chunk.PartFrom(first);
+  } catch (const std::length_error& error) {
+    throw Error(std::string("a moment of this host is ") + error.what());
+  }
+}
+
 }  // namespace
 
 Recorder::Recorder(RecordingStore& store) : store_(store) {
@@ -32,12 +40,7 @@ void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
   std::unique_ptr<ksi::ChunkWriter> chunk = std::move(chunk_);
   const size_t place = chunk->Count();
   chunk->Add(facts, readings);
-  ksi::Bytes content;
-  try {
-    content = chunk->PartFrom(place);
-  } catch (const std::length_error& error) {
-    throw Error(std::string("a moment of this host is ") + error.what());
-  }
+  const ksi::Bytes content = PartOf(*chunk, place);
   store_.Add({0, 1, next_, chunkNumber_, facts.taken, facts.taken, 0, 0}, content);
   ++next_;
   bytes_ += content.size();
@@ -67,7 +70,7 @@ void Recorder::Pack() {
   const auto count = static_cast<int64_t>(chunk_->Count() - packed_);
   store_.Replace({0, count, chunkNumber_ + static_cast<int64_t>(packed_), chunkNumber_,
                   chunk_->At(packed_).taken, chunk_->Last().taken, 0, 0},
-                 chunk_->PartFrom(packed_));
+                 PartOf(*chunk_, packed_));
   packed_ = chunk_->Count();
   bytes_ = 0;
 }

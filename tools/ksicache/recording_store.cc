@@ -35,7 +35,8 @@ constexpr int64_t kBlockOnDisk = 4700;
 constexpr const char* kAddPart =
     "INSERT INTO part VALUES(NULL, 0, 140737488355327, 140737488355327, 9223372036854775807, "
     "9223372036854775807, 140737488355327, 140737488355327)";
-constexpr const char* kAddBlock = "INSERT INTO block VALUES(NULL, zeroblob(?1))";
+const std::string kAddBlock =
+    "INSERT INTO block VALUES(NULL, zeroblob(" + std::to_string(kBlockSize) + "))";
 constexpr const char* kSetPart =
     "UPDATE part SET moments = ?2, number = ?3, chunk = ?4, first = ?5, last = ?6, size = ?7, "
     "block = ?8 WHERE id = ?1";
@@ -58,12 +59,9 @@ struct CloseBlob {
   void operator()(sqlite3_blob* blob) const { sqlite3_blob_close(blob); }
 };
 
-[[nodiscard]] bool AddRows(sqlite3* database, const char* sql, size_t count) {
+[[nodiscard]] bool AddRows(sqlite3* database, const std::string& sql, size_t count) {
   ksi::Statement insert;
-  int code = insert.Prepare(database, sql);
-  if (code == SQLITE_OK && sql == kAddBlock) {
-    code = insert.Bind(1, static_cast<int64_t>(kBlockSize));
-  }
+  int code = insert.Prepare(database, sql.c_str());
   for (size_t i = 0; i < count && (code == SQLITE_OK || code == SQLITE_DONE); ++i) {
     code = insert.Step();
     insert.Reset();
@@ -144,10 +142,8 @@ void RecordingStore::TellWhose() {
   static_cast<void>(fcntl(file_.Get(), F_SETLK, &lock));
 }
 
-// What there is in the file, and what is free in it.
-void RecordingStore::TakeStock() {
+std::unique_ptr<ksi::RecordingFile> RecordingStore::Read() const {
   auto opened = std::make_unique<ksi::CacheDatabase>();
-  // By what is open: another file may have its name.
   ksi::Status status = opened->Open(("/proc/self/fd/" + std::to_string(file_.Get())).c_str());
   std::string why = opened->Why();
   std::unique_ptr<ksi::RecordingFile> recording;
@@ -156,16 +152,24 @@ void RecordingStore::TakeStock() {
   if (status != ksi::kOk) {
     throw DataError(name_ + ": " + (why.empty() ? StatusText(status) : "damaged: " + why));
   }
+  return recording;
+}
+
+// What there is in the file, and what is free in it.
+void RecordingStore::TakeStock() {
+  std::unique_ptr<ksi::RecordingFile> recording = Read();
   parts_ = recording->Parts();
   replaced_.clear();
   blocksOf_.clear();
+  std::unordered_set<int64_t> chosen;
+  for (const Part& part : parts_) chosen.insert(part.id);
   std::unordered_set<int64_t> used;
   for (const Part& row : recording->Rows()) {
     std::vector<int64_t>& blocks = blocksOf_[row.id];
     // Those of a damaged part that are found; the others nobody finds.
     static_cast<void>(recording->ReadBlocks(row, blocks));
     used.insert(blocks.begin(), blocks.end());
-    if (std::ranges::find(parts_, row.id, &Part::id) == parts_.end()) replaced_.push_back(row);
+    if (!chosen.contains(row.id)) replaced_.push_back(row);
   }
   recording.reset();
   TellWhose();

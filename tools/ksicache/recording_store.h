@@ -53,8 +53,11 @@ class RecordingStore {
   // Brings all to the disk.
   void Sync();
 
+  // The file, to read what it holds; by what is open, for another file may have its name.
+  std::unique_ptr<ksi::RecordingFile> Read() const;
+
   // Lets others know which process this is. They do not any more once this process has closed any
-  // descriptor of the file.
+  // descriptor of the file, as whoever has read it has.
   void TellWhose();
 
   int64_t Size() const;

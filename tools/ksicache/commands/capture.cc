@@ -1,12 +1,11 @@
 // capture: records a host, whatever libknvlibs.so answers of it.
 #include <unistd.h>
 
-#include <array>
 #include <ctime>
 #include <string>
 #include <string_view>
 
-#include "knvlibs/cache_format.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diagnostics.h"
@@ -21,14 +20,6 @@ namespace ksicache {
 namespace {
 
 constexpr const Option* kOptions[] = {&kForce, &kMode, &kRoot};
-
-std::string Now() {
-  const time_t now = time(nullptr);
-  struct tm parts = {};
-  gmtime_r(&now, &parts);
-  std::array<char, 32> text;
-  return {text.data(), strftime(text.data(), text.size(), ksi::cache::kTimeForm, &parts)};
-}
 
 // The lines on what was captured; on standard error if the file itself is on standard output.
 class Account {
@@ -79,7 +70,7 @@ int Capture(const CommandLine& line) {
   CacheWriter writer(fileName, line.Has(kForce), mode);
   Diagnostics diagnostics;
   HostLibrary library(root);
-  const std::string taken = Now();
+  const std::string taken = ksi::TextOfTime(ksi::ReadClock(CLOCK_REALTIME));
   HostWalk walk(library, writer);
   walk.Run(true);
   diagnostics.Say();

@@ -8,6 +8,7 @@
 
 #include "knvlibs/cache_format.h"
 #include "knvlibs/node_table.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/group_tree.h"
@@ -62,7 +63,7 @@ class Checker {
 
   void CheckCapture() {
     const std::string& taken = file_.GetCapture().taken;
-    if (!ksi::IsTime(taken)) Report("taken " + taken + " is no date and time");
+    if (!ksi::TimeOfText(taken)) Report("taken " + taken + " is no date and time");
     const std::string& signature = file_.GetCapture().signature;
     if (signature != ksi::kDefinitions.signature) {
       Report("signature " + signature + " is not " + std::string(ksi::kDefinitions.signature) +

@@ -1,11 +1,9 @@
 // info: what cache files are, in a few lines each.
-#include <sys/stat.h>
-
-#include <cerrno>
 #include <limits>
 #include <utility>
 
 #include "knvlibs/cache_format.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/failures.h"
@@ -44,12 +42,6 @@ Contents ContentsOf(const ksi::CacheFile& file) {
   return contents;
 }
 
-int64_t SizeOf(const std::string& fileName) {
-  struct stat status = {};
-  if (stat(fileName.c_str(), &status) != 0) throw SystemError(fileName, errno);
-  return status.st_size;
-}
-
 void PrintDefinitions(const std::string& built, const std::string& signature) {
   const bool own = signature == ksi::kDefinitions.signature;
   PrintLine("built      " + built);
@@ -63,7 +55,7 @@ void PrintCapture(const OpenedFile& opened, const std::string& fileName) {
   PrintLine("host       " + capture.host);
   PrintLine("taken      " + capture.taken);
   if (!opened.IsMoment()) {
-    PrintLine("size       " + std::to_string(SizeOf(fileName)) + " bytes, schema " +
+    PrintLine("size       " + std::to_string(opened.File().Size()) + " bytes, schema " +
               std::to_string(ksi::cache::kSchemaVersion));
   }
   PrintDefinitions(capture.built, capture.signature);
@@ -92,7 +84,7 @@ void PrintRecording(ksi::RecordingFile& recording, const std::string& fileName) 
   PrintLine("moments    " + std::to_string(moments) + ", in " + std::to_string(parts.size()) +
             " parts of " + std::to_string(chunks) + " chunks, with " + std::to_string(bytes) +
             " bytes");
-  PrintLine("size       " + std::to_string(SizeOf(fileName)) + " bytes, schema " +
+  PrintLine("size       " + std::to_string(recording.Size()) + " bytes, schema " +
             std::to_string(ksi::cache::kRecordingVersion));
   if (!parts.empty()) PrintDefinitions(host.built, host.signature);
 }

@@ -8,7 +8,6 @@
 #include <limits>
 #include <memory>
 #include <string>
-#include <tuple>
 #include <vector>
 
 #include "tools/ksicache/commands/commands.h"
@@ -75,7 +74,7 @@ class Inputs {
     const std::string& name = names_[file];
     recordings_.emplace_back();
     if (!IsRecording(name)) {
-      places_.push_back({MomentOf(OpenedFile(name).File()).facts.taken, file, 0});
+      places_.push_back({TakenOf(OpenedFile(name).File()), file, 0});
       return;
     }
     recordings_.back() = OpenRecording(name);

@@ -10,6 +10,7 @@
 
 #include "knvlibs/cache_format.h"
 #include "knvlibs/source.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
@@ -182,7 +183,7 @@ ksi::CacheFile::Capture TakeHead(const Json& document) {
   if (const char* bad = ksi::BadMember(capture)) {
     throw DataError(std::string(bad) + ": is not as it is in a cache file");
   }
-  if (!ksi::IsTime(capture.taken)) throw DataError("taken: is no date and time");
+  if (!ksi::TimeOfText(capture.taken)) throw DataError("taken: is no date and time");
   return capture;
 }
 

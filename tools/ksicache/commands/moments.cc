@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "knvlibs/recording/recording_file.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/opened_file.h"
@@ -15,15 +16,13 @@
 namespace ksicache {
 namespace {
 
-constexpr int64_t kSecond = 1'000'000;
-
 // "1d 02:03:04" or "02:03:04"
 std::string SpanText(int64_t time) {
-  const int64_t seconds = time / kSecond;
+  const int64_t days = time / ksi::kDay;
   char text[64];
-  const int days = static_cast<int>(seconds / 86400);
-  const int size = std::snprintf(text, sizeof text, "%02" PRId64 ":%02" PRId64 ":%02" PRId64,
-                                 seconds / 3600 % 24, seconds / 60 % 60, seconds % 60);
+  const int size =
+      std::snprintf(text, sizeof text, "%02" PRId64 ":%02" PRId64 ":%02" PRId64,
+                    time / ksi::kHour % 24, time / ksi::kMinute % 60, time / ksi::kSecond % 60);
   const std::string clock(text, static_cast<size_t>(size));
   return days == 0 ? clock : std::to_string(days) + "d " + clock;
 }
@@ -89,8 +88,8 @@ class Lister {
       } else if (last_.uptime != 0 && facts.uptime != 0) {
         // How far the clock on the wall went beyond the other.
         const int64_t step = (facts.taken - last_.taken) - (facts.uptime - last_.uptime);
-        if (step > kSecond) add("clock put forward by " + SpanText(step));
-        if (step < -kSecond) add("clock set back by " + SpanText(-step));
+        if (step > ksi::kSecond) add("clock put forward by " + SpanText(step));
+        if (step < -ksi::kSecond) add("clock set back by " + SpanText(-step));
       }
     }
     if (facts.skipped != 0) add(std::to_string(facts.skipped) + " skipped before");

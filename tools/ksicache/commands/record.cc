@@ -1,13 +1,13 @@
 // record: takes a moment of this host again and again, into one file.
 #include <sys/stat.h>
 
-#include <array>
 #include <ctime>
 #include <map>
+#include <memory>
 #include <new>
 #include <string>
 
-#include "knvlibs/open_cache.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/alarm.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diagnostics.h"
@@ -29,23 +29,13 @@ constexpr Option kMaxSize = {"max-size", "SIZE", "let FILE grow to SIZE instead 
 constexpr Option kCount = {"count", "N", "end after N moments"};
 constexpr const Option* kOptions[] = {&kEvery, &kKeep, &kMaxSize, &kCount, &kMode, &kRoot};
 
-constexpr int64_t kSecond = 1'000'000;
-constexpr int64_t kHour = 3600 * kSecond;
-constexpr int64_t kDay = 24 * kHour;
-
 // A loss of power takes what was recorded since the last of these.
-constexpr int64_t kSyncEvery = 60 * kSecond;
+constexpr int64_t kSyncEvery = ksi::kMinute;
 
 // What is the same again and again is said so often.
-constexpr int64_t kSayEvery = kHour;
+constexpr int64_t kSayEvery = ksi::kHour;
 
-int64_t TimeOf(clockid_t clock) {
-  struct timespec now = {};
-  clock_gettime(clock, &now);
-  return int64_t{now.tv_sec} * kSecond + now.tv_nsec / 1000;
-}
-
-int64_t Now() { return TimeOf(CLOCK_REALTIME); }
+int64_t Now() { return ksi::ReadClock(CLOCK_REALTIME); }
 
 // What is said again and again.
 class Log {
@@ -71,7 +61,7 @@ class Log {
 class HourlyAccount {
  public:
   void Add(const std::string& fileName, const ksi::MomentFacts& facts, int64_t size) {
-    if (moments_ != 0 && facts.taken / kHour != from_ / kHour) {
+    if (moments_ != 0 && facts.taken / ksi::kHour != from_ / ksi::kHour) {
       Tell(fileName, size);
       *this = {};
     }
@@ -107,7 +97,8 @@ struct Plan {
 };
 
 Plan PlanOf(const CommandLine& line) {
-  const Plan plan = {DurationOf(line, kEvery, 5 * kSecond), DurationOf(line, kKeep, 7 * kDay),
+  const Plan plan = {DurationOf(line, kEvery, 5 * ksi::kSecond),
+                     DurationOf(line, kKeep, 7 * ksi::kDay),
                      SizeOf(line, kMaxSize, int64_t{2} << 30), CountOf(line, kCount, 0)};
   if (plan.maxSize < RecordingStore::kSmallestFile) {
     throw UsageError("--max-size is at least " +
@@ -125,15 +116,10 @@ class Recording {
         store_(fileName, plan.maxSize),
         recorder_(store_),
         sampler_(root) {
-    ksi::OpenedCache opened;
-    std::string why;
-    const ksi::Status status = ksi::OpenCache(fileName, &opened, &why);
-    if (status == ksi::kOk && opened.recording != nullptr) {
-      TellOtherHost(*opened.recording, host);
-      Adopt(*opened.recording);
+    if (!store_.Parts().empty()) {
+      GoOn(host);
+      store_.TellWhose();
     }
-    opened = {};
-    store_.TellWhose();
     synced_ = Now();
   }
 
@@ -154,6 +140,12 @@ class Recording {
   }
 
  private:
+  void GoOn(const std::string& host) {
+    const std::unique_ptr<ksi::RecordingFile> recording = store_.Read();
+    TellOtherHost(*recording, host);
+    Adopt(*recording);
+  }
+
   // Hosts are given other names, and files other hosts.
   void TellOtherHost(ksi::RecordingFile& recording, const std::string& host) const {
     ksi::HostIdentity last;
@@ -172,7 +164,7 @@ class Recording {
   // What was due while the last one was taken is left out, and not taken late. A clock that was set
   // leaves nothing out.
   void CountSkipped() {
-    const int64_t now = TimeOf(CLOCK_BOOTTIME);
+    const int64_t now = ksi::ReadClock(CLOCK_BOOTTIME);
     const int64_t ticks = (now - last_ + plan_.every / 2) / plan_.every;
     if (last_ != 0 && ticks > 1) skipped_ += static_cast<uint64_t>(ticks - 1);
     last_ = now;
@@ -271,8 +263,8 @@ int Record(const CommandLine& line) {
     NewFile(fileName, false, ModeOf(line)).Commit(RecordingStore::Empty(host));
   }
   Recording recording(fileName, plan, root, host);
-  PrintLine(fileName + ": recording " + host + " every " + std::to_string(plan.every / kSecond) +
-            " s");
+  PrintLine(fileName + ": recording " + host + " every " +
+            std::to_string(plan.every / ksi::kSecond) + " s");
   FlushOutput();
   return recording.Run();
 }

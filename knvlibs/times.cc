@@ -1,0 +1,37 @@
+#include "knvlibs/times.h"
+
+#include <array>
+
+namespace ksi {
+namespace {
+
+constexpr const char* kForm = "%Y-%m-%dT%H:%M:%SZ";
+
+std::string TextOf(const struct tm& parts) {
+  std::array<char, 64> text = {};
+  return {text.data(), strftime(text.data(), text.size(), kForm, &parts)};
+}
+
+}  // namespace
+
+int64_t ReadClock(clockid_t clock) {
+  struct timespec now = {};
+  clock_gettime(clock, &now);
+  return int64_t{now.tv_sec} * kSecond + now.tv_nsec / 1000;
+}
+
+std::string TextOfTime(int64_t time) {
+  const time_t seconds = time / kSecond - (time % kSecond < 0 ? 1 : 0);
+  struct tm parts = {};
+  return gmtime_r(&seconds, &parts) == nullptr ? std::to_string(time) : TextOf(parts);
+}
+
+std::optional<int64_t> TimeOfText(const std::string& text) {
+  struct tm parts = {};
+  if (strptime(text.c_str(), kForm, &parts) == nullptr) return std::nullopt;
+  const time_t seconds = timegm(&parts);  // makes the 30th of February the 2nd of March
+  if (TextOf(parts) != text) return std::nullopt;
+  return int64_t{seconds} * kSecond;
+}
+
+}  // namespace ksi
