@@ -27,6 +27,7 @@
 #include "knvlibs/node_table.h"
 #include "knvlibs/open_cache.h"
 #include "knvlibs/recording/moment.h"
+#include "knvlibs/times.h"
 #include "tools/ksicache/cache_writer.h"
 #include "tools/ksicache/moment_builder.h"
 #include "tools/ksicache/opened_file.h"

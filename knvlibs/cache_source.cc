@@ -7,6 +7,7 @@
 #include <knvlibs/ksi.h>
 #include "knvlibs/cache_format.h"
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/times.h"
 
 namespace ksi {
 namespace {
@@ -201,6 +202,11 @@ Status CacheSource::TakeEntry(const Node& node, ParamList& instances) {
 Definitions CacheSource::KernelDefinitions() const {
   const CacheFile::Capture& capture = file_->GetCapture();
   return {capture.signature, capture.built};
+}
+
+std::optional<Source::Origin> CacheSource::GetOrigin() const {
+  const CacheFile::Capture& capture = file_->GetCapture();
+  return Origin{capture.host, TimeOfText(capture.taken).value_or(0)};
 }
 
 // The reading of a node's value or list; one that failed when it was captured fails again.

@@ -35,6 +35,7 @@ class CacheSource : public Source {
   void Refresh() override { walk_.Restart(); }
   [[nodiscard]] Status WalkStatus() const override { return walk_.WalkStatus(); }
   Definitions KernelDefinitions() const override;
+  std::optional<Origin> GetOrigin() const override;
 
  private:
   struct Reading {

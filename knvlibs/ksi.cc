@@ -243,6 +243,24 @@ uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source, uint16_t node
   return ksi::Guarded([&] { return ksi::GetInstanceListAlloc(source, node, keys, 0, list); });
 }
 
+uint32_t KSI_SourceOrigin(struct KSI_Source* source, int64_t* taken, char* host, size_t size) {
+  return ksi::Guarded([&]() -> ksi::Status {
+    if (taken == nullptr || (host != nullptr && size == 0)) return KSI_STATUS_BAD_PARAM;
+    const auto origin =
+        ksi::SourceOf(source).Ask([](const ksi::Source& asked) { return asked.GetOrigin(); });
+    if (!origin) return KSI_STATUS_NOT_FOUND;
+    *taken = origin->taken;
+    if (host != nullptr) Str_Strcpy(host, origin->host.c_str(), size);
+    return ksi::kOk;
+  });
+}
+
+uint32_t KSI_SourceNextMoment(struct KSI_Source* source) {
+  return ksi::Guarded([&] {
+    return ksi::SourceOf(source).Ask([](ksi::Source& asked) { return asked.NextMoment(); });
+  });
+}
+
 uint32_t KSI_SourceWalkStatus(struct KSI_Source* source) {
   return ksi::Guarded([&] {
     return ksi::SourceOf(source).Ask([](const ksi::Source& asked) { return asked.WalkStatus(); });

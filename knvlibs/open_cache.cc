@@ -131,7 +131,8 @@ Status OpenCacheSource(const char* name, std::unique_ptr<Source>* source) {
   } else if (opened.recording == nullptr) {
     *source = std::make_unique<CacheSource>(name, std::move(opened.capture));
   } else {
-    *source = std::make_unique<MomentSource>(name, std::move(moment));
+    *source = std::make_unique<MomentSource>(name, std::move(opened.recording), opened.number,
+                                             std::move(moment));
   }
   return status;
 }

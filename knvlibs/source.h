@@ -4,7 +4,9 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <span>
+#include <string>
 #include <string_view>
 
 #include "knvlibs/catalogue.h"
@@ -56,6 +58,18 @@ class Source {
   // REQUIRES: the node has a list, `keys` are of its kinds.
   [[nodiscard]] virtual Status Instances(const Node& node, const Keys& keys,
                                          ParamList& instances) = 0;
+
+  // Whose answers they are, and of when.
+  struct Origin {
+    std::string host;
+    int64_t taken = 0;  // us since 1970
+  };
+  // None of a host that is read as it runs.
+  virtual std::optional<Origin> GetOrigin() const { return std::nullopt; }
+
+  // Goes on to the next moment, of what has several: KSI_STATUS_NOT_FOUND after the last, and where
+  // there is but one.
+  [[nodiscard]] virtual Status NextMoment() { return KSI_STATUS_NOT_FOUND; }
 
   // Forgets what was read: later answers are read anew.
   virtual void Refresh() {}

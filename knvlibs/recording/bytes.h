@@ -55,6 +55,10 @@ class ByteReader {
   explicit ByteReader(ByteView bytes) : bytes_(bytes) {}
 
   uint64_t Unsigned() {
+    // Most numbers are one byte.
+    if (at_ < bytes_.size() && bytes_[at_] < std::byte{0x80}) {
+      return static_cast<uint8_t>(bytes_[at_++]);
+    }
     uint64_t number = 0;
     for (unsigned shift = 0; at_ < bytes_.size(); shift += 7) {
       const auto byte = static_cast<uint8_t>(bytes_[at_++]);

@@ -10,22 +10,28 @@
 // moments can be packed together. A part is
 //
 //   size of the first frame, 4 bytes, little-endian
-//   frame: the facts
-//   frame: the changes
+//   frame: the index
+//   frames: the nodes
 //
 // and the frames (frame.h) hold, in the terms of bytes.h:
 //
-//   facts    1 if it starts a chunk, else 0
+//   index    1 if it starts a chunk, else 0
 //            if it starts one, the host: the texts signature, built, name, boot; the number of
 //              nodes, and of each the text path, 0 for a value and 1 for a list, the size of its
 //              record, the number of its cells and of each the width times 2, plus 1 for a figure
 //            the number of moments and of each, signed and as difference from the one before,
 //              taken and uptime, then duration, cpu, skipped, loss, refused, failed
-//   changes  the size of the events; of each node the sizes of its seven streams; the events; the
-//            streams, first those of the first kind of all nodes, then those of the next
-//     events   of each moment: how many readings went, and of each how many readings lie between it
-//              and the one before it; how many came, and of each the node, the keys and the status;
-//              how many lists changed, and of each the reading and the edit (list_edit.h)
+//            of each node the size of what happened to it: 0 if nothing did
+//            of each further frame its size, as it is packed
+//   nodes    what happened to each, the smallest first (of equals, the first node); a frame has as
+//            many as are together no larger than kFrameSize, or one
+//
+// What happened to a node is the sizes of its eight streams and the streams:
+//
+//     events   of each moment with any: how many moments lie between it and the one before it; how
+//              many readings went, and of each how many numbers lie between it and the one before
+//              it; how many came, and of each the keys and the status; how many lists changed, and
+//              of each the reading's number and the edit (list_edit.h)
 //     first    the figures that came, column by column, signed
 //     raw      the other cells that came, likewise, as they are
 //     gaps     of each cell that changed: how many lie between it and the one before it
@@ -34,16 +40,20 @@
 //     deltas   of each change: by how much, signed, modulo the cell's width; of each the first byte
 //     more     and the bytes that follow it, which are distributed otherwise
 //
-// Readings are numbered as they come, from 0 in each chunk. A list comes empty. The cells of a node
+// The readings of a node are numbered as they come, from 0 in each chunk. A list comes empty. Cells
 // are ordered by their place in the record, then by the number of the reading; readings that had
-// gone before the part have none, and those that failed. So who wants a few nodes reads their
-// streams and no others.
+// gone before the part have none, and those that failed.
+//
+// So who wants a few nodes unpacks these, and a day is read moment by moment at the cost of what
+// happened in it.
 #ifndef KNVLIBS_RECORDING_CHUNK_H_
 #define KNVLIBS_RECORDING_CHUNK_H_
 
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <span>
+#include <vector>
 
 #include "knvlibs/recording/bytes.h"
 #include "knvlibs/recording/moment.h"
@@ -56,7 +66,10 @@ constexpr size_t kMostMoments = 4096;
 // The bytes of the size of the first frame.
 constexpr size_t kPrefixSize = 4;
 
-enum Stream { kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kMore, kStreams };
+// In so large a frame nothing is won by another node.
+constexpr size_t kFrameSize = size_t{16} << 10;
+
+enum Stream { kEvents, kFirst, kRaw, kGaps, kCounts, kSteps, kDeltas, kMore, kStreams };
 
 inline uint64_t BitsOf(const RecordCell& cell, const Bytes& record) {
   uint64_t bits = 0;
@@ -77,6 +90,9 @@ inline int64_t Plus(int64_t a, int64_t b) {
 inline int64_t Minus(int64_t a, int64_t b) {
   return static_cast<int64_t>(static_cast<uint64_t>(a) - static_cast<uint64_t>(b));
 }
+
+// The nodes of each frame of a part, by the sizes of what happened to them.
+std::vector<std::vector<size_t>> FramesOf(std::span<const uint64_t> sizes);
 
 }  // namespace ksi::chunk
 

@@ -16,8 +16,10 @@ constexpr size_t kLargestFrame = size_t{64} << 20;
 // std::bad_alloc, and with std::length_error.
 Bytes Pack(std::span<const ByteView> pieces);
 
-// The status is KSI_STATUS_METADATA_READ_ERROR if `packed` is no frame, or not whole.
+// The status is KSI_STATUS_METADATA_READ_ERROR if `packed` is no frame, or not whole, or ...
 [[nodiscard]] Status Unpack(ByteView packed, Bytes& content);
+// ... if it does not hold so many bytes.
+[[nodiscard]] Status Unpack(ByteView packed, size_t size, Bytes& content);
 
 }  // namespace ksi
 

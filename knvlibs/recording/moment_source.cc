@@ -1,7 +1,6 @@
 #include "knvlibs/recording/moment_source.h"
 
 #include <algorithm>
-#include <compare>
 #include <utility>
 
 #include <knvlibs/ksi.h>
@@ -13,25 +12,16 @@ namespace {
 
 constexpr Key kAbsent{KeyKind::kText, 0, {}};
 
-std::strong_ordering Compare(const Key& a, const Key& b) {
-  if (a.kind != b.kind) return a.kind <=> b.kind;
-  return a.kind == KeyKind::kNumber ? a.number <=> b.number : a.text <=> b.text;
-}
-
-std::strong_ordering Compare(const std::array<Key, kMaxKeys>& a,
-                             const std::array<Key, kMaxKeys>& b) {
-  const auto first = Compare(a[0], b[0]);
-  return std::is_eq(first) ? Compare(a[1], b[1]) : first;
-}
-
 }  // namespace
 
-MomentSource::MomentSource(std::string fileName, ChunkReader moment)
+MomentSource::MomentSource(std::string fileName, std::unique_ptr<RecordingFile> recording,
+                           int64_t number, ChunkReader moment)
     : fileName_(std::move(fileName)),
+      recording_(std::move(recording)),
+      number_(number),
       moment_(std::move(moment)),
       walk_(moment_.Size()),
-      places_(moment_.Host().nodes),
-      readings_(moment_.Host().nodes.size()) {}
+      places_(moment_.Host().nodes) {}
 
 Status MomentSource::Damaged(const Node& node) {
   if (!std::exchange(told_, true)) {
@@ -42,32 +32,29 @@ Status MomentSource::Damaged(const Node& node) {
 }
 
 // The reading of a node's value or list; one that failed fails again.
-Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, ChunkReader::View& view) {
+Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, NodeReader::View& view) {
   const size_t place = places_.Of(node, kind);
   if (place == NodePlaces::kNowhere) return KSI_STATUS_NOT_FOUND;
-  std::optional<std::vector<size_t>>& readings = readings_[place];
-  const auto keysOf = [this](size_t number) { return moment_.At(number).keys; };
-  const auto before = [](const auto& a, const auto& b) { return std::is_lt(Compare(a, b)); };
-  if (!readings) {
-    std::vector<size_t> numbers;
-    if (moment_.ReadNode(place, numbers) != kOk) return Damaged(node);
-    if (!std::ranges::is_sorted(numbers, before, keysOf)) {
-      std::ranges::sort(numbers, before, keysOf);
-    }
-    readings = std::move(numbers);
-  }
-  std::array<Key, kMaxKeys> wanted = {kAbsent, kAbsent};
+  const NodeReader* readings = nullptr;
+  if (moment_.ReadNode(place, &readings) != kOk) return Damaged(node);
+  NodeReader::KeyPair wanted = {kAbsent, kAbsent};
   std::copy_n(keys.at, keys.count, wanted.begin());
-  const auto found = std::ranges::lower_bound(*readings, wanted, before, keysOf);
-  if (found == readings->end() || std::is_neq(Compare(keysOf(*found), wanted))) {
-    return KSI_STATUS_NOT_FOUND;
+  return readings->Find(wanted, view) ? view.status : Status{KSI_STATUS_NOT_FOUND};
+}
+
+Status MomentSource::NextMoment() {
+  const Status status = recording_->ReadNext(number_, moment_);
+  if (status != kOk && status != KSI_STATUS_NOT_FOUND) {
+    Warning("%s: %s\n", Printable(fileName_).c_str(), Printable(recording_->Why()).c_str());
   }
-  view = moment_.At(*found);
-  return view.status;
+  if (status != kOk) return status;
+  places_ = NodePlaces(moment_.Host().nodes);
+  walk_ = ListWalk(moment_.Size());
+  return kOk;
 }
 
 Status MomentSource::Value(const Node& node, const Keys& keys, Buffer record) {
-  ChunkReader::View view = {};
+  NodeReader::View view = {};
   const Status status = Find(node, Kind::kValue, keys, view);
   if (status != kOk) return status;
   if (view.record.size() != record.size()) return KSI_STATUS_LENGTH_MISMATCH;
@@ -76,7 +63,7 @@ Status MomentSource::Value(const Node& node, const Keys& keys, Buffer record) {
 }
 
 Status MomentSource::Instances(const Node& node, const Keys& keys, ParamList& instances) {
-  ChunkReader::View view = {};
+  NodeReader::View view = {};
   Status status = walk_.Begin(node, keys);
   if (status == kOk) status = Find(node, Kind::kList, keys, view);
   if (status != kOk) return status;

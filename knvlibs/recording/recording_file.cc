@@ -17,7 +17,8 @@ namespace {
 enum Column { kId, kMoments, kNumber, kChunk, kFirst, kLast, kSize, kBlock };
 
 constexpr const char* kRows =
-    "SELECT id, moments, number, chunk, first, last, size, block FROM part ORDER BY id";
+    "SELECT id, moments, number, chunk, first, last, size, block FROM part WHERE moments > 0 "
+    "ORDER BY id";
 constexpr const char* kBlockOf = "SELECT data FROM block WHERE id = ?1";
 
 // More than the years of a recording in seconds.
@@ -28,9 +29,10 @@ constexpr size_t kMostRows = size_t{1} << 20;
 constexpr uint64_t kGrowth = uint64_t{1} << 20;
 
 bool IsGood(const RecordingFile::Part& part) {
-  return part.moments <= static_cast<int64_t>(chunk::kMostMoments) && part.chunk >= 0 &&
-         part.chunk <= part.number && part.number < kMostNumber && part.first <= part.last &&
-         part.size > 0 && part.size <= RecordingFile::kLargestPart && part.block > 0;
+  return part.moments > 0 && part.moments <= static_cast<int64_t>(chunk::kMostMoments) &&
+         part.chunk >= 0 && part.chunk <= part.number && part.number < kMostNumber &&
+         part.first <= part.last && part.size > 0 && part.size <= RecordingFile::kLargestPart &&
+         part.block > 0;
 }
 
 }  // namespace
@@ -64,7 +66,6 @@ Status RecordingFile::ReadRows() {
     if (part.id <= std::exchange(last, part.id) || rows_.size() == kMostRows) {
       return database_->Damaged("the rows of its parts are out of order");
     }
-    if (part.moments <= 0) continue;
     if (!IsGood(part)) return Damaged(part, "is not understood");
     total += static_cast<uint64_t>(part.size);
     if (total > Size() + kGrowth) return database_->Damaged("its parts are larger than it");
@@ -92,6 +93,7 @@ Status RecordingFile::Damaged(const Part& part, const char* why) {
 
 Status RecordingFile::ReadPart(const Part& part, Bytes& content) {
   content.clear();
+  content.reserve(std::min(static_cast<uint64_t>(part.size), Size()));
   return Walk(part, &content, nullptr);
 }
 
@@ -170,19 +172,41 @@ const RecordingFile::Part* RecordingFile::FindPart(int64_t number) const {
 Status RecordingFile::ReadMoment(int64_t number, ChunkReader& reader) {
   const Part* wanted = FindPart(number);
   if (wanted == nullptr) return KSI_STATUS_NOT_FOUND;
-  Bytes content;
   for (int64_t at = wanted->chunk; at <= number;) {
     const Part* part = FindPart(at);
     if (part == nullptr || part->number != at || part->chunk != wanted->chunk) {
       return Damaged(*wanted, "has not all that it continues");
     }
-    Status status = ReadPart(*part, content);
+    const size_t last = part == wanted ? static_cast<size_t>(number - at) : SIZE_MAX;
+    const Status status = TakePart(*part, last, reader);
     if (status != kOk) return status;
-    status = reader.Take(content, part == wanted ? static_cast<size_t>(number - at) : SIZE_MAX);
-    if (status != kOk) return Damaged(*part, "is damaged");
     at = part->End();
   }
   return kOk;
+}
+
+Status RecordingFile::TakePart(const Part& part, size_t last, ChunkReader& reader) {
+  Bytes content;
+  const Status status = ReadPart(part, content);
+  if (status != kOk) return status;
+  return reader.Take(std::move(content), last) == kOk ? kOk : Damaged(part, "is damaged");
+}
+
+Status RecordingFile::ReadNext(int64_t& number, ChunkReader& reader) {
+  if (reader.HasNext()) {
+    reader.Next();
+    ++number;
+    return kOk;
+  }
+  const auto part = std::ranges::upper_bound(parts_, number, {}, &Part::number);
+  if (part == parts_.end()) return KSI_STATUS_NOT_FOUND;
+  const Part* before = FindPart(number);
+  const bool continues =
+      before != nullptr && before->End() == part->number && before->chunk == part->chunk;
+  number = part->number;
+  if (continues) return TakePart(*part, 0, reader);
+  reader = {};
+  return ReadMoment(number, reader);
 }
 
 Status RecordingFile::ReadMoment(int64_t number, Moment& moment) {

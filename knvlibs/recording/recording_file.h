@@ -65,6 +65,10 @@ class RecordingFile {
   [[nodiscard]] Status ReadMoment(int64_t number, ChunkReader& reader);
   [[nodiscard]] Status ReadMoment(int64_t number, Moment& moment);
 
+  // Goes on from the moment with `number`, which `reader` has been given, to the next one that
+  // there is; KSI_STATUS_NOT_FOUND after the last.
+  [[nodiscard]] Status ReadNext(int64_t& number, ChunkReader& reader);
+
   // The facts of the moments of a part.
   [[nodiscard]] Status ReadFacts(const Part& part, std::vector<MomentFacts>& facts);
 
@@ -86,6 +90,7 @@ class RecordingFile {
   void ChooseParts();
   [[nodiscard]] Status Walk(const Part& part, Bytes* content, std::vector<int64_t>* blocks);
   [[nodiscard]] Status Damaged(const Part& part, const char* why);
+  [[nodiscard]] Status TakePart(const Part& part, size_t last, ChunkReader& reader);
   [[nodiscard]] Status CheckFacts(const Part& part, const std::vector<MomentFacts>& facts);
   const Part* FindPart(int64_t number) const;
 

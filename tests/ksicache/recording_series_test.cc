@@ -2,6 +2,7 @@
 //
 // FULL_SWEEP=1 in the environment joins 1000 series by the program instead of some.
 #include <algorithm>
+#include <array>
 #include <cctype>
 #include <cstdlib>
 #include <random>
@@ -10,6 +11,8 @@
 #include <string>
 #include <vector>
 
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_status.h>
 #include "knvlibs/times.h"
 #include "tests/harness/report_names.h"
 #include "tests/harness/tally.h"
@@ -106,6 +109,68 @@ TEST_F(RecordingSeries, LongRecordingsAreJoined) {
   EXPECT_EQ(sizes.size(), (moments.size() + first - 1) / first);
   EXPECT_EQ(sizes.front(), first);
   EXPECT_EQ(chunks, (std::set<int64_t>{0, ksicache::Recorder::kChunkMoments}));
+}
+
+// Past the bounds of parts and chunks, reboots and what was removed, from any moment on.
+TEST_F(RecordingSeries, MomentsAreGoneThrough) {
+  std::vector<Moment> moments = MakeMoments(4, 300);
+  for (size_t i = 250; i < moments.size(); ++i) moments[i].host.boot = "2";
+  Record(Path("r.ksi"), moments);
+  const std::unique_ptr<RecordingFile> file = OpenFile(Path("r.ksi"));
+  ASSERT_NE(file, nullptr);
+  for (const int64_t from : {0, 57, 239, 299}) {
+    int64_t number = from;
+    ChunkReader reader;
+    Status status = file->ReadMoment(number, reader);
+    int64_t expected = from;
+    for (; status == kOk; ++expected, status = file->ReadNext(number, reader)) {
+      ASSERT_EQ(number, expected);
+      const Moment& moment = moments[static_cast<size_t>(number)];
+      std::vector<MomentReading> readings;
+      ASSERT_EQ(reader.Facts(), moment.facts) << number;
+      ASSERT_EQ(reader.Host(), moment.host) << number;
+      if (number % 3 == 0 || number % 40 > 36) {
+        ASSERT_EQ(reader.ReadAll(readings), kOk) << number;
+        ASSERT_EQ(readings, moment.readings) << number;
+      }
+    }
+    EXPECT_EQ(status, Status{KSI_STATUS_NOT_FOUND});
+    EXPECT_EQ(expected, 300);
+  }
+}
+
+TEST_F(RecordingSeries, ASourceGoesOnToTheNextMoment) {
+  const std::vector<Moment> moments = MakeMoments(5, 3);
+  Record(Path("r.ksi"), moments);
+  KSI_Source* source = nullptr;
+  ASSERT_EQ(KSI_OpenCache(Path("r.ksi@first").c_str(), &source), 0U);
+  int64_t taken = 0;
+  std::array<char, 3> host = {};
+  for (size_t i = 0; i < moments.size(); ++i) {
+    if (i != 0) {
+      ASSERT_EQ(KSI_SourceNextMoment(source), 0U);
+    }
+    EXPECT_EQ(KSI_SourceOrigin(source, &taken, host.data(), host.size()), 0U);
+    EXPECT_EQ(taken, moments[i].facts.taken);
+    EXPECT_EQ(moments[i].host.name.substr(0, host.size() - 1), host.data());
+  }
+  EXPECT_EQ(KSI_SourceNextMoment(source), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(KSI_SourceOrigin(source, &taken, nullptr, 0), 0U);
+  EXPECT_EQ(taken, moments.back().facts.taken);
+  EXPECT_EQ(KSI_SourceOrigin(source, nullptr, nullptr, 0), KSI_STATUS_BAD_PARAM);
+  EXPECT_EQ(KSI_SourceOrigin(source, &taken, host.data(), 0), KSI_STATUS_BAD_PARAM);
+  KSI_CloseSource(source);
+
+  MakeCapture(moments[1], Capture(1));
+  ASSERT_EQ(KSI_OpenCache(Capture(1).c_str(), &source), 0U);
+  EXPECT_EQ(KSI_SourceOrigin(source, &taken, nullptr, 0), 0U);
+  EXPECT_EQ(taken, moments[1].facts.taken);
+  EXPECT_EQ(KSI_SourceNextMoment(source), KSI_STATUS_NOT_FOUND);
+  KSI_CloseSource(source);
+  ASSERT_EQ(KSI_OpenHost(nullptr, &source), 0U);
+  EXPECT_EQ(KSI_SourceOrigin(source, &taken, nullptr, 0), KSI_STATUS_NOT_FOUND);
+  EXPECT_EQ(KSI_SourceNextMoment(source), KSI_STATUS_NOT_FOUND);
+  KSI_CloseSource(source);
 }
 
 TEST_F(RecordingSeries, HostsAreNotMixed) {

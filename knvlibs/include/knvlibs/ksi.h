@@ -135,6 +135,18 @@ KSI_NODISCARD uint32_t KSI_SourceGetInstanceListAlloc(struct KSI_Source* source,
                                                       struct KSI_ParamList* keys,
                                                       struct KSI_ParamList** list);
 
+/* Whose answers the reads of `source` give, and of when, if it is a cache file: `*taken` receives
+ * the microseconds since 1970 and `host`, if not NULL, of `size` bytes the name of the host.
+ * KSI_STATUS_NOT_FOUND for a host that is read as it runs. */
+KSI_NODISCARD uint32_t KSI_SourceOrigin(struct KSI_Source* source, int64_t* taken, char* host,
+                                        size_t size);
+
+/* Goes on to the next moment of a recording, which all later reads of `source` answer from; what
+ * they have in common is not read again. KSI_STATUS_NOT_FOUND after the last moment, and of all that
+ * is no recording: nothing changes then. After another failure, which was said to people, a further
+ * call goes on behind what is damaged. */
+KSI_NODISCARD uint32_t KSI_SourceNextMoment(struct KSI_Source* source);
+
 /* Whether the groups that were walked over are a tree. A damaged cache file may have groups that
  * contain each other, and to walk over them has no end: when a walk has asked for more lists of
  * groups and been given more entries than a file of its size can hold, this is

@@ -80,6 +80,41 @@ TEST_P(ChunkTest, AChunkIsContinuedByAPartOfMany) {
   EXPECT_EQ(ReadingsOf(reader), moments_[7]);
 }
 
+// What one asks for at each moment, another at some and a third never.
+TEST_P(ChunkTest, MomentsFollowEachOther) {
+  ChunkReader all;
+  ChunkReader some;
+  ASSERT_EQ(all.Take(writer_.PartFrom(0), 0), kOk);
+  ASSERT_EQ(some.Take(singles_[0]), kOk);
+  for (size_t i = 0; i < kMoments; ++i) {
+    if (i != 0) {
+      ASSERT_TRUE(all.HasNext());
+      all.Next();
+      ASSERT_FALSE(some.HasNext());
+      ASSERT_EQ(some.Take(singles_[i]), kOk);
+    }
+    EXPECT_EQ(all.Facts(), FactsOf(i));
+    EXPECT_EQ(ReadingsOf(all), moments_[i]) << "moment " << i;
+    if (i % 5 == 3) {
+      EXPECT_EQ(ReadingsOf(some), moments_[i]) << "moment " << i;
+    }
+  }
+  EXPECT_FALSE(all.HasNext());
+}
+
+// A part of many is left in its midst only by who goes on to its end.
+TEST_P(ChunkTest, APartIsGoneThroughBeforeTheNext) {
+  ChunkWriter writer(Host());
+  RandomHost host(GetParam());
+  for (size_t i = 0; i < 10; ++i) writer.Add(FactsOf(i), host.Next());
+  ChunkReader reader;
+  ASSERT_EQ(reader.Take(writer.PartFrom(0), 3), kOk);
+  EXPECT_EQ(ReadingsOf(reader), moments_[3]);
+  while (reader.HasNext()) reader.Next();
+  ASSERT_EQ(reader.Take(writer_.PartFrom(10), 4), kOk);
+  EXPECT_EQ(ReadingsOf(reader), moments_[14]);
+}
+
 TEST_P(ChunkTest, FactsAreToldWithoutTheChanges) {
   HostIdentity host;
   std::vector<MomentFacts> facts;
@@ -98,7 +133,9 @@ TEST(ChunkReaderTest, APartThatIsDamagedIsRefused) {
   const Bytes part = writer.PartFrom(0);
   for (size_t size = 0; size < part.size(); ++size) {
     ChunkReader reader;
-    EXPECT_EQ(reader.Take(ByteView(part).first(size)), KSI_STATUS_METADATA_READ_ERROR) << size;
+    EXPECT_EQ(reader.Take({part.begin(), part.begin() + static_cast<ptrdiff_t>(size)}),
+              KSI_STATUS_METADATA_READ_ERROR)
+        << size;
   }
   for (size_t bit = 0; bit < part.size() * 8; ++bit) {
     Bytes flipped = part;
