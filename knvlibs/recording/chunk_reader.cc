@@ -16,6 +16,7 @@ constexpr Status kDamaged = KSI_STATUS_METADATA_READ_ERROR;
 
 // Those of an honest file, several times over.
 constexpr size_t kMostNodes = 4096;
+constexpr size_t kMostIndex = size_t{1} << 20;  // bytes
 
 // The cells of a node; false if they do not cover its record.
 bool TakeCells(ByteReader& in, RecordedNode& node) {
@@ -81,7 +82,7 @@ Status UnpackIndex(ByteView part, Bytes& index, ByteView& frames) {
   part = part.subspan(chunk::kPrefixSize);
   if (size > part.size()) return kDamaged;
   frames = part.subspan(size);
-  return Unpack(part.first(size), index);
+  return Unpack(part.first(size), kMostIndex, index);
 }
 
 }  // namespace
@@ -146,6 +147,7 @@ Status ChunkReader::ContentOf(Part& part, size_t node, ByteView& content) {
   if (frame.content.empty()) {
     const Status status = Unpack(frame.packed, frame.size, frame.content);
     if (status != kOk) return status;
+    if (frame.content.size() != frame.size) return kDamaged;
   }
   content = ByteView(frame.content).subspan(place.from, place.size);
   return kOk;
@@ -157,28 +159,36 @@ size_t ChunkReader::MomentIn(size_t part) const {
 }
 
 Status ChunkReader::ReadNode(size_t node, const NodeReader** reader) {
-  NodeReader& read = nodes_[node];
+  const Status status = TakeParts(node);
+  if (status != kOk) taken_[node] = kNotGood;
+  *reader = &nodes_[node];
+  return status;
+}
+
+// Brings a node to the moment.
+Status ChunkReader::TakeParts(size_t node) {
+  NodeReader& reader = nodes_[node];
   size_t& taken = taken_[node];
-  bool isGood = taken == 0 || read.GoTo(MomentIn(taken - 1));
+  if (taken == kNotGood) return kDamaged;
+  bool isGood = taken == 0 || reader.GoTo(MomentIn(taken - 1));
   for (; isGood && taken < parts_.size(); ++taken) {
     ByteView content;
     const Status status = ContentOf(parts_[taken], node, content);
     if (status != kOk) return status;
-    isGood = read.Take(content, parts_[taken].count, MomentIn(taken));
+    isGood = reader.Take(content, parts_[taken].count, MomentIn(taken));
   }
-  *reader = &read;
   return isGood ? kOk : kDamaged;
 }
 
-Status ChunkReader::ReadAll(std::vector<MomentReading>& readings) {
-  readings.clear();
+Status ChunkReader::ReadAll(Moment& moment) {
+  moment = {host_, Facts(), {}};
   for (uint32_t node = 0; node < nodes_.size(); ++node) {
     const NodeReader* reader = nullptr;
     const Status status = ReadNode(node, &reader);
     if (status != kOk) return status;
     for (const uint32_t number : reader->Present()) {
       const NodeReader::View view = reader->At(number);
-      MomentReading& reading = readings.emplace_back();
+      MomentReading& reading = moment.readings.emplace_back();
       reading.question.node = node;
       for (size_t i = 0; i < kMaxKeys; ++i) reading.question.keys[i] = OwnOf(view.keys[i]);
       reading.answer.status = view.status;

@@ -29,6 +29,9 @@ class ChunkReader {
   [[nodiscard]] static Status TakeFacts(ByteView part, HostIdentity& host,
                                         std::vector<MomentFacts>& facts);
 
+  // Whether nothing has been taken.
+  bool IsEmpty() const { return parts_.empty(); }
+
   const HostIdentity& Host() const { return host_; }
 
   // The bytes of what happened, more than its lists have entries.
@@ -44,8 +47,8 @@ class ChunkReader {
   // A node at the moment, until another one is come to. Fails as Take.
   [[nodiscard]] Status ReadNode(size_t node, const NodeReader** reader);
 
-  // All readings, by nodes and keys. Fails as Take.
-  [[nodiscard]] Status ReadAll(std::vector<MomentReading>& readings);
+  // All of it, the readings by nodes and keys. Fails as Take.
+  [[nodiscard]] Status ReadAll(Moment& moment);
 
  private:
   struct Frame {
@@ -67,6 +70,7 @@ class ChunkReader {
   };
 
   [[nodiscard]] Status TakePlaces(ByteReader& in, ByteView packed, Part& part);
+  [[nodiscard]] Status TakeParts(size_t node);
   [[nodiscard]] Status ContentOf(Part& part, size_t node, ByteView& content);
   [[nodiscard]] size_t MomentIn(size_t part) const;
 
@@ -74,7 +78,8 @@ class ChunkReader {
   std::unique_ptr<ChunkBudget> budget_ = std::make_unique<ChunkBudget>();
   std::vector<Part> parts_;
   std::vector<NodeReader> nodes_;
-  std::vector<size_t> taken_;  // how many parts of each node
+  static constexpr size_t kNotGood = SIZE_MAX;
+  std::vector<size_t> taken_;  // how many parts of each node; kNotGood if one is damaged
   size_t size_ = 0;
   std::vector<MomentFacts> facts_;  // of the last part
   size_t moment_ = 0;               // of the last part

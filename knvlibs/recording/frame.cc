@@ -2,6 +2,7 @@
 
 #include <zstd.h>
 
+#include <algorithm>
 #include <memory>
 #include <new>
 #include <stdexcept>
@@ -57,15 +58,10 @@ Bytes Pack(std::span<const ByteView> pieces) {
   return packed;
 }
 
-Status Unpack(ByteView packed, Bytes& content) {
-  return Unpack(packed, ZSTD_getFrameContentSize(packed.data(), packed.size()), content);
-}
-
-Status Unpack(ByteView packed, size_t size, Bytes& content) {
+Status Unpack(ByteView packed, size_t most, Bytes& content) {
+  const unsigned long long size = ZSTD_getFrameContentSize(packed.data(), packed.size());
   // So large are the two answers that are no size, too.
-  if (size > kLargestFrame || size != ZSTD_getFrameContentSize(packed.data(), packed.size())) {
-    return KSI_STATUS_METADATA_READ_ERROR;
-  }
+  if (size > std::min(most, kLargestFrame)) return KSI_STATUS_METADATA_READ_ERROR;
   content.resize(size);
   const size_t got = ZSTD_decompress(content.data(), content.size(), packed.data(), packed.size());
   return got == size ? kOk : Status{KSI_STATUS_METADATA_READ_ERROR};

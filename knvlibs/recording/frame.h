@@ -16,10 +16,9 @@ constexpr size_t kLargestFrame = size_t{64} << 20;
 // std::bad_alloc, and with std::length_error.
 Bytes Pack(std::span<const ByteView> pieces);
 
-// The status is KSI_STATUS_METADATA_READ_ERROR if `packed` is no frame, or not whole, or ...
-[[nodiscard]] Status Unpack(ByteView packed, Bytes& content);
-// ... if it does not hold so many bytes.
-[[nodiscard]] Status Unpack(ByteView packed, size_t size, Bytes& content);
+// The status is KSI_STATUS_METADATA_READ_ERROR if `packed` is no frame, not whole, or holds more
+// than `most` bytes, which are no more than kLargestFrame.
+[[nodiscard]] Status Unpack(ByteView packed, size_t most, Bytes& content);
 
 }  // namespace ksi
 

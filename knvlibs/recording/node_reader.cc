@@ -69,7 +69,10 @@ bool NodeReader::Hold(size_t bytes) {
 // that come in it.
 bool NodeReader::TakeCells(Streams& streams, size_t old, size_t count, size_t moment) {
   const size_t size = node_->recordSize;
-  if (!ChunkBudget::Spend(budget_->bytes, readings_.size() * size - records_.size())) return false;
+  if (!ChunkBudget::Spend(budget_->bytes, readings_.size() * size - records_.size()) ||
+      !ChunkBudget::Spend(budget_->work, readings_.size())) {
+    return false;
+  }
   records_.resize(readings_.size() * size);
   std::vector<uint32_t> members = present_;
   std::ranges::sort(members);
@@ -219,6 +222,7 @@ bool NodeReader::Apply(const Event& event) {
     readings_[number].isThere = true;
   }
   UpdatePresent(event);
+  if (!ChunkBudget::Spend(budget_->work, present_.size())) return false;
   return std::ranges::all_of(event.edits, [this](const Edit& edit) { return Apply(edit); });
 }
 

@@ -18,8 +18,8 @@
 namespace ksi {
 
 // What all nodes of a chunk may take together, when it is damaged: readings; bytes of what is
-// unpacked, and of records and entries; bytes of the lists that are changed one after the other.
-// The largest hosts need a part of it.
+// unpacked, and of records and entries; bytes of the lists that are changed one after the other,
+// with the readings that are gone through for it. The largest hosts need a part of it.
 struct ChunkBudget {
   size_t readings = size_t{1} << 20;
   size_t bytes = size_t{256} << 20;

@@ -28,9 +28,16 @@ constexpr size_t kMostRows = size_t{1} << 20;
 // By so much a file may have grown since its size was looked at.
 constexpr uint64_t kGrowth = uint64_t{1} << 20;
 
+// What a part takes of the file.
+uint64_t RoomOf(const RecordingFile::Part& part) {
+  constexpr uint64_t kPiece = cache::kBlockSize - cache::kBlockHead;
+  return (static_cast<uint64_t>(part.size) + kPiece - 1) / kPiece * cache::kBlockSize;
+}
+
 bool IsGood(const RecordingFile::Part& part) {
   return part.moments > 0 && part.moments <= static_cast<int64_t>(chunk::kMostMoments) &&
          part.chunk >= 0 && part.chunk <= part.number && part.number < kMostNumber &&
+         part.End() - part.chunk <= static_cast<int64_t>(chunk::kMostMoments) &&
          part.first <= part.last && part.size > 0 && part.size <= RecordingFile::kLargestPart &&
          part.block > 0;
 }
@@ -67,7 +74,7 @@ Status RecordingFile::ReadRows() {
       return database_->Damaged("the rows of its parts are out of order");
     }
     if (!IsGood(part)) return Damaged(part, "is not understood");
-    total += static_cast<uint64_t>(part.size);
+    total += RoomOf(part);
     if (total > Size() + kGrowth) return database_->Damaged("its parts are larger than it");
     rows_.push_back(part);
   }
@@ -169,18 +176,27 @@ const RecordingFile::Part* RecordingFile::FindPart(int64_t number) const {
   return number < part.End() ? &part : nullptr;
 }
 
-Status RecordingFile::ReadMoment(int64_t number, ChunkReader& reader) {
+Status RecordingFile::ReadMoment(int64_t number, ChunkReader& reader, int64_t at) {
   const Part* wanted = FindPart(number);
   if (wanted == nullptr) return KSI_STATUS_NOT_FOUND;
-  for (int64_t at = wanted->chunk; at <= number;) {
-    const Part* part = FindPart(at);
-    if (part == nullptr || part->number != at || part->chunk != wanted->chunk) {
+  const Part* reached = FindPart(at);
+  const bool goesOn =
+      !reader.IsEmpty() && reached != nullptr && reached->chunk == wanted->chunk && at <= number;
+  if (!goesOn) reader = {};
+  for (; goesOn && reader.HasNext() && at < number; ++at) reader.Next();
+  for (int64_t next = goesOn ? reached->End() : wanted->chunk; next <= number;) {
+    const Part* part = FindPart(next);
+    if (part == nullptr || part->number != next || part->chunk != wanted->chunk) {
+      reader = {};
       return Damaged(*wanted, "has not all that it continues");
     }
-    const size_t last = part == wanted ? static_cast<size_t>(number - at) : SIZE_MAX;
+    const size_t last = part == wanted ? static_cast<size_t>(number - next) : SIZE_MAX;
     const Status status = TakePart(*part, last, reader);
-    if (status != kOk) return status;
-    at = part->End();
+    if (status != kOk) {
+      reader = {};  // of which nothing is good any more
+      return status;
+    }
+    next = part->End();
   }
   return kOk;
 }
@@ -189,33 +205,31 @@ Status RecordingFile::TakePart(const Part& part, size_t last, ChunkReader& reade
   Bytes content;
   const Status status = ReadPart(part, content);
   if (status != kOk) return status;
-  return reader.Take(std::move(content), last) == kOk ? kOk : Damaged(part, "is damaged");
+  const size_t before = reader.Size();
+  const bool isGood = reader.Take(std::move(content), last) == kOk;
+  taken_ += reader.Size() - before;
+  return isGood ? kOk : Damaged(part, "is damaged");
 }
 
 Status RecordingFile::ReadNext(int64_t& number, ChunkReader& reader) {
-  if (reader.HasNext()) {
-    reader.Next();
+  const int64_t at = number;
+  const Part* part = FindPart(at);
+  if (part != nullptr && at + 1 < part->End()) {
     ++number;
-    return kOk;
+  } else {
+    const auto next = std::ranges::upper_bound(parts_, at, {}, &Part::number);
+    if (next == parts_.end()) return KSI_STATUS_NOT_FOUND;
+    number = next->number;
   }
-  const auto part = std::ranges::upper_bound(parts_, number, {}, &Part::number);
-  if (part == parts_.end()) return KSI_STATUS_NOT_FOUND;
-  const Part* before = FindPart(number);
-  const bool continues =
-      before != nullptr && before->End() == part->number && before->chunk == part->chunk;
-  number = part->number;
-  if (continues) return TakePart(*part, 0, reader);
-  reader = {};
-  return ReadMoment(number, reader);
+  return ReadMoment(number, reader, at);
 }
 
-Status RecordingFile::ReadMoment(int64_t number, Moment& moment) {
-  ChunkReader reader;
-  const Status status = ReadMoment(number, reader);
+Status RecordingFile::ReadWhole(int64_t number, ChunkReader& reader, Moment& moment, int64_t at) {
+  const Status status = ReadMoment(number, reader, at);
   if (status != kOk) return status;
-  moment.host = reader.Host();
-  moment.facts = reader.Facts();
-  return reader.ReadAll(moment.readings) == kOk ? kOk : Damaged(*FindPart(number), "is damaged");
+  if (reader.ReadAll(moment) == kOk) return kOk;
+  reader = {};
+  return Damaged(*FindPart(number), "is damaged");
 }
 
 Status RecordingFile::FindMoment(int64_t time, int64_t& number) {

@@ -61,9 +61,13 @@ class RecordingFile {
   // The blocks of a part, in their order.
   [[nodiscard]] Status ReadBlocks(const Part& part, std::vector<int64_t>& blocks);
 
-  // The moment with a number that a part has: to look into, or as a whole.
-  [[nodiscard]] Status ReadMoment(int64_t number, ChunkReader& reader);
-  [[nodiscard]] Status ReadMoment(int64_t number, Moment& moment);
+  // The moment with a number that a part has: to look into, or as a whole. `at`: the moment that
+  // the reader has been given before; of what both have in common nothing is read again. A reader
+  // that fails is empty, and begins anew.
+  static constexpr int64_t kNoMoment = -1;
+  [[nodiscard]] Status ReadMoment(int64_t number, ChunkReader& reader, int64_t at = kNoMoment);
+  [[nodiscard]] Status ReadWhole(int64_t number, ChunkReader& reader, Moment& moment,
+                                 int64_t at = kNoMoment);
 
   // Goes on from the moment with `number`, which `reader` has been given, to the next one that
   // there is; KSI_STATUS_NOT_FOUND after the last.
@@ -78,6 +82,9 @@ class RecordingFile {
   // The number of the latest moment that was taken at `time` or before; -1 if there is none. The
   // latest is the one recorded last, for clocks may be set back.
   [[nodiscard]] Status FindMoment(int64_t time, int64_t& number);
+
+  // About the bytes that have been unpacked to read moments.
+  uint64_t Taken() const { return taken_; }
 
   const std::string& Why() const { return database_->Why(); }
   uint64_t Size() const { return database_->Size(); }
@@ -98,6 +105,7 @@ class RecordingFile {
   std::vector<Part> rows_;
   std::vector<Part> parts_;
   Statement block_;
+  uint64_t taken_ = 0;
 };
 
 }  // namespace ksi

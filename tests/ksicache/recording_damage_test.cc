@@ -2,15 +2,10 @@
 // bounded memory and time.
 //
 // FULL_SWEEP=1 in the environment flips 100,000 bits instead of some.
-#include <sys/resource.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
-#include <functional>
 #include <random>
 #include <span>
 #include <string>
@@ -47,29 +42,11 @@ void Use(const std::string& name) {
     Moment moment;
     static_cast<void>(file->ReadFacts(part, facts));
     static_cast<void>(file->ReadHost(part, host));
-    static_cast<void>(file->ReadMoment(part.number, moment));
-    static_cast<void>(file->ReadMoment(part.End() - 1, moment));
+    static_cast<void>(file->ReadWhole(part.number, reader, moment));
+    static_cast<void>(file->ReadWhole(part.End() - 1, reader, moment, part.number));
     int64_t number = 0;
     static_cast<void>(file->FindMoment(part.first, number));
   }
-}
-
-// In a process of its own that may take neither much memory nor long.
-void ExpectBounded(const std::function<void()>& run) {
-  const pid_t child = fork();
-  if (child == 0) {
-#ifndef TALLY_SANITIZED
-    const rlimit memory = {rlim_t{1} << 30, rlim_t{1} << 30};
-    setrlimit(RLIMIT_AS, &memory);
-#endif
-    const rlimit seconds = {20, 20};
-    setrlimit(RLIMIT_CPU, &seconds);
-    run();
-    _exit(0);
-  }
-  int status = 0;
-  ASSERT_EQ(waitpid(child, &status, 0), child);
-  ASSERT_EQ(status, 0);
 }
 
 class RecordingDamage : public RecordingTest {

@@ -3,9 +3,13 @@
 #define TESTS_KSICACHE_RECORDING_FIXTURE_H_
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <random>
 #include <string>
@@ -92,13 +96,33 @@ class RecordingTest : public Ksicache {
     return file;
   }
 
+  // Runs in a process of its own, and programs from there, that may take neither much memory nor
+  // long.
+  static void ExpectBounded(const std::function<void()>& run) {
+    const pid_t child = fork();
+    if (child == 0) {
+#ifndef TALLY_SANITIZED
+      const rlimit memory = {rlim_t{1} << 30, rlim_t{1} << 30};
+      setrlimit(RLIMIT_AS, &memory);
+#endif
+      const rlimit seconds = {20, 20};
+      setrlimit(RLIMIT_CPU, &seconds);
+      run();
+      _exit(HasFailure() ? 1 : 0);
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    ASSERT_EQ(status, 0);
+  }
+
   // Expects the moments from `number` on to be these.
   static void ExpectMoments(RecordingFile& file, const std::vector<Moment>& moments,
                             int64_t number = 0) {
     for (const Moment& wanted : moments) {
       SCOPED_TRACE("moment " + std::to_string(number));
       Moment moment;
-      ASSERT_EQ(file.ReadMoment(number++, moment), kOk) << file.Why();
+      ChunkReader reader;
+      ASSERT_EQ(file.ReadWhole(number++, reader, moment), kOk) << file.Why();
       SortReadings(moment.readings);
       ASSERT_EQ(moment.facts, wanted.facts);
       ASSERT_EQ(moment.host, wanted.host);

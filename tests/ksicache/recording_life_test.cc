@@ -161,8 +161,7 @@ TEST_F(RecordingLife, ReadersMeanwhileSeeWholeMoments) {
     std::string why;
     const std::string when = TextOfTime(kStart + wanted * kSecond);
     ASSERT_EQ(ReadCache(file_ + "@" + when, &opened, &reader, &why), kOk) << when << ": " << why;
-    ASSERT_EQ(reader.ReadAll(moment.readings), kOk) << when;
-    moment.facts = reader.Facts();
+    ASSERT_EQ(reader.ReadAll(moment), kOk) << when;
     const Moment expected = MomentAt(wanted);
     SortReadings(moment.readings);
     ASSERT_EQ(moment.facts, expected.facts) << when;

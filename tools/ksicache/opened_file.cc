@@ -63,8 +63,8 @@ ksi::OpenedCache OpenAny(const std::string& name, ksi::ChunkReader& moment) {
 }
 
 ksi::Moment WholeOf(ksi::ChunkReader& reader) {
-  ksi::Moment moment = {reader.Host(), reader.Facts(), {}};
-  if (reader.ReadAll(moment.readings) != ksi::kOk) throw DataError("damaged");
+  ksi::Moment moment;
+  if (reader.ReadAll(moment) != ksi::kOk) throw DataError("damaged");
   return moment;
 }
 

@@ -79,10 +79,13 @@ size_t Recorder::Adopt(ksi::RecordingFile& recording) {
   size_t damaged = 0;
   const std::vector<RecordingStore::Part>& parts = recording.Parts();
   size_t from = parts.size();
-  while (from > 0 && parts[from - 1].moments == 1) --from;
+  while (from > 0 && parts[from - 1].moments == 1 && parts.size() - from < kChunkMoments) --from;
+  ksi::ChunkReader reader;
+  int64_t at = ksi::RecordingFile::kNoMoment;
   for (; from < parts.size(); ++from) {
     ksi::Moment moment;
-    const ksi::Status status = recording.ReadMoment(parts[from].number, moment);
+    const int64_t before = std::exchange(at, parts[from].number);
+    const ksi::Status status = recording.ReadWhole(at, reader, moment, before);
     if (status == KSI_STATUS_METADATA_READ_ERROR) {
       ++damaged;
       continue;

@@ -28,10 +28,10 @@ MomentFacts FactsOf(size_t i) {
 }
 
 std::vector<MomentReading> ReadingsOf(ChunkReader& reader) {
-  std::vector<MomentReading> readings;
-  EXPECT_EQ(reader.ReadAll(readings), kOk);
-  SortReadings(readings);
-  return readings;
+  Moment moment;
+  EXPECT_EQ(reader.ReadAll(moment), kOk);
+  SortReadings(moment.readings);
+  return moment.readings;
 }
 
 constexpr size_t kMoments = 24;
@@ -141,8 +141,8 @@ TEST(ChunkReaderTest, APartThatIsDamagedIsRefused) {
     Bytes flipped = part;
     flipped[bit / 8] ^= std::byte{1} << bit % 8;
     ChunkReader reader;
-    std::vector<MomentReading> readings;
-    if (reader.Take(flipped) == kOk && reader.ReadAll(readings) == kOk) {
+    Moment moment;
+    if (reader.Take(flipped) == kOk && reader.ReadAll(moment) == kOk) {
       // There are bits of a frame that say nothing of its content.
       EXPECT_EQ(reader.Facts(), FactsOf(4)) << bit;
     }

@@ -207,23 +207,47 @@ class Checker {
   size_t problems_ = 0;
 };
 
+// What looking into a recording may take, as bytes: what is the same in many moments takes no room
+// in its file, so a small one may hold more than anybody waits for. A host on which nothing happens
+// comes to some hundred for a byte.
+uint64_t MostWorkOn(uint64_t fileSize) { return (uint64_t{16} << 20) + 512 * fileSize; }
+
+uint64_t WorkOn(const ksi::Moment& moment) {
+  constexpr uint64_t kEach = 256;  // that a reading, or an entry, is like
+  uint64_t work = 0;
+  for (const ksi::MomentReading& reading : moment.readings) {
+    work += kEach * (1 + reading.answer.entries.size()) + reading.answer.record.size();
+  }
+  return work;
+}
+
 // All parts of a recording, and of each its last moment as a capture.
 bool CheckRecording(const std::string& fileName) {
   const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName);
   const std::vector<ksi::RecordingFile::Part>& parts = recording->Parts();
   Progress progress("checking");
   size_t problems = 0;
+  uint64_t work = 0;
+  ksi::ChunkReader reader;
+  int64_t at = ksi::RecordingFile::kNoMoment;
   for (size_t i = 0; i < parts.size(); ++i) {
     progress.Show(i, parts.size());
+    constexpr uint64_t kTakenFast = 4;
+    if (work + recording->Taken() / kTakenFast > MostWorkOn(recording->Size())) {
+      PrintLine(fileName + ": damaged: its moments hold more than a file of its size does");
+      return false;
+    }
     const std::string name = fileName + "@" + ksi::TextOfTime(parts[i].last);
     ksi::Moment moment;
     std::vector<ksi::MomentFacts> facts;
+    const int64_t before = std::exchange(at, parts[i].End() - 1);
     if (recording->ReadFacts(parts[i], facts) != ksi::kOk ||
-        recording->ReadMoment(parts[i].End() - 1, moment) != ksi::kOk) {
+        recording->ReadWhole(at, reader, moment, before) != ksi::kOk) {
       PrintLine(name + ": damaged: " + recording->Why());
       ++problems;
       continue;
     }
+    work += WorkOn(moment);
     try {
       const OpenedFile opened(name, moment);
       problems += Checker(name, opened.File()).Run();

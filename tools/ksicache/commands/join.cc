@@ -8,6 +8,7 @@
 #include <limits>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tools/ksicache/commands/commands.h"
@@ -30,6 +31,20 @@ struct Place {
   int64_t number;  // in a recording
 };
 
+// One of the files.
+struct Input {
+  std::unique_ptr<ksi::RecordingFile> recording;  // null for a capture
+  ksi::ChunkReader reader;
+  int64_t at = ksi::RecordingFile::kNoMoment;  // the moment that the reader has
+
+  void Read(int64_t number, ksi::Moment& moment) {
+    const int64_t before = std::exchange(at, number);
+    if (recording->ReadWhole(number, reader, moment, before) != ksi::kOk) {
+      throw DataError("damaged: " + recording->Why());
+    }
+  }
+};
+
 // The files to join, by the order in which they were given.
 class Inputs {
  public:
@@ -44,11 +59,11 @@ class Inputs {
   ksi::Moment Read(const Place& place) {
     ksi::Moment moment;
     Named(place.file, [&] {
-      ksi::RecordingFile* recording = recordings_[place.file].get();
-      if (recording == nullptr) {
+      Input& input = inputs_[place.file];
+      if (input.recording == nullptr) {
         moment = MomentOf(OpenedFile(names_[place.file]).File());
-      } else if (recording->ReadMoment(place.number, moment) != ksi::kOk) {
-        throw DataError("damaged: " + recording->Why());
+      } else {
+        input.Read(place.number, moment);
       }
       if (host_.empty()) host_ = moment.host.name;
       if (moment.host.name != host_) {
@@ -72,16 +87,16 @@ class Inputs {
 
   void Add(size_t file) {
     const std::string& name = names_[file];
-    recordings_.emplace_back();
+    Input& input = inputs_.emplace_back();
     if (!IsRecording(name)) {
       places_.push_back({TakenOf(OpenedFile(name).File()), file, 0});
       return;
     }
-    recordings_.back() = OpenRecording(name);
-    for (const ksi::RecordingFile::Part& part : recordings_.back()->Parts()) {
+    input.recording = OpenRecording(name);
+    for (const ksi::RecordingFile::Part& part : input.recording->Parts()) {
       std::vector<ksi::MomentFacts> facts;
-      if (recordings_.back()->ReadFacts(part, facts) != ksi::kOk) {
-        throw DataError("damaged: " + recordings_.back()->Why());
+      if (input.recording->ReadFacts(part, facts) != ksi::kOk) {
+        throw DataError("damaged: " + input.recording->Why());
       }
       for (size_t i = 0; i < facts.size(); ++i) {
         places_.push_back({facts[i].taken, file, part.number + static_cast<int64_t>(i)});
@@ -90,7 +105,7 @@ class Inputs {
   }
 
   const std::vector<std::string>& names_;
-  std::vector<std::unique_ptr<ksi::RecordingFile>> recordings_;  // null for a capture
+  std::vector<Input> inputs_;
   std::vector<Place> places_;
   std::string host_;
 };

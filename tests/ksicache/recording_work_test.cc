@@ -1,0 +1,149 @@
+// Recordings that are small and hold much: whatever looks into them ends before long, in bounded
+// memory, and says what is wrong.
+#include <algorithm>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "knvlibs/recording/chunk_writer.h"
+#include "knvlibs/recording/frame.h"
+#include "tests/ksicache/recording_fixture.h"
+
+namespace ksi {
+namespace {
+
+using ksicache::RecordingStore;
+
+class RecordingWork : public RecordingTest {
+ protected:
+  RecordingWork() { MakeEmpty(file_); }
+
+  // So many values of nothing but zeros.
+  static std::vector<MomentReading> Zeros(size_t count) {
+    const auto node =
+        std::ranges::find(RecordedNodes(), "sched/groups/groupFlags", &RecordedNode::path);
+    std::vector<MomentReading> readings(count);
+    for (size_t i = 0; i < count; ++i) {
+      readings[i].question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
+      readings[i].question.keys[0].emplace<int64_t>(static_cast<int64_t>(i));
+      readings[i].answer.record.resize(node->recordSize);
+    }
+    return readings;
+  }
+
+  // The first moment of a chunk with them, and one more, in which nothing happened.
+  static std::pair<Bytes, Bytes> PartsWithZeros(size_t count) {
+    MomentFacts facts;
+    facts.taken = kStart;
+    ChunkWriter writer(Host());
+    writer.Add(facts, Zeros(count));
+    Bytes start = writer.PartFrom(0);
+    writer.Add(facts, Zeros(count));
+    return {std::move(start), writer.PartFrom(1)};
+  }
+
+  static Bytes PartOf(ByteView facts, ByteView changes) {
+    const auto size = static_cast<uint32_t>(facts.size());
+    ByteWriter part;
+    part.Raw(std::as_bytes(std::span(&size, 1)));
+    part.Raw(facts);
+    part.Raw(changes);
+    return part.All();
+  }
+
+  // Adds so many chunks of one moment each.
+  void AddChunks(int64_t count, ByteView content) const {
+    RecordingStore store(file_, kUnbounded);
+    for (int64_t i = 0; i < count; ++i) store.Add({0, 1, i, i, kStart, kStart, 0, 0}, content);
+  }
+
+  // Adds moments of the first chunk.
+  void AddMoments(int64_t first, int64_t end, ByteView content) const {
+    RecordingStore store(file_, kUnbounded);
+    for (int64_t i = first; i < end; ++i) {
+      store.Add({0, 1, i, 0, kStart, kStart, 0, 0}, content);
+    }
+  }
+
+  // The program where neither much memory nor much time is to be had.
+  static void ExpectEnds(const std::vector<std::string>& args, const std::string& out,
+                         const std::string& err) {
+    ExpectBounded([&] {
+      const harness::Result result = Run(args);
+      EXPECT_EQ(result.status, 1);
+      EXPECT_EQ(result.out, out);
+      EXPECT_EQ(result.err, err);
+    });
+  }
+
+  static std::string Repeat(const std::string& text, int times) {
+    std::string all;
+    for (int i = 0; i < times; ++i) all += text;
+    return all;
+  }
+
+  const std::string file_ = Path("r.ksi");
+};
+
+// What is the same from moment to moment takes no room.
+TEST_F(RecordingWork, CheckEndsByTheSizeOfTheFile) {
+  AddChunks(30, PartsWithZeros(100'000).first);
+  ExpectEnds({"check", file_},
+             file_ + ": damaged: its moments hold more than a file of its size does\n", "");
+}
+
+TEST_F(RecordingWork, FactsAreNoLargerThanFactsAre) {
+  const Bytes zeros(kLargestFrame);
+  const ByteView pieces[] = {zeros};
+  const Bytes frame = Pack(pieces);
+  constexpr int kParts = 1500;
+  AddChunks(kParts, PartOf(frame, frame));
+  const std::string damaged = "damaged: the part of 2026-11-21T10:00:00Z is damaged\n";
+  ExpectEnds({"check", file_}, Repeat(file_ + "@2026-11-21T10:00:00Z: " + damaged, kParts), "");
+  ExpectEnds({"moments", file_}, "taken                     bytes   took ms    cpu ms  remarks\n",
+             Repeat("ksicache: " + file_ + ": " + damaged, kParts));
+}
+
+TEST_F(RecordingWork, MomentsInARowAreUnpackedOnce) {
+  constexpr int64_t kMoments = 2500;
+  const auto [start, more] = PartsWithZeros(10);
+  AddChunks(1, start);
+  AddMoments(1, kMoments, more);
+  ExpectBounded([this] {
+    const std::unique_ptr<RecordingFile> file = OpenFile(file_);
+    Moment moment;
+    ChunkReader reader;
+    for (int64_t i = 0; i < kMoments; ++i) {
+      ASSERT_EQ(file->ReadWhole(i, reader, moment, i - 1), kOk) << i;
+    }
+    EXPECT_EQ(moment.readings, Zeros(10));
+    EXPECT_LT(file->Taken(), kMoments * 1000u);
+  });
+}
+
+TEST_F(RecordingWork, AChunkHasABoundOfMoments) {
+  const auto [start, more] = PartsWithZeros(10);
+  AddChunks(1, start);
+  AddMoments(1, 2, more);
+  const auto expect = [this](const std::string& number, const std::string& why) {
+    RunSql(file_, "UPDATE part SET number = " + number + " WHERE number > 0 AND moments = 1");
+    ExpectFailure({"dump", file_}, file_ + ": damaged: the part of 2026-11-21T10:00:00Z " + why);
+  };
+  expect("4095", "has not all that it continues");
+  expect("4096", "is not understood");
+}
+
+TEST_F(RecordingWork, PartsHaveBlocksOfTheirOwn) {
+  AddChunks(1, PartsWithZeros(10).first);
+  RunSql(file_,
+         "WITH RECURSIVE n(x) AS (VALUES(1) UNION ALL SELECT x + 1 FROM n WHERE x < 400) "
+         "INSERT INTO part SELECT NULL, 1, x, x, first, last, size, block FROM part, n "
+         "WHERE number = 0");
+  ExpectFailure({"moments", file_}, file_ + ": damaged: its parts are larger than it");
+}
+
+}  // namespace
+}  // namespace ksi
