@@ -46,6 +46,8 @@ constexpr const char* kFreePart = "UPDATE part SET moments = 0 WHERE id = ?1";
 constexpr off_t kLockAt = off_t{1} << 61;
 constexpr off_t kTellingLockAt = kLockAt + 1;
 
+size_t BlocksOf(size_t bytes) { return (bytes + kPieceSize - 1) / kPieceSize; }
+
 struct flock LockAt(off_t place) {
   struct flock lock = {};
   lock.l_type = F_WRLCK;
@@ -169,6 +171,7 @@ void RecordingStore::TakeStock() {
     // Those of a damaged part that are found; the others nobody finds.
     static_cast<void>(recording->ReadBlocks(row, blocks));
     used.insert(blocks.begin(), blocks.end());
+    mostTaken_ = std::max(mostTaken_, 2 * blocks.size());
     if (!chosen.contains(row.id)) replaced_.push_back(row);
   }
   recording.reset();
@@ -246,7 +249,9 @@ void RecordingStore::Add(Part part, ksi::ByteView content) {
 
 void RecordingStore::Put(Part part, ksi::ByteView content, bool replaces) {
   part.size = static_cast<int64_t>(content.size());
-  const std::vector<int64_t> blocks = TakeBlocks((content.size() + kPieceSize - 1) / kPieceSize);
+  const size_t count = BlocksOf(content.size());
+  KeepSpare(count);
+  const std::vector<int64_t> blocks = TakeBlocks(count);
   part.block = blocks.front();
   WriteBlocks(blocks, content);
   // Its row hides those of older parts, which are on the disk already.
@@ -270,13 +275,19 @@ void RecordingStore::Replace(Part part, ksi::ByteView content) {
   };
   std::ranges::copy_if(parts_, std::back_inserter(replaced_), isReplaced);
   std::erase_if(parts_, isReplaced);
-  KeepSpare((content.size() + kPieceSize - 1) / kPieceSize);
+  taken_ = 0;
 }
 
-// At the bound of its size the file has always room for some moments, so that blocks are not
-// written as soon as they are free: who copies the file may just read them.
+// What is free is used in the order in which it became so, and at the bound of the file's size
+// there is always as much of it as is written until moments are packed: who copies the file may
+// just read what was freed.
 void RecordingStore::KeepSpare(size_t count) {
-  while (blocks_.size() < 2 * count && !CanGrow(2 * count) && HasOldChunk()) RemoveFirstChunk();
+  taken_ += count;
+  mostTaken_ = std::max(mostTaken_, taken_);
+  const size_t wanted = count + mostTaken_;
+  if (blocks_.size() + Room() >= wanted) return;
+  Grow(Room());
+  while (blocks_.size() < wanted && HasOldChunk()) RemoveFirstChunk();
 }
 
 void RecordingStore::RemoveBefore(int64_t time) {
@@ -325,19 +336,24 @@ void RecordingStore::Remove(const std::vector<Part>& parts) {
   }
 }
 
-bool RecordingStore::CanGrow(size_t count) const {
-  return Size() + static_cast<int64_t>(count) * kBlockOnDisk <= maxSize_;
+size_t RecordingStore::Room() const {
+  return static_cast<size_t>(std::max(maxSize_ - Size(), int64_t{0}) / kBlockOnDisk);
+}
+
+void RecordingStore::Grow(size_t count) {
+  if (count == 0) return;
+  Execute("BEGIN");
+  Require(AddRows(database_.get(), kAddBlock, count));
+  const int64_t last = sqlite3_last_insert_rowid(database_.get());
+  Flush();
+  for (auto id = last - static_cast<int64_t>(count) + 1; id <= last; ++id) blocks_.push_back(id);
 }
 
 std::vector<int64_t> RecordingStore::TakeBlocks(size_t count) {
   while (blocks_.size() < count) {
-    const size_t more = std::max(count - blocks_.size(), kMoreBlocks);
-    if (CanGrow(more)) {
-      Execute("BEGIN");
-      Require(AddRows(database_.get(), kAddBlock, more));
-      const int64_t last = sqlite3_last_insert_rowid(database_.get());
-      Flush();
-      for (auto id = last - static_cast<int64_t>(more) + 1; id <= last; ++id) blocks_.push_back(id);
+    const size_t wanting = count - blocks_.size();
+    if (Room() >= wanting) {
+      Grow(std::min(Room(), std::max(wanting, kMoreBlocks)));
     } else if (HasOldChunk()) {
       RemoveFirstChunk();
     } else {

@@ -76,7 +76,8 @@ class RecordingStore {
   bool HasOldChunk() const;
   void RemoveFirstChunk();
   void Remove(const std::vector<Part>& parts);
-  bool CanGrow(size_t count) const;
+  size_t Room() const;
+  void Grow(size_t count);
   void KeepSpare(size_t count);
   std::vector<int64_t> TakeBlocks(size_t count);
   int64_t TakeRow();
@@ -94,6 +95,9 @@ class RecordingStore {
   // What is free, the one that has been so for longest first.
   std::deque<int64_t> rows_;
   std::deque<int64_t> blocks_;
+  // Blocks that were taken since moments were packed, and the most until that was done.
+  size_t taken_ = 0;
+  size_t mostTaken_ = 0;
 };
 
 }  // namespace ksicache
