@@ -33,7 +33,8 @@ void RepairHead(uint8_t* data, size_t size) {
   PutNumber(data, 28, size / 512);  // pages
   PutNumber(data, 44, 4);           // schema format
   PutNumber(data, 56, 1);           // UTF-8
-  PutNumber(data, 60, 1);           // schema version
+  // Schema version: a recording stays one.
+  PutNumber(data, 60, data[63] == 2 ? 2 : 1);
   PutNumber(data, 68, 0x4b534963);  // a cache file
   PutNumber(data, 92, 1);
 }
