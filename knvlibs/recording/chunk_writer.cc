@@ -50,6 +50,30 @@ Bytes PackNodes(const std::vector<size_t>& nodes, const std::vector<std::vector<
 
 }  // namespace
 
+Bytes MakePart(ByteView head, const std::vector<std::vector<Bytes>>& nodes) {
+  ByteWriter index;
+  index.Raw(head);
+  std::vector<uint64_t> sizes;
+  for (const std::vector<Bytes>& pieces : nodes) {
+    sizes.push_back(SizeOf(pieces));
+    index.Unsigned(sizes.back());
+  }
+  ByteWriter frames;
+  for (const std::vector<size_t>& together : chunk::FramesOf(sizes)) {
+    const Bytes frame = PackNodes(together, nodes);
+    index.Unsigned(frame.size());
+    frames.Raw(frame);
+  }
+  const ByteView whole[] = {index.All()};
+  const Bytes first = Pack(whole);
+  const auto size = static_cast<uint32_t>(first.size());
+  ByteWriter part;
+  part.Raw(std::as_bytes(std::span(&size, 1)));
+  part.Raw(first);
+  part.Raw(frames.All());
+  return part.All();
+}
+
 ChunkWriter::ChunkWriter(HostIdentity host) : host_(std::move(host)) {
   for (const RecordedNode& node : host_.nodes) nodes_.emplace_back(node);
 }
@@ -67,32 +91,13 @@ void ChunkWriter::Add(const MomentFacts& facts, const std::vector<MomentReading>
 }
 
 Bytes ChunkWriter::PartFrom(size_t from) const {
-  std::vector<std::vector<Bytes>> pieces;
-  std::vector<uint64_t> sizes;
-  for (const NodeWriter& node : nodes_) {
-    pieces.push_back(node.PiecesFrom(from));
-    sizes.push_back(SizeOf(pieces.back()));
-  }
-  ByteWriter index;
-  PutHead(from, index);
-  for (const uint64_t size : sizes) index.Unsigned(size);
-  ByteWriter frames;
-  for (const std::vector<size_t>& nodes : chunk::FramesOf(sizes)) {
-    const Bytes frame = PackNodes(nodes, pieces);
-    index.Unsigned(frame.size());
-    frames.Raw(frame);
-  }
-  const ByteView whole[] = {index.All()};
-  const Bytes head = Pack(whole);
-  const auto size = static_cast<uint32_t>(head.size());
-  ByteWriter part;
-  part.Raw(std::as_bytes(std::span(&size, 1)));
-  part.Raw(head);
-  part.Raw(frames.All());
-  return part.All();
+  std::vector<std::vector<Bytes>> nodes;
+  for (const NodeWriter& node : nodes_) nodes.push_back(node.PiecesFrom(from));
+  return MakePart(HeadFrom(from), nodes);
 }
 
-void ChunkWriter::PutHead(size_t from, ByteWriter& out) const {
+Bytes ChunkWriter::HeadFrom(size_t from) const {
+  ByteWriter out;
   out.Byte(from == 0 ? 1 : 0);
   if (from == 0) PutHost(host_, out);
   out.Unsigned(moments_.size() - from);
@@ -101,6 +106,7 @@ void ChunkWriter::PutHead(size_t from, ByteWriter& out) const {
     PutFacts(facts, before, out);
     before = facts;
   }
+  return out.All();
 }
 
 }  // namespace ksi

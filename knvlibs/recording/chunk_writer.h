@@ -11,6 +11,10 @@
 
 namespace ksi {
 
+// A part of its index, as far as it says nothing of nodes, and of what happened to each node, in
+// pieces. Fails with std::length_error if there is more than a part holds.
+Bytes MakePart(ByteView head, const std::vector<std::vector<Bytes>>& nodes);
+
 class ChunkWriter {
  public:
   explicit ChunkWriter(HostIdentity host);
@@ -26,12 +30,11 @@ class ChunkWriter {
   // Takes the next moment of the host, with its readings in the order of SortReadings.
   void Add(const MomentFacts& facts, const std::vector<MomentReading>& readings);
 
-  // The moments from `from` to the last as a part; from 0 on it starts the chunk. Fails with
-  // std::length_error if there is more in it than a part holds.
+  // The moments from `from` to the last as a part; from 0 on it starts the chunk. Fails as MakePart.
   Bytes PartFrom(size_t from) const;
 
  private:
-  void PutHead(size_t from, ByteWriter& out) const;
+  Bytes HeadFrom(size_t from) const;
 
   HostIdentity host_;
   std::vector<MomentFacts> moments_;

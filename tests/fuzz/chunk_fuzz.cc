@@ -1,8 +1,9 @@
 // Parts of a chunk of a recording, as they are before they are packed: the checks of what packs
 // them keep out most of what is changed afterwards.
 //
-// The input is, for each part, up to which moment it is taken (255: to its end), the sizes of its
-// facts and of its changes in 2 bytes each, little-endian, and these.
+// The input is, for each part, up to which moment it is taken (255: to its end), the size of the
+// head of its index in 2 bytes, little-endian, and the head; the number of its nodes, and of each
+// the size of what happened to it in 2 bytes, and that.
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
@@ -13,7 +14,6 @@
 #include "knvlibs/recording/bytes.h"
 #include "knvlibs/recording/chunk_reader.h"
 #include "knvlibs/recording/chunk_writer.h"
-#include "knvlibs/recording/frame.h"
 #include "tests/fuzz/target.h"
 
 namespace {
@@ -32,16 +32,15 @@ size_t TakeSize(ksi::ByteReader& in) {
   return low | size_t{in.Byte()} << 8;
 }
 
-ksi::Bytes Packed(ksi::ByteView content) { return ksi::Pack(std::span(&content, 1)); }
+ksi::ByteView TakeSized(ksi::ByteReader& in) { return in.Raw(TakeSize(in)); }
 
-ksi::Bytes PartOf(ksi::ByteView facts, ksi::ByteView changes) {
-  const ksi::Bytes head = Packed(facts);
-  const auto size = static_cast<uint32_t>(head.size());
-  ksi::ByteWriter part;
-  part.Raw(std::as_bytes(std::span(&size, 1)));
-  part.Raw(head);
-  part.Raw(Packed(changes));
-  return part.All();
+std::vector<std::vector<ksi::Bytes>> TakeNodes(ksi::ByteReader& in) {
+  std::vector<std::vector<ksi::Bytes>> nodes(in.Byte());
+  for (std::vector<ksi::Bytes>& pieces : nodes) {
+    const ksi::ByteView content = TakeSized(in);
+    if (!content.empty()) pieces.emplace_back(content.begin(), content.end());
+  }
+  return nodes;
 }
 
 bool AreDifferent(const std::vector<ksi::MomentReading>& sorted) {
@@ -49,29 +48,30 @@ bool AreDifferent(const std::vector<ksi::MomentReading>& sorted) {
 }
 
 // What was read can be written, and is read again.
-void WriteAgain(const ksi::ChunkReader& reader, const std::vector<ksi::MomentReading>& readings) {
-  ksi::ChunkWriter writer(reader.Host());
-  writer.Add(reader.Facts(), readings);
+void WriteAgain(const ksi::Moment& moment) {
+  ksi::ChunkWriter writer(moment.host);
+  writer.Add(moment.facts, moment.readings);
   ksi::ChunkReader again;
-  std::vector<ksi::MomentReading> read;
+  ksi::Moment read;
   Require(again.Take(writer.PartFrom(0)) == ksi::kOk, "what is written is a part");
   Require(again.ReadAll(read) == ksi::kOk, "what is written can be read");
-  ksi::SortReadings(read);
-  Require(again.Host() == reader.Host() && again.Facts() == reader.Facts() && read == readings,
-          "what is read is what was written");
+  ksi::SortReadings(read.readings);
+  Require(
+      read.host == moment.host && read.facts == moment.facts && read.readings == moment.readings,
+      "what is read is what was written");
 }
 
 void Look(ksi::ChunkReader& reader) {
-  std::vector<ksi::MomentReading> readings;
-  if (reader.ReadAll(readings) != ksi::kOk) return;
-  for (const ksi::MomentReading& each : readings) {
-    Require(each.question.node < reader.Host().nodes.size(), "a reading is of a node");
-    const size_t size = reader.Host().nodes[each.question.node].recordSize;
+  ksi::Moment moment;
+  if (reader.ReadAll(moment) != ksi::kOk) return;
+  for (const ksi::MomentReading& each : moment.readings) {
+    Require(each.question.node < moment.host.nodes.size(), "a reading is of a node");
+    const size_t size = moment.host.nodes[each.question.node].recordSize;
     Require(each.answer.record.size() == (each.answer.status == ksi::kOk ? size : 0),
             "a record has its size");
   }
-  ksi::SortReadings(readings);
-  if (reader.Size() < kSmall && AreDifferent(readings)) WriteAgain(reader, readings);
+  ksi::SortReadings(moment.readings);
+  if (reader.Size() < kSmall && AreDifferent(moment.readings)) WriteAgain(moment);
 }
 
 }  // namespace
@@ -82,14 +82,15 @@ int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   ksi::ChunkReader reader;
   while (in.Left() != 0) {
     const uint8_t last = in.Byte();
-    const size_t factsSize = TakeSize(in);
-    const size_t changesSize = TakeSize(in);
-    const ksi::ByteView facts = in.Raw(factsSize);
-    const ksi::ByteView changes = in.Raw(changesSize);
+    const ksi::ByteView head = TakeSized(in);
+    const auto nodes = TakeNodes(in);
     if (!in.IsGood()) break;
-    if (reader.Take(PartOf(facts, changes), last == kWhole ? SIZE_MAX : last) != ksi::kOk) break;
+    if (reader.Take(ksi::MakePart(head, nodes), last == kWhole ? SIZE_MAX : last) != ksi::kOk) {
+      break;
+    }
     Look(reader);
-    if (last != kWhole) break;
+    // The moments that it was not taken to are gone through.
+    for (; reader.HasNext(); Look(reader)) reader.Next();
   }
   return 0;
 }

@@ -40,6 +40,7 @@ void Use(const std::string& name) {
     std::vector<MomentFacts> facts;
     HostIdentity host;
     Moment moment;
+    ChunkReader reader;
     static_cast<void>(file->ReadFacts(part, facts));
     static_cast<void>(file->ReadHost(part, host));
     static_cast<void>(file->ReadWhole(part.number, reader, moment));
