@@ -1,4 +1,4 @@
-# Completion of ksicache(8) for fish. docs/refresh makes the list of nodes.
+# Completion of ksicache(8) for fish. docs/refresh makes the lists of nodes and reports.
 
 # BEGIN fish_nodes
 function __ksicache_nodes
@@ -44,13 +44,41 @@ function __ksicache_nodes
 end
 # END
 
+# BEGIN fish_report_names
+function __ksicache_report_names
+    printf "%s\t%s\n" \
+        all 'all fifteen' \
+        group-stats 'group stats' \
+        vm-stats 'virtual machine stats' \
+        uw-stats 'user-world stats' \
+        buddy-stats 'memmap buddy stats' \
+        pshare-stats 'pshare stats' \
+        pshareHint-stats 'pshare hint stats' \
+        swap-stats 'virtual machine swap stats' \
+        comp-stats 'comprehensive stats' \
+        lpool-stats 'lpage pool stats' \
+        heap-stats 'heap stats' \
+        guest-stats 'guest stats' \
+        zip-stats 'virtual machine compression stats' \
+        lpage-stats 'virtual machine large page stats' \
+        asyncremap-stats 'async_remap stats' \
+        pmem-stats 'persistent memory stats'
+end
+# END
+
+# The reports, and what makes lists of them of what is there.
+function __ksicache_reports
+    set -l used (commandline -ct | string match -r '.*,')
+    __ksicache_report_names | string match -v -r "^("(string replace -a , '|' -- "$used")")\t" | string replace -r '^' "$used"
+end
+
 # The command and its arguments so far, one a line.
 function __ksicache_words
     set -l words (commandline -opc)
     set -e words[1]
     while set -q words[1]
         switch $words[1]
-            case --root --mode --every --keep --max-size --count
+            case --root --mode --every --keep --max-size --count --format --unit --output -u -o
                 set -e words[1]
             case '-*'
             case '*'
@@ -72,6 +100,12 @@ function __ksicache_wants_node
     test "$words[1]" = dump; and set -q words[2]
 end
 
+# Whether the next argument of export is its reports.
+function __ksicache_wants_reports
+    set -l words (__ksicache_words)
+    test "$words[1]" = export; and not set -q words[2]
+end
+
 function __ksicache_wants_file
     set -l words (__ksicache_words)
     switch "$words[1]"
@@ -81,6 +115,8 @@ function __ksicache_wants_file
             true
         case load extract
             not set -q words[3]
+        case export
+            set -q words[2]
         case '*'
             false
     end
@@ -95,17 +131,22 @@ complete -c ksicache -n $no_command -a extract -d 'Make a capture of a moment'
 complete -c ksicache -n $no_command -a join -d 'Make a recording of captures'
 complete -c ksicache -n $no_command -a info -d 'Say which host a file is of'
 complete -c ksicache -n $no_command -a dump -d 'Show what a file holds'
+complete -c ksicache -n $no_command -a export -d 'Write the rows of reports'
 complete -c ksicache -n $no_command -a load -d 'Make a file from JSON'
 complete -c ksicache -n $no_command -a check -d 'Say what is wrong with a file'
 complete -c ksicache -n $no_command -s h -l help -d 'Print a summary'
 complete -c ksicache -n $no_command -l version -d 'Print the version'
 complete -c ksicache -n __ksicache_wants_file -F
 complete -c ksicache -n __ksicache_wants_node -a '(__ksicache_nodes)'
-complete -c ksicache -n '__ksicache_command capture load extract join' -l force -d 'Replace the file'
-complete -c ksicache -n '__ksicache_command capture record load extract join' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
+complete -c ksicache -n __ksicache_wants_reports -a '(__ksicache_reports)'
+complete -c ksicache -n '__ksicache_command capture load extract join export' -l force -d 'Replace the file'
+complete -c ksicache -n '__ksicache_command capture record load extract join export' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
 complete -c ksicache -n '__ksicache_command capture record' -l root -x -a '(__fish_complete_directories)' -d 'Take the host whose files are there'
 complete -c ksicache -n '__ksicache_command record' -l every -x -a '1s 5s 10s 30s 1m' -d 'Take a moment so often'
 complete -c ksicache -n '__ksicache_command record' -l keep -x -a '1d 7d 30d' -d 'Keep moments so long'
 complete -c ksicache -n '__ksicache_command record' -l max-size -x -a '500M 1G 2G' -d 'Let the file grow so large'
 complete -c ksicache -n '__ksicache_command record' -l count -x -d 'End after so many moments'
 complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'
+complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics' -d 'Write in this format'
+complete -c ksicache -n '__ksicache_command export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
+complete -c ksicache -n '__ksicache_command export' -s o -l output -r -F -d 'Make a file'

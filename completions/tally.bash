@@ -249,12 +249,13 @@ _tally_reply() {
   done
 }
 
-# The same for one more word of a list joined by ':'.
+# The same for one more word of a list joined by ':', or by $4.
 _tally_reply_list() {
-  local start=${2##*:} word words=
+  local by=${4:-:} word words=
+  local start=${2##*"$by"}
   local used=${2%"$start"}
   for word in $3; do
-    if [[ ":${used,,}" != *":${word,,}:"* ]]; then words+=" $word"; fi
+    if [[ "$by${used,,}" != *"$by${word,,}$by"* ]]; then words+=" $word"; fi
   done
   compopt -o nospace
   _tally_reply "$1$used" "$start" "$words"
@@ -349,6 +350,8 @@ declare -gA _ksicache_values=(
   [--every]='1s 5s 10s 30s 1m'
   [--keep]='1d 7d 30d'
   [--max-size]='500M 1G 2G'
+  [--format]='csv json sqlite openmetrics'
+  [--unit]='mb kb pg b'
 )
 
 _ksicache() {
@@ -358,7 +361,7 @@ _ksicache() {
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
     if [[ -n $skip ]]; then
       skip=
-    elif [[ $word =~ ^--(root|mode|every|keep|max-size|count)$ ]]; then
+    elif [[ $word =~ ^(--(root|mode|every|keep|max-size|count|format|unit|output)|-[uo])$ ]]; then
       skip=$word
     elif [[ $word != -* ]]; then
       if [[ -z $command ]]; then command=$word; else count=$((count + 1)); fi
@@ -369,8 +372,14 @@ _ksicache() {
   if [[ -z $skip && $word == --*=* ]]; then
     skip=${word%%=*} head=${word%%=*}= word=${word#*=}
   fi
+  case $skip in
+    -u) skip=--unit ;;
+    -o) skip=--output ;;
+  esac
   if [[ $skip == --root ]]; then
     _tally_reply_files "$head" "$word" -d
+  elif [[ $skip == --output ]]; then
+    _tally_reply_files "$head" "$word" -f
   elif [[ -n $skip ]]; then
     _tally_reply "$head" "$word" "${_ksicache_values[$skip]-}"
   elif [[ $word == -* ]]; then
@@ -378,18 +387,21 @@ _ksicache() {
       capture) _tally_reply '' "$word" '--force --mode --root' ;;
       record) _tally_reply '' "$word" '--every --keep --max-size --count --mode --root' ;;
       dump) _tally_reply '' "$word" --json ;;
+      export) _tally_reply '' "$word" '--format --unit -u --output -o --force --mode' ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac
   else
     case $command$count in
       0)
-        _tally_reply '' "$word" 'capture record moments extract join info dump load check'
+        _tally_reply '' "$word" 'capture record moments extract join info dump export load check'
         ;;
       capture0 | record0 | moments* | extract[01] | join* | info* | dump0 | check* | load[01])
         _tally_reply_files '' "$word" -f
         ;;
       dump*) _tally_reply '' "$word" "$_ksicache_nodes" ;;
+      export0) _tally_reply_list '' "$word" "all $_tally_reports" , ;;
+      export*) _tally_reply_files '' "$word" -f ;;
     esac
   fi
 }

@@ -62,9 +62,11 @@ struct Figure {
   uint8_t bits;   // of the record's number; 0 for a text
   bool isSigned;  // the number is printed with a sign
   InTotal inTotal;
-  Conversion toUnit;  // null for what is shown as it is
+  Conversion toUnit;       // null for what is shown as it is
+  bool isKey = false;      // tells, with the other keys, what the row is of
+  bool isCounter = false;  // only grows, as long as what it counts is there
 
-  bool IsNumber() const { return kind != Kind::text && kind != Kind::flag; }
+  constexpr bool IsNumber() const { return kind != Kind::text && kind != Kind::flag; }
 
   // Whether the kernel has no value for the figure: all of the number's bits are ones.
   bool IsNone(const Cell& cell) const {
@@ -136,6 +138,21 @@ struct Column : ColumnInfo {
   constexpr Column Fixed() const {
     Column column = *this;
     column.desc.fixed = 1;
+    return column;
+  }
+
+  // What the row is of, together with the report's other keys: no two rows of a moment have the
+  // same keys, and rows of two moments with the same keys are of the same thing.
+  constexpr Column Key() const {
+    Column column = *this;
+    column.figure.isKey = true;
+    return column;
+  }
+
+  // Counted from when the thing came to be, and never reset.
+  constexpr Column Ever() const {
+    Column column = *this;
+    column.figure.isCounter = true;
     return column;
   }
 };
@@ -298,6 +315,12 @@ constexpr bool CanBeTotal(const Figure& figure) {
   return (figure.inTotal == kLabel) == (figure.kind == Kind::text);
 }
 
+// Whether what the column counts can be counted, and what it tells apart can be told.
+constexpr bool CanBeMarked(const Figure& figure) {
+  const bool isName = figure.kind == Kind::text || figure.kind == Kind::id;
+  return (!figure.isKey || isName) && (!figure.isCounter || (figure.IsNumber() && !isName));
+}
+
 }  // namespace column_internal
 
 // Whether a column can be printed and added up as it says.
@@ -306,7 +329,7 @@ constexpr bool IsSound(const ColumnInfo& column) {
   const ColumnDesc& desc = column.desc;
   return IsName(desc.name) && IsPrintable(desc.description) && desc.width > 0 &&
          desc.conversion != nullptr && Prints(desc.conversion, column.figure) &&
-         CanBeTotal(column.figure);
+         CanBeTotal(column.figure) && CanBeMarked(column.figure);
 }
 
 // Whether all columns of a table are sound and their names differ, whatever the case.

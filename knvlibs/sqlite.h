@@ -41,6 +41,7 @@ class Statement {
   // Parameters count from 1. A text is copied; a blob must live until the statement is stepped for
   // the last time or bound anew.
   int Bind(int parameter, int64_t number) { return sqlite3_bind_int64(handle_, parameter, number); }
+  int Bind(int parameter, double number) { return sqlite3_bind_double(handle_, parameter, number); }
   int Bind(int parameter, std::string_view text) {
     return sqlite3_bind_text(handle_, parameter, text.data() == nullptr ? "" : text.data(),
                              static_cast<int>(text.size()), SQLITE_TRANSIENT);

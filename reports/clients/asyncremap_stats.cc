@@ -30,21 +30,30 @@ struct RemapRow {
 
 // sic: C23
 constexpr Column<RemapRow> kColumns[] = {
-    Text("name", "Group name", [](const RemapRow& row) { return row.name; }).Wide(27),
-    Id("grpLeader", "Group leader ID", [](const RemapRow& row) { return row.grpLeader; }),
-    Text("type", "Type of remap", [](const RemapRow& row) { return row.type; }).Wide(28).Fixed(),
+    Text("name", "Group name", [](const RemapRow& row) { return row.name; }).Key().Wide(27),
+    Id("grpLeader", "Group leader ID", [](const RemapRow& row) { return row.grpLeader; }).Key(),
+    Text("type", "Type of remap", [](const RemapRow& row) { return row.type; })
+        .Key()
+        .Wide(28)
+        .Fixed(),
     Pages("added", "Total number of pages ever added",
-          [](const RemapRow& row) { return row.pages.added; }),
+          [](const RemapRow& row) { return row.pages.added; })
+        .Ever(),
     Pages("prepared", "Number of pages ever prepared",
-          [](const RemapRow& row) { return row.pages.prepared; }),
+          [](const RemapRow& row) { return row.pages.prepared; })
+        .Ever(),
     Pages("filtered", "Number of pages ever filtered",
-          [](const RemapRow& row) { return row.pages.filtered; }),
+          [](const RemapRow& row) { return row.pages.filtered; })
+        .Ever(),
     Pages("staged", "Number of pages ever staged",
-          [](const RemapRow& row) { return row.pages.staged; }),
+          [](const RemapRow& row) { return row.pages.staged; })
+        .Ever(),
     Pages("remapped", "Total number of pages ever remapped",
-          [](const RemapRow& row) { return row.pages.remapped; }),
+          [](const RemapRow& row) { return row.pages.remapped; })
+        .Ever(),
     Pages("canceled", "Total number of pages ever canceled",
-          [](const RemapRow& row) { return row.pages.canceled; }),
+          [](const RemapRow& row) { return row.pages.canceled; })
+        .Ever(),
     Pages("cUnprepared", "Number of pages currently unprepared",
           [](const RemapRow& row) { return row.pages.cUnprepared; }),
     Pages("cPrepared", "Number of pages currently prepared",

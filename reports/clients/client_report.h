@@ -37,12 +37,14 @@ uint64_t Consumed(const Tally& tally) {
 // The columns of these figures; a Row has a member `client`.
 template <class Row>
 constexpr Column<Row> NameColumn(const char* description) {
-  return Text("name", description, [](const Row& row) { return FixedText(row.client.name.text); });
+  return Text("name", description, [](const Row& row) { return FixedText(row.client.name.text); })
+      .Key();
 }
 
 template <class Row>
-constexpr Column<Row> kSchedGrpColumn = Id("schedGrp", "Scheduler group ID",
-                                           [](const Row& row) { return row.client.schedGrp; });
+constexpr Column<Row> kSchedGrpColumn = Id("schedGrp", "Scheduler group ID", [](const Row& row) {
+                                          return row.client.schedGrp;
+                                        }).Key();
 
 template <class Row>
 constexpr Column<Row> kParSchedGroupColumn =

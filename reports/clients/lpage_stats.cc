@@ -32,23 +32,30 @@ constexpr Column<LPageStatsRow> kColumns[] = {
     Count("nrBackings", "Current number of lpage backings",
           [](const LPageStatsRow& row) { return row.lpage.nrBackings; }),
     Count("nrAllocSuccess", "Number of lpage mapping attempts succeeded",
-          [](const LPageStatsRow& row) { return row.lpage.nrAllocSuccess; }),
+          [](const LPageStatsRow& row) { return row.lpage.nrAllocSuccess; })
+        .Ever(),
     Count("nrLocked", "Number of guest lpage mappings created",
           [](const LPageStatsRow& row) { return row.lpage.nrLocked; })
+        .Ever()
         .As("Lu"),
     Count("nrBroken", "Number of guest lpage mappings broken",
-          [](const LPageStatsRow& row) { return row.lpage.nrBroken; }),
+          [](const LPageStatsRow& row) { return row.lpage.nrBroken; })
+        .Ever(),
     Count("maxSwapThreshold", "Current max swap-in threshold to map lpage",
           [](const LPageStatsRow& row) { return row.lpage.maxSwapThreshold; })
         .As("Lu"),
     Count("nrFailPinned", "Number of lpage mapping attempts failed due to pinning",
-          [](const LPageStatsRow& row) { return row.lpage.nrFailPinned; }),
+          [](const LPageStatsRow& row) { return row.lpage.nrFailPinned; })
+        .Ever(),
     Count("nrFailSwapped", "Number of lpage mapping attempts failed to avoid excessive swapins",
-          [](const LPageStatsRow& row) { return row.lpage.nrFailSwapped; }),
+          [](const LPageStatsRow& row) { return row.lpage.nrFailSwapped; })
+        .Ever(),
     Count("nrFailPinnedLate", "Number of lpage mapping attempts failed due to late pinning",
-          [](const LPageStatsRow& row) { return row.lpage.nrFailPinnedLate; }),
+          [](const LPageStatsRow& row) { return row.lpage.nrFailPinnedLate; })
+        .Ever(),
     Count("nrFailNoMem", "Number of lpage mapping attempts failed due to lack of memory",
-          [](const LPageStatsRow& row) { return row.lpage.nrFailNoMem; }),
+          [](const LPageStatsRow& row) { return row.lpage.nrFailNoMem; })
+        .Ever(),
 };
 static_assert(IsSound(kColumns));
 

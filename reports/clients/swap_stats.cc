@@ -41,7 +41,8 @@ constexpr Column<SwapStatsRow> kColumns[] = {
               [](const SwapStatsRow& row) { return row.swap.cacheUsage; })
         .Total(kBlank),
     Time("swapoutReady", "Ready-time spent by swap-out client",
-         [](const SwapStatsRow& row) { return row.swap.swapoutReady; }),
+         [](const SwapStatsRow& row) { return row.swap.swapoutReady; })
+        .Ever(),
     Kilobytes("swapTgt", "Host swap target",
               [](const SwapStatsRow& row) { return row.swap.swapTgt; }),
     Kilobytes("swapped", "Amount swapped by host",
@@ -49,19 +50,25 @@ constexpr Column<SwapStatsRow> kColumns[] = {
     Kilobytes("swapRead", "Total guest phsyical memory read, and not released, from swap space",
               [](const SwapStatsRow& row) { return row.swap.swapRead; }),
     Kilobytes("swapIn", "Total guest phsyical memory swapped in, and released, from swap space",
-              [](const SwapStatsRow& row) { return row.swap.swapIn; }),
+              [](const SwapStatsRow& row) { return row.swap.swapIn; })
+        .Ever(),
     Kilobytes("swapOut", "Total guest physical memory swapped out to swap space",
-              [](const SwapStatsRow& row) { return row.swap.swapOut; }),
+              [](const SwapStatsRow& row) { return row.swap.swapOut; })
+        .Ever(),
     Kilobytes("discarded", "Total swapped memory discarded from swap space",
-              [](const SwapStatsRow& row) { return row.swap.discarded; }),
+              [](const SwapStatsRow& row) { return row.swap.discarded; })
+        .Ever(),
     Kilobytes("COWSwapper",
               "Total guest physical memory swapped out which was marked as COW by Kernova",
-              [](const SwapStatsRow& row) { return row.swap.COWSwapper; }),
+              [](const SwapStatsRow& row) { return row.swap.COWSwapper; })
+        .Ever(),
     Count("vmmSwapOn", "Number of times vmm swapper was turned on",
           [](const SwapStatsRow& row) { return row.swap.vmmSwapOn; })
+        .Ever()
         .As("Lu"),
     Count("knvSwapOn", "Number of times knv swapper was turned on",
           [](const SwapStatsRow& row) { return row.swap.knvSwapOn; })
+        .Ever()
         .As("Lu"),
     Kilobytes("llswapped", "Memory swapped to llswap",
               [](const SwapStatsRow& row) { return row.vmm.llswapped; }),
@@ -74,9 +81,11 @@ constexpr Column<SwapStatsRow> kColumns[] = {
     Kilobytes("cptTgt", "Total checkpoint memory to read",
               [](const SwapStatsRow& row) { return row.swap.cptTgt; }),
     Kilobytes("cptRead", "Checkpoint memory read from checkpoint file",
-              [](const SwapStatsRow& row) { return row.swap.cptRead; }),
+              [](const SwapStatsRow& row) { return row.swap.cptRead; })
+        .Ever(),
     Kilobytes("cptWritten", "Checkpoint memory written to checkpoint file",
-              [](const SwapStatsRow& row) { return row.swap.cptWritten; }),
+              [](const SwapStatsRow& row) { return row.swap.cptWritten; })
+        .Ever(),
     Kilobytes("totalMig", "Total space in the migration swap file",
               [](const SwapStatsRow& row) { return row.swap.totalMig; }),
     Kilobytes("freeMig", "Free space in the migration swap file",
@@ -84,9 +93,11 @@ constexpr Column<SwapStatsRow> kColumns[] = {
     Kilobytes("gblSwapRead", "Guest physical memory read from global swap file",
               [](const SwapStatsRow& row) { return row.swap.gblSwapRead; }),
     Kilobytes("gblSwapIn", "Guest physical memory swapped in from global swap file",
-              [](const SwapStatsRow& row) { return row.swap.gblSwapIn; }),
+              [](const SwapStatsRow& row) { return row.swap.gblSwapIn; })
+        .Ever(),
     Kilobytes("gblSwapOut", "Guest physical memory swapped out to global swap file",
-              [](const SwapStatsRow& row) { return row.swap.gblSwapOut; }),
+              [](const SwapStatsRow& row) { return row.swap.gblSwapOut; })
+        .Ever(),
 };
 static_assert(IsSound(kColumns));
 

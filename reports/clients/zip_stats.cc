@@ -34,11 +34,14 @@ constexpr Column<ZipStatsRow> kColumns[] = {
     Kilobytes("usedCache", "Total compression cache used",
               [](const ZipStatsRow& row) { return row.zip.usedCache; }),
     Kilobytes("zipped", "Total memory compressed",
-              [](const ZipStatsRow& row) { return row.zip.zipped; }),
+              [](const ZipStatsRow& row) { return row.zip.zipped; })
+        .Ever(),
     Kilobytes("unZipped", "Total memory decompressed",
-              [](const ZipStatsRow& row) { return row.zip.unZipped; }),
+              [](const ZipStatsRow& row) { return row.zip.unZipped; })
+        .Ever(),
     Kilobytes("zipRejected", "Total memory rejected",
-              [](const ZipStatsRow& row) { return row.zip.zipRejected; }),
+              [](const ZipStatsRow& row) { return row.zip.zipRejected; })
+        .Ever(),
     Count("nrFreeHalf", "Total free half pages",
           [](const ZipStatsRow& row) { return row.zip.nrFreeHalf; })
         .As("Lu"),

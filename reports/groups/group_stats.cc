@@ -67,9 +67,10 @@ int64_t LimitOrNone(int64_t kilobytes) {
 }
 
 constexpr GroupColumn kColumns[] = {
-    {Id("gid", "Group ID", [](const GroupRow& row) { return row.gid; }).Wide(8).Fixed(),
+    {Id("gid", "Group ID", [](const GroupRow& row) { return row.gid; }).Key().Wide(8).Fixed(),
      InTag::slot},
     {Text("name", "Group name", [](const GroupRow& row) { return FixedText(row.name.text); })
+         .Key()
          .Wide(28),
      InTag::slot},
     {Id("parGid", "Parent group ID", [](const GroupRow& row) { return row.parGid; }).Wide(8),

@@ -52,6 +52,7 @@ constexpr auto kUsed = [](const BuddyRow& row) { return row.stats.buffers[kSize]
 // sic: C29
 constexpr Column<BuddyRow> kColumns[] = {
     Text("name", "Name of the buddy", [](const BuddyRow& row) { return row.name; })
+        .Key()
         .Wide(20)
         .Total(kLabel),
     Id("memNode", "Memory node the buddy belongs to",

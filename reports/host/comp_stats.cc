@@ -74,15 +74,20 @@ constexpr Column<CompRow> kColumns[] = {
     Kilobytes("free", "Available (Free) physical memory",
               [](const CompRow& row) { return row.memory.free; }),
     Count("numHigh", "Num times host in high state",
-          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_HIGH); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_HIGH); })
+        .Ever(),
     Count("numClear", "Num times host in clear state",
-          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_CLEAR); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_CLEAR); })
+        .Ever(),
     Count("numSoft", "Num times host in soft state",
-          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_SOFT); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_SOFT); })
+        .Ever(),
     Count("numHard", "Num of times host in hard state",
-          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_HARD); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_HARD); })
+        .Ever(),
     Count("numLow", "Num of times host in low state",
-          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_LOW); }),
+          [](const CompRow& row) { return Entries(row, KSI_MEMORY_STATE_LOW); })
+        .Ever(),
     Text("memState", "Current memory state",
          [](const CompRow& row) {
            const uint32_t state = row.tally.memState;

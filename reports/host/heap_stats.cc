@@ -29,6 +29,7 @@ constexpr ReportFrame kFrame = {
 // sic: C39
 constexpr Column<KSI_HeapStats> kColumns[] = {
     Text("name", "heap name", [](const KSI_HeapStats& heap) { return FixedText(heap.name); })
+        .Key()
         .Wide(35)
         .Total(kLabel)
         .Fixed(),
@@ -72,14 +73,18 @@ constexpr Column<KSI_HeapStats> kColumns[] = {
         .AsSigned("d"),
     Count("numSuccAllocs", "number of succeeded allocations",
           [](const KSI_HeapStats& heap) { return heap.numSuccAllocs; })
+        .Ever()
         .Total(kBlank),
     Count("numFailAllocs", "number of succeeded allocations",
           [](const KSI_HeapStats& heap) { return heap.numFailAllocs; })
+        .Ever()
         .Total(kBlank),
     Count("numGrowthOps", "number of growth operations",
-          [](const KSI_HeapStats& heap) { return heap.numGrowthOps; }),
+          [](const KSI_HeapStats& heap) { return heap.numGrowthOps; })
+        .Ever(),
     Count("numShrinkOps", "number of shrink operations",
-          [](const KSI_HeapStats& heap) { return heap.numShrinkOps; }),
+          [](const KSI_HeapStats& heap) { return heap.numShrinkOps; })
+        .Ever(),
     Count("numReqsPerGrowth", "number of requests per growth operations",
           [](const KSI_HeapStats& heap) { return heap.numReqsPerGrowth; })
         .Total(kBlank),

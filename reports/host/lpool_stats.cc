@@ -30,10 +30,12 @@ struct LPoolRow {
 // sic: C34
 constexpr Column<LPoolRow> kColumns[] = {
     Text("name", "Large page pool name", [](const LPoolRow& row) { return row.name; })
+        .Key()
         .Wide(15)
         .Total(kLabel)
         .Fixed(),
     Id("nodeID", "Home memory node the pool", [](const LPoolRow& row) { return row.nodeID; })
+        .Key()
         .Wide(7),
     Count("nrLPages", "# of large pages in the pool",
           [](const LPoolRow& row) { return row.pool.nrLPages; })
@@ -43,33 +45,42 @@ constexpr Column<LPoolRow> kColumns[] = {
         .Wide(16),
     Count("nrSPageAllocs", "Total small page alloc count",
           [](const LPoolRow& row) { return row.pool.nrSPageAllocs; })
+        .Ever()
         .Wide(16),
     Count("nrSPageFrees", "Total small page free count",
           [](const LPoolRow& row) { return row.pool.nrSPageFrees; })
+        .Ever()
         .Wide(16),
     Count("nrReapAttempts", "Total reap attemts",
           [](const LPoolRow& row) { return row.pool.nrReapAttempts; })
+        .Ever()
         .Wide(16),
     Count("nrSPagesReaped", "Total number of small pages reaped",
           [](const LPoolRow& row) { return row.pool.nrSPagesReaped; })
+        .Ever()
         .Wide(16),
     Count("nrDefragAttempts", "Total large page defrag attempts",
           [](const LPoolRow& row) { return row.pool.nrDefragAttempts; })
+        .Ever()
         .Wide(16),
     Count("nrDefragCancelled", "Total defrag attempts cancelled",
           [](const LPoolRow& row) { return row.pool.nrDefragCancelled; })
+        .Ever()
         .Wide(16),
     Count("nrDefragReaped", "Total defrag attempts reaped",
           [](const LPoolRow& row) { return row.pool.nrDefragReaped; })
+        .Ever()
         .Wide(16),
     Count("nrLPagesDefragged", "Total number of large pages defragged",
           [](const LPoolRow& row) { return row.pool.nrLPagesDefragged; })
+        .Ever()
         .Wide(16),
     Count("peakDefragAttempts", "Peak defrag attempts for any large page",
           [](const LPoolRow& row) { return row.pool.peakDefragAttempts; })
         .Wide(16),
     Count("nrCachehit", "Hit count in lpage victim cache",
           [](const LPoolRow& row) { return row.pool.nrCachehit; })
+        .Ever()
         .Wide(16),
 };
 static_assert(IsSound(kColumns));

@@ -54,7 +54,7 @@ struct RegionRow {
 };
 
 constexpr Column<VolumeRow> kVolumeColumns[] = {
-    Text("uuid", "Volume UUID", [](const VolumeRow& row) { return row.uuid; }).Wide(40),
+    Text("uuid", "Volume UUID", [](const VolumeRow& row) { return row.uuid; }).Key().Wide(40),
     Count("alloc2MBlocks", "Allocated 2M Blocks",
           [](const VolumeRow& row) { return row.store.alloc2MBlocks; }),
     Count("resvd2MBlocks", "Reserved 2M Blocks",
@@ -76,8 +76,10 @@ constexpr Column<VolumeRow> kVolumeColumns[] = {
 static_assert(IsSound(kVolumeColumns));
 
 constexpr Column<RegionRow> kRegionColumns[] = {
-    Text("uuid", "Volume UUID", [](const RegionRow& row) { return row.uuid; }).Wide(40),
-    Text("regionUuid", "Region UUID", [](const RegionRow& row) { return row.regionUuid; }).Wide(40),
+    Text("uuid", "Volume UUID", [](const RegionRow& row) { return row.uuid; }).Key().Wide(40),
+    Text("regionUuid", "Region UUID", [](const RegionRow& row) { return row.regionUuid; })
+        .Key()
+        .Wide(40),
     Bytes("size", "Region memory size", [](const RegionRow& row) { return row.region.size; })
         .Wide(14),
     Count("reserved", "Reserved 2M blocks",

@@ -29,9 +29,13 @@ struct HintRow {
 constexpr Column<HintRow> kColumns[] = {
     Text("type", "Hint type (regular or large page hint)",
          [](const HintRow& row) { return row.type; })
+        .Key()
         .Total(kLabel),
-    Pages("totAdd", "Total hints added", [](const HintRow& row) { return row.totAdd; }).Wide(15),
+    Pages("totAdd", "Total hints added", [](const HintRow& row) { return row.totAdd; })
+        .Ever()
+        .Wide(15),
     Pages("totRemove", "Total hints removed", [](const HintRow& row) { return row.totRemove; })
+        .Ever()
         .Wide(15),
     Pages("active", "Currently active hints", [](const HintRow& row) { return row.active; })
         .Wide(15),

@@ -30,9 +30,11 @@ constexpr Column<KSI_PshareStats> kColumns[] = {
     Pages("reclaimed", "Machine memory reclaimed via pshare",
           [](const KSI_PshareStats& row) { return row.reclaimed; }),
     Pages("totAdd", "Total client memory added to pshare table",
-          [](const KSI_PshareStats& row) { return row.totAdd; }),
+          [](const KSI_PshareStats& row) { return row.totAdd; })
+        .Ever(),
     Pages("totRemove", "Total client memory removed from pshare table",
-          [](const KSI_PshareStats& row) { return row.totRemove; }),
+          [](const KSI_PshareStats& row) { return row.totRemove; })
+        .Ever(),
 };
 static_assert(IsSound(kColumns));
 

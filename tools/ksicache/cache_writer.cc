@@ -1,6 +1,5 @@
 #include "tools/ksicache/cache_writer.h"
 
-#include <new>
 #include <utility>
 
 #include "knvlibs/cache_format.h"
@@ -11,8 +10,6 @@ namespace {
 
 enum Parameter { kKey1 = 1, kKey2, kNode, kStatus, kAnswer };
 enum EntryParameter { kPosition = 4, kEntry };
-
-constexpr const char* kMain = "main";  // SQLite's name for the database of a connection
 
 // A node's identifier in the file: its value's, and the next for its list.
 int64_t RowId(const ksi::Node& node, ksi::Kind kind) {
@@ -27,48 +24,21 @@ void CheckText(std::string_view text) {
 
 }  // namespace
 
-CacheContent::CacheContent(std::string name) : name_(std::move(name)) {
-  Open();
-  Execute("PRAGMA application_id=" + std::to_string(ksi::cache::kApplicationId));
-  Execute("PRAGMA user_version=" + std::to_string(ksi::cache::kSchemaVersion));
-  Execute("BEGIN");
-  for (const ksi::cache::Table& table : ksi::cache::kTables) Execute(std::string(table.sql));
+CacheContent::CacheContent(std::string name)
+    : database_(std::move(name),
+                "PRAGMA application_id=" + std::to_string(ksi::cache::kApplicationId) +
+                    ";PRAGMA user_version=" + std::to_string(ksi::cache::kSchemaVersion)) {
+  for (const ksi::cache::Table& table : ksi::cache::kTables) {
+    database_.Execute(std::string(table.sql));
+  }
   WriteNodes();
-  Require(addReading_.Prepare(database_.get(), "INSERT INTO reading VALUES(?1, ?2, ?3, ?4, ?5)") ==
-          SQLITE_OK);
-  Require(addEntry_.Prepare(database_.get(), "INSERT INTO instance VALUES(?1, ?2, ?3, ?4, ?5)") ==
-          SQLITE_OK);
-}
-
-void CacheContent::Open() {
-  sqlite3* handle = nullptr;
-  const int code =
-      sqlite3_open_v2("capture", &handle,
-                      SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOMUTEX, "memdb");
-  database_.reset(handle);
-  Require(code == SQLITE_OK);
-  sqlite3_int64 limit = kLargestFile;
-  Require(sqlite3_file_control(handle, kMain, SQLITE_FCNTL_SIZE_LIMIT, &limit) == SQLITE_OK);
-  // The file is nobody's until it is whole, so a failure needs no journal.
-  Execute("PRAGMA journal_mode=OFF");
-}
-
-void CacheContent::Execute(const std::string& sql) {
-  Require(sqlite3_exec(database_.get(), sql.c_str(), nullptr, nullptr, nullptr) == SQLITE_OK);
-}
-
-void CacheContent::Require(bool good) {
-  if (good) return;
-  const int code = database_ == nullptr ? SQLITE_NOMEM : sqlite3_extended_errcode(database_.get());
-  if (code == SQLITE_NOMEM || code == SQLITE_IOERR_NOMEM) throw std::bad_alloc();
-  const std::string reason =
-      code == SQLITE_FULL ? "it is larger than 1 GiB" : sqlite3_errmsg(database_.get());
-  throw Error(name_ + ": cannot write: " + reason);
+  database_.Prepare("INSERT INTO reading VALUES(?1, ?2, ?3, ?4, ?5)", addReading_);
+  database_.Prepare("INSERT INTO instance VALUES(?1, ?2, ?3, ?4, ?5)", addEntry_);
 }
 
 void CacheContent::WriteNodes() {
   ksi::Statement insert;
-  Require(insert.Prepare(database_.get(), "INSERT INTO node VALUES(?1, ?2, ?3)") == SQLITE_OK);
+  database_.Prepare("INSERT INTO node VALUES(?1, ?2, ?3)", insert);
   const auto write = [&](const ksi::Node& node, ksi::Kind kind, std::string_view name) {
     Require(insert.Bind(1, RowId(node, kind)) == SQLITE_OK);
     Require(insert.Bind(2, node.path) == SQLITE_OK);
@@ -146,8 +116,7 @@ void CacheContent::AddList(const ksi::Node& node, const ksi::Keys& keys,
 
 void CacheContent::WriteCapture(const ksi::CacheFile::Capture& capture) {
   ksi::Statement insert;
-  Require(insert.Prepare(database_.get(), "INSERT INTO capture VALUES(?1, ?2, ?3, ?4)") ==
-          SQLITE_OK);
+  database_.Prepare("INSERT INTO capture VALUES(?1, ?2, ?3, ?4)", insert);
   int parameter = 0;
   for (const std::string* member :
        {&capture.signature, &capture.built, &capture.host, &capture.taken}) {
@@ -160,12 +129,7 @@ std::span<const std::byte> CacheContent::Finish(const ksi::CacheFile::Capture& c
   WriteCapture(capture);
   addReading_ = {};
   addEntry_ = {};
-  Execute("COMMIT");
-  sqlite3_int64 size = 0;
-  const auto* content = reinterpret_cast<const std::byte*>(
-      sqlite3_serialize(database_.get(), kMain, &size, SQLITE_SERIALIZE_NOCOPY));
-  Require(content != nullptr);
-  return {content, static_cast<size_t>(size)};
+  return database_.Finish();
 }
 
 }  // namespace ksicache

@@ -12,6 +12,7 @@
 #include "knvlibs/cache_file.h"
 #include "knvlibs/source.h"
 #include "knvlibs/sqlite.h"
+#include "tools/ksicache/memory_database.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/reading_sink.h"
 
@@ -20,7 +21,7 @@ namespace ksicache {
 // Every call fails with an Error, a DataError if what it was given cannot be written.
 class CacheContent : public ReadingSink {
  public:
-  static constexpr int64_t kLargestFile = int64_t{1} << 30;
+  static constexpr int64_t kLargestFile = MemoryDatabase::kLargestFile;
 
   // What to call it in a message.
   explicit CacheContent(std::string name);
@@ -40,14 +41,12 @@ class CacheContent : public ReadingSink {
   // The bytes of the file, which live as long as this. Nothing can be added any more.
   std::span<const std::byte> Finish(const ksi::CacheFile::Capture& capture);
 
-  const std::string& Name() const { return name_; }
+  const std::string& Name() const { return database_.Name(); }
   size_t Values() const { return values_; }
   size_t Lists() const { return lists_; }
 
  private:
-  void Open();
-  void Execute(const std::string& sql);
-  void Require(bool good);
+  void Require(bool good) const { database_.Require(good); }
   void WriteNodes();
   void WriteCapture(const ksi::CacheFile::Capture& capture);
   void BindKey(ksi::Statement& statement, int parameter, const ksi::Key& key);
@@ -55,8 +54,7 @@ class CacheContent : public ReadingSink {
   // Adds the row of which the answer is bound already.
   void AddReading(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys, ksi::Status status);
 
-  std::string name_;
-  ksi::Database database_;
+  MemoryDatabase database_;
   ksi::Statement addReading_;
   ksi::Statement addEntry_;
   int64_t position_ = 0;  // of the list's next entry

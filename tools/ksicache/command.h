@@ -17,6 +17,7 @@ struct Option {
   const char* name;   // without its dashes
   const char* value;  // what the value is called, null if it takes none
   const char* help;
+  char letter = '\0';  // a short name; none
 };
 
 // What was given to a command.

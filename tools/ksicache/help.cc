@@ -10,8 +10,8 @@ namespace ksicache {
 namespace {
 
 constexpr std::string_view kPurpose = R"(
-Captures, shows, makes and checks KSI cache files, which `tally -c FILE` reads
-instead of the host it runs on.
+Captures, shows, exports, makes and checks KSI cache files, which `tally -c FILE`
+reads instead of the host it runs on.
 )";
 
 constexpr std::string_view kExitStatus = R"(
@@ -19,7 +19,7 @@ Exit status: 0 if all went well, 1 if something failed or check found something
 wrong, 2 if the command line is wrong.
 )";
 
-constexpr Option kHelpOption = {"help", nullptr, "show this message"};
+constexpr Option kHelpOption = {"help", nullptr, "show this message", 'h'};
 constexpr Option kVersionOption = {"version", nullptr, "show the version"};
 
 using Options = std::vector<const Option*>;
@@ -48,7 +48,9 @@ std::string OptionList(const Options& options) {
   for (const Option* option : options) {
     std::string spelling = Spelling(*option);
     spelling.resize(width, ' ');
-    list += (option == &kHelpOption ? "  -h, " : "      ") + spelling + "  " + option->help + "\n";
+    const std::string letter = {'-', option->letter, ',', ' '};
+    list +=
+        "  " + (option->letter == '\0' ? "    " : letter) + spelling + "  " + option->help + "\n";
   }
   return list;
 }

@@ -28,7 +28,7 @@ struct Given {
   CommandLine line;
 };
 
-std::vector<option> LongOptions(Given& given) {
+std::vector<option> LongOptions(Given& given, std::string& letters) {
   std::vector<option> options = {{"help", no_argument, nullptr, kHelpLetter},
                                  {"version", no_argument, nullptr, kVersionLetter}};
   for (const Command* command : kCommands) {
@@ -38,19 +38,32 @@ std::vector<option> LongOptions(Given& given) {
       options.push_back(
           {each->name, each->value == nullptr ? no_argument : required_argument, nullptr, letter});
       given.all.push_back(each);
+      if (each->letter == '\0') continue;
+      letters += each->letter;
+      if (each->value != nullptr) letters += ':';
     }
   }
   options.push_back({nullptr, 0, nullptr, 0});
   return options;
 }
 
+// The one that getopt_long has found; null if it is none of a command.
+const Option* FindOption(const Given& given, int letter) {
+  if (letter >= kFirstOption) return given.all[static_cast<size_t>(letter - kFirstOption)];
+  const auto found = std::ranges::find_if(given.all, [&](const Option* each) {
+    return each->letter != '\0' && each->letter == letter;
+  });
+  return found == given.all.end() ? nullptr : *found;
+}
+
 Given Parse(int argc, char** argv) {
   Given given;
-  const std::vector<option> options = LongOptions(given);
+  std::string letters = "h";
+  const std::vector<option> options = LongOptions(given, letters);
   opterr = 0;
-  for (int letter; (letter = getopt_long(argc, argv, "h", options.data(), nullptr)) != -1;) {
-    if (letter >= kFirstOption) {
-      const Option* each = given.all[static_cast<size_t>(letter - kFirstOption)];
+  for (int letter;
+       (letter = getopt_long(argc, argv, letters.c_str(), options.data(), nullptr)) != -1;) {
+    if (const Option* each = FindOption(given, letter)) {
       given.line.options[each] = optarg == nullptr ? "" : optarg;
     } else if (letter == kHelpLetter) {
       given.help = true;

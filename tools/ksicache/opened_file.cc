@@ -159,6 +159,13 @@ std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName) {
   return recording;
 }
 
+MomentHead HeadOf(const std::string& name) {
+  ksi::ChunkReader moment;
+  const ksi::OpenedCache opened = OpenAny(name, moment);
+  if (opened.recording != nullptr) return {moment.Host().name, moment.Facts().taken};
+  return {opened.capture->GetCapture().host, TakenOf(*opened.capture)};
+}
+
 ksi::Moment ReadMoment(const std::string& name) {
   ksi::ChunkReader moment;
   if (OpenAny(name, moment).recording == nullptr) throw DataError("is no recording");

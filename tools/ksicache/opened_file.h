@@ -2,6 +2,7 @@
 #ifndef TOOLS_KSICACHE_OPENED_FILE_H_
 #define TOOLS_KSICACHE_OPENED_FILE_H_
 
+#include <cstdint>
 #include <memory>
 #include <string>
 
@@ -37,6 +38,13 @@ bool IsRecording(const std::string& name);
 
 // A whole recording.
 std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName);
+
+// Whose moment a name stands for, and when it was taken, us since 1970.
+struct MomentHead {
+  std::string host;
+  int64_t taken;
+};
+MomentHead HeadOf(const std::string& name);
 
 // One moment of a recording.
 ksi::Moment ReadMoment(const std::string& name);

@@ -1,0 +1,271 @@
+// ksicache export as a SQLite database and as metrics.
+#include <cstdlib>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "knvlibs/sqlite.h"
+#include "tests/ksicache/export_fixture.h"
+#include "tools/ksicache/export/metric_name.h"
+
+namespace ksi {
+namespace {
+
+class ExportFormats : public ExportTest {
+ protected:
+  // The first column of what a query gives.
+  static std::vector<std::string> Query(const std::string& fileName, const std::string& sql) {
+    const Database database = OpenAsOwner(fileName);
+    Statement query;
+    EXPECT_EQ(query.Prepare(database.get(), sql.c_str()), SQLITE_OK)
+        << sqlite3_errmsg(database.get());
+    std::vector<std::string> rows;
+    while (query.Step() == SQLITE_ROW) rows.emplace_back(query.Text(0));
+    return rows;
+  }
+
+  static bool IsThere(const std::string& program) {
+    return std::system(("command -v " + program + " >/dev/null").c_str()) == 0;
+  }
+
+  // What a shell command says on both its outputs; its status is expected to be 0.
+  static std::string Shell(const std::string& command) {
+    harness::Program shell = Command({});
+    shell.path = "/bin/sh";
+    shell.args = {"sh", "-c", command};
+    const harness::Result result = harness::RunProgram(shell);
+    EXPECT_EQ(result.status, 0) << result.err;
+    return result.out + result.err;
+  }
+};
+
+TEST_F(ExportFormats, SqliteHasATableForEachReport) {
+  const std::string file = Path("host.db");
+  EXPECT_EQ(Output({"export", "all", "--format=sqlite", "-o", file, kExample}), "");
+  std::set<std::string> tables = {"columns"};
+  for (std::string report : kReports) tables.insert(report.replace(report.find('-'), 1, "_"));
+  const std::vector<std::string> found =
+      Query(file, "SELECT name FROM sqlite_master WHERE type = 'table'");
+  EXPECT_EQ(std::set<std::string>(found.begin(), found.end()), tables);
+  EXPECT_EQ(Query(file,
+                  "SELECT quote(host) || quote(time) || quote(name) || quote(b) || "
+                  "quote(consumed) || quote(max) FROM vm_stats ORDER BY consumed LIMIT 2"),
+            (std::vector<std::string>{
+                "'hypervisor.example.org''2026-11-21T10:00:00Z''gateway'01518336NULL",
+                "'hypervisor.example.org''2026-11-21T10:00:00Z''desktop-anna'127934086291456"}));
+  EXPECT_EQ(Query(file,
+                  "SELECT report || '|' || quote(unit) || '|' || description || '|' || isKey "
+                  "|| isCounter FROM columns WHERE name IN ('size', 'buddyOvhd', 'numHigh', "
+                  "'schedGrp', 'avgZipTime') ORDER BY name, report LIMIT 5"),
+            (std::vector<std::string>{"zip_stats|'us'|Average compression time in usec|00",
+                                      "comp_stats|'KB'|Memmap buddy overhead|00",
+                                      "comp_stats|NULL|Num times host in high state|01",
+                                      "guest_stats|NULL|Scheduler group ID|10",
+                                      "lpage_stats|NULL|Scheduler group ID|10"}));
+  EXPECT_EQ(Query(file, "PRAGMA integrity_check"), std::vector<std::string>{"ok"});
+}
+
+// Whoever sums a column sums what there is.
+TEST_F(ExportFormats, SqliteHasTheFiguresOfCsv) {
+  const std::string file = Path("host.db");
+  size_t cells = 0;
+  Output({"export", "all", "--format=sqlite", "-u", "mb", "-o", file, kExample});
+  for (const std::string& report : kReports) {
+    SCOPED_TRACE(report);
+    const std::vector<Row> csv = Cells(Output({"export", report, "-u", "mb", kExample}));
+    std::string table = report;
+    table.replace(table.find('-'), 1, "_");
+    for (size_t column = 0; column < csv[0].size(); ++column) {
+      const std::vector<std::string> values =
+          Query(file, "SELECT \"" + csv[0][column] + "\" FROM " + table + " ORDER BY rowid");
+      ASSERT_EQ(values.size() + 1, csv.size());
+      for (size_t row = 0; row < values.size(); ++row, ++cells) {
+        std::string cell = csv[row + 1][column];
+        if (cell == "\"\"") cell.clear();
+        const bool isFlag = cell == "y" || cell == "n";
+        EXPECT_EQ(isFlag ? std::string(cell == "y" ? "1" : "0") : cell, values[row]);
+      }
+    }
+  }
+  EXPECT_GT(cells, 5'000u);
+}
+
+TEST_F(ExportFormats, SqliteHoldsWhatHasNoIntegerAndNoText) {
+  const std::string host = ExampleWith(
+      "odd.ksi",
+      {{R"("mapped":32547796)", R"("mapped":18446744073709551000)"},
+       {R"({"text":"web-01"})", R"({"text":{"hex":"61ff)" + std::string(2 * 62, '0') + R"("}})"},
+       {R"({"text":"mail"})", R"({"text":"a'\"\n;"})"}});
+  const std::string file = Path("odd.db");
+  Output({"export", "vm-stats", "--format=sqlite", "-o", file, host});
+  EXPECT_EQ(Query(file,
+                  "SELECT quote(name) || ' ' || typeof(mapped) || printf(' %.15g', mapped) "
+                  "FROM vm_stats WHERE "
+                  "schedGrp IN (1000, 1020, 1050)"),
+            (std::vector<std::string>{"'db-orders' real 1.84467440737096e+19",
+                                      "X'61FF' integer 6543112", "'a''\"\n;' integer 7549744"}));
+  EXPECT_NE(Output({"export", "vm-stats", host}).find(",18446744073709551000,"), std::string::npos);
+  EXPECT_NE(Output({"export", "vm-stats", "--format=json", host})
+                .find(R"("mapped":18446744073709551000,)"),
+            std::string::npos);
+}
+
+TEST_F(ExportFormats, SqliteTakesAFile) {
+  ExpectFailure({"export", "all", "--format=sqlite", kExample}, "sqlite takes a file: --output OUT",
+                2);
+  harness::Program program = Command({"export", "all", "--format=sqlite", "-o", "-", kExample});
+  const harness::Result result = harness::RunProgram(program);
+  EXPECT_EQ(result.status, 0);
+  EXPECT_EQ(result.out.substr(0, 15), "SQLite format 3");
+  // What stood there stands there still where all is not well.
+  WriteContent(Path("old.db"), "old");
+  ExpectFailure({"export", "all", "--format=sqlite", "-o", Path("old.db"), kExample},
+                Path("old.db") + ": exists already (--force replaces it)");
+  EXPECT_EQ(FileContent(Path("old.db")), "old");
+}
+
+// Moments and hosts stand in the same tables.
+TEST_F(ExportFormats, SqliteTakesManyFiles) {
+  const std::string file = Path("many.db");
+  WriteContent(Path("text"), "no cache file");
+  const harness::Result result = Run({"export", "comp-stats", "--format=sqlite", "-o", file,
+                                      kIncident + "@..", Path("text"), kExample});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err, "ksicache: " + Path("text") + ": not a cache file\n");
+  EXPECT_EQ(Query(file, "SELECT time || memState FROM comp_stats"),
+            (std::vector<std::string>{"2026-11-21T10:02:00ZHigh", "2026-11-21T10:03:00ZHigh",
+                                      "2026-11-21T10:04:00ZHigh", "2026-11-21T10:05:00ZHard",
+                                      "2026-11-21T10:06:00ZHigh", "2026-11-21T10:00:00ZHigh"}));
+}
+
+TEST_F(ExportFormats, WritesMetrics) {
+  EXPECT_EQ(Output({"export", "pshareHint-stats", "--format=openmetrics", kExample}),
+            "# HELP tally_pshare_hint_tot_add_bytes_total Total hints added\n"
+            "# TYPE tally_pshare_hint_tot_add_bytes_total counter\n"
+            "tally_pshare_hint_tot_add_bytes_total{host=\"hypervisor.example.org\","
+            "type=\"regular\"} 15692881920\n"
+            "tally_pshare_hint_tot_add_bytes_total{host=\"hypervisor.example.org\","
+            "type=\"lpage\"} 4018667520\n"
+            "# HELP tally_pshare_hint_tot_remove_bytes_total Total hints removed\n"
+            "# TYPE tally_pshare_hint_tot_remove_bytes_total counter\n"
+            "tally_pshare_hint_tot_remove_bytes_total{host=\"hypervisor.example.org\","
+            "type=\"regular\"} 15373713408\n"
+            "tally_pshare_hint_tot_remove_bytes_total{host=\"hypervisor.example.org\","
+            "type=\"lpage\"} 3964141568\n"
+            "# HELP tally_pshare_hint_active_bytes Currently active hints\n"
+            "# TYPE tally_pshare_hint_active_bytes gauge\n"
+            "tally_pshare_hint_active_bytes{host=\"hypervisor.example.org\",type=\"regular\"} "
+            "319168512\n"
+            "tally_pshare_hint_active_bytes{host=\"hypervisor.example.org\",type=\"lpage\"} "
+            "54525952\n"
+            "# EOF\n");
+}
+
+TEST_F(ExportFormats, MetricsAreInBaseUnits) {
+  const std::string metrics = Output({"export", "all", "--format=openmetrics", kExample});
+  const std::string host = "{host=\"hypervisor.example.org\"";
+  const std::string machine = host + ",name=\"build-linux\",sched_grp=\"1060\"";
+  for (const std::string& line : {
+           "tally_zip_avg_zip_time_seconds" + machine + "} 0.000031",
+           "tally_zip_nr_free_half" + machine + "} 3495",
+           "tally_vm_flag" + machine + ",flag=\"b\"} 1",
+           "tally_vm_flag" + machine + ",flag=\"useReliableMem\"} 0",
+           "tally_vm_info" + machine + ",par_sched_group=\"4\",world_grp=\"4120\"} 1",
+           "tally_vm_min_bytes" + machine + "} 0",
+           "tally_swap_swapout_ready_total" + machine + "} 0",
+           "tally_comp_info" + host + ",mem_state=\"High\"} 1",
+           "tally_comp_num_high_total" + host + "} 9",
+           "tally_heap_pct_free_of_cur_ratio" + host + ",name=\"acpi\"} 0.32",
+           "tally_guest_lpage_all" + host + ",name=\"db-orders\",sched_grp=\"1000\"} 6553",
+       }) {
+    EXPECT_NE(metrics.find("\n" + line + "\n"), std::string::npos) << line;
+  }
+  // A limit that is not set has no sample.
+  EXPECT_EQ(metrics.find("tally_vm_max_bytes" + machine), std::string::npos);
+  ExpectFailure({"export", "all", "--format=openmetrics", "-u", "kb"},
+                "openmetrics is in bytes and seconds, and takes no --unit", 2);
+}
+
+TEST_F(ExportFormats, MetricNamesAreSnakeCase) {
+  for (const auto& [name, snake] : std::vector<std::pair<std::string, std::string>>{
+           {"memSizeLimit", "mem_size_limit"},
+           {"COWSwapper", "cow_swapper"},
+           {"vpmemRO", "vpmem_ro"},
+           {"nodeID", "node_id"},
+           {"nrSPageAllocs", "nr_spage_allocs"},
+           {"iMin", "imin"},
+           {"4KBfree", "4kb_free"},
+           {"512MBused", "512mb_used"},
+           {"alloc2MBlocks", "alloc_2m_blocks"},
+           {"cow1", "cow1"},
+           {"CurSwapper", "cur_swapper"},
+           {"pshareHint", "pshare_hint"},
+           {"a-b", "a_b"},
+           {"", ""},
+       }) {
+    EXPECT_EQ(ksicache::SnakeCase(name), snake);
+  }
+}
+
+TEST_F(ExportFormats, MetricsHoldHostileNames) {
+  const std::string host = ExampleWith(
+      "odd.ksi",
+      {{R"({"text":"web-01"})", R"({"text":"a\"} 1\n#\\"})"},
+       {R"({"text":"web-02"})", R"({"text":{"hex":"61ff)" + std::string(2 * 62, '0') + R"("}})"}});
+  const std::string metrics = Output({"export", "vm-stats", "--format=openmetrics", host});
+  const std::string start = "\ntally_vm_mem_size_bytes{host=\"hypervisor.example.org\",name=";
+  EXPECT_NE(metrics.find(start + R"("a\"} 1\n#\\",sched_grp="1020"} 8589934592)" + "\n"),
+            std::string::npos);
+  EXPECT_NE(metrics.find(start + R"("hex:61ff",sched_grp="1030"} 8589934592)" + "\n"),
+            std::string::npos);
+}
+
+// One row of each thing: what metrics cannot tell apart is said.
+TEST_F(ExportFormats, MetricsSayWhatIsThereTwice) {
+  const harness::Result result =
+      Run({"export", "pshareHint-stats,pshare-stats", "--format=openmetrics", kExample, kExample});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.out,
+            Output({"export", "pshareHint-stats,pshare-stats", "--format=openmetrics", kExample}));
+  EXPECT_EQ(result.err,
+            "ksicache: " + kExample +
+                ": pshareHint-stats: there are two rows of {host=\"hypervisor.example.org\","
+                "type=\"lpage\"}, of which metrics have one\n"
+                "ksicache: " +
+                kExample +
+                ": pshare-stats: there are two rows of {host=\"hypervisor.example.org\"}, of which "
+                "metrics have one\n");
+}
+
+TEST_F(ExportFormats, MetricsOfASpanHaveTheirTimes) {
+  const std::string metrics =
+      Output({"export", "comp-stats", "--format=openmetrics", kIncident + "@10:04Z..10:05Z"});
+  const std::string start = "tally_comp_free_bytes{host=\"hypervisor.example.org\"} ";
+  EXPECT_NE(metrics.find("\n" + start + "37455228928 1795255440\n" + start +
+                         "2021748736 1795255500\n# HELP"),
+            std::string::npos)
+      << metrics;
+  EXPECT_EQ(metrics.find("mem_state=\"High\"} 1\n"), std::string::npos);
+}
+
+TEST_F(ExportFormats, PromtoolHasNoComplaint) {
+  if (!IsThere("promtool")) GTEST_SKIP() << "there is no promtool (Debian package prometheus)";
+  Output({"export", "all", "--format=openmetrics", "-o", Path("host.prom"), kExample});
+  EXPECT_EQ(Shell("promtool check metrics <" + Path("host.prom")), "");
+}
+
+// A recording goes into a Prometheus that had not been there.
+TEST_F(ExportFormats, PromtoolMakesBlocksOfASpan) {
+  if (!IsThere("promtool")) GTEST_SKIP() << "there is no promtool (Debian package prometheus)";
+  Output({"export", "vm-stats,comp-stats", "--format=openmetrics", "-o", Path("span.om"),
+          kIncident + "@.."});
+  Shell("mkdir -p " + Path("data/wal") + "; promtool tsdb create-blocks-from openmetrics " +
+        Path("span.om") + " " + Path("data"));
+  const std::string dump =
+      Shell("promtool tsdb dump --match='tally_comp_free_bytes' " + Path("data"));
+  EXPECT_NE(dump.find("tally_comp_free_bytes"), std::string::npos) << dump;
+  EXPECT_NE(dump.find("} 2.021748736e+09 1795255500000\n"), std::string::npos) << dump;
+}
+
+}  // namespace
+}  // namespace ksi

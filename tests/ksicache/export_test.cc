@@ -1,0 +1,346 @@
+// ksicache export: its command line, files and moments, CSV and JSON.
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <set>
+#include <string>
+#include <vector>
+
+#include <nlohmann/json.hpp>
+#include "tests/ksicache/export_fixture.h"
+
+namespace ksi {
+namespace {
+
+using nlohmann::json;
+
+constexpr const char* kHints =
+    "host,time,type,totAdd,totRemove,active\n"
+    "hypervisor.example.org,2026-11-21T10:00:00Z,regular,15325080,15013392,311688\n"
+    "hypervisor.example.org,2026-11-21T10:00:00Z,lpage,3924480,3871232,53248\n";
+
+TEST_F(ExportTest, WritesCsv) {
+  EXPECT_EQ(Output({"export", "pshareHint-stats", kExample}), kHints);
+  EXPECT_EQ(Output({"export", "PSHAREHINT-stats", "--format", "csv", "--unit=KB", kExample}),
+            kHints);
+}
+
+TEST_F(ExportTest, WritesJson) {
+  EXPECT_EQ(Output({"export", "comp-stats", "-umb", "--format=json", kExample}),
+            R"({"host":"hypervisor.example.org","time":"2026-11-21T10:00:00Z",)"
+            R"("total":262144,"discarded":0,"managedByMemMap":257536,"reliableMem":16384,)"
+            R"("kernelCode":24,"critical":64,"dataAndHeap":3072,"buddyOvhd":512,"rsvdLow":128,)"
+            R"("managedByMemSched":254464,"minFree":3200,"knvClientConsumed":5120,)"
+            R"("otherConsumed":114423,"free":134856,"numHigh":9,"numClear":12,"numSoft":5,)"
+            R"("numHard":1,"numLow":0,"memState":"High"})"
+            "\n");
+}
+
+// With several reports each row says of which it is, and each report has its header.
+TEST_F(ExportTest, WritesSeveralReports) {
+  const std::string start = "hypervisor.example.org,2026-11-21T10:00:00Z,";
+  EXPECT_EQ(Output({"export", "pshareHint-stats,pshare-stats", kExample}),
+            "host,time,report,type,totAdd,totRemove,active\n" + start +
+                "pshareHint-stats,regular,15325080,15013392,311688\n" + start +
+                "pshareHint-stats,lpage,3924480,3871232,53248\n"
+                "\n"
+                "host,time,report,cow,cow1,zero,used,reclaimed,totAdd,totRemove\n" +
+                start +
+                "pshare-stats,18937228,1683308,3313500,3787444,15149784,60599136,45449352\n");
+  std::set<std::string> reports;
+  for (const std::string& line : Lines(Output({"export", "all", "--format=json", kExample}))) {
+    reports.insert(json::parse(line)["report"]);
+  }
+  EXPECT_EQ(reports, std::set<std::string>(kReports.begin(), kReports.end()));
+}
+
+// The figures of a column without a value, as tally shows them in each unit.
+const std::set<std::string> kNoValues = {
+    "-1",
+    "18446744073709551615",
+    "18446744073709551612",  // pages in KB
+    "18014398509481983",     // and in MB, as are bytes in KB
+    "4611686018427387903",   // pages in pages
+};
+
+// Each cell is what tally shows, but for figures without a value.
+TEST_F(ExportTest, HasTheFiguresOfTally) {
+  size_t none = 0;
+  size_t cells = 0;
+  for (const std::string& report : kReports) {
+    for (const std::string unit : {"", "mb", "kb", "pg"}) {
+      SCOPED_TRACE(report + " in " + unit);
+      std::vector<std::string> exported = {"export", report, kExample};
+      std::vector<std::string> printed = {"-c", kExample, "-r", report, "-q"};
+      if (!unit.empty()) {
+        exported.insert(exported.end(), {"-u", unit});
+        printed.insert(printed.end(), {"-u", unit});
+      }
+      const std::vector<Row> ours = Cells(Output(exported));
+      const std::vector<Row> tallys = Cells(RunTally(printed).out);
+      // The last row of tally may be the Total.
+      ASSERT_GT(ours.size(), 1u);
+      ASSERT_TRUE(ours.size() == tallys.size() ||
+                  (ours.size() + 1 == tallys.size() &&
+                   (tallys.back()[0] == "Total" || tallys.back()[0].empty())));
+      for (size_t row = 0; row < ours.size(); ++row) {
+        ASSERT_EQ(ours[row].size(), tallys[row].size() + 2);
+        for (size_t i = 0; i < tallys[row].size(); ++i) {
+          const std::string& cell = ours[row][i + 2];
+          ++cells;
+          if (cell.empty()) {
+            ++none;
+            EXPECT_TRUE(kNoValues.contains(tallys[row][i])) << tallys[row][i];
+          } else {
+            EXPECT_EQ(cell == "\"\"" ? "" : cell, tallys[row][i]) << ours[0][i + 2];
+            EXPECT_FALSE(kNoValues.contains(cell)) << ours[0][i + 2];
+          }
+        }
+      }
+    }
+  }
+  EXPECT_GT(none, 100u);
+  EXPECT_GT(cells, 20'000u);
+}
+
+// JSON has what CSV has, with types.
+TEST_F(ExportTest, HasTheSameFiguresInJson) {
+  for (const std::string& report : kReports) {
+    SCOPED_TRACE(report);
+    const std::vector<Row> csv = Cells(Output({"export", report, kExample}));
+    const std::vector<std::string> lines =
+        Lines(Output({"export", report, "--format", "json", kExample}));
+    ASSERT_EQ(lines.size() + 1, csv.size());
+    for (size_t row = 0; row < lines.size(); ++row) {
+      const nlohmann::ordered_json object = nlohmann::ordered_json::parse(lines[row]);
+      ASSERT_EQ(object.size(), csv[0].size());
+      size_t column = 0;
+      for (const auto& [name, value] : object.items()) {
+        const std::string& cell = csv[row + 1][column];
+        EXPECT_EQ(name, csv[0][column++]);
+        if (value.is_null()) {
+          EXPECT_EQ(cell, "");
+        } else if (value.is_boolean()) {
+          EXPECT_EQ(cell, value.get<bool>() ? "y" : "n");
+        } else if (value.is_number()) {
+          EXPECT_EQ(cell, value.dump());
+        } else {
+          EXPECT_EQ(cell == "\"\"" ? "" : cell, value.get<std::string>());
+        }
+      }
+    }
+  }
+}
+
+// In bytes nothing is lost: limits in 32 bits of kilobytes have room, too.
+TEST_F(ExportTest, TakesBytesForEveryReport) {
+  const std::vector<Row> kb = Cells(Output({"export", "vm-stats", kExample}));
+  const std::vector<Row> bytes = Cells(Output({"export", "vm-stats", "-u", "b", kExample}));
+  size_t memory = 0;
+  for (size_t row = 1; row < kb.size(); ++row) {
+    for (const char* name : {"memSize", "min", "minLimit", "consumed"}) {
+      const auto column = static_cast<size_t>(std::ranges::find(kb[0], name) - kb[0].begin());
+      EXPECT_EQ(std::stoull(bytes[row][column]), 1024 * std::stoull(kb[row][column]));
+      ++memory;
+    }
+  }
+  EXPECT_EQ(memory, 48u);
+  EXPECT_EQ(Lines(Output({"export", "pshare-stats", "-u", "b", kExample}))[1],
+            "hypervisor.example.org,2026-11-21T10:00:00Z,19391721472,1723707392,3393024000,"
+            "3878342656,15513378816,62053515264,46540136448");
+}
+
+TEST_F(ExportTest, QuotesHostileNames) {
+  const std::string longName(4096, 'n');
+  const std::string host = ExampleWith(
+      "hostile.ksi", {
+                         {R"({"text":"web-01"})", R"({"text":"a,\"b\"\r\nc"})"},
+                         {R"({"text":"web-02"})", R"({"text":"=1+1"})"},
+                         {R"({"text":"web-03"})", R"({"text":" blanks "})"},
+                         {R"({"text":"mail"})", R"({"text":""})"},
+                         {R"({"text":"gateway"})", R"({"text":"caf\u00e9 \u202e\u001b[2J\\"})"},
+                         {R"({"text":"monitoring"})",
+                          R"({"text":{"hex":"61ff)" + std::string(2 * 62, '0') + R"("}})"},
+                         {R"("desktop-anna")", '"' + longName + '"'},
+                         {R"({"text":")" + longName + "\"}", R"({"text":"desktop-anna"})"},
+                         {R"("host": "hypervisor.example.org")", R"("host": "h,\u0007")"},
+                     });
+  const std::string csv = Output({"export", "guest-stats", host});
+  const std::string start = "\"h,\a\",2026-11-21T10:00:00Z,";
+  EXPECT_NE(csv.find("\n" + start + "\"a,\"\"b\"\"\r\nc\",1020,"), std::string::npos) << csv;
+  EXPECT_NE(csv.find("\n" + start + "=1+1,1030,"), std::string::npos);
+  EXPECT_NE(csv.find("\n" + start + "\" blanks \",1040,"), std::string::npos);
+  EXPECT_NE(csv.find("\n" + start + "\"\",1050,"), std::string::npos);
+  EXPECT_NE(csv.find("\n" + start + "café \xe2\x80\xae\x1b[2J\\,1110,"), std::string::npos);
+  EXPECT_NE(csv.find("\n" + start + "hex:61ff,1100,"), std::string::npos);
+
+  std::vector<json> names;
+  for (const std::string& line : Lines(Output({"export", "guest-stats", "--format=json", host}))) {
+    const json row = json::parse(line);
+    EXPECT_EQ(row["host"], "h,\a");
+    names.push_back(row["name"]);
+  }
+  for (const json& name : std::vector<json>{"a,\"b\"\r\nc", "=1+1", " blanks ", "",
+                                            "café \u202e\x1b[2J\\", json{{"hex", "61ff"}}}) {
+    EXPECT_EQ(std::ranges::count(names, name), 1) << name;
+  }
+  EXPECT_NE(Output({"export", "lpool-stats", host}).find("," + longName + ","), std::string::npos);
+}
+
+TEST_F(ExportTest, TakesAMomentOfARecording) {
+  const auto states = [](const std::string& name) {
+    std::string result;
+    for (const Row& row : Cells(Output({"export", "comp-stats", name}))) {
+      if (row[0] != "host") result += row[1] + " " + row.back() + "\n";
+    }
+    return result;
+  };
+  EXPECT_EQ(states(kIncident), "2026-11-21T10:06:00Z High\n");
+  EXPECT_EQ(states(kIncident + "@10:05Z"), "2026-11-21T10:05:00Z Hard\n");
+  EXPECT_EQ(states(kIncident + "@first"), "2026-11-21T10:02:00Z High\n");
+  EXPECT_EQ(states(kExample + "@2026-11-21T12:00Z"), "2026-11-21T10:00:00Z High\n");
+  const std::string all =
+      "2026-11-21T10:02:00Z High\n2026-11-21T10:03:00Z High\n2026-11-21T10:04:00Z High\n"
+      "2026-11-21T10:05:00Z Hard\n2026-11-21T10:06:00Z High\n";
+  EXPECT_EQ(states(kIncident + "@.."), all);
+  EXPECT_EQ(states(kIncident + "@first..last"), all);
+  EXPECT_EQ(states(kIncident + "@-4m.."), all);
+  EXPECT_EQ(states(kIncident + "@10:04Z.."), all.substr(52));
+  EXPECT_EQ(states(kIncident + "@10:04:01Z.."), all.substr(78));
+  EXPECT_EQ(states(kIncident + "@..10:02:59Z"), all.substr(0, 26));
+  EXPECT_EQ(states(kIncident + "@10:03Z..10:04Z"), all.substr(26, 52));
+}
+
+TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
+  const auto expect = [](const std::string& name, const std::string& message) {
+    const harness::Result result = Run({"export", "comp-stats", "--format=json", name});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, "ksicache: " + name + ": " + message + "\n");
+  };
+  expect(kIncident + "@11:00..11x",
+         "11x is no time: spans are as 10:05..10:10, -1h.. or first..last");
+  expect(kIncident + "@2026-11-22T10:00Z..",
+         "there is no moment in that time: the first is of 2026-11-21T10:02:00Z, the last of "
+         "2026-11-21T10:06:00Z");
+  expect(kIncident + "@2026-11-20T10:00Z",
+         "there is no moment at 2026-11-20T10:00Z or before: the first is of 2026-11-21T10:02:00Z, "
+         "the last of 2026-11-21T10:06:00Z");
+  expect(kExample + "@..", "is no recording");
+  expect(Path("none@.."), "No such file or directory");
+}
+
+// What is wrong with one file is said, and the others have their turn.
+TEST_F(ExportTest, GoesOnAfterABrokenFile) {
+  WriteContent(Path("broken.ksi"), FileContent(kExample).substr(0, 20'000));
+  WriteContent(Path("text"), "no cache file");
+  const harness::Result result = Run({"export", "pshareHint-stats", Path("broken.ksi"), kExample,
+                                      Path("text"), Path("none"), kIncident + "@10:05Z"});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.out,
+            std::string(kHints) +
+                "hypervisor.example.org,2026-11-21T10:05:00Z,regular,15325080,15013392,311688\n"
+                "hypervisor.example.org,2026-11-21T10:05:00Z,lpage,3924480,3871232,53248\n");
+  const std::vector<std::string> lines = Lines(result.err);
+  ASSERT_EQ(lines.size(), 3u);
+  EXPECT_EQ(lines[0].substr(0, lines[0].rfind(": ")), "ksicache: " + Path("broken.ksi"));
+  EXPECT_EQ(lines[1], "ksicache: " + Path("text") + ": not a cache file");
+  EXPECT_EQ(lines[2], "ksicache: " + Path("none") + ": No such file or directory");
+}
+
+TEST_F(ExportTest, TellsRowsThatAreMissing) {
+  WriteContent(Path("less.json"),
+               R"({"ksiCache":1,"host":"h","taken":"2026-11-21T10:00:00Z","readings":[
+    {"node":"memory/pshare/stats","keys":[],"status":"0xbad005a"}]})");
+  Output({"load", Path("less.json"), Path("less.ksi")});
+  const harness::Result result =
+      Run({"export", "pshareHint-stats,pshare-stats", Path("less.ksi"), kExample});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(Lines(result.out).size(), 6u);
+  EXPECT_EQ(result.err,
+            "ksicache: " + Path("less.ksi") + ": pshareHint-stats: 0xbad005a Permission denied\n" +
+                "ksicache: " + Path("less.ksi") + ": pshare-stats: 0xbad005a Permission denied\n");
+}
+
+// Groups that contain each other end the walk; the next report begins anew.
+TEST_F(ExportTest, TellsOfGroupsThatContainEachOther) {
+  const std::string host = ExampleWith(
+      "circle.ksi",
+      {{R"("keys":[1000],"instances":[1001,1002])", R"("keys":[1000],"instances":[1001,1002,0])"}});
+  const harness::Result result = Run({"export", "group-stats,comp-stats", host});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_NE(result.err.find("ksicache: " + host +
+                            ": group-stats: groups contain each other, rows "
+                            "are missing: 0xbad"),
+            std::string::npos)
+      << result.err;
+  EXPECT_EQ(Lines(result.out).back().substr(0, 55),
+            "hypervisor.example.org,2026-11-21T10:00:00Z,comp-stats,");
+}
+
+// This host, as tally shows it.
+TEST_F(ExportTest, TakesThisHostWithoutAFile) {
+  const std::vector<Row> rows = Cells(Output({"export", "comp-stats", "-u", "mb"}));
+  ASSERT_EQ(rows.size(), 2u);
+  std::array<char, 256> name = {};
+  ASSERT_EQ(gethostname(name.data(), name.size() - 1), 0);
+  EXPECT_EQ(rows[1][0], name.data());
+  EXPECT_EQ(rows[1][1].size(), sizeof "2026-11-21T10:00:00Z" - 1);
+  const std::vector<Row> tallys = Cells(RunTally({"-r", "comp-stats", "-q", "-u", "mb"}).out);
+  EXPECT_EQ(rows[1][2], tallys[1][0]);
+}
+
+TEST_F(ExportTest, MakesAFile) {
+  const std::string out = Path("out.csv");
+  EXPECT_EQ(Output({"export", "pshareHint-stats", "-o", out, kExample}), "");
+  EXPECT_EQ(FileContent(out), kHints);
+  ExpectFailure({"export", "pshareHint-stats", "-o", out, kExample},
+                out + ": exists already (--force replaces it)");
+  EXPECT_EQ(Output({"export", "pshareHint-stats", "-o", out, "--force", "--mode=0644",
+                    "--format=json", kExample})
+                .size(),
+            0u);
+  EXPECT_EQ(Lines(FileContent(out)).size(), 2u);
+  EXPECT_EQ(Output({"export", "pshareHint-stats", "-o", "-", kExample}), kHints);
+  // Nothing is left behind beside it.
+  EXPECT_EQ(directory_.Names(), std::vector<std::string>{"out.csv"});
+}
+
+TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
+  ExpectFailure({"export"},
+                "not as in: ksicache export REPORT[,REPORT...]|all [FILE[@WHEN|@FROM..TO]...] "
+                "[--format FORMAT] [--unit UNIT] [--output OUT] [--force] [--mode MODE]",
+                2);
+  ExpectFailure({"export", "vm-stats,vm-stats"}, "vm-stats is named twice", 2);
+  ExpectFailure({"export", "vm-stats,", kExample},
+                "there is no report : there are group-stats, vm-stats, uw-stats, pshare-stats, "
+                "pshareHint-stats, swap-stats, buddy-stats, comp-stats, lpool-stats, heap-stats, "
+                "guest-stats, zip-stats, lpage-stats, asyncremap-stats and pmem-stats, or all",
+                2);
+  ExpectFailure({"export", "all", "--format=xml"},
+                "there is no format xml: there are csv, json, sqlite and openmetrics", 2);
+  ExpectFailure({"export", "all", "-u", "gb"}, "--unit is mb, kb, pg or b", 2);
+  ExpectFailure({"export", "all", "--force"}, "--force is for a file, not standard output", 2);
+  ExpectFailure({"export", "all", "-o", "-", "--mode=0644"},
+                "--mode is for a file, not standard output", 2);
+  ExpectFailure({"export", "all", "-o"}, "unknown or incomplete option -o", 2);
+  ExpectFailure({"info", kExample, "-u", "kb"}, "info does not take --unit", 2);
+}
+
+TEST_F(ExportTest, TellsOfOutputThatIsLost) {
+  harness::Program program = Command({"export", "all", kExample});
+  program.outPath = "/dev/full";
+  const harness::Result full = harness::RunProgram(program);
+  EXPECT_EQ(full.status, 1);
+  EXPECT_EQ(full.err, "ksicache: standard output: No space left on device\n");
+  program.outPath.clear();
+  program.outPipeWithoutReader = true;
+  program.ignoreSigpipe = true;
+  const harness::Result closed = harness::RunProgram(program);
+  EXPECT_EQ(closed.status, 1);
+  EXPECT_EQ(closed.err, "ksicache: standard output: Broken pipe\n");
+}
+
+}  // namespace
+}  // namespace ksi

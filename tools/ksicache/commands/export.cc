@@ -1,0 +1,205 @@
+// export: the rows of reports for programs.
+#include <algorithm>
+#include <memory>
+#include <optional>
+#include <set>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "framework/name_list.h"
+#include "reports/reports.h"
+#include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/diagnostics.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/export/formats.h"
+#include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/new_file.h"
+#include "tools/ksicache/output.h"
+#include "tools/ksicache/report_run.h"
+
+namespace ksicache {
+namespace {
+
+constexpr Option kFormat = {"format", "FORMAT", "write json, sqlite or openmetrics instead of csv"};
+constexpr Option kUnit = {"unit", "UNIT", "show memory in mb, kb, pg (4 KB pages) or b", 'u'};
+constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
+constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kForce, &kMode};
+
+using Reports = std::vector<const tally::Report*>;
+
+// "group-stats, vm-stats and pmem-stats"
+std::string ReportNames() {
+  std::string names;
+  const auto reports = tally::Reports();
+  for (const tally::Report* report : reports) {
+    if (!names.empty()) names += report == reports.back() ? " and " : ", ";
+    names += report->name;
+  }
+  return names;
+}
+
+const tally::Report* ReportCalled(const std::string& name) {
+  const tally::Report* report = tally::FindReport(name.c_str());
+  if (report == nullptr) {
+    throw UsageError("there is no report " + name + ": there are " + ReportNames() + ", or all");
+  }
+  return report;
+}
+
+// Of "vm-stats,heap-stats".
+Reports ReportsOf(const std::string& names) {
+  if (tally::SameName(names, "all")) {
+    const auto all = tally::Reports();
+    return {all.begin(), all.end()};
+  }
+  Reports reports;
+  for (size_t begin = 0, end = 0; end != std::string::npos; begin = end + 1) {
+    end = names.find(',', begin);
+    const tally::Report* report = ReportCalled(names.substr(begin, end - begin));
+    if (std::ranges::find(reports, report) != reports.end()) {
+      throw UsageError(std::string(report->name) + " is named twice");
+    }
+    reports.push_back(report);
+  }
+  return reports;
+}
+
+const FormatInfo& FormatOf(const CommandLine& line) {
+  const std::string* name = line.ValueOf(kFormat);
+  if (name == nullptr) return kFormats[0];
+  for (const FormatInfo& format : kFormats) {
+    if (*name == format.name) return format;
+  }
+  throw UsageError("there is no format " + *name + ": there are csv, json, sqlite and openmetrics");
+}
+
+// None: that of each report.
+std::optional<tally::DisplayUnit> UnitOf(const CommandLine& line, const FormatInfo& format) {
+  const std::string* word = line.ValueOf(kUnit);
+  if (format.isInBaseUnits && word != nullptr) {
+    throw UsageError(std::string(format.name) + " is in bytes and seconds, and takes no --unit");
+  }
+  if (format.isInBaseUnits) return tally::DisplayUnit::b;
+  if (word == nullptr) return std::nullopt;
+  for (const tally::UnitName& name : tally::kUnitNames) {
+    if (tally::SameName(*word, name.word)) return name.unit;
+  }
+  throw UsageError("--unit is mb, kb, pg or b");
+}
+
+// The file to make; none for standard output.
+std::optional<NewFile> FileOf(const CommandLine& line, const FormatInfo& format) {
+  const std::string* name = line.ValueOf(kOutput);
+  const bool isFile = name != nullptr && *name != "-";
+  if (!isFile) CheckOptionsFor("-", line);
+  if (name == nullptr && format.needsFile) {
+    throw UsageError(std::string(format.name) + " takes a file: --output OUT");
+  }
+  if (!isFile && !format.needsFile) return std::nullopt;
+  return std::make_optional<NewFile>(*name, line.Has(kForce), ModeOf(line));
+}
+
+// Says what is wrong with one file, each thing once however many moments have it.
+class Complaints {
+ public:
+  // `name`: empty for the host itself.
+  explicit Complaints(const std::string& name) : before_(name.empty() ? "" : name + ": ") {}
+
+  void Say(const std::string& text) {
+    if (said_.insert(text).second) PrintError(before_ + text);
+  }
+
+  // What the library has said meanwhile.
+  void SayDiagnostics() {
+    for (const std::string& text : diagnostics_.TakeKept()) Say(text);
+  }
+
+ private:
+  std::string before_;
+  Diagnostics diagnostics_;
+  std::set<std::string> said_;
+};
+
+// Puts reports into a format, for one file after the other.
+class Exporter {
+ public:
+  Exporter(const Reports& reports, RowFormat& format, std::optional<tally::DisplayUnit> unit)
+      : reports_(reports), sink_(format, unit) {}
+
+  void ExportHost() {
+    Complaints complaints("");
+    Export(LiveOrigin(), complaints);
+  }
+
+  void ExportFile(const std::string& name) {
+    Complaints complaints(name);
+    try {
+      ForEachMoment(name, [&](const Origin& origin) { Export(origin, complaints); });
+    } catch (const DataError& error) {
+      isWhole_ = false;
+      complaints.SayDiagnostics();
+      complaints.Say(error.what());
+    }
+  }
+
+  // Whether nothing was left out.
+  bool IsWhole() const { return isWhole_; }
+
+ private:
+  void Export(const Origin& origin, Complaints& complaints) {
+    for (const tally::Report* report : reports_) {
+      sink_.Expect(*report, origin);
+      try {
+        RunReport(*report, sink_);
+        complaints.SayDiagnostics();
+        const std::string lost = sink_.TakeComplaint();
+        if (!lost.empty()) throw DataError(report->name + (": " + lost));
+      } catch (const DataError& error) {
+        isWhole_ = false;
+        complaints.SayDiagnostics();
+        complaints.Say(error.what());
+      }
+    }
+  }
+
+  const Reports& reports_;
+  RowSink sink_;
+  bool isWhole_ = true;
+};
+
+int Export(const CommandLine& line) {
+  const Reports reports = ReportsOf(line.arguments[0]);
+  const FormatInfo& info = FormatOf(line);
+  const std::optional<tally::DisplayUnit> unit = UnitOf(line, info);
+  std::optional<NewFile> file = FileOf(line, info);
+  const std::span<const std::string> files = std::span(line.arguments).subspan(1);
+  const std::unique_ptr<RowFormat> format =
+      info.make({.file = file ? &*file : nullptr,
+                 .hasManyReports = reports.size() > 1,
+                 .hasSpans = std::ranges::any_of(files, IsSpan)});
+  Exporter exporter(reports, *format, unit);
+  if (files.empty()) exporter.ExportHost();
+  for (const std::string& name : files) exporter.ExportFile(name);
+  format->Finish();
+  return exporter.IsWhole() ? 0 : 1;
+}
+
+}  // namespace
+
+const Command kExport = {
+    .name = "export",
+    .arguments = "REPORT[,REPORT...]|all [FILE[@WHEN|@FROM..TO]...]",
+    .summary = "write the rows of reports for programs",
+    .help = R"(Writes the rows of reports of tally, or of all fifteen, without their totals: of
+each FILE, of all moments of a recording from FROM to TO, or of this host. The
+columns are host, time, report where there are several, and those of the report
+under their names. A figure without a value is an empty field, or null.
+)",
+    .options = kOptions,
+    .fewest = 1,
+    .most = Command::kAnyNumber,
+    .run = Export,
+};
+
+}  // namespace ksicache

@@ -1,0 +1,56 @@
+#include "tools/ksicache/export/text_output.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <span>
+
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/output.h"
+
+namespace ksicache {
+
+TextOutput::TextOutput(NewFile* file)
+    : file_(file),
+      isTerminal_(file == nullptr && isatty(STDOUT_FILENO) == 1),
+      full_(file == nullptr ? kBlock : kLargestFile) {}
+
+void TextOutput::Flush() {
+  if (file_ != nullptr) {
+    throw Error(file_->Name() + ": is larger than 1 GiB: standard output takes any size");
+  }
+  if (!isTerminal_) {
+    Print(text_);
+  } else {
+    // Nothing from outside reaches a terminal as a command.
+    std::string_view rest = text_;
+    for (size_t end; (end = rest.find('\n')) != std::string_view::npos;) {
+      PrintLine(rest.substr(0, end));
+      rest.remove_prefix(end + 1);
+    }
+  }
+  text_.clear();
+}
+
+void TextOutput::Finish() {
+  if (file_ == nullptr) return Flush();
+  file_->Commit(std::as_bytes(std::span(text_)));
+}
+
+bool IsSimple(std::string_view text) {
+  return std::ranges::all_of(text,
+                             [](char c) { return c >= ' ' && c <= '~' && c != '"' && c != '\\'; });
+}
+
+std::string HexText(std::string_view text) {
+  constexpr char kDigits[] = "0123456789abcdef";
+  std::string hex = "hex:";
+  for (const char c : text) {
+    const auto byte = static_cast<unsigned char>(c);
+    hex += kDigits[byte >> 4];
+    hex += kDigits[byte & 15];
+  }
+  return hex;
+}
+
+}  // namespace ksicache

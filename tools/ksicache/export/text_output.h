@@ -1,0 +1,69 @@
+#ifndef TOOLS_KSICACHE_EXPORT_TEXT_OUTPUT_H_
+#define TOOLS_KSICACHE_EXPORT_TEXT_OUTPUT_H_
+
+#include <charconv>
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+#include "tools/ksicache/export/row_format.h"
+#include "tools/ksicache/new_file.h"
+
+namespace ksicache {
+
+// Text on its way to standard output, or into a file that is not there until it is whole. It fails
+// with an OutputError or an Error.
+class TextOutput {
+ public:
+  // The most that a file may have: it is made in memory.
+  static constexpr size_t kLargestFile = size_t{1} << 30;
+
+  // `file`: null for standard output.
+  explicit TextOutput(NewFile* file);
+
+  void Put(char c) { text_ += c; }
+  void Put(std::string_view text) { text_ += text; }
+  // REQUIRES: the value is a number.
+  void PutNumber(const Value& value) {
+    value.type == ValueType::signedNumber ? PutInteger(static_cast<int64_t>(value.number))
+                                          : PutInteger(value.number);
+  }
+
+  // The end of a row: what there is may go out.
+  void EndRow() {
+    if (text_.size() >= full_) Flush();
+  }
+
+  void Finish();
+
+ private:
+  static constexpr size_t kBlock = size_t{64} << 10;
+  static constexpr size_t kLongestNumber = 20;
+
+  template <class Number>
+  void PutInteger(Number number) {
+    const size_t size = text_.size();
+    text_.resize(size + kLongestNumber);
+    char* const begin = text_.data() + size;
+    const auto [end, error] = std::to_chars(begin, begin + kLongestNumber, number);
+    text_.resize(size + static_cast<size_t>(end - begin));
+  }
+
+  void Flush();
+
+  NewFile* file_;
+  bool isTerminal_;
+  size_t full_;
+  std::string text_;
+};
+
+// Whether a text can stand as it is wherever printable ASCII but `"` and `\` can.
+bool IsSimple(std::string_view text);
+
+// The text that stands for one that is not UTF-8: "hex:" and its bytes.
+std::string HexText(std::string_view text);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_EXPORT_TEXT_OUTPUT_H_

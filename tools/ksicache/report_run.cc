@@ -1,0 +1,180 @@
+#include "tools/ksicache/report_run.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <ctime>
+#include <memory>
+#include <optional>
+
+#include <knvlibs/ksi.h>
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/cache_format.h"
+#include "knvlibs/recording/recording_file.h"
+#include "knvlibs/recording/when.h"
+#include "knvlibs/times.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/host_files.h"
+#include "tools/ksicache/opened_file.h"
+
+// A host's own library has none.
+#pragma weak KSI_RefreshSource
+#pragma weak KSI_SourceNextMoment
+#pragma weak KSI_SourceOrigin
+#pragma weak KSI_SourceWalkStatus
+
+namespace ksicache {
+namespace {
+
+// "FILE@FROM..TO"; times that are left out are empty.
+struct NamedSpan {
+  std::string fileName;
+  std::string from;
+  std::string to;
+};
+
+// None if the name means something else. A file that has the whole name is that file.
+std::optional<NamedSpan> SpanOf(const std::string& name) {
+  constexpr std::string_view kTo = "..";
+  const size_t at = name.rfind('@');
+  const size_t to = at == std::string::npos ? at : name.find(kTo, at);
+  if (to == std::string::npos || access(name.c_str(), F_OK) == 0) return std::nullopt;
+  return NamedSpan{name.substr(0, at), name.substr(at + 1, to - at - 1),
+                   name.substr(to + kTo.size())};
+}
+
+// Reports are made of the records of one version.
+void CheckDefinitions() {
+  std::array<char, KSI_BUILD_DATE_SIZE> built = {};
+  const char* ownBuilt = "";
+  if (KSI_CheckSig(built.data(), built.size(), &ownBuilt) == ksi::kOk) return;
+  built.back() = '\0';
+  throw DataError(std::string("made with definitions built on ") + built.data() + ", not " +
+                  ownBuilt);
+}
+
+void UseCache(const std::string& name) {
+  const ksi::Status status = KSI_UseCache(name.c_str(), 0);
+  if (status != ksi::kOk) throw DataError("cannot be read: " + StatusText(status));
+  CheckDefinitions();
+}
+
+Origin OriginOf(const std::string& host, int64_t taken) {
+  return {host, ksi::TextOfTime(taken), taken};
+}
+
+// That of the file which the library answers from.
+Origin CurrentOrigin() {
+  std::array<char, ksi::cache::kLongestText + 1> host = {};
+  int64_t taken = 0;
+  const ksi::Status status = KSI_SourceOrigin(nullptr, &taken, host.data(), host.size());
+  if (status != ksi::kOk) throw DataError("cannot be read: " + StatusText(status));
+  return OriginOf(host.data(), taken);
+}
+
+int64_t TimeIn(const std::string& when, const ksi::Span& span) {
+  const std::optional<int64_t> time = ksi::TimeOf(when, span);
+  if (!time) throw DataError(when + " is no time: spans are as 10:05..10:10, -1h.. or first..last");
+  return *time;
+}
+
+// The times from the one to the other, which are seconds as a whole.
+ksi::Span WantedOf(const NamedSpan& named, const ksi::Span& all) {
+  const int64_t from = named.from.empty() ? all.first : TimeIn(named.from, all);
+  const int64_t to = named.to.empty() ? all.last : TimeIn(named.to, all);
+  return {from / ksi::kSecond * ksi::kSecond, to / ksi::kSecond * ksi::kSecond + ksi::kSecond - 1};
+}
+
+// The moments of a recording, by the library, which goes on from one to the next.
+class SpanVisit {
+ public:
+  explicit SpanVisit(const NamedSpan& named) : fileName_(named.fileName) {
+    if (&KSI_SourceNextMoment == nullptr) {
+      throw DataError("this host's library does not read recordings");
+    }
+    const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName_);
+    const auto& parts = recording->Parts();
+    if (parts.empty()) throw DataError("it has no moments yet");
+    all_ = {parts.front().first, parts.back().last};
+    for (size_t i = 0; i < parts.size(); ++i) {
+      all_.first = std::min(all_.first, parts[i].first);
+      isInOrder_ = isInOrder_ && (i == 0 || parts[i - 1].last < parts[i].first);
+    }
+    wanted_ = WantedOf(named, all_);
+  }
+
+  void Run(const std::function<void(const Origin&)>& visit) {
+    // Where the clock was set back, times lie in several places.
+    const bool isAfterFirst = isInOrder_ && wanted_.first > all_.first;
+    UseCache(fileName_ + "@" + (isAfterFirst ? ksi::TextOfTime(wanted_.first) : "first"));
+    ksi::Status status = ksi::kOk;
+    for (; status != KSI_STATUS_NOT_FOUND; status = KSI_SourceNextMoment(nullptr)) {
+      if (status != ksi::kOk) {
+        wrong_ = "moments are missing: " + StatusText(status);
+      } else if (!Visit(visit)) {
+        break;
+      }
+    }
+    if (!wrong_.empty()) throw DataError(wrong_);
+    if (!isFound_) {
+      throw DataError("there is no moment in that time: the first is of " +
+                      ksi::TextOfTime(all_.first) + ", the last of " + ksi::TextOfTime(all_.last));
+    }
+  }
+
+ private:
+  // False if no other moment can be wanted.
+  bool Visit(const std::function<void(const Origin&)>& visit) {
+    const Origin origin = CurrentOrigin();
+    if (origin.taken > wanted_.last) return !isInOrder_;
+    if (origin.taken < wanted_.first) return true;
+    isFound_ = true;
+    try {
+      CheckDefinitions();
+      visit(origin);
+    } catch (const DataError& error) {
+      wrong_ = error.what();
+    }
+    return true;
+  }
+
+  std::string fileName_;
+  ksi::Span all_ = {};
+  ksi::Span wanted_ = {};
+  bool isInOrder_ = true;
+  bool isFound_ = false;
+  std::string wrong_;
+};
+
+}  // namespace
+
+Origin LiveOrigin() {
+  CheckDefinitions();
+  bool isRead = false;
+  return OriginOf(HostName(nullptr, isRead), ksi::ReadClock(CLOCK_REALTIME));
+}
+
+bool IsSpan(const std::string& name) { return SpanOf(name).has_value(); }
+
+void ForEachMoment(const std::string& name, const std::function<void(const Origin&)>& visit) {
+  if (const std::optional<NamedSpan> span = SpanOf(name)) return SpanVisit(*span).Run(visit);
+  const MomentHead head = HeadOf(name);
+  UseCache(name);
+  visit(OriginOf(head.host, head.taken));
+}
+
+void RunReport(const tally::Report& report, tally::Sink& sink) {
+  const tally::ReportOptions options = {.levels = report.frame->defaultLevels};
+  ksi::Status status = report.run(options, sink);
+  const std::string name = report.name;
+  if (status != ksi::kOk) throw DataError(name + ": " + StatusText(status));
+  if (&KSI_SourceWalkStatus != nullptr) status = KSI_SourceWalkStatus(nullptr);
+  if (status != ksi::kOk) {
+    KSI_RefreshSource(nullptr);  // the next walk begins anew
+    throw DataError(name + ": groups contain each other, rows are missing: " + StatusText(status));
+  }
+}
+
+}  // namespace ksicache

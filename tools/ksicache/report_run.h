@@ -1,0 +1,38 @@
+// Reports, run on the host and on moments of cache files.
+#ifndef TOOLS_KSICACHE_REPORT_RUN_H_
+#define TOOLS_KSICACHE_REPORT_RUN_H_
+
+#include <cstdint>
+#include <functional>
+#include <string>
+
+#include "framework/report.h"
+
+namespace ksicache {
+
+// Whose moment is reported on.
+struct Origin {
+  std::string host;
+  std::string time;  // "2026-11-21T10:00:00Z"
+  int64_t taken;     // the same, us since 1970
+};
+
+// The host that the library reads by itself, now. Fails with an Error if its kernel's definitions
+// are not the library's.
+Origin LiveOrigin();
+
+// Whether a name is "FILE@FROM..TO".
+bool IsSpan(const std::string& name);
+
+// Calls `visit` with each moment that `name` means while the library answers from it: of "FILE" and
+// "FILE@WHEN" the one that KSI_UseCache takes, of "FILE@FROM..TO", of which either may be left out,
+// all that a recording has from the one time to the other. Fails with a DataError.
+void ForEachMoment(const std::string& name, const std::function<void(const Origin&)>& visit);
+
+// Runs a report on what the library answers from. Fails with a DataError that starts with the
+// report's name, after the library's diagnostics; the rows before the failure have been given.
+void RunReport(const tally::Report& report, tally::Sink& sink);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_REPORT_RUN_H_
