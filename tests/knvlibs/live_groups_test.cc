@@ -285,9 +285,10 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
                                             "unix:" + path_ + ",server=on,wait=off"});
   }
 
-  // The tests of the other guests run beside this one.
+  // The tests of the other guests run beside this one, and this one from another build tree.
   static std::string Name() {
-    return std::string("tally-plug-") + GetParam().accelerator + std::to_string(GetParam().memory);
+    return std::string("tally-plug-") + GetParam().accelerator + std::to_string(GetParam().memory) +
+           "-" + std::to_string(getpid());
   }
 
   // Tries until it is so. A monitor has one client at a time, and reports of other tests ask it,
@@ -388,14 +389,15 @@ TEST(LiveGroupsTest, AGuestThatWaitsForItsFirstClientIsNotReleased) {
   }
   const HostTree directory;
   const std::string socket = directory.Root() + "/monitor";
-  const Child guest({"qemu-system-x86_64", "-name", "guest=tally-waits", "-accel", "tcg", "-M",
-                     "pc", "-m", "64", "-display", "none", "-serial", "none", "-monitor", "none",
+  const std::string name = "tally-waits-" + std::to_string(getpid());
+  const Child guest({"qemu-system-x86_64", "-name", "guest=" + name, "-accel", "tcg", "-M", "pc",
+                     "-m", "64", "-display", "none", "-serial", "none", "-monitor", "none",
                      "-device", "virtio-balloon-pci", "-qmp", "unix:" + socket + ",server=on"});
   for (int i = 0; i < 100 && access(socket.c_str(), F_OK) != 0; ++i) {
     std::this_thread::sleep_for(std::chrono::milliseconds(100));
   }
   const harness::Result run = TallyLive({"-r", "vm-stats", "-q", "-s", "name:memSize:ballooned"});
-  EXPECT_NE(run.out.find("tally-waits,65536,18446744073709551615\n"), std::string::npos) << run.out;
+  EXPECT_NE(run.out.find(name + ",65536,18446744073709551615\n"), std::string::npos) << run.out;
   // It would have its memory at once.
   std::this_thread::sleep_for(std::chrono::seconds(1));
   const std::string smaps = "/proc/" + std::to_string(guest.Pid()) + "/smaps";

@@ -50,6 +50,16 @@ std::vector<Mapping> FindBlocks(const std::vector<Figure>& sizes, std::vector<Ma
   return blocks;
 }
 
+// Whether one of the blocks may be another one than that: memory of its size is left, such as of a
+// module that is about to be plugged in.
+bool MayBeMistaken(const std::vector<Mapping>& blocks, const std::vector<Mapping>& left) {
+  return std::ranges::any_of(left, [&blocks](const Mapping& other) {
+    return other.isDontCopy && std::ranges::any_of(blocks, [&other](const Mapping& block) {
+             return SizeOf(block) == SizeOf(other);
+           });
+  });
+}
+
 // QEMU's default memory is the largest thing that it keeps from its children.
 std::vector<Mapping> FindDefault(std::vector<Mapping> mappings) {
   std::erase_if(mappings, [](const Mapping& mapping) { return !mapping.isDontCopy; });
@@ -136,8 +146,9 @@ Status MeasureGuest(const LinuxHost& host, int32_t pid, const QemuMappings& mapp
     memory.modules.reset();
     blocks.clear();
   }
+  const bool mayBeMistaken = MayBeMistaken(blocks, left);
   guest.memory = std::move(memory);
-  if (blocks.empty()) return kOk;
+  if (blocks.empty() || mayBeMistaken) return kOk;
   // The kernel may have joined a block with what lies beside it.
   const Figure size = guest.memory.Size();
   if (isSmaps) TakeSmaps(blocks, guest);

@@ -117,6 +117,16 @@ TEST_F(MachineTest, WithRoomAndMoreThatMayBeMemoryIsNotTold) {
   EXPECT_EQ(+Tally().memSize, 1024u);
 }
 
+TEST_F(MachineTest, WithTwoBlocksOfOneSizeWhatIsThereIsNotTold) {
+  WriteQemu(kPid, "1", "-smp", "2");
+  WriteMappings(kPid, "1000000-1100000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n");
+  EXPECT_EQ(+Tally().memSize, 1024u);
+  EXPECT_EQ(+Tally().mapped, kNoValue);
+  // What QEMU does not keep from its children is not memory of a guest.
+  WriteMappings(kPid, "1000000-1100000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: rd wr\n");
+  EXPECT_EQ(+Tally().mapped, 1000u);
+}
+
 TEST_F(MachineTest, WhatItsMonitorTellsIsItsMemory) {
   WriteQemu(kPid, "1,slots=1,maxmem=64M", "-qmp", "unix:/run/q");
   tree_.Write("/run/q",
