@@ -13,6 +13,10 @@
 namespace ksi {
 namespace {
 
+// What it takes to bring a reading into order, as bytes of lists.
+constexpr size_t kEachSorted = 16;
+constexpr size_t kEachMerged = 4;
+
 std::strong_ordering Compare(const Key& a, const Key& b) {
   if (a.kind != b.kind) return a.kind <=> b.kind;
   return a.kind == KeyKind::kNumber ? a.number <=> b.number : a.text <=> b.text;
@@ -70,7 +74,7 @@ bool NodeReader::Hold(size_t bytes) {
 bool NodeReader::TakeCells(Streams& streams, size_t old, size_t count, size_t moment) {
   const size_t size = node_->recordSize;
   if (!ChunkBudget::Spend(budget_->bytes, readings_.size() * size - records_.size()) ||
-      !ChunkBudget::Spend(budget_->work, readings_.size())) {
+      !ChunkBudget::Spend(budget_->work, kEachSorted * readings_.size())) {
     return false;
   }
   records_.resize(readings_.size() * size);
@@ -222,7 +226,7 @@ bool NodeReader::Apply(const Event& event) {
     readings_[number].isThere = true;
   }
   UpdatePresent(event);
-  if (!ChunkBudget::Spend(budget_->work, present_.size())) return false;
+  if (!ChunkBudget::Spend(budget_->work, kEachMerged * present_.size())) return false;
   return std::ranges::all_of(event.edits, [this](const Edit& edit) { return Apply(edit); });
 }
 
@@ -240,11 +244,12 @@ void NodeReader::UpdatePresent(const Event& event) {
   const auto keysOf = [this](uint32_t number) -> const KeyPair& { return readings_[number].keys; };
   const auto isGone = [this](uint32_t number) { return !readings_[number].isThere; };
   if (!event.gone.empty()) std::erase_if(present_, isGone);
-  const auto old = static_cast<ptrdiff_t>(present_.size());
+  const size_t old = present_.size();
   for (uint32_t number = event.come; number < event.end; ++number) present_.push_back(number);
-  const auto come = std::ranges::subrange(present_.begin() + old, present_.end());
+  const std::span<uint32_t> come = std::span(present_).subspan(old);
   if (!std::ranges::is_sorted(come, IsBefore, keysOf)) std::ranges::sort(come, IsBefore, keysOf);
-  std::ranges::inplace_merge(present_, present_.begin() + old, IsBefore, keysOf);
+  std::ranges::inplace_merge(present_, present_.begin() + static_cast<ptrdiff_t>(old), IsBefore,
+                             keysOf);
 }
 
 NodeReader::View NodeReader::At(uint32_t number) const {

@@ -260,9 +260,9 @@ TEST_F(RecordingLive, AMomentSaysWhatWasSaidBeforeAndAfterIt) {
   ASSERT_EQ(file->Parts().back().End(), kMoments);
   std::set<std::string> compared;
   for (int64_t number = 0; number < kMoments; ++number) {
-    Moment moment;
+    ChunkReader moment;
     ASSERT_EQ(file->ReadMoment(number, moment), kOk) << file->Why();
-    compared.merge(CompareMoment(moment.facts, looks));
+    compared.merge(CompareMoment(moment.Facts(), looks));
   }
   EXPECT_TRUE(std::ranges::includes(compared, still)) << testing::PrintToString(compared);
 }
