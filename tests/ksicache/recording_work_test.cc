@@ -127,9 +127,9 @@ TEST_F(RecordingWork, MomentsInARowAreUnpackedOnce) {
 }
 
 TEST_F(RecordingWork, ManyReadingsThatChangeInManyPartsAreDamage) {
-  const auto [start, more] = PartsWithZeros(500'000, 1);
+  const auto [start, more] = PartsWithZeros(300'000, 1);
   AddChunks(1, start);
-  AddMoments(1, 400, more);
+  AddMoments(1, 500, more);
   ExpectEnds({"extract", file_, Path("out.ksi")}, "", "ksicache: damaged\n");
 }
 
