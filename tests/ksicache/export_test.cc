@@ -303,6 +303,8 @@ TEST_F(ExportTest, MakesAFile) {
             0u);
   EXPECT_EQ(Lines(FileContent(out)).size(), 2u);
   EXPECT_EQ(Output({"export", "pshareHint-stats", "-o", "-", kExample}), kHints);
+  // Of nothing at all there is no file.
+  EXPECT_EQ(Run({"export", "pshareHint-stats", "-o", Path("none.csv"), Path("none")}).status, 1);
   // Nothing is left behind beside it.
   EXPECT_EQ(directory_.Names(), std::vector<std::string>{"out.csv"});
 }

@@ -146,6 +146,9 @@ class Exporter {
   // Whether nothing was left out.
   bool IsWhole() const { return isWhole_; }
 
+  // Whether there is anything at all, be it only that there are no rows.
+  bool HasBegun() const { return sink_.HasBegun(); }
+
  private:
   void Export(const Origin& origin, Complaints& complaints) {
     for (const tally::Report* report : reports_) {
@@ -181,7 +184,7 @@ int Export(const CommandLine& line) {
   Exporter exporter(reports, *format, unit);
   if (files.empty()) exporter.ExportHost();
   for (const std::string& name : files) exporter.ExportFile(name);
-  format->Finish();
+  if (exporter.HasBegun()) format->Finish();
   return exporter.IsWhole() ? 0 : 1;
 }
 

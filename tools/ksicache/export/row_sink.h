@@ -26,6 +26,9 @@ class RowSink : public tally::Sink {
     origin_ = &origin;
   }
 
+  // Whether there has been anything to give.
+  bool HasBegun() const { return !columns_.empty(); }
+
   // Of the format.
   std::string TakeComplaint() { return format_.TakeComplaint(); }
 
