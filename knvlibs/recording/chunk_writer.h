@@ -30,7 +30,8 @@ class ChunkWriter {
   // Takes the next moment of the host, with its readings in the order of SortReadings.
   void Add(const MomentFacts& facts, const std::vector<MomentReading>& readings);
 
-  // The moments from `from` to the last as a part; from 0 on it starts the chunk. Fails as MakePart.
+  // The moments from `from` to the last as a part; from 0 on it starts the chunk. Fails as
+  // MakePart.
   Bytes PartFrom(size_t from) const;
 
  private:

@@ -298,13 +298,24 @@ TEST_F(GroupsTest, ACgroupWithoutTheControllerHasNoFigures) {
   EXPECT_EQ(uint64_t{stats.bMin}, 0u);
 }
 
-TEST_F(GroupsTest, ACgroupThatVanishesAfterTheScanIsNotFound) {
+TEST_F(GroupsTest, ACgroupThatVanishesAfterTheScanHasNoFigures) {
   LinuxSource source(tree_.Root());
   EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}).size(), 1u);
   std::filesystem::remove_all(tree_.Root() + "/sys/fs/cgroup/jobs");
   KSI_GroupMemoryStats stats = {};
-  EXPECT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kJobs}, &stats),
-            KSI_STATUS_NOT_FOUND);
+  ASSERT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kJobs}, &stats), kOk);
+  for (const uint64_t none : {stats.consumed, stats.consumedPeak, stats.memSize, stats.memSizePeak,
+                              stats.ovhd, stats.touched, stats.bMax}) {
+    EXPECT_EQ(none, kNoValue);
+  }
+  EXPECT_EQ(uint64_t{stats.bMin}, 0u);
+  KSI_GroupName name = {};
+  ASSERT_EQ(GetValue(source, "sched/groups/groupName", {kJobs}, &name), kOk);
+  EXPECT_STREQ(name.text, "jobs");
+  KSI_GroupAllocation allocation = {};
+  EXPECT_EQ(GetValue(source, "sched/groups/memAllocationInKB", {kJobs}, &allocation), kOk);
+  KSI_GroupCapacity capacity = {};
+  EXPECT_EQ(GetValue(source, "sched/groups/stats/capacity", {kJobs}, &capacity), kOk);
 }
 
 TEST_F(GroupsTest, AProcessThatEndsAfterTheScanIsShownAsItWas) {

@@ -142,9 +142,9 @@ KSI_NODISCARD uint32_t KSI_SourceOrigin(struct KSI_Source* source, int64_t* take
                                         size_t size);
 
 /* Goes on to the next moment of a recording, which all later reads of `source` answer from; what
- * they have in common is not read again. KSI_STATUS_NOT_FOUND after the last moment, and of all that
- * is no recording: nothing changes then. After another failure, which was said to people, a further
- * call goes on behind what is damaged. */
+ * they have in common is not read again. KSI_STATUS_NOT_FOUND after the last moment, and of all
+ * that is no recording: nothing changes then. After another failure, which was said to people, a
+ * further call goes on behind what is damaged. */
 KSI_NODISCARD uint32_t KSI_SourceNextMoment(struct KSI_Source* source);
 
 /* Whether the groups that were walked over are a tree. A damaged cache file may have groups that

@@ -157,12 +157,6 @@ Status CgroupHierarchy::ReadStat(const LinuxHost& host, std::string_view path,
   return FigureFile::ReadMemoryStat(host, FileOf(path, "memory.stat"), stat);
 }
 
-Status CgroupHierarchy::CheckExists(const LinuxHost& host, std::string_view path) const {
-  std::string content;
-  const Status status = host.Read(FileOf(path, "cgroup.procs"), content);
-  return status == KSI_STATUS_NOT_FOUND ? status : kOk;
-}
-
 Status CgroupHierarchy::ReadReservation(const LinuxHost& host, std::string_view path,
                                         Figure& reserved) const {
   reserved = 0;
@@ -181,7 +175,7 @@ Status CgroupHierarchy::ReadUsage(const LinuxHost& host, std::string_view path,
   usage = MemcgUsage();
   const Status status =
       version_ == Version::k2 ? ReadUsage2(host, path, usage) : ReadUsage1(host, path, usage);
-  return status == KSI_STATUS_NOT_FOUND ? CheckExists(host, path) : status;
+  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
 }
 
 Status CgroupHierarchy::ReadUsage2(const LinuxHost& host, std::string_view path,
@@ -260,7 +254,7 @@ Status CgroupHierarchy::ReadEvents(const LinuxHost& host, std::string_view path,
   if (version_ != Version::k2) return kOk;
   FigureFile stat;
   Status status = ReadStat(host, path, stat);
-  if (status == KSI_STATUS_NOT_FOUND) return CheckExists(host, path);
+  if (status == KSI_STATUS_NOT_FOUND) return kOk;
   if (status == kOk) {
     status = ReadAmount(host, path, "memory.zswap.max", std::nullopt, events.zswapMax);
   }

@@ -87,9 +87,9 @@ class CgroupHierarchy {
   [[nodiscard]] Status ReadProcesses(const LinuxHost& host, std::string_view path,
                                      std::vector<int32_t>& pids) const;
 
-  // What is reserved, and the limit, in KB; none is "max". A cgroup that has no memory controller
-  // has no reservation, 0, and no limit. These fail with KSI_STATUS_NOT_FOUND if the cgroup is
-  // gone.
+  // What is reserved, and the limit, in KB; none is "max". A cgroup that has no memory controller,
+  // or has gone since the scan, has no reservation, 0, no limit, and no figures in what follows: it
+  // is not the end of a walk over the others.
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, std::string_view path,
                                        Figure& reserved) const;
   [[nodiscard]] Status ReadLimit(const LinuxHost& host, std::string_view path, Figure& limit) const;
@@ -115,7 +115,6 @@ class CgroupHierarchy {
                                   std::string_view name, Figure missing, Figure& amount) const;
   [[nodiscard]] Status ReadStat(const LinuxHost& host, std::string_view path,
                                 FigureFile& stat) const;
-  [[nodiscard]] Status CheckExists(const LinuxHost& host, std::string_view path) const;
   [[nodiscard]] Status ReadUsage1(const LinuxHost& host, std::string_view path,
                                   MemcgUsage& usage) const;
   [[nodiscard]] Status ReadUsage2(const LinuxHost& host, std::string_view path,

@@ -50,13 +50,16 @@ std::vector<Mapping> FindBlocks(const std::vector<Figure>& sizes, std::vector<Ma
   return blocks;
 }
 
-// Whether one of the blocks may be another one than that: memory of its size is left, such as of a
-// module that is about to be plugged in.
-bool MayBeMistaken(const std::vector<Mapping>& blocks, const std::vector<Mapping>& left) {
-  return std::ranges::any_of(left, [&blocks](const Mapping& other) {
-    return other.isDontCopy && std::ranges::any_of(blocks, [&other](const Mapping& block) {
-             return SizeOf(block) == SizeOf(other);
-           });
+// Whether one of the blocks may be another one than that: there is other memory of its size, such
+// as of a module that is about to be plugged in.
+bool MayBeMistaken(const std::vector<Mapping>& blocks, const std::vector<Mapping>& all) {
+  const auto isBlock = [&blocks](const Mapping& other) {
+    return std::ranges::find(blocks, other.start, &Mapping::start) != blocks.end();
+  };
+  return std::ranges::any_of(all, [&](const Mapping& other) {
+    return other.isDontCopy && !isBlock(other) &&
+           std::ranges::any_of(
+               blocks, [&other](const Mapping& block) { return SizeOf(block) == SizeOf(other); });
   });
 }
 
@@ -146,7 +149,7 @@ Status MeasureGuest(const LinuxHost& host, int32_t pid, const QemuMappings& mapp
     memory.modules.reset();
     blocks.clear();
   }
-  const bool mayBeMistaken = MayBeMistaken(blocks, left);
+  const bool mayBeMistaken = MayBeMistaken(blocks, mappings.mappings);
   guest.memory = std::move(memory);
   if (blocks.empty() || mayBeMistaken) return kOk;
   // The kernel may have joined a block with what lies beside it.
