@@ -23,7 +23,7 @@ class ChunkReader {
   // Takes a part up to its moment `last`, or all of it if it has no more. What was taken before has
   // no moment to go on to. The status is KSI_STATUS_METADATA_READ_ERROR if it is damaged: nothing
   // is good any more then.
-  [[nodiscard]] Status Take(Bytes part, size_t last = SIZE_MAX);
+  [[nodiscard]] Status Take(Bytes packed, size_t last = SIZE_MAX);
 
   // The facts of a part's moments alone, and the host if it starts a chunk; else that stays.
   [[nodiscard]] static Status TakeFacts(ByteView part, HostIdentity& host,
@@ -71,7 +71,7 @@ class ChunkReader {
 
   [[nodiscard]] Status TakePlaces(ByteReader& in, ByteView packed, Part& part);
   [[nodiscard]] Status TakeParts(size_t node);
-  [[nodiscard]] Status ContentOf(Part& part, size_t node, ByteView& content);
+  [[nodiscard]] static Status ContentOf(Part& part, size_t node, ByteView& content);
   [[nodiscard]] size_t MomentIn(size_t part) const;
 
   HostIdentity host_;

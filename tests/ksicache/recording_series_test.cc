@@ -173,6 +173,29 @@ TEST_F(RecordingSeries, ASourceGoesOnToTheNextMoment) {
   KSI_CloseSource(source);
 }
 
+// Times name seconds, in which there may be several moments.
+TEST_F(RecordingSeries, SpansHaveAllMomentsOfTheirSeconds) {
+  const auto node = std::ranges::find(RecordedNodes(), "memory/pshare/stats", &RecordedNode::path);
+  Moment moment;
+  moment.host = Host();
+  moment.readings.emplace_back();
+  moment.readings[0].question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
+  moment.readings[0].answer.record.resize(node->recordSize);
+  std::vector<Moment> moments;
+  for (int64_t i = 0; i < 20; ++i) {
+    moment.facts.taken = kStart + i * kSecond / 5;
+    moments.push_back(moment);
+  }
+  Record(Path("r.ksi"), moments);
+  const auto rows = [this](const std::string& span) {
+    return std::ranges::count(Output({"export", "pshare-stats", Path("r.ksi@" + span)}), '\n') - 1;
+  };
+  EXPECT_EQ(rows(".."), 20);
+  EXPECT_EQ(rows("..10:00:00Z"), 5);
+  EXPECT_EQ(rows("10:00:01Z..10:00:02Z"), 10);
+  EXPECT_EQ(rows("10:00:03Z.."), 5);
+}
+
 TEST_F(RecordingSeries, HostsAreNotMixed) {
   std::vector<Moment> moments = MakeMoments(1, 2);
   moments[1].host.name = "other.example.org";

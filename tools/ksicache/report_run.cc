@@ -106,9 +106,11 @@ class SpanVisit {
   }
 
   void Run(const std::function<void(const Origin&)>& visit) {
-    // Where the clock was set back, times lie in several places.
-    const bool isAfterFirst = isInOrder_ && wanted_.first > all_.first;
-    UseCache(fileName_ + "@" + (isAfterFirst ? ksi::TextOfTime(wanted_.first) : "first"));
+    // From the last moment of the second before on. Where the clock was set back, times lie in
+    // several places.
+    const int64_t before = wanted_.first - ksi::kSecond;
+    const bool isAfterFirst = isInOrder_ && before > all_.first;
+    UseCache(fileName_ + "@" + (isAfterFirst ? ksi::TextOfTime(before) : "first"));
     ksi::Status status = ksi::kOk;
     for (; status != KSI_STATUS_NOT_FOUND; status = KSI_SourceNextMoment(nullptr)) {
       if (status != ksi::kOk) {
