@@ -173,6 +173,17 @@ TEST_F(RecordingLife, ReadersMeanwhileSeeWholeMoments) {
   while (*done_ < then + 100) usleep(100);
 }
 
+TEST_F(RecordingLife, CheckPassesOverWhatLeavesMeanwhile) {
+  Child recorder([this] { RecordOn(RecordingStore::kSmallestFile); });
+  while (*done_ < 10 || OpenFile(file_)->Parts().front().number == 0) usleep(10'000);
+  for (int i = 0; i < 12; ++i) {
+    // Hosts of noise have much that is wrong, and nothing that is damaged.
+    const harness::Result result = Run({"check", file_});
+    ASSERT_EQ(result.out.find("damaged"), std::string::npos) << result.out;
+    ASSERT_EQ(result.err, "");
+  }
+}
+
 TEST_F(RecordingLife, ASecondRecorderIsToldTheFirstsProcess) {
   std::filesystem::create_hard_link(file_, Path("hard.ksi"));
   std::filesystem::create_directory(Path("other"));

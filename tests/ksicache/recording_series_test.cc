@@ -173,6 +173,18 @@ TEST_F(RecordingSeries, ASourceGoesOnToTheNextMoment) {
   KSI_CloseSource(source);
 }
 
+TEST_F(RecordingSeries, WhatSeveralFilesHaveIsJoinedOnce) {
+  const std::vector<Moment> moments = MakeMoments(6, 8);
+  Record(Path("first.ksi"), {moments.begin(), moments.begin() + 6});
+  Record(Path("second.ksi"), {moments.begin() + 3, moments.end()});
+  MakeCapture(moments[4], Capture(4));
+  Output({"join", Path("r.ksi"), Path("second.ksi"), Path("first.ksi"), Capture(4)});
+  const std::unique_ptr<RecordingFile> file = OpenFile(Path("r.ksi"));
+  ASSERT_NE(file, nullptr);
+  EXPECT_EQ(file->Parts().back().End(), 8);
+  ExpectMoments(*file, moments);
+}
+
 // Times name seconds, in which there may be several moments.
 TEST_F(RecordingSeries, SpansHaveAllMomentsOfTheirSeconds) {
   const auto node = std::ranges::find(RecordedNodes(), "memory/pshare/stats", &RecordedNode::path);

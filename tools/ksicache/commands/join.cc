@@ -110,6 +110,11 @@ class Inputs {
   std::string host_;
 };
 
+// Whether two files have the same moment.
+bool IsSame(const ksi::Moment& a, const ksi::Moment& b) {
+  return a.facts.taken == b.facts.taken && a.readings == b.readings;
+}
+
 // A file without a name, closed with its owner.
 using TemporaryFile = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 
@@ -143,9 +148,12 @@ int Join(const CommandLine& line) {
                          std::numeric_limits<int64_t>::max());
     Recorder recorder(store);
     Progress progress("joining");
-    for (size_t i = 0; i < inputs.Places().size(); ++i) {
+    recorder.Add(moment.host, moment.facts, moment.readings);
+    for (size_t i = 1; i < inputs.Places().size(); ++i) {
       progress.Show(i, inputs.Places().size());
-      if (i != 0) moment = inputs.Read(inputs.Places()[i]);
+      ksi::Moment next = inputs.Read(inputs.Places()[i]);
+      if (IsSame(next, moment)) continue;
+      moment = std::move(next);
       recorder.Add(moment.host, moment.facts, moment.readings);
       recorder.Tidy();
     }
@@ -162,7 +170,8 @@ const Command kJoin = {
     .arguments = "OUT IN...",
     .summary = "make a recording of captures and recordings of one host",
     .help = R"(Makes OUT, a recording, of captures and recordings of one host, by the times at
-which their moments were taken; "-" is standard output.
+which their moments were taken; "-" is standard output. What several of them have
+is there once.
 )",
     .options = kOptions,
     .fewest = 2,
