@@ -101,13 +101,11 @@ class RecordingTest : public Ksicache {
   static void ExpectBounded(const std::function<void()>& run) {
     const pid_t child = fork();
     if (child == 0) {
-#ifdef TALLY_SANITIZED
-      const rlimit seconds = {200, 200};  // what is looked at takes many times as long
-#else
-      const rlimit seconds = {20, 20};
+#ifndef TALLY_SANITIZED
       const rlimit memory = {rlim_t{1} << 30, rlim_t{1} << 30};
       setrlimit(RLIMIT_AS, &memory);
 #endif
+      const rlimit seconds = {20, 20};
       setrlimit(RLIMIT_CPU, &seconds);
       run();
       _exit(HasFailure() ? 1 : 0);
