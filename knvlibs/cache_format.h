@@ -54,6 +54,12 @@ constexpr size_t kPageSize = 4096;
 constexpr size_t kBlockSize = 4572;
 constexpr size_t kBlockHead = 4;
 
+// How many blocks hold so many bytes of a part.
+constexpr size_t BlocksOf(size_t bytes) {
+  constexpr size_t kPiece = kBlockSize - kBlockHead;
+  return (bytes + kPiece - 1) / kPiece;
+}
+
 // node.kind
 constexpr std::string_view kValue = "value";
 constexpr std::string_view kList = "list";

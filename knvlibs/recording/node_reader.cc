@@ -78,18 +78,16 @@ bool NodeReader::TakeCells(Streams& streams, size_t old, size_t count, size_t mo
     return false;
   }
   records_.resize(readings_.size() * size);
+  const auto hasFailed = [this](uint32_t number) { return readings_[number].status != kOk; };
   std::vector<uint32_t> members = present_;
+  std::erase_if(members, hasFailed);
   std::ranges::sort(members);
   const size_t there = members.size();
-  for (size_t number = old; number < readings_.size(); ++number) {
-    members.push_back(static_cast<uint32_t>(number));
+  for (auto number = static_cast<uint32_t>(old); number < readings_.size(); ++number) {
+    if (!hasFailed(number)) members.push_back(number);
   }
-  const auto hasFailed = [this](uint32_t number) { return readings_[number].status != kOk; };
-  const size_t thereAndGood = there - static_cast<size_t>(std::ranges::count_if(
-                                          std::span(members).first(there), hasFailed));
-  std::erase_if(members, hasFailed);
-  TakeFirst(streams, std::span(members).subspan(thereAndGood));
-  const bool isGood = TakeChanges(streams, members, thereAndGood, count, moment);
+  TakeFirst(streams, std::span(members).subspan(there));
+  const bool isGood = TakeChanges(streams, members, there, count, moment);
   std::ranges::sort(changes_, {}, &Change::moment);
   return isGood && std::ranges::all_of(streams, &ByteReader::IsAtEnd);
 }

@@ -30,8 +30,7 @@ constexpr uint64_t kGrowth = uint64_t{1} << 20;
 
 // What a part takes of the file.
 uint64_t RoomOf(const RecordingFile::Part& part) {
-  constexpr uint64_t kPiece = cache::kBlockSize - cache::kBlockHead;
-  return (static_cast<uint64_t>(part.size) + kPiece - 1) / kPiece * cache::kBlockSize;
+  return cache::BlocksOf(static_cast<size_t>(part.size)) * cache::kBlockSize;
 }
 
 bool IsGood(const RecordingFile::Part& part) {

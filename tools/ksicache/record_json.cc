@@ -13,16 +13,6 @@
 namespace ksicache {
 namespace {
 
-std::string ToHex(std::span<const std::byte> bytes) {
-  constexpr char kDigits[] = "0123456789abcdef";
-  std::string hex;
-  for (const std::byte byte : bytes) {
-    hex += kDigits[std::to_integer<unsigned>(byte) >> 4];
-    hex += kDigits[std::to_integer<unsigned>(byte) & 15];
-  }
-  return hex;
-}
-
 std::optional<unsigned> DigitOf(char c) {
   if (c >= '0' && c <= '9') return c - '0';
   if (c >= 'a' && c <= 'f') return c - 'a' + 10;
@@ -165,6 +155,16 @@ bool IsUtf8(std::string_view text) {
     text.remove_prefix(first.size);
   }
   return true;
+}
+
+std::string ToHex(std::span<const std::byte> bytes) {
+  constexpr char kDigits[] = "0123456789abcdef";
+  std::string hex;
+  for (const std::byte byte : bytes) {
+    hex += kDigits[std::to_integer<unsigned>(byte) >> 4];
+    hex += kDigits[std::to_integer<unsigned>(byte) & 15];
+  }
+  return hex;
 }
 
 std::string TextToJson(std::string_view text) {

@@ -28,6 +28,9 @@ std::string ToText(const Json& json);
 
 bool IsUtf8(std::string_view text);
 
+// The bytes, two digits each.
+std::string ToHex(std::span<const std::byte> bytes);
+
 // Text of any bytes: a string, or {"hex": "..."}.
 std::string TextToJson(std::string_view text);
 // Fails with a DataError that starts with `where`.

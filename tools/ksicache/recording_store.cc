@@ -46,8 +46,6 @@ constexpr const char* kFreePart = "UPDATE part SET moments = 0 WHERE id = ?1";
 constexpr off_t kLockAt = off_t{1} << 61;
 constexpr off_t kTellingLockAt = kLockAt + 1;
 
-size_t BlocksOf(size_t bytes) { return (bytes + kPieceSize - 1) / kPieceSize; }
-
 struct flock LockAt(off_t place) {
   struct flock lock = {};
   lock.l_type = F_WRLCK;
@@ -249,7 +247,7 @@ void RecordingStore::Add(Part part, ksi::ByteView content) {
 
 void RecordingStore::Put(Part part, ksi::ByteView content, bool replaces) {
   part.size = static_cast<int64_t>(content.size());
-  const size_t count = BlocksOf(content.size());
+  const size_t count = ksi::cache::BlocksOf(content.size());
   KeepSpare(count);
   const std::vector<int64_t> blocks = TakeBlocks(count);
   part.block = blocks.front();

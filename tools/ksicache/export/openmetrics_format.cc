@@ -18,6 +18,7 @@
 #include <utility>
 #include <vector>
 
+#include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/metric_name.h"
@@ -132,7 +133,7 @@ class OpenMetricsFormat : public RowFormat {
     }
     host_ = "{";
     PutLabel("host", table.origin->host, host_);
-    ending_ = hasTimes_ ? " " + std::to_string(table.origin->taken / 1'000'000) + "\n" : "\n";
+    ending_ = hasTimes_ ? " " + std::to_string(table.origin->taken / ksi::kSecond) + "\n" : "\n";
   }
 
   void Row(std::span<const Value> values) override {
@@ -173,7 +174,6 @@ class OpenMetricsFormat : public RowFormat {
 
   // The metrics of a report.
   struct Family {
-    const tally::Report* report = nullptr;
     std::vector<Place> places;  // one for each column
     Metric flag;
     Metric info;
@@ -186,7 +186,6 @@ class OpenMetricsFormat : public RowFormat {
     std::string_view report = table.report->name;
     if (report.ends_with(kStats)) report.remove_suffix(kStats.size());
     const std::string start = "tally_" + SnakeCase(report) + "_";
-    family.report = table.report;
     family.flag = {start + "flag", "", "gauge", ""};
     family.info = {start + "info", "", "gauge", ""};
     for (const RowColumn& column : table.columns) AddPlace(column, start, family);

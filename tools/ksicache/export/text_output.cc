@@ -7,6 +7,7 @@
 
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/output.h"
+#include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 
@@ -43,14 +44,7 @@ bool IsSimple(std::string_view text) {
 }
 
 std::string HexText(std::string_view text) {
-  constexpr char kDigits[] = "0123456789abcdef";
-  std::string hex = "hex:";
-  for (const char c : text) {
-    const auto byte = static_cast<unsigned char>(c);
-    hex += kDigits[byte >> 4];
-    hex += kDigits[byte & 15];
-  }
-  return hex;
+  return "hex:" + ToHex(std::as_bytes(std::span(text)));
 }
 
 }  // namespace ksicache
