@@ -16,15 +16,23 @@ namespace {
 enum ReadingColumn { kKey1, kKey2, kNode, kStatus, kAnswer };
 enum EntryColumn { kPosition = kNode + 1, kEntry };
 
+// All readings from an object on. One comparison of both keys, as the lists have it, would say it
+// shorter, and SQLite would make it again for each row.
 constexpr const char* kReadings =
-    "SELECT key1, key2, node, status, answer FROM reading WHERE (key1, key2) >= (?1, ?2) "
-    "ORDER BY key1, key2, node";
+    "SELECT * FROM (SELECT key1, key2, node, status, answer FROM reading "
+    "WHERE key1 = ?1 AND key2 >= ?2 ORDER BY key2, node) "
+    "UNION ALL "
+    "SELECT * FROM (SELECT key1, key2, node, status, answer FROM reading "
+    "WHERE key1 > ?1 ORDER BY key1, key2, node)";
 constexpr const char* kEntries =
     "SELECT key1, key2, node, position, entry FROM instance "
     "WHERE (key1, key2, node) >= (?1, ?2, ?3) ORDER BY key1, key2, node, position";
 
 // More readings than a catalogue has nodes are damage.
 constexpr size_t kMostReadings = 256;
+
+// A report may ask for a list of a few entries twice, and whoever reads has gone on since.
+constexpr int64_t kFewEntries = 16;
 
 constexpr const char* kOtherCount = "has other entries than it says";
 
@@ -33,21 +41,33 @@ constexpr Key kAbsent{KeyKind::kText, 0, {}};
 // The keys of an object as the file has them.
 const Key& KeyAt(const Keys& keys, size_t i) { return i < keys.count ? keys[i] : kAbsent; }
 
-bool ColumnIs(const Statement& row, int column, const Key& key) {
-  return key.kind == KeyKind::kNumber
-             ? row.Type(column) == SQLITE_INTEGER && row.Number(column) == key.number
-             : row.Type(column) == SQLITE_TEXT && row.Bytes(column) == key.text;
+bool AreSame(const Key& one, const Key& other) {
+  return one.kind == other.kind &&
+         (one.kind == KeyKind::kNumber ? one.number == other.number : one.text == other.text);
+}
+
+// None if the column holds what is no key.
+std::optional<Key> KeyIn(const ColumnValue& column) {
+  const int type = column.Type();
+  if (type == SQLITE_INTEGER) return Key{KeyKind::kNumber, column.Number(), {}};
+  if (type == SQLITE_TEXT) return Key{KeyKind::kText, 0, column.Bytes()};
+  return std::nullopt;
 }
 
 }  // namespace
 
 bool CacheSource::Cursor::IsAt(const Keys& keys) const {
-  return isOnRow && ColumnIs(rows, kKey1, KeyAt(keys, 0)) && ColumnIs(rows, kKey2, KeyAt(keys, 1));
+  if (!isOnRow) return false;
+  for (size_t i = 0; i < kMaxKeys; ++i) {
+    if (!at[i] || !AreSame(*at[i], KeyAt(keys, i))) return false;
+  }
+  return true;
 }
 
 int CacheSource::Cursor::Step() {
   const int code = rows.Step();
   isOnRow = code == SQLITE_ROW;
+  if (isOnRow) at = {KeyIn(rows.At(kKey1)), KeyIn(rows.At(kKey2))};
   return code;
 }
 
@@ -71,9 +91,7 @@ int CacheSource::Cursor::Seek(sqlite3* database, const Keys& keys, const int64_t
   return code == SQLITE_OK ? Step() : code;
 }
 
-bool CacheSource::OwnKey::Is(const Key& key) const {
-  return kind == key.kind && (kind == KeyKind::kNumber ? number == key.number : text == key.text);
-}
+bool CacheSource::OwnKey::Is(const Key& key) const { return AreSame({kind, number, text}, key); }
 
 void CacheSource::OwnKey::Take(const Key& key) {
   kind = key.kind;
@@ -97,7 +115,7 @@ Status CacheSource::Value(const Node& node, const Keys& keys, Buffer record) {
 }
 
 Status CacheSource::Read(const Node& node, const Keys& keys, Buffer record) {
-  const Object* object = nullptr;
+  Object* object = nullptr;
   const Reading* reading = nullptr;
   const Status status = Find(node, Kind::kValue, keys, &object, &reading);
   if (status != kOk) return status;
@@ -155,32 +173,44 @@ Status CacheSource::BeginRead() {
 }
 
 Status CacheSource::List(const Node& node, const Keys& keys, ParamList& instances) {
-  const Object* object = nullptr;
+  Object* object = nullptr;
   const Reading* reading = nullptr;
   Status status = Find(node, Kind::kList, keys, &object, &reading);
   if (status != kOk) return status;
   if (reading->type != SQLITE_INTEGER) return Damaged("has no number of entries");
-  const int64_t count = reading->number;
-  if (count == 0) return kOk;
-  status = BeginRead();
+  if (reading->number == 0) return kOk;
+  if (reading->number > kFewEntries) return ReadEntries(node, keys, *reading, instances);
+  if (object->listed != reading->node) {
+    object->listed = -1;
+    object->entries = ParamList(ParamList::kNoLimit);
+    status = ReadEntries(node, keys, *reading, object->entries);
+    if (status != kOk) return status;
+    object->listed = reading->node;
+  }
+  return instances.Append(object->entries);
+}
+
+Status CacheSource::ReadEntries(const Node& node, const Keys& keys, const Reading& reading,
+                                ParamList& instances) {
+  Status status = BeginRead();
   if (status != kOk) return status;
 
   // The lists of a walk lie side by side.
   const auto isOnList = [&] {
-    return entries_.IsAt(keys) && entries_.rows.Number(kNode) == reading->node;
+    return entries_.IsAt(keys) && entries_.rows.Number(kNode) == reading.node;
   };
   int code = SQLITE_ROW;
   if (!isOnList() || entries_.rows.Number(kPosition) != 0) {
-    code = entries_.Seek(file_->Handle(), keys, &reading->node);
+    code = entries_.Seek(file_->Handle(), keys, &reading.node);
   }
   int64_t position = 0;
   for (; status == kOk && code == SQLITE_ROW && isOnList(); code = entries_.Step(), ++position) {
-    status = position < count && entries_.rows.Number(kPosition) == position
+    status = position < reading.number && entries_.rows.Number(kPosition) == position
                  ? TakeEntry(node, instances)
                  : Damaged(kOtherCount);
   }
   if (status == kOk) status = StatusOfCall(code);
-  if (status == kOk && position != count) status = Damaged(kOtherCount);
+  if (status == kOk && position != reading.number) status = Damaged(kOtherCount);
   if (status != kOk) entries_.Leave();
   return status;
 }
@@ -210,7 +240,7 @@ std::optional<Source::Origin> CacheSource::GetOrigin() const {
 }
 
 // The reading of a node's value or list; one that failed when it was captured fails again.
-Status CacheSource::Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
+Status CacheSource::Find(const Node& node, Kind kind, const Keys& keys, Object** object,
                          const Reading** reading) {
   const int64_t id = ids_[static_cast<size_t>(kind)][IdOf(node) - 1u];
   if (id < 0) return KSI_STATUS_NOT_FOUND;
@@ -223,8 +253,8 @@ Status CacheSource::Find(const Node& node, Kind kind, const Keys& keys, const Ob
   return found->status;
 }
 
-Status CacheSource::FindObject(const Keys& keys, const Object** object) {
-  for (const Object& each : objects_) {
+Status CacheSource::FindObject(const Keys& keys, Object** object) {
+  for (Object& each : objects_) {
     if (each.valid && each.keys[0].Is(KeyAt(keys, 0)) && each.keys[1].Is(KeyAt(keys, 1))) {
       *object = &each;
       return kOk;
@@ -258,6 +288,7 @@ Status CacheSource::FindCursor(const Keys& keys, Cursor*& cursor) {
 Status CacheSource::Load(const Keys& keys, Object& object) {
   object.readings.clear();
   object.bytes.clear();
+  object.listed = -1;
   Cursor* cursor = nullptr;
   Status status = BeginRead();
   if (status == kOk) status = FindCursor(keys, cursor);
@@ -277,17 +308,18 @@ Status CacheSource::TakeReading(const Statement& row, Object& object) {
       (reading.node <= object.readings.back().node || object.readings.size() == kMostReadings)) {
     return Damaged("readings are out of order");
   }
-  const int64_t recorded = row.Number(kStatus);
-  if (row.Type(kStatus) != SQLITE_INTEGER || recorded < 0 ||
-      recorded > std::numeric_limits<Status>::max()) {
+  const ColumnValue recorded = row.At(kStatus);
+  if (recorded.Type() != SQLITE_INTEGER || recorded.Number() < 0 ||
+      recorded.Number() > std::numeric_limits<Status>::max()) {
     return Damaged("a reading has no good status");
   }
-  reading.status = static_cast<Status>(recorded);
-  reading.type = row.Type(kAnswer);
+  reading.status = static_cast<Status>(recorded.Number());
+  const ColumnValue answer = row.At(kAnswer);
+  reading.type = answer.Type();
   if (reading.type == SQLITE_INTEGER) {
-    reading.number = row.Number(kAnswer);
+    reading.number = answer.Number();
   } else if (reading.type == SQLITE_BLOB) {
-    const std::span<const std::byte> blob = row.Blob(kAnswer);
+    const std::span<const std::byte> blob = answer.Blob();
     reading.offset = object.bytes.size();
     reading.size = blob.size();
     if (blob.size() <= kMaxRecordSize) {  // a larger one is no node's

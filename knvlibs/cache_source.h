@@ -10,6 +10,7 @@
 
 #include <array>
 #include <memory>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -62,12 +63,15 @@ class CacheSource : public Source {
     OwnKey keys[kMaxKeys];
     std::vector<Reading> readings;
     std::vector<std::byte> bytes;
+    int64_t listed = -1;  // the node, in the file, of the list that `entries` are of, -1: none
+    ParamList entries{ParamList::kNoLimit};
   };
 
   // Over all readings from an object on, or over the entries of all lists.
   struct Cursor {
     Statement rows;
     bool isOnRow = false;
+    std::array<std::optional<Key>, kMaxKeys> at;  // the keys of that row
 
     bool IsAt(const Keys& keys) const;
     int Step();
@@ -81,11 +85,13 @@ class CacheSource : public Source {
   [[nodiscard]] Status StatusOfCall(int code);
   void TellWhy(const Node& node);
   [[nodiscard]] Status BeginRead();
-  [[nodiscard]] Status Find(const Node& node, Kind kind, const Keys& keys, const Object** object,
+  [[nodiscard]] Status Find(const Node& node, Kind kind, const Keys& keys, Object** object,
                             const Reading** reading);
   [[nodiscard]] Status List(const Node& node, const Keys& keys, ParamList& instances);
+  [[nodiscard]] Status ReadEntries(const Node& node, const Keys& keys, const Reading& reading,
+                                   ParamList& instances);
   [[nodiscard]] Status TakeEntry(const Node& node, ParamList& instances);
-  [[nodiscard]] Status FindObject(const Keys& keys, const Object** object);
+  [[nodiscard]] Status FindObject(const Keys& keys, Object** object);
   [[nodiscard]] Status FindCursor(const Keys& keys, Cursor*& cursor);
   [[nodiscard]] Status Load(const Keys& keys, Object& object);
   [[nodiscard]] Status TakeReading(const Statement& row, Object& object);

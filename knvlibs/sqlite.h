@@ -20,6 +20,30 @@ struct CloseDatabase {
 };
 using Database = std::unique_ptr<sqlite3, CloseDatabase>;
 
+// A column of the row that a statement is on, good until the next step. Several looks at one column
+// cost less by it than by the statement.
+class ColumnValue {
+ public:
+  explicit ColumnValue(sqlite3_value* value) : value_(value) {}
+
+  int Type() const { return sqlite3_value_type(value_); }
+  int64_t Number() const { return sqlite3_value_int64(value_); }
+  // The bytes of a text as they lie, which costs less than to have them end in a NUL.
+  std::string_view Bytes() const {
+    const auto* bytes = static_cast<const char*>(sqlite3_value_blob(value_));
+    return bytes == nullptr ? std::string_view() : std::string_view(bytes, Size());
+  }
+  std::span<const std::byte> Blob() const {
+    const auto* blob = static_cast<const std::byte*>(sqlite3_value_blob(value_));
+    return blob == nullptr ? std::span<const std::byte>() : std::span(blob, Size());
+  }
+
+ private:
+  size_t Size() const { return static_cast<size_t>(sqlite3_value_bytes(value_)); }
+
+  sqlite3_value* value_;
+};
+
 // A prepared statement. Calls give SQLite's result codes.
 class Statement {
  public:
@@ -65,15 +89,10 @@ class Statement {
     if (text == nullptr) RequireMemory();
     return text == nullptr ? std::string_view() : std::string_view(text, Size(column));
   }
-  // The bytes of a text as they lie, which costs less than to have them end in a NUL.
-  std::string_view Bytes(int column) const {
-    const auto* bytes = static_cast<const char*>(sqlite3_column_blob(handle_, column));
-    return bytes == nullptr ? std::string_view() : std::string_view(bytes, Size(column));
-  }
-  std::span<const std::byte> Blob(int column) const {
-    const auto* blob = static_cast<const std::byte*>(sqlite3_column_blob(handle_, column));
-    return blob == nullptr ? std::span<const std::byte>() : std::span(blob, Size(column));
-  }
+  std::span<const std::byte> Blob(int column) const { return At(column).Blob(); }
+
+  // A connection is used by one thread at a time, and so may its values.
+  ColumnValue At(int column) const { return ColumnValue(sqlite3_column_value(handle_, column)); }
 
  private:
   void RequireMemory() const {
