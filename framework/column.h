@@ -22,6 +22,7 @@
 
 #include <knvlibs/ksi_records.h>
 #include "framework/column_table.h"
+#include "framework/computed.h"
 #include "framework/display_unit.h"
 
 namespace tally {
@@ -68,8 +69,9 @@ struct Figure {
 
   constexpr bool IsNumber() const { return kind != Kind::text && kind != Kind::flag; }
 
-  // Whether the kernel has no value for the figure: all of the number's bits are ones.
+  // Whether the figure has no value: the cell is not known, or all bits of its number are ones.
   bool IsNone(const Cell& cell) const {
+    if (!cell.isKnown()) return true;
     return IsNumber() && (cell.number() & KSI_NO_VALUE_OF(bits)) == KSI_NO_VALUE_OF(bits);
   }
 
@@ -172,6 +174,27 @@ using RowOf = typename Signature<decltype(&Read::operator())>::Row;
 template <class Read>
 using ResultOf = typename Signature<decltype(&Read::operator())>::Result;
 
+// What a function's result is of, known or not: the `Value` of a Computed, else itself.
+template <class Result>
+struct Unwrapped {
+  using Value = Result;
+};
+template <class T>
+struct Unwrapped<Computed<T>> {
+  using Value = T;
+};
+template <class Read>
+using ValueOf = typename Unwrapped<ResultOf<Read>>::Value;
+
+template <class Value>
+constexpr Cell CellOf(const Value& value) {
+  return value;
+}
+template <class Value>
+constexpr Cell CellOf(const Computed<Value>& computed) {
+  return Cell(computed.value).KnownIf(computed.isKnown);
+}
+
 // Whether a text of the row can still be read when the function that gave it has returned.
 template <class Result>
 concept IsKept = std::same_as<Result, std::string_view> || std::is_pointer_v<Result> ||
@@ -204,39 +227,41 @@ template <class Read>
 constexpr auto Number(Kind kind, const char* name, const char* description, InTotal inTotal,
                       Conversion toUnit) {
   using Row = RowOf<Read>;
-  using Result = ResultOf<Read>;
-  static_assert(std::integral<Result> && !std::same_as<Result, bool>);
-  return Make<Row>(name, description, ConversionOf<Result>(kind),
+  using Value = ValueOf<Read>;
+  static_assert(std::integral<Value> && !std::same_as<Value, bool>);
+  return Make<Row>(name, description, ConversionOf<Value>(kind),
                    {.kind = kind,
-                    .bits = 8 * sizeof(Result),
-                    .isSigned = std::signed_integral<Result>,
+                    .bits = 8 * sizeof(Value),
+                    .isSigned = std::signed_integral<Value>,
                     .inTotal = inTotal,
                     .toUnit = toUnit},
-                   [](const Row& row) -> Cell { return Read{}(row); });
+                   [](const Row& row) { return CellOf(Read{}(row)); });
 }
 
 }  // namespace column_internal
 
 // A text that is the row's for as long as the row is; one that the function makes would be gone.
 template <class Read>
-requires column_internal::IsKept<column_internal::ResultOf<Read>>
+requires column_internal::IsKept<column_internal::ValueOf<Read>>
 constexpr auto Text(const char* name, const char* description, Read /*read*/) {
   using Row = column_internal::RowOf<Read>;
   return column_internal::Make<Row>(
       name, description, "s",
       {.kind = Kind::text, .bits = 0, .isSigned = false, .inTotal = kBlank, .toUnit = nullptr},
-      [](const Row& row) -> Cell { return std::string_view(Read{}(row)); });
+      [](const Row& row) { return column_internal::CellOf(Read{}(row)); });
 }
 
-// 'y' or 'n'.
+// 'y' or 'n', of a number of the kernel that is 0 for no.
 template <class Read>
 constexpr auto Flag(const char* name, const char* description, Read /*read*/) {
   using Row = column_internal::RowOf<Read>;
-  static_assert(std::same_as<column_internal::ResultOf<Read>, bool>);
   return column_internal::Make<Row>(
       name, description, "c",
       {.kind = Kind::flag, .bits = 1, .isSigned = false, .inTotal = kBlank, .toUnit = nullptr},
-      [](const Row& row) { return Cell::YesNo(Read{}(row)); });
+      [](const Row& row) {
+        const auto flag = Read{}(row);
+        return Cell::YesNo(flag != 0).KnownIf(HasValue(flag));
+      });
 }
 
 template <class Read>

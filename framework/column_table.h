@@ -42,12 +42,21 @@ class Cell {
     return cell;
   }
 
+  // The same value, known or not. What prints a table shows it in either case.
+  constexpr Cell KnownIf(bool isKnown) const {
+    Cell cell = *this;
+    cell.isKnown_ = isKnown;
+    return cell;
+  }
+
   constexpr uint64_t number() const { return number_; }
   constexpr std::string_view text() const { return text_; }
+  constexpr bool isKnown() const { return isKnown_; }
 
  private:
   uint64_t number_ = 0;
   std::string_view text_;
+  bool isKnown_ = true;
 };
 
 // Hides the selectable columns that `mask`, a ':'-separated list of names, does not hold (null:

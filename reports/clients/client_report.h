@@ -27,11 +27,11 @@ struct Client {
 // The status of what failed, after its message.
 [[nodiscard]] Status ReadClient(uint64_t groupId, Client& client);
 
-// The host memory that a virtual machine or user world consumes, in kilobytes. Wraps like the
-// kernel's own sums.
+// The host memory that a virtual machine or user world consumes, in kilobytes.
 template <class Tally>
-uint64_t Consumed(const Tally& tally) {
-  return tally.vpmemUC + tally.mapped - tally.vpmemRW - tally.sharedSaved;
+Computed<uint64_t> Consumed(const Tally& tally) {
+  return Known(tally.vpmemUC) + Known(tally.mapped) - Known(tally.vpmemRW) -
+         Known(tally.sharedSaved);
 }
 
 // The columns of these figures; a Row has a member `client`.

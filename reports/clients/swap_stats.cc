@@ -33,9 +33,12 @@ constexpr Column<SwapStatsRow> kColumns[] = {
     kParSchedGroupColumn<SwapStatsRow>,
     kWorldGrpColumn<SwapStatsRow>,
     Flag("isSwapping", "is the VM currently swapping out",
-         [](const SwapStatsRow& row) { return row.swap.isSwapping != 0; }),
+         [](const SwapStatsRow& row) { return row.swap.isSwapping; }),
     Text("CurSwapper", "knv or vmm swapper currently active",
-         [](const SwapStatsRow& row) { return row.swap.curSwapper == 0 ? "vmm" : "knv"; }),
+         [](const SwapStatsRow& row) {
+           const auto swapper = Known(row.swap.curSwapper);
+           return Computed<const char*>{swapper.value == 0 ? "vmm" : "knv", swapper.isKnown};
+         }),
     // sic: C20
     Kilobytes("cacheUsage", "Swap slot cache usage",
               [](const SwapStatsRow& row) { return row.swap.cacheUsage; })

@@ -93,7 +93,7 @@ constexpr Column<UWStatsRow> kColumns[] = {
     Kilobytes("swapped", "Memory swapped to secondary storage",
               [](const UWStatsRow& row) { return row.uw.swapped; }),
     Flag("useReliableMem", "Uses Reliable memory",
-         [](const UWStatsRow& row) { return row.uw.useReliableMem != 0; })
+         [](const UWStatsRow& row) { return row.uw.useReliableMem; })
         .Wide(1)
         .As("s"),
     Code("swapScope", "Swap scope", [](const UWStatsRow& row) { return row.uw.swapScope; }).Wide(1),

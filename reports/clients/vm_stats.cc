@@ -40,15 +40,15 @@ uint64_t FromSigned32Kilobytes(uint64_t kilobytes, DisplayUnit unit) {
 }
 
 // A negative limit is none.
-int32_t LimitOrNone(int64_t kilobytes) {
-  const auto limit = static_cast<int32_t>(kilobytes);
-  return limit < 0 ? -1 : limit;
+Computed<int32_t> LimitOrNone(int64_t kilobytes) {
+  const auto limit = Cut<int32_t>(kilobytes);
+  return limit.value < 0 ? Computed<int32_t>{-1, true} : limit;
 }
 
 constexpr Column<VMStatsRow> kColumns[] = {
     NameColumn<VMStatsRow>("Virtual machine name").Wide(15).Total(kLabel),
     Flag("b", "Is balloon driver active?",
-         [](const VMStatsRow& row) { return row.vmm.balloonActive != 0; })
+         [](const VMStatsRow& row) { return row.vmm.balloonActive; })
         .Wide(1),
     kSchedGrpColumn<VMStatsRow>,
     kParSchedGroupColumn<VMStatsRow>,
@@ -58,7 +58,7 @@ constexpr Column<VMStatsRow> kColumns[] = {
     Kilobytes("memSize", "Guest physical memory size",
               [](const VMStatsRow& row) { return row.vmm.memSize; }),
     Kilobytes("min", "Configured host physical memory reservation for guest",
-              [](const VMStatsRow& row) { return static_cast<int32_t>(row.allocation.min); })
+              [](const VMStatsRow& row) { return Cut<int32_t>(row.allocation.min); })
         .Through(FromSigned32Kilobytes),
     Kilobytes("max", "Configured host physical memory limit for guest",
               [](const VMStatsRow& row) { return LimitOrNone(row.allocation.max); })
@@ -108,7 +108,7 @@ constexpr Column<VMStatsRow> kColumns[] = {
     Kilobytes("sharedSaved", "Host physical memory saved as a result of page-sharing",
               [](const VMStatsRow& row) { return row.vmm.sharedSaved; }),
     Flag("useReliableMem", "Uses Reliable memory",
-         [](const VMStatsRow& row) { return row.vmm.useReliableMem != 0; })
+         [](const VMStatsRow& row) { return row.vmm.useReliableMem; })
         .Wide(1)
         .As("s"),
     Code("swapScope", "Swap scope", [](const VMStatsRow& row) { return row.vmm.swapScope; })

@@ -5,6 +5,7 @@
 // keeps and the state are sched/globalStats/memory/tally; the entries into a state are counted from
 // sched/globalStats/memory/stateTransitions, which tells for each state how often it was left.
 
+#include <algorithm>
 #include <iterator>
 
 #include <knvlibs/ksi_nodes.h>
@@ -38,11 +39,11 @@ struct CompRow {
 };
 
 // Entries into a state: down from the better one and up from the worse one.
-uint32_t Entries(const CompRow& row, uint32_t state) {
-  uint32_t entries =
-      state == KSI_MEMORY_STATE_HIGH ? 1 : row.transitions[state - 1].down;  // sic: C33
-  if (state != KSI_MEMORY_STATE_LOW) entries += row.transitions[state + 1].up;
-  return entries;
+Computed<uint32_t> Entries(const CompRow& row, uint32_t state) {
+  const auto fromBetter =
+      Known(state == KSI_MEMORY_STATE_HIGH ? 1 : row.transitions[state - 1].down);  // sic: C33
+  if (state == KSI_MEMORY_STATE_LOW) return fromBetter;
+  return fromBetter + Known(row.transitions[state + 1].up);
 }
 
 // sic: C32
@@ -90,8 +91,9 @@ constexpr Column<CompRow> kColumns[] = {
         .Ever(),
     Text("memState", "Current memory state",
          [](const CompRow& row) {
-           const uint32_t state = row.tally.memState;
-           return kMemStateTitles[state < kMemStates ? state : kMemStates];
+           const auto state = Known(row.tally.memState);
+           return Computed<const char*>{kMemStateTitles[std::min(state.value, kMemStates)],
+                                        state.isKnown};
          })
         .Wide(7),
 };

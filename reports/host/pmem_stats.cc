@@ -69,8 +69,7 @@ constexpr Column<VolumeRow> kVolumeColumns[] = {
         .As("Lu"),
     Count("total2MBlocks", "Total 2M Blocks",
           [](const VolumeRow& row) { return row.store.total2MBlocks; }),
-    Flag("isClean", "Is region store clean ?",
-         [](const VolumeRow& row) { return row.isClean != 0; })
+    Flag("isClean", "Is region store clean ?", [](const VolumeRow& row) { return row.isClean; })
         .Wide(4),
 };
 static_assert(IsSound(kVolumeColumns));

@@ -21,9 +21,9 @@ constexpr ReportFrame kFrame = {
 
 struct HintRow {
   const char* type;
-  uint64_t totAdd;  // pages, as the others
-  uint64_t totRemove;
-  uint64_t active;
+  Computed<uint64_t> totAdd;  // pages, as the others
+  Computed<uint64_t> totRemove;
+  Computed<uint64_t> active;
 };
 
 constexpr Column<HintRow> kColumns[] = {
@@ -55,14 +55,17 @@ Status Run(const ReportOptions& options, Sink& sink) {
   }
   context.SelectColumns();
   context.Begin();
-  const uint64_t regularAdded = stats.hintsAdded - stats.lpageHintsAdded;
-  const uint64_t regularRemoved = stats.hintsRemoved - stats.lpageHintsRemoved;
+  const auto added = Known(stats.hintsAdded);
+  const auto removed = Known(stats.hintsRemoved);
+  const auto lpageAdded = Known(stats.lpageHintsAdded);
+  const auto lpageRemoved = Known(stats.lpageHintsRemoved);
+  const auto regularAdded = added - lpageAdded;
+  const auto regularRemoved = removed - lpageRemoved;
   context.PrintRow({"regular", regularAdded, regularRemoved, regularAdded - regularRemoved});
-  context.PrintRow({"lpage", stats.lpageHintsAdded, stats.lpageHintsRemoved,
-                    stats.lpageHintsAdded - stats.lpageHintsRemoved});
+  context.PrintRow({"lpage", lpageAdded, lpageRemoved, lpageAdded - lpageRemoved});
   context.Rule();
   // sic: C28
-  context.PrintTotalRow({"Total", stats.hintsAdded, stats.hintsRemoved, stats.hintsActive});
+  context.PrintTotalRow({"Total", added, removed, Known(stats.hintsActive)});
   context.Rule();
   context.PrintDescriptions();
   return kSuccess;

@@ -133,6 +133,52 @@ TEST_F(ExportTest, HasTheSameFiguresInJson) {
   }
 }
 
+// What a report computes from a figure without a value has none either, nor has what does not fit
+// into the report; tally shows a number for both.
+TEST_F(ExportTest, HasNoValueForWhatIsComputedFromNone) {
+  const std::string none = "18446744073709551615";
+  const std::string host = ExampleWith(
+      "none.ksi",
+      {{R"("mapped":6543112)", R"("mapped":)" + none},
+       {R"("size":2097152)", R"("size":4294967295)"},
+       {R"("hintsAdded":4812390)", R"("hintsAdded":)" + none},
+       {R"("lpageHintsRemoved":967808)", R"("lpageHintsRemoved":981121)"},
+       {R"("keys":["clear"],"value":{"up":8)", R"("keys":["clear"],"value":{"up":4294967295)"},
+       {R"("min":0,"max":-1)", R"("min":8589934592,"max":8589934592)"},
+       {R"("isSwapping":0)", R"("isSwapping":255)"},
+       {R"("curSwapper":0)", R"("curSwapper":4294967295)"},
+       {R"("memState":0)", R"("memState":4294967295)"}});
+  const auto values = [&](const std::string& report, const std::string& column) {
+    std::string text;
+    for (const std::string& line : Lines(Output({"export", report, "--format=json", host}))) {
+      const json row = json::parse(line);
+      if (!row.contains("name") || row["name"] == "web-01" || row["name"] == "acpi")
+        text += row[column].dump() + " ";
+    }
+    return text;
+  };
+  EXPECT_EQ(values("vm-stats", "mapped"), "null ");
+  EXPECT_EQ(values("vm-stats", "consumed"), "null ");
+  EXPECT_EQ(values("vm-stats", "min"), "null ");
+  EXPECT_EQ(values("vm-stats", "max"), "null ");
+  EXPECT_EQ(values("heap-stats", "used"), "null ");
+  EXPECT_EQ(values("heap-stats", "avail"), "676337 ");
+  EXPECT_EQ(values("pshareHint-stats", "totAdd"), "null 3924480 ");
+  EXPECT_EQ(values("pshareHint-stats", "totRemove"), "14960140 3924484 ");
+  EXPECT_EQ(values("pshareHint-stats", "active"), "null null ");
+  EXPECT_EQ(values("comp-stats", "numHigh"), "null ");
+  EXPECT_EQ(values("comp-stats", "numClear"), "12 ");
+  EXPECT_EQ(values("comp-stats", "memState"), "null ");
+  EXPECT_EQ(values("swap-stats", "CurSwapper"), "null ");
+  EXPECT_EQ(values("swap-stats", "isSwapping"), "null ");
+  EXPECT_EQ(Output({"export", "vm-stats", "--format=openmetrics", host})
+                .find("tally_vm_consumed_bytes{host=\"hypervisor.example.org\",name=\"web-01\""),
+            std::string::npos);
+  EXPECT_NE(
+      RunTally({"-c", host, "-r", "heap-stats", "-q", "-s", "used"}).out.find("acpi,4294290958\n"),
+      std::string::npos);
+}
+
 // In bytes nothing is lost: limits in 32 bits of kilobytes have room, too.
 TEST_F(ExportTest, TakesBytesForEveryReport) {
   const std::vector<Row> kb = Cells(Output({"export", "vm-stats", kExample}));

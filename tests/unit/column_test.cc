@@ -12,7 +12,7 @@ struct Row {
   uint32_t times;
   int32_t balance;
   uint8_t share;
-  bool flag;
+  uint8_t flag;
   const char* text;
 };
 
@@ -137,7 +137,7 @@ TEST(Column, IsPrintedAsItsFiguresTypeIs) {
 
 TEST(Column, TakesItsFigureFromTheRow) {
   const Row row = {
-      .memory = 4096, .times = 3, .balance = -2, .share = 1, .flag = true, .text = "word"};
+      .memory = 4096, .times = 3, .balance = -2, .share = 1, .flag = 1, .text = "word"};
   EXPECT_EQ(kColumns[0].value(row).number(), 4096U);
   EXPECT_EQ(Count("a", "", kBalance).value(row).number(), UINT64_MAX - 1);
   EXPECT_EQ(Text("a", "", kText).value(row).text(), "word");
@@ -153,7 +153,47 @@ TEST(Figure, HasNoValueWhenAllItsBitsAreOnes) {
   EXPECT_TRUE(Count("a", "", kBalance).figure.IsNone(-1));
   EXPECT_TRUE(Count("a", "", kShare).figure.IsNone(UINT8_MAX));
   EXPECT_FALSE(Flag("a", "", kFlag).figure.IsNone(Cell::YesNo(true)));
+  EXPECT_TRUE(Flag("a", "", kFlag).figure.IsNone(Cell::YesNo(true).KnownIf(false)));
   EXPECT_FALSE(Text("a", "", kText).figure.IsNone(Cell("")));
+}
+
+// What a column computes has a number in any case, and says whether it is true.
+TEST(Column, KnowsWhatItComputes) {
+  const auto cell = [](const auto& column, uint64_t memory, uint32_t times, uint8_t flag = 0) {
+    return column.value({memory, times, 0, 0, flag, "word"});
+  };
+  const auto isNone = [&](const auto& column, uint64_t memory, uint32_t times, uint8_t flag = 0) {
+    return column.figure.IsNone(cell(column, memory, times, flag));
+  };
+  constexpr auto kDifference = Kilobytes(
+      "a", "", [](const Row& row) { return Known(row.memory) - Known(uint64_t{row.times}); });
+  EXPECT_EQ(cell(kDifference, 9, 4).number(), 5U);
+  EXPECT_FALSE(isNone(kDifference, 9, 4));
+  EXPECT_EQ(cell(kDifference, UINT64_MAX, 4).number(), UINT64_MAX - 4);
+  EXPECT_TRUE(isNone(kDifference, UINT64_MAX, 4));
+  EXPECT_TRUE(isNone(kDifference, 2, 4));
+
+  constexpr auto kSumOfBoth =
+      Count("a", "", [](const Row& row) { return Known(row.times) + Known(uint32_t{7}); });
+  EXPECT_STREQ(kSumOfBoth.desc.conversion, "u");
+  EXPECT_EQ(cell(kSumOfBoth, 0, 4).number(), 11U);
+  EXPECT_FALSE(isNone(kSumOfBoth, 0, 4));
+  EXPECT_TRUE(isNone(kSumOfBoth, 0, UINT32_MAX));
+  EXPECT_TRUE(isNone(kSumOfBoth, 0, UINT32_MAX - 1));
+
+  constexpr auto kNarrow =
+      Count("a", "", [](const Row& row) { return Cut<int32_t>(static_cast<int64_t>(row.memory)); });
+  EXPECT_FALSE(isNone(kNarrow, INT32_MAX, 0));
+  EXPECT_TRUE(isNone(kNarrow, uint64_t{INT32_MAX} + 1, 0));
+
+  constexpr auto kWord = Text("a", "", [](const Row& row) {
+    return Computed<const char*>{row.text, row.times != 0};
+  });
+  EXPECT_EQ(cell(kWord, 0, 0).text(), "word");
+  EXPECT_TRUE(isNone(kWord, 0, 0));
+  EXPECT_FALSE(isNone(kWord, 0, 1));
+  EXPECT_TRUE(isNone(Flag("a", "", kFlag), 0, 0, UINT8_MAX));
+  EXPECT_EQ(cell(Flag("a", "", kFlag), 0, 0, UINT8_MAX).text(), "y");
 }
 
 TEST(Figure, IsShownInTheUnit) {

@@ -225,6 +225,7 @@ class OpenMetricsFormat : public RowFormat {
         PutLabel(place.name, value, info);
         break;
       case Role::flag: {
+        if (value.type == ValueType::none) break;
         std::string flag = labels;
         PutLabel("flag", place.name, flag);
         AddSample(family_->flag, flag, value.number != 0 ? "1" : "0");

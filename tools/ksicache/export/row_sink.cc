@@ -46,9 +46,9 @@ void RowSink::Row(tally::RowKind kind, std::span<const tally::Cell> cells) {
 
 Value RowSink::ValueOf(const Place& place, const tally::Cell& cell) const {
   const tally::Figure& figure = place.figure;
+  if (figure.IsNone(cell)) return {ValueType::none, 0, {}};
   if (figure.kind == Kind::text) return {ValueType::text, 0, cell.text()};
   if (figure.kind == Kind::flag) return {ValueType::flag, cell.number(), cell.text()};
-  if (figure.IsNone(cell)) return {ValueType::none, 0, {}};
   uint64_t number = cell.number();
   if (!place.isAsItIs) {
     // In bytes nothing is cut, whatever the column's own conversion has room for.
