@@ -2,7 +2,6 @@
 
 #include <unistd.h>
 
-#include <algorithm>
 #include <optional>
 #include <string_view>
 #include <utility>
@@ -31,14 +30,13 @@ Wanted WantedOf(const std::string& name) {
   return {name.substr(0, at), name.substr(at + 1)};
 }
 
-Status NotATime(const std::string& when, std::string* why) {
-  *why = when + " is no time: it is as 2026-11-21T10:05:30Z, 10:05, -10m, first or last";
+Status NotATime(const std::string& when, const Span& times, std::string* why) {
+  *why = when + " is no time, as 10:05, -10m and last are: moments are of " + TextOfSpan(times);
   return KSI_STATUS_BAD_PARAM;
 }
 
-Status NotInSpan(const std::string& when, const Span& span, std::string* why) {
-  *why = "there is no moment at " + when + " or before: the first is of " + TextOfTime(span.first) +
-         ", the last of " + TextOfTime(span.last);
+Status NotSoEarly(const Span& times, std::string* why) {
+  *why = "there is no moment so early: moments are of " + TextOfSpan(times);
   return KSI_STATUS_NOT_FOUND;
 }
 
@@ -46,8 +44,8 @@ Status CheckTime(const CacheFile& capture, const std::string& when, std::string*
   const int64_t taken = TimeOfText(capture.GetCapture().taken).value_or(0);
   const Span span = {taken, taken};
   const std::optional<int64_t> time = TimeOf(when, span);
-  if (!time) return NotATime(when, why);
-  return *time >= taken ? kOk : NotInSpan(when, span, why);
+  if (!time) return NotATime(when, span, why);
+  return *time >= taken ? kOk : NotSoEarly(span, why);
 }
 
 Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened, std::string* why) {
@@ -57,9 +55,6 @@ Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened,
     *why = "it has no moments yet";
     return KSI_STATUS_NOT_FOUND;
   }
-  // Clocks may be set back.
-  const Span span = {std::ranges::min(parts, {}, &RecordingFile::Part::first).first,
-                     parts.back().last};
   if (!when || *when == "last") {
     opened.number = parts.back().End() - 1;
     return kOk;
@@ -68,14 +63,14 @@ Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened,
     opened.number = parts.front().number;
     return kOk;
   }
-  const std::optional<int64_t> time = TimeOf(*when, span);
-  if (!time) return NotATime(*when, why);
+  const std::optional<int64_t> time = TimeOf(*when, {parts.front().first, parts.back().last});
+  if (!time) return NotATime(*when, recording.Times(), why);
   const Status status = recording.FindMoment(*time, opened.number);
   if (status != kOk) {
     *why = recording.Why();
     return status;
   }
-  return opened.number >= 0 ? kOk : NotInSpan(*when, span, why);
+  return opened.number >= 0 ? kOk : NotSoEarly(recording.Times(), why);
 }
 
 }  // namespace

@@ -33,6 +33,9 @@ uint64_t RoomOf(const RecordingFile::Part& part) {
   return cache::BlocksOf(static_cast<size_t>(part.size)) * cache::kBlockSize;
 }
 
+// Times are told, and compared, in seconds.
+int64_t SecondOf(int64_t time) { return time / kSecond - (time % kSecond < 0 ? 1 : 0); }
+
 bool IsGood(const RecordingFile::Part& part) {
   return part.moments > 0 && part.moments <= static_cast<int64_t>(chunk::kMostMoments) &&
          part.chunk >= 0 && part.chunk <= part.number && part.number < kMostNumber &&
@@ -143,7 +146,9 @@ Status RecordingFile::Walk(const Part& part, Bytes* content, std::vector<int64_t
 Status RecordingFile::CheckFacts(const Part& part, const std::vector<MomentFacts>& facts) {
   const bool isOfPart = facts.size() == static_cast<size_t>(part.moments) &&
                         facts.front().taken == part.first && facts.back().taken == part.last;
-  return isOfPart ? kOk : Damaged(part, "is not what its row says");
+  if (!isOfPart) return Damaged(part, "is not what its row says");
+  const bool isInOrder = std::ranges::is_sorted(facts, {}, &MomentFacts::taken);
+  return isInOrder ? kOk : Damaged(part, "goes back in time");
 }
 
 Status RecordingFile::ReadFacts(const Part& part, std::vector<MomentFacts>& facts) {
@@ -232,21 +237,46 @@ Status RecordingFile::ReadWhole(int64_t number, ChunkReader& reader, Moment& mom
   return Damaged(*FindPart(number), "is damaged");
 }
 
-Status RecordingFile::FindMoment(int64_t time, int64_t& number) {
-  number = -1;
-  const auto part = std::find_if(parts_.rbegin(), parts_.rend(),
-                                 [time](const Part& each) { return each.first <= time; });
-  if (part == parts_.rend()) return kOk;
-  if (part->last <= time) {
-    number = part->End() - 1;
-    return kOk;
+Span RecordingFile::Times() const {
+  Span times = {parts_.front().first, parts_.front().last};
+  for (const Part& part : parts_) {
+    times = {std::min(times.first, part.first), std::max(times.last, part.last)};
   }
+  return times;
+}
+
+// The number of the last moment of a part up to a second, in which its first one is or which is
+// later.
+Status RecordingFile::FindIn(const Part& part, int64_t second, int64_t& number, int64_t& found) {
+  number = part.End() - 1;
+  found = SecondOf(part.last);
+  if (found <= second) return kOk;
   std::vector<MomentFacts> facts;
-  const Status status = ReadFacts(*part, facts);
+  const Status status = ReadFacts(part, facts);
   if (status != kOk) return status;
-  const auto after =
-      std::ranges::find_if(facts, [time](const MomentFacts& each) { return each.taken > time; });
-  number = part->number + (after - facts.begin()) - 1;
+  const auto after = std::ranges::upper_bound(
+      facts, second, {}, [](const MomentFacts& each) { return SecondOf(each.taken); });
+  number = part.number + (after - facts.begin()) - 1;
+  found = SecondOf(std::prev(after)->taken);
+  return kOk;
+}
+
+Status RecordingFile::FindMoment(int64_t time, int64_t& number) {
+  const int64_t wanted = SecondOf(time);
+  int64_t best = 0;  // the second of `number`
+  number = -1;
+  for (auto part = parts_.rbegin(); part != parts_.rend(); ++part) {
+    const bool isBehind = number >= 0 && SecondOf(part->last) <= best;
+    if (isBehind || SecondOf(part->first) > wanted) continue;
+    int64_t candidate = 0;
+    int64_t second = 0;
+    const Status status = FindIn(*part, wanted, candidate, second);
+    if (status != kOk) return status;
+    if (number >= 0 && second <= best) continue;
+    number = candidate;
+    best = second;
+    if (best == wanted) break;
+  }
   return kOk;
 }
 

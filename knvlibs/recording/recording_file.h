@@ -15,6 +15,7 @@
 #include "knvlibs/recording/bytes.h"
 #include "knvlibs/recording/chunk_reader.h"
 #include "knvlibs/recording/moment.h"
+#include "knvlibs/recording/when.h"
 #include "knvlibs/sqlite.h"
 #include "knvlibs/status.h"
 
@@ -79,8 +80,12 @@ class RecordingFile {
   // The host that the moments of a part are of.
   [[nodiscard]] Status ReadHost(const Part& part, HostIdentity& host);
 
-  // The number of the latest moment that was taken at `time` or before; -1 if there is none. The
-  // latest is the one recorded last, for clocks may be set back.
+  // When its moments were taken. Clocks may be set: none need be of the moments recorded first and
+  // last. REQUIRES: there are moments.
+  Span Times() const;
+
+  // The number of the moment of the latest second that is not after that of `time`, and of those of
+  // one second of the one recorded last; -1 if there is none.
   [[nodiscard]] Status FindMoment(int64_t time, int64_t& number);
 
   // About the bytes that have been unpacked to read moments.
@@ -100,6 +105,7 @@ class RecordingFile {
   [[nodiscard]] Status TakePart(const Part& part, size_t last, ChunkReader& reader);
   [[nodiscard]] Status CheckFacts(const Part& part, const std::vector<MomentFacts>& facts);
   const Part* FindPart(int64_t number) const;
+  [[nodiscard]] Status FindIn(const Part& part, int64_t second, int64_t& number, int64_t& found);
 
   std::unique_ptr<CacheDatabase> database_;
   std::vector<Part> rows_;

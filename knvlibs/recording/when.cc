@@ -134,6 +134,10 @@ std::optional<int64_t> TimeBefore(std::string_view text, int64_t last) {
 
 }  // namespace
 
+std::string TextOfSpan(const Span& span) {
+  return TextOfTime(span.first) + " to " + TextOfTime(span.last);
+}
+
 std::optional<int64_t> TimeOf(std::string_view when, const Span& span) {
   if (when == "first") return span.first;
   if (when == "last") return span.last;

@@ -1,27 +1,32 @@
 // A moment of a recording, as people call it.
 //
 //   2026-11-21T10:05[:30][Z]   a date and a time; of the second, if it has none, the end
-//   10:05[:30][Z]              the latest such time that the recording has
+//   10:05[:30][Z]              the latest such time that is not after the last moment
 //   -10m                       so long before the last moment: s, m, h, d
 //   first, last
 //
-// Times are local ones, or UTC with a Z.
+// Times are local ones, or UTC with a Z. The last moment is the one recorded last.
 #ifndef KNVLIBS_RECORDING_WHEN_H_
 #define KNVLIBS_RECORDING_WHEN_H_
 
 #include <cstdint>
 #include <optional>
+#include <string>
 #include <string_view>
 
 namespace ksi {
 
-// The first and the last moment of a recording, us since 1970.
+// From one time to another, us since 1970.
 struct Span {
   int64_t first;
   int64_t last;
 };
 
+// "2026-11-21T10:00:00Z to 2026-11-21T12:00:00Z"
+std::string TextOfSpan(const Span& span);
+
 // The time that is meant, us since 1970: the moment is that at it or before. None if it is no time.
+// `span`: from the first moment of the recording to the last.
 std::optional<int64_t> TimeOf(std::string_view when, const Span& span);
 
 }  // namespace ksi

@@ -259,6 +259,7 @@ TEST_F(ExportTest, TakesAMomentOfARecording) {
 }
 
 TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
+  const std::string kSpan = "moments are of 2026-11-21T10:02:00Z to 2026-11-21T10:06:00Z";
   const auto expect = [](const std::string& name, const std::string& message) {
     const harness::Result result = Run({"export", "comp-stats", "--format=json", name});
     EXPECT_EQ(result.status, 1);
@@ -266,13 +267,9 @@ TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
     EXPECT_EQ(result.err, "ksicache: " + name + ": " + message + "\n");
   };
   expect(kIncident + "@11:00..11x",
-         "11x is no time: spans are as 10:05..10:10, -1h.. or first..last");
-  expect(kIncident + "@2026-11-22T10:00Z..",
-         "there is no moment in that time: the first is of 2026-11-21T10:02:00Z, the last of "
-         "2026-11-21T10:06:00Z");
-  expect(kIncident + "@2026-11-20T10:00Z",
-         "there is no moment at 2026-11-20T10:00Z or before: the first is of 2026-11-21T10:02:00Z, "
-         "the last of 2026-11-21T10:06:00Z");
+         "11x is no time, as those of 10:05..10:10, -1h.. and first..last are: " + kSpan);
+  expect(kIncident + "@2026-11-22T10:00Z..", "there is no moment in that time: " + kSpan);
+  expect(kIncident + "@2026-11-20T10:00Z", "there is no moment so early: " + kSpan);
   expect(kExample + "@..", "is no recording");
   expect(Path("none@.."), "No such file or directory");
 }

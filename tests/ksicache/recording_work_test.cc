@@ -133,7 +133,7 @@ TEST_F(RecordingWork, ManyReadingsThatChangeInManyPartsAreDamage) {
   const auto [start, more] = PartsWithZeros(300'000, 1);
   AddChunks(1, start);
   AddMoments(1, 500, more);
-  ExpectEnds({"extract", file_, Path("out.ksi")}, "", "ksicache: damaged\n");
+  ExpectEnds({"extract", file_, Path("out.ksi")}, "", "ksicache: " + file_ + ": damaged\n");
 }
 
 TEST_F(RecordingWork, AChunkHasABoundOfMoments) {

@@ -1,8 +1,5 @@
 #include "tools/ksicache/report_run.h"
 
-#include <unistd.h>
-
-#include <algorithm>
 #include <array>
 #include <cstdint>
 #include <ctime>
@@ -17,6 +14,7 @@
 #include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/host_files.h"
+#include "tools/ksicache/named_span.h"
 #include "tools/ksicache/opened_file.h"
 
 // A host's own library has none.
@@ -27,23 +25,6 @@
 
 namespace ksicache {
 namespace {
-
-// "FILE@FROM..TO"; times that are left out are empty.
-struct NamedSpan {
-  std::string fileName;
-  std::string from;
-  std::string to;
-};
-
-// None if the name means something else. A file that has the whole name is that file.
-std::optional<NamedSpan> SpanOf(const std::string& name) {
-  constexpr std::string_view kTo = "..";
-  const size_t at = name.rfind('@');
-  const size_t to = at == std::string::npos ? at : name.find(kTo, at);
-  if (to == std::string::npos || access(name.c_str(), F_OK) == 0) return std::nullopt;
-  return NamedSpan{name.substr(0, at), name.substr(at + 1, to - at - 1),
-                   name.substr(to + kTo.size())};
-}
 
 // Reports are made of the records of one version.
 void CheckDefinitions() {
@@ -74,19 +55,6 @@ Origin CurrentOrigin() {
   return OriginOf(host.data(), taken);
 }
 
-int64_t TimeIn(const std::string& when, const ksi::Span& span) {
-  const std::optional<int64_t> time = ksi::TimeOf(when, span);
-  if (!time) throw DataError(when + " is no time: spans are as 10:05..10:10, -1h.. or first..last");
-  return *time;
-}
-
-// The times from the one to the other, which are seconds as a whole.
-ksi::Span WantedOf(const NamedSpan& named, const ksi::Span& all) {
-  const int64_t from = named.from.empty() ? all.first : TimeIn(named.from, all);
-  const int64_t to = named.to.empty() ? all.last : TimeIn(named.to, all);
-  return {from / ksi::kSecond * ksi::kSecond, to / ksi::kSecond * ksi::kSecond + ksi::kSecond - 1};
-}
-
 // The moments of a recording, by the library, which goes on from one to the next.
 class SpanVisit {
  public:
@@ -95,14 +63,12 @@ class SpanVisit {
       throw DataError("this host's library does not read recordings");
     }
     const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName_);
+    wanted_ = TimesOf(named, *recording);
+    all_ = recording->Times();
     const auto& parts = recording->Parts();
-    if (parts.empty()) throw DataError("it has no moments yet");
-    all_ = {parts.front().first, parts.back().last};
-    for (size_t i = 0; i < parts.size(); ++i) {
-      all_.first = std::min(all_.first, parts[i].first);
-      isInOrder_ = isInOrder_ && (i == 0 || parts[i - 1].last < parts[i].first);
+    for (size_t i = 1; i < parts.size(); ++i) {
+      isInOrder_ = isInOrder_ && parts[i - 1].last < parts[i].first;
     }
-    wanted_ = WantedOf(named, all_);
   }
 
   void Run(const std::function<void(const Origin&)>& visit) {
@@ -120,10 +86,7 @@ class SpanVisit {
       }
     }
     if (!wrong_.empty()) throw DataError(wrong_);
-    if (!isFound_) {
-      throw DataError("there is no moment in that time: the first is of " +
-                      ksi::TextOfTime(all_.first) + ", the last of " + ksi::TextOfTime(all_.last));
-    }
+    if (!isFound_) throw DataError(NoneInSpan(all_));
   }
 
  private:
@@ -157,8 +120,6 @@ Origin LiveOrigin() {
   bool isRead = false;
   return OriginOf(HostName(nullptr, isRead), ksi::ReadClock(CLOCK_REALTIME));
 }
-
-bool IsSpan(const std::string& name) { return SpanOf(name).has_value(); }
 
 void ForEachMoment(const std::string& name, const std::function<void(const Origin&)>& visit) {
   if (const std::optional<NamedSpan> span = SpanOf(name)) return SpanVisit(*span).Run(visit);

@@ -21,9 +21,6 @@ struct Origin {
 // are not the library's.
 Origin LiveOrigin();
 
-// Whether a name is "FILE@FROM..TO".
-bool IsSpan(const std::string& name);
-
 // Calls `visit` with each moment that `name` means while the library answers from it: of "FILE" and
 // "FILE@WHEN" the one that KSI_UseCache takes, of "FILE@FROM..TO", of which either may be left out,
 // all that a recording has from the one time to the other. Fails with a DataError.

@@ -14,6 +14,7 @@
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/named_span.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/report_run.h"

@@ -13,7 +13,7 @@ namespace {
 
 constexpr const Option* kOptions[] = {&kForce, &kMode};
 
-int Extract(const CommandLine& line) {
+int Extract(const CommandLine& line) try {
   const std::string& target = line.arguments[1];
   CheckOptionsFor(target, line);
   const mode_t mode = ModeOf(line);
@@ -24,6 +24,8 @@ int Extract(const CommandLine& line) {
   PutReadings(moment, writer);
   writer.Commit(CaptureOf(moment));
   return 0;
+} catch (const DataError& error) {
+  throw Error(line.arguments[0] + ": " + error.what());
 }
 
 }  // namespace

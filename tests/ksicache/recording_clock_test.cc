@@ -1,0 +1,125 @@
+// Recordings of hosts whose clock was set: every moment is found, and none is mixed with others.
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include <knvlibs/ksi_status.h>
+#include "knvlibs/open_cache.h"
+#include "knvlibs/times.h"
+#include "tests/ksicache/recording_fixture.h"
+#include "tools/ksicache/opened_file.h"
+
+namespace ksi {
+namespace {
+
+class RecordingClock : public RecordingTest {
+ protected:
+  // Moments each 5 s: `count` of them from each of the starts, seconds from kStart, one after the
+  // other.
+  void RecordFrom(const std::vector<int64_t>& starts, size_t count) {
+    moments_ = MakeMoments(1, starts.size() * count);
+    for (size_t i = 0; i < moments_.size(); ++i) {
+      moments_[i].facts.taken = TimeAt(starts[i / count] + 5 * static_cast<int64_t>(i % count));
+    }
+    Record(file_, moments_);
+  }
+
+  // A clock ticks somewhere in its second.
+  static int64_t TimeAt(int64_t second) { return kStart + second * kSecond + 250'000; }
+
+  // The number of the moment that `when` means, or the status for which there is none.
+  int64_t NumberAt(const std::string& when) const {
+    OpenedCache opened;
+    std::string why;
+    const Status status = OpenCache(file_ + "@" + when, &opened, &why);
+    return status == kOk ? opened.number : status;
+  }
+  int64_t NumberAt(int64_t second) const { return NumberAt(TextOfTime(kStart + second * kSecond)); }
+
+  const std::string file_ = Path("r.ksi");
+  std::vector<Moment> moments_;
+};
+
+// An hour from 10:00 on, then the clock is set back to 10:30, where it stays for some minutes.
+TEST_F(RecordingClock, MomentsBeforeItWasSetBackAreFound) {
+  RecordFrom({0, 1800}, 720);
+  // What was once is found, before and after the step.
+  EXPECT_EQ(NumberAt(0), 0);
+  EXPECT_EQ(NumberAt(1799), 359);
+  // What was twice is the later one, though half of it lies before the step.
+  EXPECT_EQ(NumberAt(1800), 720);
+  EXPECT_EQ(NumberAt(1804), 720);
+  EXPECT_EQ(NumberAt(3599), 1079);
+  EXPECT_EQ(NumberAt(5395), 1439);
+  EXPECT_EQ(NumberAt(9999), 1439);
+  EXPECT_EQ(NumberAt("last"), 1439);
+  EXPECT_EQ(NumberAt("first"), 0);
+  EXPECT_EQ(NumberAt("-30m"), 1079);
+  EXPECT_EQ(NumberAt(-1), KSI_STATUS_NOT_FOUND);
+}
+
+TEST_F(RecordingClock, MomentsOfAClockThatWasWrongAreFound) {
+  // For four samples it was a day ahead.
+  RecordFrom({0, 86400, 20, 40}, 4);
+  EXPECT_EQ(NumberAt(15), 3);
+  EXPECT_EQ(NumberAt(20), 8);
+  EXPECT_EQ(NumberAt(86399), 15);
+  EXPECT_EQ(NumberAt(86400), 4);
+  EXPECT_EQ(NumberAt(86411), 6);
+  EXPECT_EQ(NumberAt(86500), 7);
+  EXPECT_EQ(NumberAt("last"), 15);
+  EXPECT_EQ(NumberAt("-5s"), 14);
+  ExpectFailure({"dump", file_ + "@2026-11-20T10:00Z"},
+                file_ +
+                    "@2026-11-20T10:00Z: there is no moment so early: moments are of "
+                    "2026-11-21T10:00:00Z to 2026-11-22T10:00:15Z");
+}
+
+TEST_F(RecordingClock, SpansHaveAllOfTheirTimesInTheOrderOfTheRecording) {
+  RecordFrom({0, 10, -100}, 4);
+  // Of a host that has rows.
+  Output({"load", TALLY_EXAMPLE_JSON, Path("h.ksi")});
+  const Moment moment = ksicache::MomentOf(ksicache::OpenedFile(Path("h.ksi")).File());
+  for (Moment& each : moments_) each = {Host(), each.facts, moment.readings};
+  Record(file_, moments_);
+  const auto times = [this](const std::string& span) {
+    const std::string out = Output({"export", "comp-stats", file_ + "@" + span});
+    std::string found;
+    for (size_t at = 0; (at = out.find("\nh,2026-11-21T", at)) != std::string::npos; ++at) {
+      found += out.substr(at + 14, 8) + " ";
+    }
+    return found;
+  };
+  const std::string all =
+      "10:00:00 10:00:05 10:00:10 10:00:15 10:00:10 10:00:15 10:00:20 10:00:25 "
+      "09:58:20 09:58:25 09:58:30 09:58:35 ";
+  EXPECT_EQ(times(".."), all);
+  EXPECT_EQ(times("first..last"), all);
+  EXPECT_EQ(times("2026-11-21T10:00:10Z..2026-11-21T10:00:15Z"),
+            "10:00:10 10:00:15 10:00:10 10:00:15 ");
+  EXPECT_EQ(times("..2026-11-21T10:00:00Z"), "10:00:00 09:58:20 09:58:25 09:58:30 09:58:35 ");
+  EXPECT_EQ(times("-5s.."),
+            "10:00:00 10:00:05 10:00:10 10:00:15 10:00:10 10:00:15 10:00:20 10:00:25 "
+            "09:58:30 09:58:35 ");
+}
+
+// Clocks go back between parts, never within one.
+TEST_F(RecordingClock, APartThatGoesBackIsDamaged) {
+  ChunkWriter writer(Host());
+  const std::vector<Moment> moments = MakeMoments(1, 3);
+  for (const int64_t second : {0, 60, 30}) {
+    MomentFacts facts;
+    facts.taken = TimeAt(second);
+    writer.Add(facts, moments[0].readings);
+  }
+  MakeEmpty(file_);
+  ksicache::RecordingStore(file_, kUnbounded)
+      .Add({0, 3, 0, 0, TimeAt(0), TimeAt(30), 0, 0}, writer.PartFrom(0));
+  ExpectFailure({"dump", file_ + "@2026-11-21T10:00:20Z"},
+                file_ +
+                    "@2026-11-21T10:00:20Z: damaged: the part of 2026-11-21T10:00:00Z goes back in "
+                    "time");
+}
+
+}  // namespace
+}  // namespace ksi
