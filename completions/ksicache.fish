@@ -146,6 +146,8 @@ complete -c ksicache -n '__ksicache_command record' -l every -x -a '1s 5s 10s 30
 complete -c ksicache -n '__ksicache_command record' -l keep -x -a '1d 7d 30d' -d 'Keep moments so long'
 complete -c ksicache -n '__ksicache_command record' -l max-size -x -a '500M 1G 2G' -d 'Let the file grow so large'
 complete -c ksicache -n '__ksicache_command record' -l count -x -d 'End after so many moments'
+complete -c ksicache -n '__ksicache_command moments' -l remarks -d 'List only moments with something to remark'
+complete -c ksicache -n '__ksicache_command moments' -l summary -d 'Sum the moments up instead'
 complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'
 complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics' -d 'Write in this format'
 complete -c ksicache -n '__ksicache_command export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'

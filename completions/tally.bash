@@ -386,6 +386,7 @@ _ksicache() {
     case $command in
       capture) _tally_reply '' "$word" '--force --mode --root' ;;
       record) _tally_reply '' "$word" '--every --keep --max-size --count --mode --root' ;;
+      moments) _tally_reply '' "$word" '--remarks --summary' ;;
       dump) _tally_reply '' "$word" --json ;;
       export) _tally_reply '' "$word" '--format --unit -u --output -o --force --mode' ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;

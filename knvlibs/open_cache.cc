@@ -40,12 +40,13 @@ Status NotSoEarly(const Span& times, std::string* why) {
   return KSI_STATUS_NOT_FOUND;
 }
 
-Status CheckTime(const CacheFile& capture, const std::string& when, std::string* why) {
-  const int64_t taken = TimeOfText(capture.GetCapture().taken).value_or(0);
+Status CheckTime(const std::string& when, OpenedCache& opened, std::string* why) {
+  const int64_t taken = TimeOfText(opened.capture->GetCapture().taken).value_or(0);
   const Span span = {taken, taken};
-  const std::optional<int64_t> time = TimeOf(when, span);
-  if (!time) return NotATime(when, span, why);
-  return *time >= taken ? kOk : NotSoEarly(span, why);
+  if (when == "first" || when == "last") return kOk;
+  opened.asked = TimeOf(when, span);
+  if (!opened.asked) return NotATime(when, span, why);
+  return *opened.asked >= taken ? kOk : NotSoEarly(span, why);
 }
 
 Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened, std::string* why) {
@@ -63,9 +64,9 @@ Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened,
     opened.number = parts.front().number;
     return kOk;
   }
-  const std::optional<int64_t> time = TimeOf(*when, {parts.front().first, parts.back().last});
-  if (!time) return NotATime(*when, recording.Times(), why);
-  const Status status = recording.FindMoment(*time, opened.number);
+  opened.asked = TimeOf(*when, {parts.front().first, parts.back().last});
+  if (!opened.asked) return NotATime(*when, recording.Times(), why);
+  const Status status = recording.FindMoment(*opened.asked, opened.number);
   if (status != kOk) {
     *why = recording.Why();
     return status;
@@ -86,9 +87,10 @@ Status OpenCache(const std::string& name, OpenedCache* opened, std::string* why)
   OpenedCache made;
   opened->isMoment = database->Version() != cache::kSchemaVersion || wanted.when;
   made.isMoment = opened->isMoment;
+  made.hasWhen = wanted.when.has_value();
   if (database->Version() == cache::kSchemaVersion) {
     status = CacheFile::Make(std::move(database), &made.capture, why);
-    if (status == kOk && wanted.when) status = CheckTime(*made.capture, *wanted.when, why);
+    if (status == kOk && wanted.when) status = CheckTime(*wanted.when, made, why);
   } else {
     status = RecordingFile::Make(std::move(database), &made.recording, why);
     if (status == kOk) status = ChooseMoment(wanted.when, made, why);

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "knvlibs/cache_file.h"
@@ -19,6 +20,8 @@ struct OpenedCache {
   std::unique_ptr<RecordingFile> recording;
   int64_t number = 0;     // of the moment
   bool isMoment = false;  // one of many, or asked for by its time; told of what is not opened, too
+  bool hasWhen = false;   // whether the name has a time
+  std::optional<int64_t> asked = {};  // the time that was asked for, us since 1970
 };
 
 // Opens what `name` says: a file, or "FILE@WHEN" (recording/when.h) if no file has the whole name;

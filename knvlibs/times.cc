@@ -1,6 +1,8 @@
 #include "knvlibs/times.h"
 
+#include <algorithm>
 #include <array>
+#include <limits>
 
 namespace ksi {
 namespace {
@@ -18,6 +20,13 @@ int64_t ReadClock(clockid_t clock) {
   struct timespec now = {};
   clock_gettime(clock, &now);
   return int64_t{now.tv_sec} * kSecond + now.tv_nsec / 1000;
+}
+
+int64_t TimeBetween(int64_t b, int64_t a) {
+  constexpr int64_t kFarthest = std::numeric_limits<int64_t>::max();
+  int64_t time = 0;
+  if (__builtin_sub_overflow(a, b, &time)) return a < b ? -kFarthest : kFarthest;
+  return std::max(time, -kFarthest);
 }
 
 std::string TextOfTime(int64_t time) {

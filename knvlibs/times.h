@@ -17,6 +17,10 @@ constexpr int64_t kDay = 24 * kHour;
 // What a clock of the system says.
 int64_t ReadClock(clockid_t clock);
 
+// The time from `b` to `a`. Files may tell times that lie farther apart than a number holds: then
+// it is the farthest.
+int64_t TimeBetween(int64_t b, int64_t a);
+
 // "2026-11-21T10:05:30Z", as files and messages tell times.
 std::string TextOfTime(int64_t time);
 

@@ -19,6 +19,7 @@ enum Column { kId, kMoments, kNumber, kChunk, kFirst, kLast, kSize, kBlock };
 constexpr const char* kRows =
     "SELECT id, moments, number, chunk, first, last, size, block FROM part WHERE moments > 0 "
     "ORDER BY id";
+constexpr const char* kLastBlock = "SELECT max(id) FROM block";
 constexpr const char* kBlockOf = "SELECT data FROM block WHERE id = ?1";
 
 // More than the years of a recording in seconds.
@@ -28,7 +29,7 @@ constexpr size_t kMostRows = size_t{1} << 20;
 // By so much a file may have grown since its size was looked at.
 constexpr uint64_t kGrowth = uint64_t{1} << 20;
 
-// What a part takes of the file.
+// What the blocks of a part take of the file.
 uint64_t RoomOf(const RecordingFile::Part& part) {
   return cache::BlocksOf(static_cast<size_t>(part.size)) * cache::kBlockSize;
 }
@@ -235,6 +236,24 @@ Status RecordingFile::ReadWhole(int64_t number, ChunkReader& reader, Moment& mom
   if (reader.ReadAll(moment) == kOk) return kOk;
   reader = {};
   return Damaged(*FindPart(number), "is damaged");
+}
+
+Status RecordingFile::ReadRoom(Room& room) {
+  Statement last;
+  int code = last.Prepare(database_->Handle(), kLastBlock);
+  if (code == SQLITE_OK) code = last.Step();
+  if (code != SQLITE_ROW) return database_->Failed(code);
+  room = {};
+  for (const Part& row : rows_) room.replaced += RoomOf(row);
+  for (const Part& part : parts_) room.moments += RoomOf(part);
+  room.replaced -= room.moments;
+  // Blocks are never removed, so there are as many as the last one says.
+  const auto count = static_cast<uint64_t>(std::max<int64_t>(last.Number(0), 0));
+  const uint64_t size = std::max(Size(), room.moments + room.replaced);
+  const uint64_t blocks = std::min(count, size / cache::kBlockSize) * cache::kBlockSize;
+  room.free = std::max(blocks, room.moments + room.replaced) - room.moments - room.replaced;
+  room.rest = size - room.moments - room.replaced - room.free;
+  return kOk;
 }
 
 Span RecordingFile::Times() const {

@@ -91,6 +91,15 @@ class RecordingFile {
   // About the bytes that have been unpacked to read moments.
   uint64_t Taken() const { return taken_; }
 
+  // What the bytes of the file are taken by.
+  struct Room {
+    uint64_t moments = 0;   // blocks of Parts
+    uint64_t replaced = 0;  // blocks of the other rows in use
+    uint64_t free = 0;      // blocks of none
+    uint64_t rest = 0;      // all but blocks: the other tables, and what leads to blocks
+  };
+  [[nodiscard]] Status ReadRoom(Room& room);
+
   const std::string& Why() const { return database_->Why(); }
   uint64_t Size() const { return database_->Size(); }
 

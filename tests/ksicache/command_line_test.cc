@@ -45,10 +45,22 @@ Options:
   }
 }
 
+TEST_F(Ksicache, HelpFitsAScreen) {
+  std::string lines = Output({"--help"});
+  for (const char* command : kCommands) lines += Output({"-h", command}) + Run({command}).err;
+  for (size_t begin = 0, end = 0; (end = lines.find('\n', begin)) != lines.npos; begin = end + 1) {
+    EXPECT_LE(end - begin, 80u) << lines.substr(begin, end - begin);
+  }
+  ExpectFailure({"record"},
+                "not as in:\nUsage: ksicache record FILE [--every TIME] [--keep TIME] "
+                "[--max-size SIZE]\n                       [--count N] [--mode MODE] [--root DIR]",
+                2);
+}
+
 TEST_F(Ksicache, WrongCommandLines) {
   ExpectFailure({}, "which command?", 2);
   ExpectFailure({"melt", "x"}, "there is no command melt", 2);
-  ExpectFailure({"info"}, "not as in: ksicache info FILE...", 2);
+  ExpectFailure({"info"}, "not as in: ksicache info FILE[@WHEN]...", 2);
   ExpectFailure({"check"}, "not as in: ksicache check FILE...", 2);
   ExpectFailure({"capture", "a", "b"},
                 "not as in: ksicache capture FILE [--force] [--mode MODE] [--root DIR]", 2);

@@ -354,8 +354,9 @@ TEST_F(ExportTest, MakesAFile) {
 
 TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
   ExpectFailure({"export"},
-                "not as in: ksicache export REPORT[,REPORT...]|all [FILE[@WHEN|@FROM..TO]...] "
-                "[--format FORMAT] [--unit UNIT] [--output OUT] [--force] [--mode MODE]",
+                "not as in:\nUsage: ksicache export REPORT[,REPORT...]|all "
+                "[FILE[@WHEN|@FROM..TO]...]\n                       [--format FORMAT] "
+                "[--unit UNIT] [--output OUT] [--force]\n                       [--mode MODE]",
                 2);
   ExpectFailure({"export", "vm-stats,vm-stats"}, "vm-stats is named twice", 2);
   ExpectFailure({"export", "vm-stats,", kExample},

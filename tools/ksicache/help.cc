@@ -10,7 +10,7 @@ namespace ksicache {
 namespace {
 
 constexpr std::string_view kPurpose = R"(
-Captures, shows, exports, makes and checks KSI cache files, which `tally -c FILE`
+Captures, shows, exports, makes and checks KSI cache files, which `tally -c`
 reads instead of the host it runs on.
 )";
 
@@ -18,6 +18,9 @@ constexpr std::string_view kExitStatus = R"(
 Exit status: 0 if all went well, 1 if something failed or check found something
 wrong, 2 if the command line is wrong.
 )";
+
+// What a usage stands behind.
+constexpr std::string_view kUsage = "Usage: ";
 
 constexpr Option kHelpOption = {"help", nullptr, "show this message", 'h'};
 constexpr Option kVersionOption = {"version", nullptr, "show the version"};
@@ -72,15 +75,28 @@ std::string CommandList() {
 }  // namespace
 
 std::string UsageOf(const Command& command) {
-  std::string usage = std::string("ksicache ") + command.name + " " + command.arguments;
-  for (const Option* option : command.options) usage += " [" + Spelling(*option) + "]";
+  constexpr size_t kWidth = 80;
+  const std::string start = std::string("ksicache ") + command.name;
+  std::string usage = start + " " + command.arguments;
+  size_t width = kUsage.size() + usage.size();
+  for (const Option* option : command.options) {
+    const std::string word = " [" + Spelling(*option) + "]";
+    width += word.size();
+    if (width > kWidth) {
+      const std::string margin(kUsage.size() + start.size(), ' ');
+      usage += "\n" + margin;
+      width = margin.size() + word.size();
+    }
+    usage += word;
+  }
   return usage;
 }
 
 std::string Help() {
   std::string text;
   for (const Command* command : kCommands) {
-    text += (text.empty() ? "Usage: " : "       ") + UsageOf(*command) + "\n";
+    text += text.empty() ? kUsage : std::string(kUsage.size(), ' ');
+    text += UsageOf(*command) + "\n";
   }
   Options options = AllOptions();
   options.insert(options.end(), {&kHelpOption, &kVersionOption});
@@ -91,7 +107,7 @@ std::string Help() {
 std::string HelpOf(const Command& command) {
   Options options(command.options.begin(), command.options.end());
   options.push_back(&kHelpOption);
-  return "Usage: " + UsageOf(command) + "\n\n" + command.help + OptionList(options);
+  return std::string(kUsage) + UsageOf(command) + "\n\n" + command.help + OptionList(options);
 }
 
 }  // namespace ksicache

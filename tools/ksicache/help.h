@@ -8,7 +8,7 @@
 
 namespace ksicache {
 
-// "ksicache load JSON FILE [--force]"
+// "ksicache load JSON FILE [--force]", in as many lines as it takes behind "Usage: ".
 std::string UsageOf(const Command& command);
 
 // What --help says, alone and after a command.

@@ -92,7 +92,10 @@ void CheckLine(const Command& command, const CommandLine& line) {
   }
   const size_t count = line.arguments.size();
   if (count < command.fewest || count > command.most) {
-    throw UsageError("not as in: " + UsageOf(command));
+    constexpr size_t kOneLine = 59;  // leaves room for what stands before it
+    const std::string usage = UsageOf(command);
+    if (usage.size() <= kOneLine) throw UsageError("not as in: " + usage);
+    throw UsageError("not as in:", "Usage: " + usage + "\nTry 'ksicache --help'.\n");
   }
 }
 

@@ -125,6 +125,8 @@ void Count(ksi::Status status, ksi::MomentFacts& facts) {
 OpenedFile::OpenedFile(const std::string& name) {
   ksi::ChunkReader moment;
   ksi::OpenedCache opened = OpenAny(name, moment);
+  hasWhen_ = opened.hasWhen;
+  asked_ = opened.asked;
   if (opened.recording == nullptr) {
     file_ = std::move(opened.capture);
   } else {
@@ -157,6 +159,15 @@ std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName) {
   status = ksi::RecordingFile::Make(std::move(database), &recording, &why);
   if (status != ksi::kOk) Throw(status, fileName, why);
   return recording;
+}
+
+NamedMoment OpenNamed(const std::string& name) {
+  ksi::OpenedCache opened;
+  std::string why;
+  const ksi::Status status = ksi::OpenCache(name, &opened, &why);
+  if (status != ksi::kOk) Throw(status, name, why);
+  if (opened.recording == nullptr) throw DataError("is no recording");
+  return {std::move(opened.recording), opened.number};
 }
 
 MomentHead HeadOf(const std::string& name) {

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "knvlibs/cache_file.h"
@@ -26,11 +27,18 @@ class OpenedFile {
   // Whether it is a recording's moment.
   bool IsMoment() const { return !content_.empty(); }
 
+  // Whether the name has a WHEN, and the time that this is, us since 1970; "first" and "last" are
+  // none.
+  bool HasWhen() const { return hasWhen_; }
+  const std::optional<int64_t>& Asked() const { return asked_; }
+
  private:
   void Open(const std::string& name, const ksi::Moment& moment);
 
   ksi::Bytes content_;  // of the moment as a capture
   std::unique_ptr<ksi::CacheFile> file_;
+  bool hasWhen_ = false;
+  std::optional<int64_t> asked_;
 };
 
 // Whether a recording has this name, and no moment is asked for.
@@ -38,6 +46,13 @@ bool IsRecording(const std::string& name);
 
 // A whole recording.
 std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName);
+
+// A recording, and the number of the moment that "FILE@WHEN" means.
+struct NamedMoment {
+  std::unique_ptr<ksi::RecordingFile> recording;
+  int64_t number;
+};
+NamedMoment OpenNamed(const std::string& name);
 
 // Whose moment a name stands for, and when it was taken, us since 1970.
 struct MomentHead {

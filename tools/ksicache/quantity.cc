@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <charconv>
+#include <cstdio>
+#include <cstdlib>
 #include <span>
 #include <string_view>
 
@@ -53,6 +55,17 @@ int64_t SizeOf(const CommandLine& line, const Option& option, int64_t standard) 
 
 int64_t CountOf(const CommandLine& line, const Option& option, int64_t standard) {
   return QuantityOf(line, option, standard, kOne, "a number from 1 on");
+}
+
+std::string TextOfDuration(int64_t duration) {
+  const int64_t seconds = std::abs(duration / ksi::kSecond);
+  const int64_t days = seconds / (ksi::kDay / ksi::kSecond);
+  char clock[16];
+  static_cast<void>(
+      std::snprintf(clock, sizeof clock, "%02d:%02d:%02d", static_cast<int>(seconds / 3600 % 24),
+                    static_cast<int>(seconds / 60 % 60), static_cast<int>(seconds % 60)));
+  return (duration <= -ksi::kSecond ? "-" : "") +
+         (days == 0 ? std::string() : std::to_string(days) + "d ") + clock;
 }
 
 }  // namespace ksicache

@@ -1,4 +1,4 @@
-// Times and sizes as people write them in options.
+// Times and sizes as people write and read them.
 #ifndef TOOLS_KSICACHE_QUANTITY_H_
 #define TOOLS_KSICACHE_QUANTITY_H_
 
@@ -18,6 +18,9 @@ int64_t DurationOf(const CommandLine& line, const Option& option, int64_t standa
 int64_t SizeOf(const CommandLine& line, const Option& option, int64_t standard);
 // A number that is not 0.
 int64_t CountOf(const CommandLine& line, const Option& option, int64_t standard);
+
+// "02:03:04", "1d 02:03:04" or "-00:00:05", of us.
+std::string TextOfDuration(int64_t duration);
 
 }  // namespace ksicache
 

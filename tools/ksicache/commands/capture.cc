@@ -94,9 +94,9 @@ const Command kCapture = {
     .arguments = "FILE",
     .summary = "record every node and instance of this host in FILE",
     .help =
-        R"(Records every node and every instance of this host in FILE, as libknvlibs.so tells
-them; "-" is standard output. A read that fails is recorded with its status, and
-fails again when the file is read. What failed is said:
+        R"(Records every node and every instance of this host in FILE, as libknvlibs.so
+tells them; "-" is standard output. A read that fails is recorded with its
+status, and fails again when the file is read. What failed is said:
 
   absent   of nodes that the host, or a thing on it, does not have
   refused  for want of rights; the superuser sees most

@@ -34,8 +34,8 @@ const Command kExtract = {
     .name = "extract",
     .arguments = "FILE@WHEN OUT",
     .summary = "make a capture of one moment of a recording",
-    .help = R"(Makes OUT, a capture, of one moment of the recording FILE; "-" is standard output.
-Without @WHEN it is the last one.
+    .help = R"(Makes OUT, a capture, of one moment of the recording FILE; "-" is standard
+output. Without @WHEN it is the last one.
 )",
     .options = kOptions,
     .fewest = 2,

@@ -1,5 +1,6 @@
 // info: what cache files are, in a few lines each.
 #include <limits>
+#include <optional>
 #include <utility>
 
 #include "knvlibs/cache_format.h"
@@ -9,6 +10,7 @@
 #include "tools/ksicache/failures.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
+#include "tools/ksicache/quantity.h"
 #include "tools/ksicache/reading_walk.h"
 
 namespace ksicache {
@@ -49,11 +51,22 @@ void PrintDefinitions(const std::string& built, const std::string& signature) {
             (own ? "" : ", not " + std::string(ksi::kDefinitions.signature) + " of this version"));
 }
 
+// How far a moment is from the time that was asked for, if one was, and from now.
+void PrintDistance(int64_t taken, const std::optional<int64_t>& asked) {
+  if (asked) {
+    PrintLine("asked      " + ksi::TextOfTime(*asked) + ", " +
+              TextOfDuration(ksi::TimeBetween(taken, *asked)) + " later");
+  }
+  PrintLine("age        " +
+            TextOfDuration(ksi::TimeBetween(taken, ksi::ReadClock(CLOCK_REALTIME))));
+}
+
 void PrintCapture(const OpenedFile& opened, const std::string& fileName) {
   const ksi::CacheFile::Capture& capture = opened.File().GetCapture();
   PrintLine("file       " + fileName);
   PrintLine("host       " + capture.host);
   PrintLine("taken      " + capture.taken);
+  if (opened.HasWhen()) PrintDistance(TakenOf(opened.File()), opened.Asked());
   if (!opened.IsMoment()) {
     PrintLine("size       " + std::to_string(opened.File().Size()) + " bytes, schema " +
               std::to_string(ksi::cache::kSchemaVersion));
@@ -61,14 +74,29 @@ void PrintCapture(const OpenedFile& opened, const std::string& fileName) {
   PrintDefinitions(capture.built, capture.signature);
 }
 
+// What the bytes of a recording's file are taken by.
+void PrintRoom(ksi::RecordingFile& recording) {
+  ksi::RecordingFile::Room room;
+  if (recording.ReadRoom(room) != ksi::kOk) throw DataError("damaged: " + recording.Why());
+  const auto print = [](const char* what, uint64_t bytes) {
+    const uint64_t blocks = bytes / ksi::cache::kBlockSize;
+    PrintLine(what + std::to_string(bytes) + " bytes in " + std::to_string(blocks) + " blocks");
+  };
+  const uint64_t all = room.moments + room.replaced + room.free + room.rest;
+  PrintLine("size       " + std::to_string(all) + " bytes, schema " +
+            std::to_string(ksi::cache::kRecordingVersion));
+  print("  moments  ", room.moments);
+  print("  replaced ", room.replaced);
+  print("  free     ", room.free);
+  PrintLine("  rest     " + std::to_string(room.rest) + " bytes");
+}
+
 void PrintRecording(ksi::RecordingFile& recording, const std::string& fileName) {
   const std::vector<ksi::RecordingFile::Part>& parts = recording.Parts();
   int64_t moments = 0;
-  int64_t bytes = 0;
   size_t chunks = 0;
   for (const ksi::RecordingFile::Part& part : parts) {
     moments += part.moments;
-    bytes += part.size;
     chunks += part.number == part.chunk ? 1 : 0;
   }
   ksi::HostIdentity host;
@@ -78,14 +106,12 @@ void PrintRecording(ksi::RecordingFile& recording, const std::string& fileName) 
   PrintLine("file       " + fileName);
   PrintLine("host       " + host.name);
   if (!parts.empty()) {
-    PrintLine("from       " + ksi::TextOfTime(parts.front().first));
-    PrintLine("to         " + ksi::TextOfTime(parts.back().last));
+    PrintLine("from       " + ksi::TextOfTime(recording.Times().first));
+    PrintLine("to         " + ksi::TextOfTime(recording.Times().last));
   }
   PrintLine("moments    " + std::to_string(moments) + ", in " + std::to_string(parts.size()) +
-            " parts of " + std::to_string(chunks) + " chunks, with " + std::to_string(bytes) +
-            " bytes");
-  PrintLine("size       " + std::to_string(recording.Size()) + " bytes, schema " +
-            std::to_string(ksi::cache::kRecordingVersion));
+            " parts of " + std::to_string(chunks) + " chunks");
+  PrintRoom(recording);
   if (!parts.empty()) PrintDefinitions(host.built, host.signature);
 }
 
@@ -120,12 +146,14 @@ int Info(const CommandLine& line) {
 
 const Command kInfo = {
     .name = "info",
-    .arguments = "FILE...",
+    .arguments = "FILE[@WHEN]...",
     .summary = "say which host a FILE is of, when it was taken and what it holds",
     .help = R"(Says which host each FILE is of, when it was taken, what definitions it was made
 with and how much it holds: values, lists, and the reads that failed. "absent"
 are those of nodes that the host, or a thing on it, does not have; "refused"
 those that whoever captured it had not the rights for; "failed" all others.
+Of FILE@WHEN it says how long before that time the moment was taken that
+answers, and how long ago.
 )",
     .options = {},
     .fewest = 1,

@@ -170,8 +170,8 @@ const Command kJoin = {
     .arguments = "OUT IN...",
     .summary = "make a recording of captures and recordings of one host",
     .help = R"(Makes OUT, a recording, of captures and recordings of one host, by the times at
-which their moments were taken; "-" is standard output. What several of them have
-is there once.
+which their moments were taken; "-" is standard output. What several of them
+have is there once.
 )",
     .options = kOptions,
     .fewest = 2,

@@ -1,114 +1,158 @@
 // moments: when a recording's moments were taken, how large they are, and what is missing.
-#include <cinttypes>
+#include <algorithm>
 #include <cstdio>
+#include <functional>
+#include <optional>
 #include <string>
-#include <vector>
+#include <utility>
 
 #include "knvlibs/recording/recording_file.h"
 #include "knvlibs/times.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/moment_summary.h"
+#include "tools/ksicache/moment_walk.h"
+#include "tools/ksicache/named_span.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
-#include "tools/ksicache/progress.h"
+#include "tools/ksicache/quantity.h"
 #include "tools/ksicache/reading_walk.h"
 
 namespace ksicache {
 namespace {
 
-// "1d 02:03:04" or "02:03:04"
-std::string SpanText(int64_t time) {
-  const int64_t days = time / ksi::kDay;
-  char text[64];
-  const int size =
-      std::snprintf(text, sizeof text, "%02" PRId64 ":%02" PRId64 ":%02" PRId64,
-                    time / ksi::kHour % 24, time / ksi::kMinute % 60, time / ksi::kSecond % 60);
-  const std::string clock(text, static_cast<size_t>(size));
-  return days == 0 ? clock : std::to_string(days) + "d " + clock;
-}
+constexpr Option kRemarks = {"remarks", nullptr, "list only moments with something to remark"};
+constexpr Option kSummary = {"summary", nullptr, "sum the moments up instead"};
+constexpr const Option* kOptions[] = {&kRemarks, &kSummary};
 
-// One line a moment: when, its share of the part's bytes, how long and how much CPU it took, and
-// what there is to remark.
-class Lister {
+// The moments that a name means: all of a recording, those of a span, or one.
+class Chosen {
  public:
-  Lister(const std::string& fileName, ksi::RecordingFile& file)
-      : fileName_(fileName), file_(file) {}
-
-  // False if something is damaged, which is said.
-  bool Run() {
-    PrintLine("taken                     bytes   took ms    cpu ms  remarks");
-    Progress progress("listing");
-    bool isGood = true;
-    const std::vector<ksi::RecordingFile::Part>& parts = file_.Parts();
-    for (size_t i = 0; i < parts.size(); ++i) {
-      progress.Show(i, parts.size());
-      try {
-        ListPart(parts[i]);
-      } catch (const DataError& error) {
-        PrintError(fileName_ + ": " + error.what());
-        isGood = false;
-      }
+  explicit Chosen(const std::string& name) {
+    if (const std::optional<NamedSpan> span = SpanOf(name)) {
+      recording_ = OpenRecording(span->fileName);
+      times_ = TimesOf(*span, *recording_);
+    } else if (IsRecording(name)) {
+      recording_ = OpenRecording(name);
+    } else {
+      NamedMoment moment = OpenNamed(name);
+      recording_ = std::move(moment.recording);
+      number_ = moment.number;
     }
-    return isGood;
   }
+
+  ksi::RecordingFile& Recording() const { return *recording_; }
+
+  bool Has(const WalkedMoment& moment) const {
+    const int64_t taken = moment.facts.taken;
+    return (!times_ || (times_->first <= taken && taken <= times_->last)) &&
+           (!number_ || moment.number == *number_);
+  }
+
+  // Whether a part has some of them, or is beside one that has: what is to be said of a moment is
+  // told by those around it.
+  bool Needs(const ksi::RecordingFile::Part& part) const {
+    const auto& parts = recording_->Parts();
+    const size_t place = static_cast<size_t>(&part - parts.data());
+    const size_t end = std::min(place + 2, parts.size());
+    const auto hasSome = [this](const ksi::RecordingFile::Part& each) {
+      return (!times_ || (each.first <= times_->last && times_->first <= each.last)) &&
+             (!number_ || (each.number <= *number_ && *number_ < each.End()));
+    };
+    return std::any_of(parts.begin() + static_cast<ptrdiff_t>(place == 0 ? 0 : place - 1),
+                       parts.begin() + static_cast<ptrdiff_t>(end), hasSome);
+  }
+
+  const std::optional<ksi::Span>& Times() const { return times_; }
 
  private:
-  void ListPart(const ksi::RecordingFile::Part& part) {
-    std::vector<ksi::MomentFacts> facts;
-    if (file_.ReadFacts(part, facts) != ksi::kOk) throw DataError("damaged: " + file_.Why());
-    std::string boot = boot_;
-    if (part.number == part.chunk) {
-      ksi::HostIdentity host;
-      if (file_.ReadHost(part, host) != ksi::kOk) throw DataError("damaged: " + file_.Why());
-      boot = host.boot;
-    }
-    for (const ksi::MomentFacts& each : facts) {
-      const std::string remarks = RemarksOn(each, boot);
-      char text[128];
-      const int size = std::snprintf(text, sizeof text, "%-20s  %9" PRId64 " %9.1f %9.1f",
-                                     ksi::TextOfTime(each.taken).c_str(), part.size / part.moments,
-                                     static_cast<double>(each.duration) / 1000,
-                                     static_cast<double>(each.cpu) / 1000);
-      PrintLine(std::string(text, static_cast<size_t>(size)) +
-                (remarks.empty() ? "" : "  " + remarks));
-      last_ = each;
-      boot_ = boot;
-      isFirst_ = false;
-    }
-  }
-
-  std::string RemarksOn(const ksi::MomentFacts& facts, const std::string& boot) const {
-    std::string remarks;
-    const auto add = [&remarks](const std::string& remark) {
-      remarks += (remarks.empty() ? "" : ", ") + remark;
-    };
-    if (!isFirst_) {
-      if (boot != boot_) {
-        add("rebooted");
-      } else if (last_.uptime != 0 && facts.uptime != 0) {
-        // How far the clock on the wall went beyond the other.
-        const int64_t step = (facts.taken - last_.taken) - (facts.uptime - last_.uptime);
-        if (step > ksi::kSecond) add("clock put forward by " + SpanText(step));
-        if (step < -ksi::kSecond) add("clock set back by " + SpanText(-step));
-      }
-    }
-    if (facts.skipped != 0) add(std::to_string(facts.skipped) + " skipped before");
-    if (facts.refused != 0) add(std::to_string(facts.refused) + " refused");
-    if (facts.failed != 0) add(std::to_string(facts.failed) + " failed");
-    if (facts.loss != ksi::kOk) add("left out: " + StatusText(facts.loss));
-    return remarks;
-  }
-
-  const std::string& fileName_;
-  ksi::RecordingFile& file_;
-  bool isFirst_ = true;
-  ksi::MomentFacts last_;
-  std::string boot_;
+  std::unique_ptr<ksi::RecordingFile> recording_;
+  std::optional<ksi::Span> times_;
+  std::optional<int64_t> number_;
 };
 
+// What there is to remark on a moment, or nothing.
+std::string RemarksOn(const WalkedMoment& moment) {
+  const ksi::MomentFacts& facts = moment.facts;
+  std::string remarks;
+  const auto add = [&remarks](bool is, const std::string& remark) {
+    if (is) remarks += (remarks.empty() ? "" : ", ") + remark;
+  };
+  add(moment.isOtherHost, "of the host " + Cut(moment.host));
+  add(moment.isRebooted, "rebooted");
+  add(moment.isAfterGap, "nothing for " + TextOfDuration(moment.passed) + " before");
+  add(moment.step > 0, "clock put forward by " + TextOfDuration(moment.step));
+  add(moment.step < 0, "clock set back by " + TextOfDuration(-moment.step));
+  add(facts.skipped != 0, std::to_string(facts.skipped) + " skipped before");
+  add(facts.refused != 0, std::to_string(facts.refused) + " refused");
+  add(facts.failed != 0, std::to_string(facts.failed) + " failed");
+  add(facts.loss != ksi::kOk, "left out: " + StatusText(facts.loss));
+  return remarks;
+}
+
+void PrintMoment(const WalkedMoment& moment, const std::string& remarks) {
+  char text[128];
+  const int size = std::snprintf(text, sizeof text, "%-20s  %9.0f %9.1f %9.1f",
+                                 ksi::TextOfTime(moment.facts.taken).c_str(), moment.bytes,
+                                 static_cast<double>(moment.facts.duration) / 1000,
+                                 static_cast<double>(moment.facts.cpu) / 1000);
+  PrintLine(std::string(text, static_cast<size_t>(size)) + (remarks.empty() ? "" : "  " + remarks));
+}
+
+// Visits those that were chosen. False if something is damaged, which is said.
+bool Walk(const std::string& name, const Chosen& chosen,
+          const std::function<void(const WalkedMoment&)>& visit) {
+  bool isGood = true;
+  bool isFound = false;
+  MomentWalk walk(
+      chosen.Recording(),
+      [&](const WalkedMoment& moment) {
+        if (!chosen.Has(moment)) return;
+        isFound = true;
+        visit(moment);
+      },
+      [&](const std::string& what) {
+        PrintError(name + ": damaged: " + what);
+        isGood = false;
+      });
+  walk.Run([&chosen](const ksi::RecordingFile::Part& part) { return chosen.Needs(part); });
+  if (!isFound && isGood && chosen.Times()) {
+    throw DataError(NoneInSpan(chosen.Recording().Times()));
+  }
+  return isGood;
+}
+
+bool List(const std::string& name, bool onlyRemarks) {
+  const Chosen chosen(name);
+  PrintLine("taken                     bytes   took ms    cpu ms  remarks");
+  return Walk(name, chosen, [onlyRemarks](const WalkedMoment& moment) {
+    const std::string remarks = RemarksOn(moment);
+    if (!onlyRemarks || !remarks.empty()) PrintMoment(moment, remarks);
+  });
+}
+
+bool SumUp(const std::string& name) {
+  const Chosen chosen(name);
+  MomentSummary summary;
+  const bool isGood =
+      Walk(name, chosen, [&summary](const WalkedMoment& moment) { summary.Add(moment); });
+  if (!isGood) summary.Damage();
+  PrintLine("file       " + name);
+  summary.Print();
+  return isGood;
+}
+
 int Moments(const CommandLine& line) {
-  return ForEachFile(line.arguments, [](const std::string& fileName) {
-    return Lister(fileName, *OpenRecording(fileName)).Run();
+  if (line.Has(kRemarks) && line.Has(kSummary)) {
+    throw UsageError("--remarks is of a list, and --summary is none");
+  }
+  const bool isSummary = line.Has(kSummary);
+  bool first = true;
+  return ForEachFile(line.arguments, [&](const std::string& name) {
+    if (!std::exchange(first, false)) PrintLine("");
+    if (isSummary) return SumUp(name);
+    if (line.arguments.size() > 1) PrintLine(name + ":");
+    return List(name, line.Has(kRemarks));
   });
 }
 
@@ -116,14 +160,15 @@ int Moments(const CommandLine& line) {
 
 const Command kMoments = {
     .name = "moments",
-    .arguments = "FILE...",
+    .arguments = "FILE[@WHEN|@FROM..TO]...",
     .summary = "list the moments of a recording",
-    .help = R"(Lists the moments of each FILE: when each was taken, in UTC, how many bytes it
-takes in the file, how long it took to read it and how much CPU, and what there is
-to remark: reboots, clocks that were set, moments that were skipped, and what
-could not be read.
+    .help = R"(Lists the moments of each FILE, or those that are asked for: when each was
+taken, in UTC; how many bytes it takes of the file; how long it took to read the
+host and how much CPU; and what there is to remark: reboots, clocks that were
+set, times without a recorder, moments that were skipped, and what could not be
+read.
 )",
-    .options = {},
+    .options = kOptions,
     .fewest = 1,
     .most = Command::kAnyNumber,
     .run = Moments,

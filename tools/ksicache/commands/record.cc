@@ -276,9 +276,10 @@ const Command kRecord = {
     .arguments = "FILE",
     .summary = "record this host over time in FILE",
     .help =
-        R"(Takes a moment of this host again and again, as capture does, and adds it to FILE,
-which is made if it is not there. Moments lie on the clock's grid; one that would
-be late is left out. It ends with SIGINT or SIGTERM, or after --count moments.
+        R"(Takes a moment of this host again and again, as capture does, and adds it to
+FILE, which is made if it is not there. Moments lie on the clock's grid; one
+that would be late is left out. It ends with SIGINT or SIGTERM, or after --count
+moments.
 
 FILE keeps to its bounds: moments older than --keep are removed, and the oldest
 ones where it would grow beyond --max-size. Times are such as 5s, 10m, 6h or 7d,
