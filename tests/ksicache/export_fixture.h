@@ -58,6 +58,22 @@ class ExportTest : public Ksicache {
     return rows;
   }
 
+  // A recording of a host that has little, at these times.
+  std::string RecordingAt(const std::string& name, const std::vector<std::string>& times) const {
+    std::vector<std::string> join = {"join", Path(name)};
+    for (size_t i = 0; i < times.size(); ++i) {
+      const std::string capture = Path(name + std::to_string(i));
+      WriteContent(capture + ".json", R"({"ksiCache":1,"host":"h","taken":")" + times[i] +
+                                          R"(","readings":[
+          {"node":"memory/pshare/stats","keys":[],"value":{"cow":)" +
+                                          std::to_string(i) + "}}]}");
+      EXPECT_EQ(Run({"load", capture + ".json", capture}).err, "");
+      join.push_back(capture);
+    }
+    EXPECT_EQ(Run(join).err, "");
+    return Path(name);
+  }
+
   // A capture of the example host with texts in its JSON replaced.
   std::string ExampleWith(const std::string& name,
                           const std::vector<std::pair<std::string, std::string>>& changes) const {

@@ -258,6 +258,31 @@ TEST_F(ExportTest, TakesAMomentOfARecording) {
   EXPECT_EQ(states(kIncident + "@10:03Z..10:04Z"), all.substr(26, 52));
 }
 
+// Times without a date are of one day, and none is of the day before the other.
+TEST_F(ExportTest, TakesBothTimesOfASpanOnOneDay) {
+  const std::string file = RecordingAt(
+      "days.rec", {"2026-11-19T23:30:00Z", "2026-11-20T10:00:00Z", "2026-11-20T23:30:00Z",
+                   "2026-11-21T09:00:00Z", "2026-11-21T10:15:00Z", "2026-11-21T10:30:00Z"});
+  const auto days = [&](const std::string& span) {
+    std::string text;
+    for (const Row& row : Cells(Output({"export", "pshare-stats", file + "@" + span}))) {
+      if (row[0] != "host") text += row[1].substr(8, 8) + " ";
+    }
+    return text;
+  };
+  EXPECT_EQ(days("10:00Z..11:00Z"), "21T10:15 21T10:30 ");
+  EXPECT_EQ(days("10:00Z..10:20Z"), "21T10:15 ");
+  EXPECT_EQ(days("23:00Z..01:00Z"), "20T23:30 ");
+  EXPECT_EQ(days("23:00Z..09:00Z"), "20T23:30 21T09:00 ");
+  EXPECT_EQ(days("23:00Z..22:59Z"), "20T23:30 21T09:00 21T10:15 21T10:30 ");
+  EXPECT_EQ(days("2026-11-19T23:00Z..11:00Z"), "19T23:30 20T10:00 ");
+  EXPECT_EQ(days("..11:00Z"), "19T23:30 20T10:00 ");
+  EXPECT_EQ(days("-90m..11:00Z"), "21T09:00 21T10:15 21T10:30 ");
+  EXPECT_EQ(days("10:15Z..10:15Z"), "21T10:15 ");
+  EXPECT_EQ(days("2026-11-20T10:00Z..2027-01-01T00:00Z"),
+            "20T10:00 20T23:30 21T09:00 21T10:15 21T10:30 ");
+}
+
 TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
   const std::string kSpan = "moments are of 2026-11-21T10:02:00Z to 2026-11-21T10:06:00Z";
   const auto expect = [](const std::string& name, const std::string& message) {

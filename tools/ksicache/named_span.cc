@@ -11,17 +11,19 @@
 namespace ksicache {
 namespace {
 
-// `last`: whether it is the end of the span.
-int64_t TimeIn(const std::string& when, const ksi::RecordingFile& recording, bool last) {
-  const ksi::Span all = recording.Times();
-  if (when.empty() || when == (last ? "last" : "first")) return last ? all.last : all.first;
-  const auto& parts = recording.Parts();
-  const std::optional<int64_t> time = ksi::TimeOf(when, {parts.front().first, parts.back().last});
+// `span`: as of TimeOf.
+int64_t TimeIn(const std::string& when, const ksi::Span& span, const ksi::Span& all) {
+  const std::optional<int64_t> time = ksi::TimeOf(when, span);
   if (!time) {
     throw DataError(when + " is no time, as those of 10:05..10:10, -1h.. and first..last are: " +
                     "moments are of " + ksi::TextOfSpan(all));
   }
-  return *time;
+  return *time / ksi::kSecond * ksi::kSecond;
+}
+
+// Whether a time has no date, so that each day has it.
+bool IsOfAnyDay(const std::string& when) {
+  return !when.empty() && when[0] >= '0' && when[0] <= '9' && when.find('-') == std::string::npos;
 }
 
 }  // namespace
@@ -39,9 +41,19 @@ bool IsSpan(const std::string& name) { return SpanOf(name).has_value(); }
 
 ksi::Span TimesOf(const NamedSpan& named, const ksi::RecordingFile& recording) {
   if (recording.Parts().empty()) throw DataError("it has no moments yet");
-  const int64_t from = TimeIn(named.from, recording, false);
-  const int64_t to = TimeIn(named.to, recording, true);
-  return {from / ksi::kSecond * ksi::kSecond, to / ksi::kSecond * ksi::kSecond + ksi::kSecond - 1};
+  const auto& parts = recording.Parts();
+  const ksi::Span recorded = {parts.front().first, parts.back().last};
+  const ksi::Span all = recording.Times();
+  ksi::Span times = {all.first / ksi::kSecond * ksi::kSecond, all.last};
+  if (!named.from.empty() && named.from != "first") {
+    times.first = TimeIn(named.from, recorded, all);
+  }
+  if (!named.to.empty() && named.to != "last") {
+    const ksi::Span dayFromThere = {times.first, times.first + ksi::kDay - 1};
+    times.last =
+        TimeIn(named.to, IsOfAnyDay(named.to) ? dayFromThere : recorded, all) + ksi::kSecond - 1;
+  }
+  return times;
 }
 
 std::string NoneInSpan(const ksi::Span& all) {
