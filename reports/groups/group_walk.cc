@@ -1,5 +1,6 @@
 #include "reports/groups/group_walk.h"
 
+#include "framework/loss.h"
 #include "framework/param_list.h"
 #include "reports/groups/group_readers.h"
 
@@ -25,11 +26,10 @@ Status TallyTraverseGroups(uint64_t startGroupId, uint32_t levels, uint8_t mode,
   Status listed = kSuccess;
   for (uint32_t i = 0; i < childCount; ++i) {
     int64_t child = 0;
-    listed = KSI_ParamListGetInt64(children.get(), i, &child);
+    listed = NoteLoss(KSI_ParamListGetInt64(children.get(), i, &child));
     if (listed != kSuccess) continue;
-    // What failed below has been said and ends nothing else.
-    static_cast<void>(
-        TallyTraverseGroups(static_cast<uint64_t>(child), levels - 1, mode, visitor, context));
+    // What failed below ends nothing else.
+    NoteLoss(TallyTraverseGroups(static_cast<uint64_t>(child), levels - 1, mode, visitor, context));
   }
   return listed;
 }

@@ -15,6 +15,7 @@
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "framework/loss.h"
 #include "framework/param_list.h"
 #include "framework/report.h"
 #include "reports/reports.h"
@@ -151,9 +152,9 @@ ParamList ListBuddies() {
   constexpr size_t kNameBytes = 128;  // of one name
   // sic: C47
   ParamList names(KSI_ParamListCreateAndAllocateParams(1, kMaxBuddies, kMaxBuddies * kNameBytes));
-  if (names && KSI_GetInstanceList(KSI_NODE_system_buddy, nullptr, names.get()) != kSuccess) {
-    names.reset();
-  }
+  const Status status =
+      names ? KSI_GetInstanceList(KSI_NODE_system_buddy, nullptr, names.get()) : kFailure;
+  if (NoteLoss(status) != kSuccess) names.reset();
   return names;
 }
 
@@ -166,9 +167,9 @@ size_t ReadBuddies(std::span<BuddyRow, kMaxBuddies> rows) {
   size_t kept = 0;
   for (uint32_t i = 0; i < KSI_ParamListUsedCount(names.get()) && kept < rows.size(); ++i) {
     const char* name = nullptr;
-    if (KSI_ParamListGetString(names.get(), i, &name) != kSuccess) break;
+    if (NoteLoss(KSI_ParamListGetString(names.get(), i, &name)) != kSuccess) break;
     if (std::strncmp(name, kPrefix, sizeof kPrefix - 1) != 0) continue;
-    if (ReadBuddyName(name, rows[kept]) == kSuccess) ++kept;
+    if (NoteLoss(ReadBuddyName(name, rows[kept])) == kSuccess) ++kept;
   }
   return kept;
 }

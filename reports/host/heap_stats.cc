@@ -10,6 +10,7 @@
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
 #include "framework/fixed_text.h"
+#include "framework/loss.h"
 #include "framework/param_list.h"
 #include "framework/report.h"
 #include "reports/reports.h"
@@ -160,7 +161,7 @@ Status Run(const ReportOptions& options, Sink& sink) {
   if (Status status = context.Settle(options)) return status;
   Heaps heaps;
   // sic: C42
-  if (TallyHeapGetMemMapStats(heaps) != kSuccess) return kSuccess;
+  if (NoteLoss(TallyHeapGetMemMapStats(heaps)) != kSuccess) return kSuccess;
   context.Begin();
   for (const KSI_HeapStats& heap : std::span(heaps.records.get(), heaps.count)) {
     context.PrintRow(heap);

@@ -7,6 +7,7 @@
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "framework/loss.h"
 #include "framework/param_list.h"
 #include "framework/report.h"
 #include "reports/reports.h"
@@ -133,13 +134,13 @@ Status PrintPools(uint32_t node, uint32_t numVMs, LPoolContext& context) {
   row.nodeID = node;
   const std::string psharePool = "pshare-" + std::to_string(node);
   row.name = psharePool;
-  if (TallyGetPSharePoolStats(node, row.pool) == kSuccess) context.PrintRow(row);
+  if (NoteLoss(TallyGetPSharePoolStats(node, row.pool)) == kSuccess) context.PrintRow(row);
 
   ParamList names;
   if (Status status = ListVmPools(node, numVMs, names)) return status;
   const Status status = ForEachName(names, kNoName, [&](const char* name) {
     row.name = name;
-    if (TallyGetVmPoolStats(node, name, row.pool) == kSuccess) context.PrintRow(row);
+    if (NoteLoss(TallyGetVmPoolStats(node, name, row.pool)) == kSuccess) context.PrintRow(row);
     return kSuccess;
   });
   if (status == kSuccess) return kSuccess;

@@ -9,6 +9,7 @@
 
 #include <knvlibs/ksi_nodes.h>
 #include <knvlibs/ksi_records.h>
+#include "framework/loss.h"
 #include "framework/param_list.h"
 #include "framework/report.h"
 #include "reports/reports.h"
@@ -162,9 +163,9 @@ Status GetRegionsInfo(const char* volume, const char* region, KSI_PmemRegion& re
 template <class Print>
 void ForEachVolume(const Complaint& notFetched, Print print) {
   ParamList volumes;
-  if (ListInstances(KSI_NODE_memory_pmem_volumes, nullptr, volumes) != kSuccess) return;
+  if (NoteLoss(ListInstances(KSI_NODE_memory_pmem_volumes, nullptr, volumes)) != kSuccess) return;
   // A failure has been told, and ends the rows.
-  static_cast<void>(ForEachName(volumes, notFetched, print));
+  NoteLoss(ForEachName(volumes, notFetched, print));
 }
 
 void PMemRegionStoreReport(ReportContext<VolumeRow>& context) {

@@ -331,6 +331,61 @@ TEST_F(ExportTest, TellsRowsThatAreMissing) {
                 "ksicache: " + Path("less.ksi") + ": pshare-stats: 0xbad005a Permission denied\n");
 }
 
+// Rows that could not be read are missing, whether tally has a word for it or not.
+TEST_F(ExportTest, TellsOfSingleRowsThatAreMissing) {
+  const auto expect = [&](const std::string& name, const std::string& report,
+                          const std::vector<std::pair<std::string, std::string>>& changes,
+                          size_t rows, const std::string& message) {
+    SCOPED_TRACE(name);
+    const std::string host = ExampleWith(name, changes);
+    const harness::Result result = Run({"export", report, "--format=json", host});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(Lines(result.out).size(), rows);
+    const std::vector<std::string> lines = Lines(result.err);
+    ASSERT_FALSE(lines.empty());
+    EXPECT_EQ(lines.back(), "ksicache: " + host + ": " + report + ": rows are missing: " + message);
+  };
+  expect("swap.ksi", "vm-stats",
+         {{R"("node":"sched/memClients/swapInfo","keys":[4121],"value":{"isSwapping":1)",
+           R"("node":"sched/memClients/swapInfo","keys":[5121],"value":{"isSwapping":1)"}},
+         11, "0xbad0003 Not found");
+  expect("list.ksi", "group-stats",
+         {{R"("node":"sched/groups/members/groups","keys":[1020])",
+           R"("node":"sched/groups/members/groups","keys":[91020])"}},
+         49, "0xbad0003 Not found");
+  expect("buddy.ksi", "buddy-stats",
+         {{R"("node":"memory/memNodes","keys":[0])", R"("node":"memory/memNodes","keys":[70])"}}, 1,
+         "0xbad0003 Not found");
+}
+
+// A report without rows has a header and a table.
+TEST_F(ExportTest, HasTheColumnsOfAReportWithoutRows) {
+  WriteContent(Path("less.json"), JsonWith(""));
+  Output({"load", Path("less.json"), Path("less.ksi")});
+  const harness::Result result =
+      Run({"export", "heap-stats,pmem-stats", "-o", Path("less.csv"), Path("less.ksi")});
+  EXPECT_EQ(result.status, 1);
+  const std::vector<std::string> lines = Lines(FileContent(Path("less.csv")));
+  ASSERT_EQ(lines.size(), 3u);
+  EXPECT_EQ(lines[0].substr(0, 38), "host,time,report,name,dynGrow,lowerLim");
+  EXPECT_EQ(lines[1], "");
+  EXPECT_EQ(lines[2].substr(0, 36), "host,time,report,uuid,alloc2MBlocks,");
+}
+
+// All moments of a report come before the next report, below one header.
+TEST_F(ExportTest, WritesCsvReportByReport) {
+  const std::vector<Row> rows =
+      Cells(Output({"export", "comp-stats,pshare-stats", kIncident + "@..", kExample}));
+  ASSERT_EQ(rows.size(), 15u);
+  EXPECT_EQ(rows[0][3], "total");
+  for (size_t i = 1; i <= 6; ++i) EXPECT_EQ(rows[i][2], "comp-stats");
+  EXPECT_EQ(rows[7], Row{""});
+  EXPECT_EQ(rows[8][3], "cow");
+  for (size_t i = 9; i <= 14; ++i) EXPECT_EQ(rows[i][2], "pshare-stats");
+  EXPECT_EQ(rows[13][1], "2026-11-21T10:06:00Z");
+  EXPECT_EQ(rows[14][1], "2026-11-21T10:00:00Z");
+}
+
 // Groups that contain each other end the walk; the next report begins anew.
 TEST_F(ExportTest, TellsOfGroupsThatContainEachOther) {
   const std::string host = ExampleWith(

@@ -8,6 +8,7 @@
 
 #include <knvlibs/ksi.h>
 #include <knvlibs/ksi_status.h>
+#include "framework/loss.h"
 #include "knvlibs/cache_format.h"
 #include "knvlibs/recording/recording_file.h"
 #include "knvlibs/recording/when.h"
@@ -130,14 +131,18 @@ void ForEachMoment(const std::string& name, const std::function<void(const Origi
 
 void RunReport(const tally::Report& report, tally::Sink& sink) {
   const tally::ReportOptions options = {.levels = report.frame->defaultLevels};
-  ksi::Status status = report.run(options, sink);
   const std::string name = report.name;
+  static_cast<void>(tally::TakeLoss());
+  const ksi::Status status = report.run(options, sink);
+  const ksi::Status loss = tally::TakeLoss();
   if (status != ksi::kOk) throw DataError(name + ": " + StatusText(status));
-  if (&KSI_SourceWalkStatus != nullptr) status = KSI_SourceWalkStatus(nullptr);
-  if (status != ksi::kOk) {
+  const ksi::Status walk =
+      &KSI_SourceWalkStatus == nullptr ? ksi::kOk : KSI_SourceWalkStatus(nullptr);
+  if (walk != ksi::kOk) {
     KSI_RefreshSource(nullptr);  // the next walk begins anew
-    throw DataError(name + ": groups contain each other, rows are missing: " + StatusText(status));
+    throw DataError(name + ": groups contain each other, rows are missing: " + StatusText(walk));
   }
+  if (loss != ksi::kOk) throw DataError(name + ": rows are missing: " + StatusText(loss));
 }
 
 }  // namespace ksicache

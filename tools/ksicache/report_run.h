@@ -27,7 +27,7 @@ Origin LiveOrigin();
 void ForEachMoment(const std::string& name, const std::function<void(const Origin&)>& visit);
 
 // Runs a report on what the library answers from. Fails with a DataError that starts with the
-// report's name, after the library's diagnostics; the rows before the failure have been given.
+// report's name, after the library's diagnostics, if rows are missing; the others have been given.
 void RunReport(const tally::Report& report, tally::Sink& sink);
 
 }  // namespace ksicache

@@ -101,75 +101,92 @@ std::optional<NewFile> FileOf(const CommandLine& line, const FormatInfo& format)
   return std::make_optional<NewFile>(*name, line.Has(kForce), ModeOf(line));
 }
 
-// Says what is wrong with one file, each thing once however many moments have it.
+// Says what is wrong with files, each thing once however many moments have it.
 class Complaints {
  public:
   // `name`: empty for the host itself.
-  explicit Complaints(const std::string& name) : before_(name.empty() ? "" : name + ": ") {}
+  void BeginFile(const std::string& name) { before_ = name.empty() ? "" : name + ": "; }
 
   void Say(const std::string& text) {
-    if (said_.insert(text).second) PrintError(before_ + text);
+    isEmpty_ = false;
+    if (said_.insert(before_ + text).second) PrintError(before_ + text);
   }
 
-  // What the library has said meanwhile.
+  // What the library has said meanwhile: what it could not read.
   void SayDiagnostics() {
     for (const std::string& text : diagnostics_.TakeKept()) Say(text);
   }
+
+  bool IsEmpty() const { return isEmpty_; }
 
  private:
   std::string before_;
   Diagnostics diagnostics_;
   std::set<std::string> said_;
+  bool isEmpty_ = true;
 };
 
-// Puts reports into a format, for one file after the other.
+// Puts reports into a format, of one file after the other.
 class Exporter {
  public:
-  Exporter(const Reports& reports, RowFormat& format, std::optional<tally::DisplayUnit> unit)
-      : reports_(reports), sink_(format, unit) {}
+  Exporter(const FormatInfo& info, RowFormat& format, std::optional<tally::DisplayUnit> unit)
+      : isByReport_(info.isByReport), format_(format), sink_(format, unit) {}
 
-  void ExportHost() {
-    Complaints complaints("");
-    Export(LiveOrigin(), complaints);
-  }
-
-  void ExportFile(const std::string& name) {
-    Complaints complaints(name);
-    try {
-      ForEachMoment(name, [&](const Origin& origin) { Export(origin, complaints); });
-    } catch (const DataError& error) {
-      isWhole_ = false;
-      complaints.SayDiagnostics();
-      complaints.Say(error.what());
-    }
+  // No files: this host.
+  void Export(std::span<const tally::Report* const> reports, std::span<const std::string> files) {
+    if (!isByReport_) return ExportTogether(reports, files);
+    for (size_t i = 0; i < reports.size(); ++i) ExportTogether(reports.subspan(i, 1), files);
   }
 
   // Whether nothing was left out.
-  bool IsWhole() const { return isWhole_; }
+  bool IsWhole() const { return complaints_.IsEmpty(); }
 
   // Whether there is anything at all, be it only that there are no rows.
-  bool HasBegun() const { return sink_.HasBegun(); }
+  bool HasBegun() const { return hasBegun_; }
 
  private:
-  void Export(const Origin& origin, Complaints& complaints) {
-    for (const tally::Report* report : reports_) {
+  void ExportTogether(std::span<const tally::Report* const> reports,
+                      std::span<const std::string> files) {
+    do {
+      if (files.empty()) ExportMoment(reports, LiveOrigin());
+      for (const std::string& name : files) ExportFile(reports, name);
+    } while (format_.EndReports());
+  }
+
+  void ExportFile(std::span<const tally::Report* const> reports, const std::string& name) {
+    complaints_.BeginFile(name);
+    Saying(
+        [&] { ForEachMoment(name, [&](const Origin& origin) { ExportMoment(reports, origin); }); });
+  }
+
+  void ExportMoment(std::span<const tally::Report* const> reports, const Origin& origin) {
+    for (const tally::Report* report : reports) {
+      hasBegun_ = true;
       sink_.Expect(*report, origin);
-      try {
-        RunReport(*report, sink_);
-        complaints.SayDiagnostics();
-        const std::string lost = sink_.TakeComplaint();
-        if (!lost.empty()) throw DataError(report->name + (": " + lost));
-      } catch (const DataError& error) {
-        isWhole_ = false;
-        complaints.SayDiagnostics();
-        complaints.Say(error.what());
-      }
+      Saying([&] { RunReport(*report, sink_); });
+      const std::string lost = sink_.TakeComplaint();
+      if (!lost.empty()) complaints_.Say(report->name + (": " + lost));
     }
   }
 
-  const Reports& reports_;
+  // Goes on after what cannot be read.
+  template <class Action>
+  void Saying(Action&& action) {
+    std::string error;
+    try {
+      action();
+    } catch (const DataError& caught) {
+      error = caught.what();
+    }
+    complaints_.SayDiagnostics();
+    if (!error.empty()) complaints_.Say(error);
+  }
+
+  bool isByReport_;
+  RowFormat& format_;
   RowSink sink_;
-  bool isWhole_ = true;
+  Complaints complaints_;
+  bool hasBegun_ = false;
 };
 
 int Export(const CommandLine& line) {
@@ -182,9 +199,8 @@ int Export(const CommandLine& line) {
       info.make({.file = file ? &*file : nullptr,
                  .hasManyReports = reports.size() > 1,
                  .hasSpans = std::ranges::any_of(files, IsSpan)});
-  Exporter exporter(reports, *format, unit);
-  if (files.empty()) exporter.ExportHost();
-  for (const std::string& name : files) exporter.ExportFile(name);
+  Exporter exporter(info, *format, unit);
+  exporter.Export(reports, files);
   if (exporter.HasBegun()) format->Finish();
   return exporter.IsWhole() ? 0 : 1;
 }

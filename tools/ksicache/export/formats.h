@@ -20,6 +20,7 @@ struct FormatInfo {
   const char* name;    // the word of --format
   bool isInBaseUnits;  // bytes, whatever -u says
   bool needsFile;      // it is nothing to print
+  bool isByReport;     // a report's rows of all moments stand together
   std::unique_ptr<RowFormat> (*make)(const FormatOptions& options);
 };
 
@@ -30,10 +31,10 @@ std::unique_ptr<RowFormat> MakeOpenMetrics(const FormatOptions& options);
 
 // The first one is taken if none is named.
 inline constexpr FormatInfo kFormats[] = {
-    {"csv", false, false, MakeCsv},
-    {"json", false, false, MakeJson},
-    {"sqlite", false, true, MakeSqlite},
-    {"openmetrics", true, false, MakeOpenMetrics},
+    {"csv", false, false, true, MakeCsv},
+    {"json", false, false, false, MakeJson},
+    {"sqlite", false, true, false, MakeSqlite},
+    {"openmetrics", true, false, true, MakeOpenMetrics},
 };
 
 }  // namespace ksicache

@@ -37,8 +37,8 @@ struct RowTable {
   const Origin* origin;
 };
 
-// Writes rows. What it is given lives until the next call. It fails with an Error or an
-// OutputError.
+// Writes rows. The host and the moment of a table live until the next call, its report and its
+// columns until EndReports. It fails with an Error or an OutputError.
 class RowFormat {
  public:
   virtual ~RowFormat() = default;
@@ -50,6 +50,10 @@ class RowFormat {
 
   // What is wrong with rows that the format has left out since the last call; empty: nothing.
   virtual std::string TakeComplaint() { return {}; }
+
+  // All rows of the reports that were begun since the last call have been given. Whether they are
+  // to be given again, all of them.
+  virtual bool EndReports() { return false; }
 
   // No more rows follow.
   virtual void Finish() = 0;

@@ -1,5 +1,7 @@
 #include "tools/ksicache/export/row_sink.h"
 
+#include <algorithm>
+
 namespace ksicache {
 namespace {
 
@@ -20,22 +22,32 @@ const char* UnitOf(const tally::Figure& figure, DisplayUnit unit) {
   return figure.kind == Kind::percent ? "%" : "";
 }
 
+// Those of the level that it goes down to by itself.
+std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report) {
+  const auto variant = std::ranges::find(report.variants, report.frame->defaultLevels,
+                                         &tally::ReportVariant::levels);
+  return (variant == report.variants.end() ? report.variants.front() : *variant).columns;
+}
+
 }  // namespace
 
-void RowSink::Begin(const tally::Heading& heading) {
-  shown_ = unit_.value_or(heading.unit);
+void RowSink::Expect(const tally::Report& report, const Origin& origin) {
+  if (report_ != &report) TakeColumns(report);
+  report_ = &report;
+  format_.Begin({report_, columns_, &origin});
+}
+
+void RowSink::TakeColumns(const tally::Report& report) {
+  shown_ = unit_.value_or(report.frame->allowBytes ? DisplayUnit::b : DisplayUnit::kb);
   places_.clear();
   columns_.clear();
-  for (size_t i = 0; i < heading.columns.size(); ++i) {
-    const tally::ColumnDesc& desc = heading.columns[i];
-    const tally::Figure& figure = heading.figures[i];
+  for (const auto& [desc, figure] : ColumnsOf(report)) {
     places_.push_back(
         {figure, desc.conversion[0] == 'L', BytesShift(figure.kind), figure.IsShownAsItIs(shown_)});
     columns_.push_back({desc.name, desc.description, figure.kind, figure.isKey, figure.isCounter,
                         UnitOf(figure, shown_)});
   }
   values_.resize(columns_.size());
-  format_.Begin({report_, columns_, origin_});
 }
 
 void RowSink::Row(tally::RowKind kind, std::span<const tally::Cell> cells) {

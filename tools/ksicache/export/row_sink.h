@@ -20,19 +20,13 @@ class RowSink : public tally::Sink {
   RowSink(RowFormat& format, std::optional<tally::DisplayUnit> unit)
       : format_(format), unit_(unit) {}
 
-  // What the next run is of.
-  void Expect(const tally::Report& report, const Origin& origin) {
-    report_ = &report;
-    origin_ = &origin;
-  }
-
-  // Whether there has been anything to give.
-  bool HasBegun() const { return !columns_.empty(); }
+  // What the next run is of. The format begins with its columns, even if no row follows.
+  void Expect(const tally::Report& report, const Origin& origin);
 
   // Of the format.
   std::string TakeComplaint() { return format_.TakeComplaint(); }
 
-  void Begin(const tally::Heading& heading) override;
+  void Begin(const tally::Heading& /*heading*/) override {}
   void Row(tally::RowKind kind, std::span<const tally::Cell> cells) override;
   void Rule() override {}
   void Note(std::string_view /*text*/) override {}
@@ -47,12 +41,12 @@ class RowSink : public tally::Sink {
     bool isAsItIs;       // or that measure is what is shown
   };
 
+  void TakeColumns(const tally::Report& report);
   Value ValueOf(const Place& place, const tally::Cell& cell) const;
 
   RowFormat& format_;
   std::optional<tally::DisplayUnit> unit_;
   const tally::Report* report_ = nullptr;
-  const Origin* origin_ = nullptr;
   tally::DisplayUnit shown_ = tally::DisplayUnit::kb;
   std::vector<Place> places_;
   std::vector<RowColumn> columns_;
