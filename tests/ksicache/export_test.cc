@@ -432,6 +432,28 @@ TEST_F(ExportTest, MakesAFile) {
   EXPECT_EQ(directory_.Names(), std::vector<std::string>{"out.csv"});
 }
 
+// No file is lost because it was taken for the output, by whatever name.
+TEST_F(ExportTest, ReplacesNoneOfItsInputs) {
+  const std::string file = RecordingAt("own.rec", {"2026-11-21T10:00:00Z", "2026-11-21T10:01:00Z"});
+  const std::string content = FileContent(file);
+  ASSERT_EQ(link(file.c_str(), Path("other.rec").c_str()), 0);
+  WriteContent(Path("own.json"), JsonWith(""));
+  const std::string text = FileContent(Path("own.json"));
+  const auto refuse = [&](const std::vector<std::string>& args, const std::string& out) {
+    ExpectFailure(args, out + ": is read, too, and not replaced");
+  };
+  refuse({"export", "pshare-stats", "--force", "-o", file, kExample, file}, file);
+  refuse({"export", "pshare-stats", "--force", "-o", Path("other.rec"), file + "@.."},
+         Path("other.rec"));
+  refuse({"export", "pshare-stats", "--format=sqlite", "--force", "-o", file, file + "@last"},
+         file);
+  refuse({"extract", "--force", file + "@first", file}, file);
+  refuse({"join", "--force", file, kExample, Path("other.rec")}, file);
+  refuse({"load", "--force", Path("own.json"), Path("own.json")}, Path("own.json"));
+  EXPECT_EQ(FileContent(file), content);
+  EXPECT_EQ(FileContent(Path("own.json")), text);
+}
+
 TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
   ExpectFailure({"export"},
                 "not as in:\nUsage: ksicache export REPORT[,REPORT...]|all "

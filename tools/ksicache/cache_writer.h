@@ -74,6 +74,8 @@ class CacheWriter : private CacheWriterFile, public CacheContent {
   CacheWriter(const std::string& fileName, bool replace, mode_t mode = NewFile::kMode)
       : CacheWriterFile{NewFile(fileName, replace, mode)}, CacheContent(file.Name()) {}
 
+  void RefuseInput(const std::string& fileName) const { file.RefuseInput(fileName); }
+
   void Commit(const ksi::CacheFile::Capture& capture) { file.Commit(Finish(capture)); }
 };
 

@@ -162,6 +162,19 @@ void NewFile::CheckTarget() const {
   }
 }
 
+void NewFile::RefuseInput(const std::string& fileName) const {
+  if (standardOutput_) return;
+  struct stat target = {};
+  struct stat input = {};
+  if (fstatat(directory_.Get(), entry_.c_str(), &target, AT_SYMLINK_NOFOLLOW) != 0 ||
+      stat(fileName.c_str(), &input) != 0) {
+    return;
+  }
+  if (target.st_dev == input.st_dev && target.st_ino == input.st_ino) {
+    throw Error(name_ + ": is read, too, and not replaced");
+  }
+}
+
 void NewFile::OpenUnnamed() {
   unnamed_.Reset(openat(directory_.Get(), ".", O_TMPFILE | O_WRONLY | O_CLOEXEC, kMode));
   if (unnamed_) return;

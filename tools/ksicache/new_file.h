@@ -38,6 +38,9 @@ class NewFile {
   // standard output is a terminal.
   NewFile(std::string target, bool replace, mode_t mode);
 
+  // Fails with an Error if the file would stand in the place of this one, which is read.
+  void RefuseInput(const std::string& fileName) const;
+
   // What to call it in a message.
   const std::string& Name() const { return name_; }
 

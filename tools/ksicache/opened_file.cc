@@ -1,6 +1,7 @@
 #include "tools/ksicache/opened_file.h"
 
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
@@ -143,6 +144,10 @@ void OpenedFile::Open(const std::string& name, const ksi::Moment& moment) {
   ksi::Status status = database->OpenBytes(content_);
   if (status == ksi::kOk) status = ksi::CacheFile::Make(std::move(database), &file_, &why);
   if (status != ksi::kOk) Throw(status, name, why);
+}
+
+std::string FileNameOf(const std::string& name) {
+  return access(name.c_str(), F_OK) == 0 ? name : name.substr(0, name.rfind('@'));
 }
 
 bool IsRecording(const std::string& name) {

@@ -41,6 +41,9 @@ class OpenedFile {
   std::optional<int64_t> asked_;
 };
 
+// The file of a name that may ask for some of its moments, "FILE@...".
+std::string FileNameOf(const std::string& name);
+
 // Whether a recording has this name, and no moment is asked for.
 bool IsRecording(const std::string& name);
 

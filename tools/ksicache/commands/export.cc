@@ -16,6 +16,7 @@
 #include "tools/ksicache/export/row_sink.h"
 #include "tools/ksicache/named_span.h"
 #include "tools/ksicache/new_file.h"
+#include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/report_run.h"
 
@@ -195,6 +196,9 @@ int Export(const CommandLine& line) {
   const std::optional<tally::DisplayUnit> unit = UnitOf(line, info);
   std::optional<NewFile> file = FileOf(line, info);
   const std::span<const std::string> files = std::span(line.arguments).subspan(1);
+  for (const std::string& name : files) {
+    if (file) file->RefuseInput(FileNameOf(name));
+  }
   const std::unique_ptr<RowFormat> format =
       info.make({.file = file ? &*file : nullptr,
                  .hasManyReports = reports.size() > 1,

@@ -21,6 +21,7 @@ int Extract(const CommandLine& line) try {
   // The same moment is the same file, however the recording keeps it.
   ksi::SortReadings(moment.readings);
   CacheWriter writer(target, line.Has(kForce), mode);
+  writer.RefuseInput(FileNameOf(line.arguments[0]));
   PutReadings(moment, writer);
   writer.Commit(CaptureOf(moment));
   return 0;

@@ -133,6 +133,7 @@ int Join(const CommandLine& line) {
   CheckOptionsFor(name, line);
   NewFile target(name, line.Has(kForce), ModeOf(line));
   const std::vector<std::string> names(line.arguments.begin() + 1, line.arguments.end());
+  for (const std::string& input : names) target.RefuseInput(FileNameOf(input));
   Inputs inputs(names);
   if (inputs.Places().empty()) throw Error("there are no moments to join");
 

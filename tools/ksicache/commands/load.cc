@@ -197,6 +197,7 @@ int Load(const CommandLine& line) {
                                                              std::fclose);
   if (json == nullptr) throw SystemError(jsonName, errno);
   CacheWriter writer(line.arguments[1], line.Has(kForce), mode);
+  writer.RefuseInput(line.arguments[0]);
   JsonReader reader([&writer](const Json& reading, const JsonEntries& entries) {
     TakeReading(reading, entries, writer);
   });
