@@ -106,7 +106,7 @@ class ReportContext : public ReportContextBase {
   // Puts out a Total row that the kernel counts itself.
   void PrintTotalRow(const Row& row) {
     FillCells(row);
-    PutCells(RowKind::total);
+    PutCells(RowKind::counted);
   }
 
  private:

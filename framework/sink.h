@@ -28,9 +28,10 @@ struct Heading {
 };
 
 enum class RowKind : uint8_t {
-  item,   // one of what the report lists
-  tag,    // the groups of one tag together
-  total,  // all rows; the columns that are not summable have no figure
+  item,     // one of what the report lists
+  tag,      // the groups of one tag together
+  total,    // all rows; the columns that are not summable have no figure
+  counted,  // the same by the kernel's own count
 };
 
 // Takes what a report produces, in the order of its output. What it is given lives until the

@@ -22,7 +22,8 @@ void TextSink::Row(RowKind kind, std::span<const Cell> cells) {
     }
     cells = shown_;
   }
-  PrintRow(table(), csvMode_, kind == RowKind::total, cells);
+  const bool isTotal = kind == RowKind::total || kind == RowKind::counted;
+  PrintRow(table(), csvMode_, isTotal, cells);
 }
 
 void TextSink::Note(std::string_view text) {

@@ -18,7 +18,8 @@ using nlohmann::json;
 constexpr const char* kHints =
     "host,time,type,totAdd,totRemove,active\n"
     "hypervisor.example.org,2026-11-21T10:00:00Z,regular,15325080,15013392,311688\n"
-    "hypervisor.example.org,2026-11-21T10:00:00Z,lpage,3924480,3871232,53248\n";
+    "hypervisor.example.org,2026-11-21T10:00:00Z,lpage,3924480,3871232,53248\n"
+    "hypervisor.example.org,2026-11-21T10:00:00Z,Total,19249560,18884624,364936\n";
 
 TEST_F(ExportTest, WritesCsv) {
   EXPECT_EQ(Output({"export", "pshareHint-stats", kExample}), kHints);
@@ -43,7 +44,8 @@ TEST_F(ExportTest, WritesSeveralReports) {
   EXPECT_EQ(Output({"export", "pshareHint-stats,pshare-stats", kExample}),
             "host,time,report,type,totAdd,totRemove,active\n" + start +
                 "pshareHint-stats,regular,15325080,15013392,311688\n" + start +
-                "pshareHint-stats,lpage,3924480,3871232,53248\n"
+                "pshareHint-stats,lpage,3924480,3871232,53248\n" + start +
+                "pshareHint-stats,Total,19249560,18884624,364936\n"
                 "\n"
                 "host,time,report,cow,cow1,zero,used,reclaimed,totAdd,totRemove\n" +
                 start +
@@ -163,9 +165,9 @@ TEST_F(ExportTest, HasNoValueForWhatIsComputedFromNone) {
   EXPECT_EQ(values("vm-stats", "max"), "null ");
   EXPECT_EQ(values("heap-stats", "used"), "null ");
   EXPECT_EQ(values("heap-stats", "avail"), "676337 ");
-  EXPECT_EQ(values("pshareHint-stats", "totAdd"), "null 3924480 ");
-  EXPECT_EQ(values("pshareHint-stats", "totRemove"), "14960140 3924484 ");
-  EXPECT_EQ(values("pshareHint-stats", "active"), "null null ");
+  EXPECT_EQ(values("pshareHint-stats", "totAdd"), "null 3924480 null ");
+  EXPECT_EQ(values("pshareHint-stats", "totRemove"), "14960140 3924484 18884624 ");
+  EXPECT_EQ(values("pshareHint-stats", "active"), "null null 364936 ");
   EXPECT_EQ(values("comp-stats", "numHigh"), "null ");
   EXPECT_EQ(values("comp-stats", "numClear"), "12 ");
   EXPECT_EQ(values("comp-stats", "memState"), "null ");
@@ -197,6 +199,18 @@ TEST_F(ExportTest, TakesBytesForEveryReport) {
             "3878342656,15513378816,62053515264,46540136448");
 }
 
+// A number that has no room in the unit is none, and said, instead of another one.
+TEST_F(ExportTest, WrapsNoFigure) {
+  const std::string host =
+      ExampleWith("large.ksi", {{R"("cow":4734307)", R"("cow":18446744073709551000)"}});
+  const harness::Result result = Run({"export", "pshare-stats", "-u", "b", "--format=json", host});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err,
+            "ksicache: " + host + ": pshare-stats: cow has a figure that is too large in Bytes\n");
+  EXPECT_EQ(json::parse(result.out)["cow"], nullptr);
+  EXPECT_EQ(Cells(Output({"export", "pshare-stats", "-u", "mb", host}))[1][2], "72057594037927933");
+}
+
 TEST_F(ExportTest, QuotesHostileNames) {
   const std::string longName(4096, 'n');
   const std::string host = ExampleWith(
@@ -205,6 +219,7 @@ TEST_F(ExportTest, QuotesHostileNames) {
                          {R"({"text":"web-02"})", R"({"text":"=1+1"})"},
                          {R"({"text":"web-03"})", R"({"text":" blanks "})"},
                          {R"({"text":"mail"})", R"({"text":""})"},
+                         {R"({"text":"build-linux"})", R"({"text":"a%ff 5% %2"})"},
                          {R"({"text":"gateway"})", R"({"text":"caf\u00e9 \u202e\u001b[2J\\"})"},
                          {R"({"text":"monitoring"})",
                           R"({"text":{"hex":"61ff)" + std::string(2 * 62, '0') + R"("}})"},
@@ -218,8 +233,9 @@ TEST_F(ExportTest, QuotesHostileNames) {
   EXPECT_NE(csv.find("\n" + start + "=1+1,1030,"), std::string::npos);
   EXPECT_NE(csv.find("\n" + start + "\" blanks \",1040,"), std::string::npos);
   EXPECT_NE(csv.find("\n" + start + "\"\",1050,"), std::string::npos);
+  EXPECT_NE(csv.find("\n" + start + "a%25ff 5% %2,"), std::string::npos);
   EXPECT_NE(csv.find("\n" + start + "café \xe2\x80\xae\x1b[2J\\,1110,"), std::string::npos);
-  EXPECT_NE(csv.find("\n" + start + "hex:61ff,1100,"), std::string::npos);
+  EXPECT_NE(csv.find("\n" + start + "a%ff,1100,"), std::string::npos);
 
   std::vector<json> names;
   for (const std::string& line : Lines(Output({"export", "guest-stats", "--format=json", host}))) {
@@ -227,8 +243,8 @@ TEST_F(ExportTest, QuotesHostileNames) {
     EXPECT_EQ(row["host"], "h,\a");
     names.push_back(row["name"]);
   }
-  for (const json& name : std::vector<json>{"a,\"b\"\r\nc", "=1+1", " blanks ", "",
-                                            "café \u202e\x1b[2J\\", json{{"hex", "61ff"}}}) {
+  for (const json& name :
+       std::vector<json>{"a,\"b\"\r\nc", "=1+1", " blanks ", "", "café \u202e\x1b[2J\\", "a%ff"}) {
     EXPECT_EQ(std::ranges::count(names, name), 1) << name;
   }
   EXPECT_NE(Output({"export", "lpool-stats", host}).find("," + longName + ","), std::string::npos);
@@ -309,7 +325,8 @@ TEST_F(ExportTest, GoesOnAfterABrokenFile) {
   EXPECT_EQ(result.out,
             std::string(kHints) +
                 "hypervisor.example.org,2026-11-21T10:05:00Z,regular,15325080,15013392,311688\n"
-                "hypervisor.example.org,2026-11-21T10:05:00Z,lpage,3924480,3871232,53248\n");
+                "hypervisor.example.org,2026-11-21T10:05:00Z,lpage,3924480,3871232,53248\n"
+                "hypervisor.example.org,2026-11-21T10:05:00Z,Total,19249560,18884624,364936\n");
   const std::vector<std::string> lines = Lines(result.err);
   ASSERT_EQ(lines.size(), 3u);
   EXPECT_EQ(lines[0].substr(0, lines[0].rfind(": ")), "ksicache: " + Path("broken.ksi"));
@@ -325,7 +342,7 @@ TEST_F(ExportTest, TellsRowsThatAreMissing) {
   const harness::Result result =
       Run({"export", "pshareHint-stats,pshare-stats", Path("less.ksi"), kExample});
   EXPECT_EQ(result.status, 1);
-  EXPECT_EQ(Lines(result.out).size(), 6u);
+  EXPECT_EQ(Lines(result.out).size(), 7u);
   EXPECT_EQ(result.err,
             "ksicache: " + Path("less.ksi") + ": pshareHint-stats: 0xbad005a Permission denied\n" +
                 "ksicache: " + Path("less.ksi") + ": pshare-stats: 0xbad005a Permission denied\n");
@@ -424,7 +441,7 @@ TEST_F(ExportTest, MakesAFile) {
                     "--format=json", kExample})
                 .size(),
             0u);
-  EXPECT_EQ(Lines(FileContent(out)).size(), 2u);
+  EXPECT_EQ(Lines(FileContent(out)).size(), 3u);
   EXPECT_EQ(Output({"export", "pshareHint-stats", "-o", "-", kExample}), kHints);
   // Of nothing at all there is no file.
   EXPECT_EQ(Run({"export", "pshareHint-stats", "-o", Path("none.csv"), Path("none")}).status, 1);

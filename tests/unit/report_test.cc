@@ -224,7 +224,7 @@ TEST_F(Reporting, PrintsWhatASinkIsGiven) {
       for (size_t i = 0; i < row.cells.size(); ++i) {
         if (i > 0) made += ",";
         const ColumnDesc& column = recording.columns[i];
-        if (row.kind == RowKind::total && column.summable == 0) continue;
+        if (row.kind != RowKind::item && column.summable == 0) continue;
         const RecordedCell& cell = row.cells[i];
         const std::string_view conversion = column.conversion;
         made += conversion == "s" || conversion == "c" ? cell.text

@@ -3,10 +3,8 @@
 // where the report is another one than before, an empty line and the header again.
 //
 // A figure without a value is an empty field; a text that is empty is "", which tells it from that.
-// A text that is not UTF-8 is "hex:" with its bytes.
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/text_output.h"
-#include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 namespace {
@@ -69,7 +67,6 @@ class CsvFormat : public RowFormat {
   }
 
   void PutText(std::string_view text) {
-    if (!IsSimple(text) && !IsUtf8(text)) return output_.Put(HexText(text));
     // Blanks at the ends are part of a field, but not all who read it know.
     const bool isPlain = !text.empty() && text.find_first_of("\",\r\n") == std::string_view::npos &&
                          text.front() != ' ' && text.back() != ' ';

@@ -1,6 +1,5 @@
 // JSON, one object a line: the names of the columns with their values, null for a figure without
-// one. Numbers are written in full, with up to 20 digits. A text that is not UTF-8 is
-// {"hex": "..."}, all of its bytes.
+// one. Numbers are written in full, with up to 20 digits.
 #include <string>
 #include <vector>
 

@@ -8,7 +8,7 @@
 //
 // What counts for ever is a counter, "..._total". Flags are the metric "..._flag", a sample for
 // each one; what else a row says in words and identifiers are the labels of "..._info", which is 1.
-// A figure without a value has no sample. A text that is not UTF-8 is "hex:" with its bytes.
+// A figure without a value has no sample.
 //
 // All samples of a metric stand together, so all that is exported is kept until the end. Only where
 // there is a span of moments samples have their times: what scrapes takes none.
@@ -92,7 +92,7 @@ void PutLabel(std::string_view name, std::string_view value, std::string& labels
   if (IsSimple(value)) {
     labels += value;
   } else {
-    for (const char c : IsUtf8(value) ? std::string(value) : HexText(value)) {
+    for (const char c : value) {
       if (c == '"' || c == '\\') labels += '\\';
       labels += c == '\n' ? "\\n" : std::string(1, c);
     }

@@ -1,6 +1,9 @@
 #include "tools/ksicache/export/row_sink.h"
 
 #include <algorithm>
+#include <utility>
+
+#include "tools/ksicache/export/escaped_text.h"
 
 namespace ksicache {
 namespace {
@@ -8,16 +11,25 @@ namespace {
 using tally::DisplayUnit;
 using tally::Kind;
 
-bool IsMemory(Kind kind) {
-  return kind == Kind::kilobytes || kind == Kind::pages || kind == Kind::bytes;
-}
+// The bits that a number of this measure has more in bytes.
+int BitsOf(Kind kind) { return kind == Kind::kilobytes ? 10 : kind == Kind::pages ? 12 : 0; }
 
-uint8_t BytesShift(Kind kind) {
-  return kind == Kind::kilobytes ? 10 : kind == Kind::pages ? 12 : 0;
+int BitsOf(DisplayUnit unit) {
+  switch (unit) {
+    case DisplayUnit::mb:
+      return 20;
+    case DisplayUnit::kb:
+      return 10;
+    case DisplayUnit::pg:
+      return 12;
+    case DisplayUnit::b:
+      break;
+  }
+  return 0;
 }
 
 const char* UnitOf(const tally::Figure& figure, DisplayUnit unit) {
-  if (IsMemory(figure.kind)) return tally::UnitTitle(unit);
+  if (figure.toUnit != nullptr) return tally::UnitTitle(unit);
   if (figure.kind == Kind::microseconds) return "us";
   return figure.kind == Kind::percent ? "%" : "";
 }
@@ -34,7 +46,9 @@ std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report) {
 void RowSink::Expect(const tally::Report& report, const Origin& origin) {
   if (report_ != &report) TakeColumns(report);
   report_ = &report;
-  format_.Begin({report_, columns_, &origin});
+  origin_ = origin;
+  origin_.host = Escaped(origin.host);
+  format_.Begin({report_, columns_, &origin_});
 }
 
 void RowSink::TakeColumns(const tally::Report& report) {
@@ -42,8 +56,8 @@ void RowSink::TakeColumns(const tally::Report& report) {
   places_.clear();
   columns_.clear();
   for (const auto& [desc, figure] : ColumnsOf(report)) {
-    places_.push_back(
-        {figure, desc.conversion[0] == 'L', BytesShift(figure.kind), figure.IsShownAsItIs(shown_)});
+    const int shift = figure.toUnit == nullptr ? 0 : BitsOf(figure.kind) - BitsOf(shown_);
+    places_.push_back({figure, desc.conversion[0] == 'L', shift});
     columns_.push_back({desc.name, desc.description, figure.kind, figure.isKey, figure.isCounter,
                         UnitOf(figure, shown_)});
   }
@@ -51,27 +65,47 @@ void RowSink::TakeColumns(const tally::Report& report) {
 }
 
 void RowSink::Row(tally::RowKind kind, std::span<const tally::Cell> cells) {
-  if (kind != tally::RowKind::item) return;
-  for (size_t i = 0; i < cells.size(); ++i) values_[i] = ValueOf(places_[i], cells[i]);
+  if (kind != tally::RowKind::item && kind != tally::RowKind::counted) return;
+  escaped_.clear();
+  for (size_t i = 0; i < cells.size(); ++i) values_[i] = ValueOf(i, cells[i]);
   format_.Row(values_);
 }
 
-Value RowSink::ValueOf(const Place& place, const tally::Cell& cell) const {
-  const tally::Figure& figure = place.figure;
+std::string RowSink::TakeComplaint() {
+  std::string own = std::exchange(complaint_, {});
+  std::string ofFormat = format_.TakeComplaint();
+  return own.empty() ? ofFormat : own;
+}
+
+Value RowSink::ValueOf(size_t place, const tally::Cell& cell) {
+  const tally::Figure& figure = places_[place].figure;
   if (figure.IsNone(cell)) return {ValueType::none, 0, {}};
-  if (figure.kind == Kind::text) return {ValueType::text, 0, cell.text()};
+  if (figure.kind == Kind::text) return {ValueType::text, 0, TextOf(cell.text())};
   if (figure.kind == Kind::flag) return {ValueType::flag, cell.number(), cell.text()};
-  uint64_t number = cell.number();
-  if (!place.isAsItIs) {
-    // In bytes nothing is cut, whatever the column's own conversion has room for.
-    number =
-        shown_ == DisplayUnit::b ? number << place.bytesShift : figure.Shown(cell, shown_).number();
-  }
-  if (!place.isWide) {
+  return NumberOf(place, cell.number());
+}
+
+// Nothing is cut or wraps on the way to the unit.
+Value RowSink::NumberOf(size_t place, uint64_t number) {
+  const auto& [figure, isWide, shift] = places_[place];
+  if (!isWide) {
     number = figure.isSigned ? static_cast<uint64_t>(static_cast<int32_t>(number))
                              : static_cast<uint32_t>(number);
   }
-  return {figure.isSigned ? ValueType::signedNumber : ValueType::unsignedNumber, number, {}};
+  const auto type = figure.isSigned ? ValueType::signedNumber : ValueType::unsignedNumber;
+  __extension__ using Wide = __int128;
+  const Wide exact = figure.isSigned ? Wide{static_cast<int64_t>(number)} : Wide{number};
+  const Wide inUnit = shift < 0 ? exact >> -shift : exact << shift;
+  const auto narrow = static_cast<uint64_t>(inUnit);
+  const Wide again = figure.isSigned ? Wide{static_cast<int64_t>(narrow)} : Wide{narrow};
+  if (again == inUnit) return {type, narrow, {}};
+  complaint_ = columns_[place].name +
+               (" has a figure that is too large in " + std::string(columns_[place].unit));
+  return {ValueType::none, 0, {}};
+}
+
+std::string_view RowSink::TextOf(std::string_view text) {
+  return IsPlain(text) ? text : escaped_.emplace_back(Escaped(text));
 }
 
 }  // namespace ksicache

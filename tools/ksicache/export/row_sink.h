@@ -1,7 +1,9 @@
 #ifndef TOOLS_KSICACHE_EXPORT_ROW_SINK_H_
 #define TOOLS_KSICACHE_EXPORT_ROW_SINK_H_
 
+#include <cstddef>
 #include <cstdint>
+#include <deque>
 #include <optional>
 #include <span>
 #include <string>
@@ -12,8 +14,9 @@
 
 namespace ksicache {
 
-// Gives a format the items of a report. Totals and the rows of tags say nothing that their items do
-// not, and are left out; so are rules, notes and descriptions.
+// Gives a format the items of a report, and totals that the kernel counts itself. Other totals and
+// the rows of tags say nothing that the items do not, and are left out; so are rules, notes and
+// descriptions. Texts are as Escaped makes them, so that all of them are UTF-8.
 class RowSink : public tally::Sink {
  public:
   // Memory is in `unit`; none: in that of the report.
@@ -23,8 +26,8 @@ class RowSink : public tally::Sink {
   // What the next run is of. The format begins with its columns, even if no row follows.
   void Expect(const tally::Report& report, const Origin& origin);
 
-  // Of the format.
-  std::string TakeComplaint() { return format_.TakeComplaint(); }
+  // What is wrong with the rows since the last call; empty: nothing.
+  std::string TakeComplaint();
 
   void Begin(const tally::Heading& /*heading*/) override {}
   void Row(tally::RowKind kind, std::span<const tally::Cell> cells) override;
@@ -36,13 +39,14 @@ class RowSink : public tally::Sink {
   // How the cells of a column become values.
   struct Place {
     tally::Figure figure;
-    bool isWide;         // it is shown in 64 bits
-    uint8_t bytesShift;  // from the kernel's measure to bytes
-    bool isAsItIs;       // or that measure is what is shown
+    bool isWide;  // it is shown in 64 bits
+    int shift;    // from the kernel's measure to the unit, to the left
   };
 
   void TakeColumns(const tally::Report& report);
-  Value ValueOf(const Place& place, const tally::Cell& cell) const;
+  Value ValueOf(size_t place, const tally::Cell& cell);
+  Value NumberOf(size_t place, uint64_t number);
+  std::string_view TextOf(std::string_view text);
 
   RowFormat& format_;
   std::optional<tally::DisplayUnit> unit_;
@@ -51,6 +55,9 @@ class RowSink : public tally::Sink {
   std::vector<Place> places_;
   std::vector<RowColumn> columns_;
   std::vector<Value> values_;
+  Origin origin_;                    // with its host escaped
+  std::deque<std::string> escaped_;  // texts of the row at hand
+  std::string complaint_;
 };
 
 }  // namespace ksicache

@@ -2,7 +2,7 @@
 // time and the columns of the report; and the table "columns", which says what these are.
 //
 // Numbers are integers; one beyond their 63 bits is a real number, which is less exact and not
-// another one. A figure without a value is NULL, a flag 0 or 1, a text that is not UTF-8 a blob.
+// another one. A figure without a value is NULL, a flag 0 or 1.
 #include <algorithm>
 #include <bit>
 #include <map>
@@ -11,7 +11,6 @@
 #include "knvlibs/sqlite.h"
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/memory_database.h"
-#include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 namespace {
@@ -99,8 +98,7 @@ class SqliteFormat : public RowFormat {
   int CodeOfBind(int parameter, const Value& value) {
     switch (value.type) {
       case ValueType::text:
-        return IsUtf8(value.text) ? insert_->Bind(parameter, value.text)
-                                  : insert_->Bind(parameter, std::as_bytes(std::span(value.text)));
+        return insert_->Bind(parameter, value.text);
       case ValueType::unsignedNumber:
         if (std::bit_width(value.number) > 63) {
           return insert_->Bind(parameter, static_cast<double>(value.number));

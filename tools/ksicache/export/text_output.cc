@@ -7,7 +7,6 @@
 
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/output.h"
-#include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 
@@ -41,10 +40,6 @@ void TextOutput::Finish() {
 bool IsSimple(std::string_view text) {
   return std::ranges::all_of(text,
                              [](char c) { return c >= ' ' && c <= '~' && c != '"' && c != '\\'; });
-}
-
-std::string HexText(std::string_view text) {
-  return "hex:" + ToHex(std::as_bytes(std::span(text)));
 }
 
 }  // namespace ksicache

@@ -61,9 +61,6 @@ class TextOutput {
 // Whether a text can stand as it is wherever printable ASCII but `"` and `\` can.
 bool IsSimple(std::string_view text);
 
-// The text that stands for one that is not UTF-8: "hex:" and its bytes.
-std::string HexText(std::string_view text);
-
 }  // namespace ksicache
 
 #endif  // TOOLS_KSICACHE_EXPORT_TEXT_OUTPUT_H_
