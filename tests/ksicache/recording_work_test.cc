@@ -136,6 +136,32 @@ TEST_F(RecordingWork, ManyReadingsThatChangeInManyPartsAreDamage) {
   ExpectEnds({"extract", file_, Path("out.ksi")}, "", "ksicache: " + file_ + ": damaged\n");
 }
 
+// Each moment has all readings: as many as moments times readings, in a few KB.
+TEST_F(RecordingWork, JoinEndsByTheSizeOfTheFile) {
+#ifdef TALLY_SANITIZED
+  GTEST_SKIP() << "sanitizers take more than ten times as long to come to the bound";
+#endif
+  std::vector<MomentReading> readings = Zeros(20'000);
+  MomentFacts facts;
+  ChunkWriter writer(Host());
+  for (int64_t i = 0; i < 4096; ++i) {
+    facts.taken = kStart + i * kSecond;
+    writer.Add(facts, readings);
+  }
+  const Bytes part = writer.PartFrom(0);
+  const Bytes empty = RecordingStore::Empty("h", 1);
+  WriteContent(file_, {reinterpret_cast<const char*>(empty.data()), empty.size()});
+  RecordingStore(file_, kUnbounded)
+      .Add({0, 4096, 0, 0, kStart, kStart + 4095 * kSecond, 0, 0}, part);
+  ExpectBounded([this] {
+    const harness::Result result = Run({"join", Path("out.rec"), file_});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_NE(result.err.find(": damaged: its moments hold more than a file of its size does: "),
+              std::string::npos)
+        << result.err;
+  });
+}
+
 TEST_F(RecordingWork, AChunkHasABoundOfMoments) {
   const auto [start, more] = PartsWithZeros(10);
   AddChunks(1, start);

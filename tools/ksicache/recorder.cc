@@ -23,7 +23,7 @@ ksi::Bytes PartOf(const ksi::ChunkWriter& chunk, size_t first) {
 
 }  // namespace
 
-Recorder::Recorder(RecordingStore& store) : store_(store) {
+Recorder::Recorder(RecordingStore& store, Singles singles) : store_(store), singles_(singles) {
   if (!store.Parts().empty()) next_ = store.Parts().back().End();
 }
 
@@ -41,7 +41,9 @@ void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
   const size_t place = chunk->Count();
   chunk->Add(facts, readings);
   const ksi::Bytes content = PartOf(*chunk, place);
-  store_.Add({0, 1, next_, chunkNumber_, facts.taken, facts.taken, 0, 0}, content);
+  if (singles_ == Singles::kWritten) {
+    store_.Add({0, 1, next_, chunkNumber_, facts.taken, facts.taken, 0, 0}, content);
+  }
   ++next_;
   bytes_ += content.size();
   chunk_ = std::move(chunk);
@@ -51,6 +53,7 @@ void Recorder::Begin(const ksi::HostIdentity& host) {
   try {
     Pack();
   } catch (const Error&) {
+    if (singles_ == Singles::kLeftOut) throw;
     // It stays as it is, and a moment is worth more.
   }
   chunk_ = std::make_unique<ksi::ChunkWriter>(host);
@@ -66,11 +69,19 @@ void Recorder::Tidy() {
 }
 
 void Recorder::Pack() {
-  if (chunk_ == nullptr || chunk_->Count() - packed_ < 2) return;
+  const bool hasSingles = singles_ == Singles::kWritten;
+  if (chunk_ == nullptr || chunk_->Count() - packed_ < (hasSingles ? 2u : 1u)) return;
   const auto count = static_cast<int64_t>(chunk_->Count() - packed_);
-  store_.Replace({0, count, chunkNumber_ + static_cast<int64_t>(packed_), chunkNumber_,
-                  chunk_->At(packed_).taken, chunk_->Last().taken, 0, 0},
-                 PartOf(*chunk_, packed_));
+  const RecordingStore::Part part = {0,
+                                     count,
+                                     chunkNumber_ + static_cast<int64_t>(packed_),
+                                     chunkNumber_,
+                                     chunk_->At(packed_).taken,
+                                     chunk_->Last().taken,
+                                     0,
+                                     0};
+  const ksi::Bytes content = PartOf(*chunk_, packed_);
+  hasSingles ? store_.Replace(part, content) : store_.Add(part, content);
   packed_ = chunk_->Count();
   bytes_ = 0;
 }

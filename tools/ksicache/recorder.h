@@ -24,8 +24,12 @@ class Recorder {
   static constexpr size_t kPartMoments = 40;
   static constexpr size_t kChunkMoments = 240;
 
+  // Whether a moment is written before it is packed together with others; without, what ends the
+  // process takes some more of them.
+  enum class Singles { kWritten, kLeftOut };
+
   // Goes on where the recording ends.
-  explicit Recorder(RecordingStore& store);
+  explicit Recorder(RecordingStore& store, Singles singles = Singles::kWritten);
 
   // Adds a moment, whose readings are in the order of SortReadings. Fails with an Error: then it is
   // not there, and a later one may be.
@@ -46,6 +50,7 @@ class Recorder {
   void Begin(const ksi::HostIdentity& host);
 
   RecordingStore& store_;
+  Singles singles_;
   std::unique_ptr<ksi::ChunkWriter> chunk_;  // none: the next moment starts one
   int64_t chunkNumber_ = 0;                  // of its first moment
   int64_t next_ = 0;                         // the number of the next moment

@@ -23,8 +23,7 @@ using ksi::cache::kBlockSize;
 
 constexpr size_t kPieceSize = kBlockSize - kBlockHead;
 
-// By so many rows the tables grow; those of parts are for a week at first.
-constexpr size_t kMoreBlocks = 64;
+// By so many rows the table of parts grows; the first are for a week.
 constexpr size_t kFirstParts = 2304;
 constexpr size_t kMoreParts = 256;
 
@@ -78,7 +77,7 @@ void RunInMemory(sqlite3* database, const std::string& sql) {
 
 }  // namespace
 
-ksi::Bytes RecordingStore::Empty(const std::string& host) {
+ksi::Bytes RecordingStore::Empty(const std::string& host, size_t blocks) {
   sqlite3* handle = nullptr;
   const int code =
       sqlite3_open_v2("recording", &handle, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, "memdb");
@@ -101,7 +100,7 @@ ksi::Bytes RecordingStore::Empty(const std::string& host) {
     throw std::bad_alloc();
   }
   insert = {};
-  if (!AddRows(handle, kAddBlock, kMoreBlocks)) throw std::bad_alloc();
+  if (!AddRows(handle, kAddBlock, blocks)) throw std::bad_alloc();
   RunInMemory(handle, "COMMIT");
   sqlite3_int64 size = 0;
   const auto* content = reinterpret_cast<const std::byte*>(
@@ -351,7 +350,7 @@ std::vector<int64_t> RecordingStore::TakeBlocks(size_t count) {
   while (blocks_.size() < count) {
     const size_t wanting = count - blocks_.size();
     if (Room() >= wanting) {
-      Grow(std::min(Room(), std::max(wanting, kMoreBlocks)));
+      Grow(std::min(Room(), std::max(wanting, moreBlocks_)));
     } else if (HasOldChunk()) {
       RemoveFirstChunk();
     } else {

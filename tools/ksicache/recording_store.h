@@ -28,8 +28,11 @@ class RecordingStore {
   // The smallest bound of a file's size that leaves room for moments.
   static constexpr int64_t kSmallestFile = int64_t{4} << 20;
 
-  // The content of an empty recording of `host`.
-  static ksi::Bytes Empty(const std::string& host);
+  // By so many blocks a recording grows at least.
+  static constexpr size_t kMoreBlocks = 64;
+
+  // The content of an empty recording of `host`, with room in so many blocks.
+  static ksi::Bytes Empty(const std::string& host, size_t blocks = kMoreBlocks);
 
   // Opens a recording to write it, alone: fails if somebody else does, with his process. Its file
   // grows to `maxSize` bytes and no further.
@@ -39,6 +42,9 @@ class RecordingStore {
 
   // The rows in use, by the number of their first moment.
   const std::vector<Part>& Parts() const { return parts_; }
+
+  // Grows by no fewer blocks than these from now on.
+  void GrowBy(size_t blocks) { moreBlocks_ = blocks; }
 
   // Adds a part; its id, size and block are chosen here. Old parts make room, from the first on.
   void Add(Part part, ksi::ByteView content);
@@ -86,6 +92,7 @@ class RecordingStore {
 
   std::string name_;
   int64_t maxSize_;
+  size_t moreBlocks_ = kMoreBlocks;
   Descriptor file_;
   std::unique_ptr<PageFile> pages_;
   ksi::Database database_;  // none after a failure: what it knows is not what stands there

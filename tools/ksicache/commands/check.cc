@@ -13,6 +13,7 @@
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/group_tree.h"
+#include "tools/ksicache/moment_work.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/progress.h"
@@ -208,20 +209,6 @@ class Checker {
   size_t problems_ = 0;
 };
 
-// What looking into a recording may take, as bytes: what is the same in many moments takes no room
-// in its file, so a small one may hold more than anybody waits for. A host on which nothing happens
-// comes to some hundred for a byte.
-uint64_t MostWorkOn(uint64_t fileSize) { return (uint64_t{16} << 20) + 512 * fileSize; }
-
-uint64_t WorkOn(const ksi::Moment& moment) {
-  constexpr uint64_t kEach = 256;  // that a reading, or an entry, is like
-  uint64_t work = 0;
-  for (const ksi::MomentReading& reading : moment.readings) {
-    work += kEach * (1 + reading.answer.entries.size()) + reading.answer.record.size();
-  }
-  return work;
-}
-
 // Whether a part has left the file meanwhile, to make room for others.
 bool HasLeft(const std::string& fileName, const ksi::RecordingFile::Part& part) {
   const std::unique_ptr<ksi::RecordingFile> now = OpenRecording(fileName);
@@ -236,14 +223,13 @@ bool CheckRecording(const std::string& fileName) {
   const std::vector<ksi::RecordingFile::Part>& parts = recording->Parts();
   Progress progress("checking");
   size_t problems = 0;
-  uint64_t work = 0;
+  MomentWork work(*recording, 1);
   ksi::ChunkReader reader;
   int64_t at = ksi::RecordingFile::kNoMoment;
   for (size_t i = 0; i < parts.size(); ++i) {
     progress.Show(i, parts.size());
-    constexpr uint64_t kTakenFast = 4;
-    if (work + recording->Taken() / kTakenFast > MostWorkOn(recording->Size())) {
-      PrintLine(fileName + ": damaged: its moments hold more than a file of its size does");
+    if (work.IsTooMuch()) {
+      PrintLine(fileName + ": damaged: " + MomentWork::kTooMuch);
       return false;
     }
     const std::string name = fileName + "@" + ksi::TextOfTime(parts[i].last);
@@ -258,7 +244,7 @@ bool CheckRecording(const std::string& fileName) {
       ++problems;
       continue;
     }
-    work += WorkOn(moment);
+    work.Add(moment);
     try {
       const OpenedFile opened(name, moment);
       problems += Checker(name, opened.File()).Run();

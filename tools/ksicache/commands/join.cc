@@ -2,18 +2,18 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <limits>
 #include <memory>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
-#include "tools/ksicache/moment_builder.h"
+#include "tools/ksicache/join_inputs.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/progress.h"
@@ -23,92 +23,6 @@ namespace ksicache {
 namespace {
 
 constexpr const Option* kOptions[] = {&kForce, &kMode};
-
-// A moment of one of the files.
-struct Place {
-  int64_t taken;
-  size_t file;
-  int64_t number;  // in a recording
-};
-
-// One of the files.
-struct Input {
-  std::unique_ptr<ksi::RecordingFile> recording;  // null for a capture
-  ksi::ChunkReader reader;
-  int64_t at = ksi::RecordingFile::kNoMoment;  // the moment that the reader has
-
-  void Read(int64_t number, ksi::Moment& moment) {
-    const int64_t before = std::exchange(at, number);
-    if (recording->ReadWhole(number, reader, moment, before) != ksi::kOk) {
-      throw DataError("damaged: " + recording->Why());
-    }
-  }
-};
-
-// The files to join, by the order in which they were given.
-class Inputs {
- public:
-  explicit Inputs(const std::vector<std::string>& names) : names_(names) {
-    for (size_t i = 0; i < names.size(); ++i) Named(i, [&] { Add(i); });
-    std::ranges::stable_sort(places_, {}, &Place::taken);
-  }
-
-  // All moments, the earliest first.
-  const std::vector<Place>& Places() const { return places_; }
-
-  ksi::Moment Read(const Place& place) {
-    ksi::Moment moment;
-    Named(place.file, [&] {
-      Input& input = inputs_[place.file];
-      if (input.recording == nullptr) {
-        moment = MomentOf(OpenedFile(names_[place.file]).File());
-      } else {
-        input.Read(place.number, moment);
-      }
-      if (host_.empty()) host_ = moment.host.name;
-      if (moment.host.name != host_) {
-        throw DataError("is of the host " + moment.host.name + ", not of " + host_);
-      }
-    });
-    ksi::SortReadings(moment.readings);
-    return moment;
-  }
-
- private:
-  // What goes wrong is said with the file's name.
-  template <class Action>
-  void Named(size_t file, Action&& action) const {
-    try {
-      action();
-    } catch (const DataError& error) {
-      throw Error(names_[file] + ": " + error.what());
-    }
-  }
-
-  void Add(size_t file) {
-    const std::string& name = names_[file];
-    Input& input = inputs_.emplace_back();
-    if (!IsRecording(name)) {
-      places_.push_back({TakenOf(OpenedFile(name).File()), file, 0});
-      return;
-    }
-    input.recording = OpenRecording(name);
-    for (const ksi::RecordingFile::Part& part : input.recording->Parts()) {
-      std::vector<ksi::MomentFacts> facts;
-      if (input.recording->ReadFacts(part, facts) != ksi::kOk) {
-        throw DataError("damaged: " + input.recording->Why());
-      }
-      for (size_t i = 0; i < facts.size(); ++i) {
-        places_.push_back({facts[i].taken, file, part.number + static_cast<int64_t>(i)});
-      }
-    }
-  }
-
-  const std::vector<std::string>& names_;
-  std::vector<Input> inputs_;
-  std::vector<Place> places_;
-  std::string host_;
-};
 
 // Whether two files have the same moment.
 bool IsSame(const ksi::Moment& a, const ksi::Moment& b) {
@@ -134,12 +48,12 @@ int Join(const CommandLine& line) {
   NewFile target(name, line.Has(kForce), ModeOf(line));
   const std::vector<std::string> names(line.arguments.begin() + 1, line.arguments.end());
   for (const std::string& input : names) target.RefuseInput(FileNameOf(input));
-  Inputs inputs(names);
-  if (inputs.Places().empty()) throw Error("there are no moments to join");
+  JoinInputs inputs(names);
+  std::optional<ksi::Moment> moment = inputs.Take();
+  if (!moment) throw Error("there are no moments to join");
 
   const TemporaryFile file(std::tmpfile(), std::fclose);
-  ksi::Moment moment = inputs.Read(inputs.Places().front());
-  const ksi::Bytes empty = RecordingStore::Empty(moment.host.name);
+  const ksi::Bytes empty = RecordingStore::Empty(moment->host.name, 1);
   if (file == nullptr || std::fwrite(empty.data(), 1, empty.size(), file.get()) != empty.size() ||
       std::fflush(file.get()) != 0) {
     throw SystemError("a temporary file", errno);
@@ -147,21 +61,21 @@ int Join(const CommandLine& line) {
   {
     RecordingStore store("a temporary file", dup(fileno(file.get())),
                          std::numeric_limits<int64_t>::max());
-    Recorder recorder(store);
+    store.GrowBy(1);
+    Recorder recorder(store, Recorder::Singles::kLeftOut);
     Progress progress("joining");
-    recorder.Add(moment.host, moment.facts, moment.readings);
-    for (size_t i = 1; i < inputs.Places().size(); ++i) {
-      progress.Show(i, inputs.Places().size());
-      ksi::Moment next = inputs.Read(inputs.Places()[i]);
-      if (IsSame(next, moment)) continue;
-      moment = std::move(next);
-      recorder.Add(moment.host, moment.facts, moment.readings);
+    ksi::Moment last;
+    for (size_t i = 0; moment; moment = inputs.Take()) {
+      progress.Show(i++, inputs.Count());
+      if (i > 1 && IsSame(*moment, last)) continue;
+      last = *std::move(moment);
+      recorder.Add(last.host, last.facts, last.readings);
       recorder.Tidy();
     }
     recorder.Pack();
   }
   Commit(file.get(), target);
-  return 0;
+  return inputs.IsDamaged() ? 1 : 0;
 }
 
 }  // namespace
@@ -171,8 +85,9 @@ const Command kJoin = {
     .arguments = "OUT IN...",
     .summary = "make a recording of captures and recordings of one host",
     .help = R"(Makes OUT, a recording, of captures and recordings of one host, by the times at
-which their moments were taken; "-" is standard output. What several of them
-have is there once.
+which their moments were taken; "-" is standard output. Those of a recording
+stay in their order, wherever the clock was set. What several of them have is
+there once, and what is damaged is said and left out.
 )",
     .options = kOptions,
     .fewest = 2,
