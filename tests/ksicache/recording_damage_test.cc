@@ -259,6 +259,20 @@ TEST_F(RecordingNames, AFileThatHasTheWholeNameWins) {
   EXPECT_NE(Output({"dump", name}), Output({"dump", name + "@first"}));
 }
 
+TEST_F(RecordingNames, LinksAreReadAndNotWritten) {
+  const std::string link = Path("link");
+  std::filesystem::create_symlink("r.ksi", link);
+  EXPECT_EQ(Output({"dump", link}), Output({"dump", file_}));
+  EXPECT_EQ(Output({"moments", link}), Output({"moments", file_}));
+  EXPECT_EQ(Output({"dump", link + "@first"}), Output({"dump", file_ + "@first"}));
+  Output({"extract", link + "@first", Path("first.ksi")});
+  Output({"join", Path("joined.ksi"), link, Path("first.ksi")});
+  const std::string before = FileContent(file_);
+  ExpectFailure({"record", "--count", "1", link},
+                link + ": is a symbolic link: record to its target");
+  EXPECT_TRUE(FileContent(file_) == before);
+}
+
 TEST_F(RecordingNames, ErrorsNameTheSpan) {
   const std::string early = file_ + "@2026-11-21T09:59:59Z";
   const std::string span = "moments are of 2026-11-21T10:00:00Z to 2026-11-21T10:00:10Z";

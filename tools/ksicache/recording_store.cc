@@ -116,6 +116,8 @@ RecordingStore::RecordingStore(const std::string& fileName, int64_t maxSize)
 
 RecordingStore::RecordingStore(std::string name, int file, int64_t maxSize)
     : name_(std::move(name)), maxSize_(maxSize), file_(file) {
+  // Whoever may put a link where a recorder writes would choose the file.
+  if (!file_ && errno == ELOOP) throw Error(name_ + ": is a symbolic link: record to its target");
   if (!file_) throw SystemError(name_, errno);
   struct stat info = {};
   if (fstat(file_.Get(), &info) != 0) throw SystemError(name_, errno);
