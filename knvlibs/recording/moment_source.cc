@@ -12,6 +12,10 @@ namespace {
 
 constexpr Key kAbsent{KeyKind::kText, 0, {}};
 
+// A host on which nothing happens takes a hundred bytes a moment, and all reports on it ask some
+// ten thousand times.
+uint64_t MostAnswers(uint64_t fileSize) { return (uint64_t{1} << 17) + 160 * fileSize; }
+
 }  // namespace
 
 MomentSource::MomentSource(std::string fileName, std::unique_ptr<RecordingFile> recording,
@@ -33,6 +37,7 @@ Status MomentSource::Damaged(const Node& node) {
 
 // The reading of a node's value or list; one that failed fails again.
 Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, NodeReader::View& view) {
+  ++answers_;
   const size_t place = places_.Of(node, kind);
   if (place == NodePlaces::kNowhere) return KSI_STATUS_NOT_FOUND;
   const NodeReader* readings = nullptr;
@@ -43,6 +48,13 @@ Status MomentSource::Find(const Node& node, Kind kind, const Keys& keys, NodeRea
 }
 
 Status MomentSource::NextMoment() {
+  if (isExhausted_) return KSI_STATUS_NOT_FOUND;
+  if (answers_ > MostAnswers(recording_->Size())) {
+    isExhausted_ = true;
+    Warning("%s: damaged: its moments hold more than a file of its size does\n",
+            Printable(fileName_).c_str());
+    return KSI_STATUS_METADATA_READ_ERROR;
+  }
   const Status status = recording_->ReadNext(number_, moment_);
   if (status != kOk && status != KSI_STATUS_NOT_FOUND) {
     Warning("%s: %s\n", Printable(fileName_).c_str(), Printable(recording_->Why()).c_str());
@@ -67,6 +79,7 @@ Status MomentSource::Instances(const Node& node, const Keys& keys, ParamList& in
   Status status = walk_.Begin(node, keys);
   if (status == kOk) status = Find(node, Kind::kList, keys, view);
   if (status != kOk) return status;
+  answers_ += view.entries.size();
   const size_t before = instances.Count();
   for (const Key& entry : view.entries) {
     if (entry.kind != KindOf(node.entries)) return Damaged(node);

@@ -27,6 +27,8 @@ class MomentSource : public Source {
   std::optional<Origin> GetOrigin() const override {
     return Origin{moment_.Host().name, moment_.Facts().taken};
   }
+  // What is the same in many moments takes no room in its file: after more answers than a file of
+  // its size has there are no moments any more, which is told.
   [[nodiscard]] Status NextMoment() override;
   void Refresh() override { walk_.Restart(); }
   [[nodiscard]] Status WalkStatus() const override { return walk_.WalkStatus(); }
@@ -44,6 +46,8 @@ class MomentSource : public Source {
   ChunkReader moment_;
   ListWalk walk_;
   bool told_ = false;
+  uint64_t answers_ = 0;  // and entries of lists, of all moments so far
+  bool isExhausted_ = false;
   NodePlaces places_;
 };
 

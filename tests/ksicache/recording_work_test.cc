@@ -70,6 +70,20 @@ class RecordingWork : public RecordingTest {
     }
   }
 
+  // A small file of so many moments that are all the same.
+  void RecordAlike(const std::vector<MomentReading>& readings, int64_t count) const {
+    MomentFacts facts;
+    ChunkWriter writer(Host());
+    for (int64_t i = 0; i < count; ++i) {
+      facts.taken = kStart + i * kSecond;
+      writer.Add(facts, readings);
+    }
+    const Bytes empty = RecordingStore::Empty("h", 1);
+    WriteContent(file_, {reinterpret_cast<const char*>(empty.data()), empty.size()});
+    RecordingStore(file_, kUnbounded)
+        .Add({0, count, 0, 0, kStart, facts.taken, 0, 0}, writer.PartFrom(0));
+  }
+
   // The program where neither much memory nor much time is to be had.
   static void ExpectEnds(const std::vector<std::string>& args, const std::string& out,
                          const std::string& err) {
@@ -141,24 +155,34 @@ TEST_F(RecordingWork, JoinEndsByTheSizeOfTheFile) {
 #ifdef TALLY_SANITIZED
   GTEST_SKIP() << "sanitizers take more than ten times as long to come to the bound";
 #endif
-  std::vector<MomentReading> readings = Zeros(20'000);
-  MomentFacts facts;
-  ChunkWriter writer(Host());
-  for (int64_t i = 0; i < 4096; ++i) {
-    facts.taken = kStart + i * kSecond;
-    writer.Add(facts, readings);
-  }
-  const Bytes part = writer.PartFrom(0);
-  const Bytes empty = RecordingStore::Empty("h", 1);
-  WriteContent(file_, {reinterpret_cast<const char*>(empty.data()), empty.size()});
-  RecordingStore(file_, kUnbounded)
-      .Add({0, 4096, 0, 0, kStart, kStart + 4095 * kSecond, 0, 0}, part);
+  RecordAlike(Zeros(20'000), 4096);
   ExpectBounded([this] {
     const harness::Result result = Run({"join", Path("out.rec"), file_});
     EXPECT_EQ(result.status, 1);
     EXPECT_NE(result.err.find(": damaged: its moments hold more than a file of its size does: "),
               std::string::npos)
         << result.err;
+  });
+}
+
+TEST_F(RecordingWork, ExportEndsByTheSizeOfTheFile) {
+#ifdef TALLY_SANITIZED
+  GTEST_SKIP() << "sanitizers take more than ten times as long to come to the bound";
+#endif
+  // A group with so many below it that each moment takes a while.
+  MomentReading groups;
+  const auto node =
+      std::ranges::find(RecordedNodes(), "sched/groups/members/groups", &RecordedNode::path);
+  groups.question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
+  groups.question.keys[0].emplace<int64_t>(0);
+  for (int64_t group = 1; group <= 20'000; ++group) groups.answer.entries.emplace_back(group);
+  RecordAlike({groups}, 4096);
+  ExpectBounded([this] {
+    const harness::Result result = Run({"export", "group-stats", file_ + "@.."});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_NE(result.err.find(": damaged: its moments hold more than a file of its size does\n"),
+              std::string::npos)
+        << result.err.substr(0, 4096);
   });
 }
 
