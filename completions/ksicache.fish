@@ -149,6 +149,6 @@ complete -c ksicache -n '__ksicache_command record' -l count -x -d 'End after so
 complete -c ksicache -n '__ksicache_command moments' -l remarks -d 'List only moments with something to remark'
 complete -c ksicache -n '__ksicache_command moments' -l summary -d 'Sum the moments up instead'
 complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'
-complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics' -d 'Write in this format'
+complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics prometheus' -d 'Write in this format'
 complete -c ksicache -n '__ksicache_command export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
 complete -c ksicache -n '__ksicache_command export' -s o -l output -r -F -d 'Make a file'

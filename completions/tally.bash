@@ -350,7 +350,7 @@ declare -gA _ksicache_values=(
   [--every]='1s 5s 10s 30s 1m'
   [--keep]='1d 7d 30d'
   [--max-size]='500M 1G 2G'
-  [--format]='csv json sqlite openmetrics'
+  [--format]='csv json sqlite openmetrics prometheus'
   [--unit]='mb kb pg b'
 )
 

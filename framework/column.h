@@ -17,6 +17,7 @@
 #include <concepts>
 #include <cstdint>
 #include <iterator>
+#include <span>
 #include <string_view>
 #include <type_traits>
 
@@ -63,9 +64,10 @@ struct Figure {
   uint8_t bits;   // of the record's number; 0 for a text
   bool isSigned;  // the number is printed with a sign
   InTotal inTotal;
-  Conversion toUnit;       // null for what is shown as it is
-  bool isKey = false;      // tells, with the other keys, what the row is of
-  bool isCounter = false;  // only grows, as long as what it counts is there
+  Conversion toUnit;                         // null for what is shown as it is
+  bool isKey = false;                        // tells, with the other keys, what the row is of
+  bool isCounter = false;                    // only grows, as long as what it counts is there
+  std::span<const char* const> states = {};  // all that a text may be; none: anything
 
   constexpr bool IsNumber() const { return kind != Kind::text && kind != Kind::flag; }
 
@@ -148,6 +150,13 @@ struct Column : ColumnInfo {
   constexpr Column Key() const {
     Column column = *this;
     column.figure.isKey = true;
+    return column;
+  }
+
+  // One of a few words, which live as long as the table.
+  constexpr Column States(std::span<const char* const> states) const {
+    Column column = *this;
+    column.figure.states = states;
     return column;
   }
 
@@ -340,10 +349,12 @@ constexpr bool CanBeTotal(const Figure& figure) {
   return (figure.inTotal == kLabel) == (figure.kind == Kind::text);
 }
 
-// Whether what the column counts can be counted, and what it tells apart can be told.
+// Whether what the column counts can be counted, what it tells apart can be told, and its words are
+// words.
 constexpr bool CanBeMarked(const Figure& figure) {
   const bool isName = figure.kind == Kind::text || figure.kind == Kind::id;
-  return (!figure.isKey || isName) && (!figure.isCounter || (figure.IsNumber() && !isName));
+  return (!figure.isKey || isName) && (!figure.isCounter || (figure.IsNumber() && !isName)) &&
+         (figure.states.empty() || figure.kind == Kind::text);
 }
 
 }  // namespace column_internal

@@ -95,7 +95,8 @@ constexpr Column<CompRow> kColumns[] = {
            return Computed<const char*>{kMemStateTitles[std::min(state.value, kMemStates)],
                                         state.isKnown};
          })
-        .Wide(7),
+        .Wide(7)
+        .States(kMemStateTitles),
 };
 static_assert(IsSound(kColumns));
 

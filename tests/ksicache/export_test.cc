@@ -484,7 +484,9 @@ TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
                 "guest-stats, zip-stats, lpage-stats, asyncremap-stats and pmem-stats, or all",
                 2);
   ExpectFailure({"export", "all", "--format=xml"},
-                "there is no format xml: there are csv, json, sqlite and openmetrics", 2);
+                "there is no format xml: there are csv, json, sqlite, openmetrics and "
+                "prometheus",
+                2);
   ExpectFailure({"export", "all", "-u", "gb"}, "--unit is mb, kb, pg or b", 2);
   ExpectFailure({"export", "all", "--force"}, "--force is for a file, not standard output", 2);
   ExpectFailure({"export", "all", "-o", "-", "--mode=0644"},

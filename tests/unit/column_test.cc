@@ -85,6 +85,11 @@ static_assert(Sound(Flag("flag", "", kFlag).As("s")));
 static_assert(!Sound(Text("text", "", kText).Total(kSum)));
 static_assert(!Sound(Count("times", "", kTimes).Total(kLabel)));
 
+// Words of a number.
+constexpr const char* kWords[] = {"good", "bad"};
+static_assert(Sound(Text("text", "", kText).States(kWords)));
+static_assert(!Sound(Count("times", "", kTimes).States(kWords)));
+
 // A text is the row's own, not one that is gone when the column has it.
 template <class Read>
 constexpr bool kCanBeText = requires(Read read) {

@@ -23,7 +23,7 @@
 namespace ksicache {
 namespace {
 
-constexpr Option kFormat = {"format", "FORMAT", "write json, sqlite or openmetrics instead of csv"};
+constexpr Option kFormat = {"format", "FORMAT", "json, sqlite, openmetrics or prometheus, not csv"};
 constexpr Option kUnit = {"unit", "UNIT", "show memory in mb, kb, pg (4 KB pages) or b", 'u'};
 constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
 constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kForce, &kMode};
@@ -73,7 +73,7 @@ const FormatInfo& FormatOf(const CommandLine& line) {
   for (const FormatInfo& format : kFormats) {
     if (*name == format.name) return format;
   }
-  throw UsageError("there is no format " + *name + ": there are csv, json, sqlite and openmetrics");
+  throw UsageError("there is no format " + *name + ": there are csv, json, sqlite, openmetrics and prometheus");
 }
 
 // None: that of each report.

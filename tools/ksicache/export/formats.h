@@ -28,6 +28,7 @@ std::unique_ptr<RowFormat> MakeCsv(const FormatOptions& options);
 std::unique_ptr<RowFormat> MakeJson(const FormatOptions& options);
 std::unique_ptr<RowFormat> MakeSqlite(const FormatOptions& options);  // REQUIRES: a file
 std::unique_ptr<RowFormat> MakeOpenMetrics(const FormatOptions& options);
+std::unique_ptr<RowFormat> MakePrometheus(const FormatOptions& options);
 
 // The first one is taken if none is named.
 inline constexpr FormatInfo kFormats[] = {
@@ -35,6 +36,7 @@ inline constexpr FormatInfo kFormats[] = {
     {"json", false, false, false, MakeJson},
     {"sqlite", false, true, false, MakeSqlite},
     {"openmetrics", true, false, true, MakeOpenMetrics},
+    {"prometheus", true, false, true, MakePrometheus},
 };
 
 }  // namespace ksicache

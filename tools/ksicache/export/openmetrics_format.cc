@@ -1,279 +1,308 @@
-// Metrics, in what OpenMetrics and the text format of Prometheus have in common, so that either
-// reads them: a metric for each figure of each report, in bytes, seconds and ratios, called after
-// both, with the host and the keys of the row as labels.
+// Metrics (export/metric_families.h), as OpenMetrics has them or as the text format of Prometheus:
 //
-//   # HELP tally_vm_consumed_bytes Host physical memory consumed by guest
 //   # TYPE tally_vm_consumed_bytes gauge
+//   # UNIT tally_vm_consumed_bytes bytes
+//   # HELP tally_vm_consumed_bytes Host physical memory consumed by guest
 //   tally_vm_consumed_bytes{host="a17",name="web-01",sched_grp="1020"} 6368371712
 //
-// What counts for ever is a counter, "..._total". Flags are the metric "..._flag", a sample for
-// each one; what else a row says in words and identifiers are the labels of "..._info", which is 1.
-// A figure without a value has no sample.
+// The text format knows no units, no state sets and no infos, and has counters under the names of
+// their samples; the samples are the same in both. A figure without a value has none.
 //
-// All samples of a metric stand together, so all that is exported is kept until the end. Only where
-// there is a span of moments samples have their times: what scrapes takes none.
-#include <map>
+// The samples of a family stand together, and in it those of the same labels, by their times. So a
+// report's rows are kept until there are no more. Where they would take too much memory, half of
+// the families are left for another reading of the same rows.
+//
+// Only where there is a span of moments samples have their times: what scrapes takes none.
+#include <algorithm>
+#include <charconv>
 #include <string>
-#include <unordered_set>
-#include <utility>
+#include <string_view>
 #include <vector>
 
 #include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/formats.h"
-#include "tools/ksicache/export/metric_name.h"
+#include "tools/ksicache/export/metric_families.h"
+#include "tools/ksicache/export/metric_rows.h"
 #include "tools/ksicache/export/text_output.h"
-#include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 namespace {
 
-using tally::Kind;
+enum class Dialect : uint8_t { openMetrics, text };
 
-// What a column is among metrics.
-enum class Role : uint8_t { label, info, flag, figure };
+using Rows = std::span<const uint32_t>;
 
-Role RoleOf(const RowColumn& column) {
-  if (column.isKey) return Role::label;
-  if (column.kind == Kind::text || column.kind == Kind::id) return Role::info;
-  return column.kind == Kind::flag ? Role::flag : Role::figure;
-}
-
-const char* UnitSuffix(Kind kind) {
-  switch (kind) {
-    case Kind::kilobytes:
-    case Kind::pages:
-    case Kind::bytes:
-      return "_bytes";
-    case Kind::microseconds:
-      return "_seconds";
-    case Kind::percent:
-      return "_ratio";
-    default:
-      return "";
+// Appends a text as the value of a label.
+void PutLabelText(std::string_view text, std::string& to) {
+  if (IsSimple(text)) {
+    to += text;
+    return;
+  }
+  for (const char c : text) {
+    if (c == '"' || c == '\\') to += '\\';
+    to += c == '\n' ? "\\n" : std::string_view(&c, 1);
   }
 }
 
-// Only counters end in "_total".
-std::string FigureName(const RowColumn& column) {
-  constexpr std::string_view kTotal = "_total";
-  std::string name = SnakeCase(column.name) + UnitSuffix(column.kind);
-  if (column.isCounter) return name + std::string(kTotal);
-  if (name.ends_with(kTotal)) name.replace(name.size() - kTotal.size(), kTotal.size(), "_all");
-  return name;
-}
-
-// How many decimals the base unit has that the kernel's own has not.
-int DecimalsOf(Kind kind) { return kind == Kind::microseconds ? 6 : kind == Kind::percent ? 2 : 0; }
-
-std::string Trimmed(std::string_view text) {
-  return std::string(text.substr(0, text.find_last_not_of(' ') + 1));
-}
-
-// The number with so many decimals, "0.07" of 7 with 2.
-std::string Scaled(const Value& value, int decimals) {
+// Appends a number with so many decimals, "0.07" of 7 with 2.
+void PutScaled(const Value& value, int decimals, std::string& to) {
   const bool isNegative =
       value.type == ValueType::signedNumber && static_cast<int64_t>(value.number) < 0;
-  std::string digits = std::to_string(isNegative ? 0 - value.number : value.number);
-  if (decimals != 0) {
-    const auto places = static_cast<size_t>(decimals);
-    if (digits.size() <= places) digits.insert(0, places + 1 - digits.size(), '0');
-    digits.insert(digits.size() - places, ".");
-    digits.erase(digits.find_last_not_of('0') + 1);
-    if (digits.back() == '.') digits.pop_back();
+  char digits[20];
+  const auto [end, error] = std::to_chars(std::begin(digits), std::end(digits),
+                                          isNegative ? 0 - value.number : value.number);
+  std::string_view text(digits, static_cast<size_t>(end - digits));
+  if (isNegative) to += '-';
+  if (decimals == 0) {
+    to += text;
+    return;
   }
-  return isNegative ? "-" + digits : digits;
+  const auto places = static_cast<size_t>(decimals);
+  std::string padded(text.size() > places ? 0 : places + 1 - text.size(), '0');
+  padded += text;
+  padded.insert(padded.size() - places, ".");
+  padded.erase(padded.find_last_not_of('0') + 1);
+  if (padded.back() == '.') padded.pop_back();
+  to += padded;
 }
 
-void PutLabel(std::string_view name, std::string_view value, std::string& labels) {
-  if (labels.back() != '{') labels += ',';
+void PutLabel(std::string_view name, const Value& value, std::string& labels) {
+  if (!labels.ends_with('{')) labels += ',';
   labels += name;
   labels += "=\"";
-  if (IsSimple(value)) {
-    labels += value;
-  } else {
-    for (const char c : value) {
-      if (c == '"' || c == '\\') labels += '\\';
-      labels += c == '\n' ? "\\n" : std::string(1, c);
-    }
+  if (value.type == ValueType::text) {
+    PutLabelText(value.text, labels);
+  } else if (value.type != ValueType::none) {
+    PutScaled(value, 0, labels);
   }
   labels += '"';
 }
 
-void PutLabel(std::string_view name, const Value& value, std::string& labels) {
-  switch (value.type) {
-    case ValueType::text:
-      return PutLabel(name, value.text, labels);
-    case ValueType::none:
-      return PutLabel(name, "", labels);
-    default:
-      return PutLabel(name, Scaled(value, 0), labels);
-  }
-}
-
-// A metric and its samples so far.
-struct Metric {
-  std::string name;
-  std::string help;
-  const char* type;
-  std::string samples;
-};
-
 class OpenMetricsFormat : public RowFormat {
  public:
-  explicit OpenMetricsFormat(const FormatOptions& options)
-      : output_(options.file), hasTimes_(options.hasSpans) {}
+  OpenMetricsFormat(const FormatOptions& options, Dialect dialect)
+      : output_(options.file), dialect_(dialect), hasTimes_(options.hasSpans) {}
 
   void Begin(const RowTable& table) override {
-    const auto [found, isNew] = families_.try_emplace(table.report);
-    family_ = &found->second;
-    if (isNew) {
-      MakeFamily(table, *family_);
-      order_.push_back(family_);
-    }
+    if (table.report != report_) BeginReport(table);
     host_ = "{";
-    PutLabel("host", table.origin->host, host_);
-    ending_ = hasTimes_ ? " " + std::to_string(table.origin->taken / ksi::kSecond) + "\n" : "\n";
+    PutLabel("host", {ValueType::text, 0, table.origin->host}, host_);
+    const int64_t taken = table.origin->taken;
+    if (!rows_.BeginMoment(table.origin->host, hasTimes_ ? taken : 0, taken)) {
+      complaint_ = "there is another moment of " + table.origin->host +
+                   (hasTimes_ ? " at " + table.origin->time : "") + ": metrics have the later one";
+    }
   }
 
   void Row(std::span<const Value> values) override {
-    std::string labels = host_;
-    for (size_t i = 0; i < values.size(); ++i) {
-      const Place& place = family_->places[i];
-      if (place.role == Role::label) PutLabel(place.name, values[i], labels);
-    }
-    if (!family_->rows.insert(labels + ending_).second) {
-      complaint_ = "there are two rows of " + labels + "}, of which metrics have one";
-      return;
-    }
-    std::string info = labels;
-    for (size_t i = 0; i < values.size(); ++i)
-      PutValue(family_->places[i], values[i], labels, info);
-    if (family_->hasInfo) AddSample(family_->info, info, "1");
+    std::string& labels = labels_;
+    labels = host_;
+    for (const size_t key : metrics_.keys) PutLabel(metrics_.names[key], values[key], labels);
+    rows_.Add(labels, values);
+    if (rows_.Size() > kMostBytes) LeaveFamilies();
   }
 
   std::string TakeComplaint() override { return std::exchange(complaint_, {}); }
 
+  bool EndReports() override {
+    order_ = rows_.Order();
+    for (size_t i = first_; i < end_; ++i) PutFamily(metrics_.families[i]);
+    first_ = end_;
+    const bool isDone = first_ == metrics_.families.size();
+    if (isDone) report_ = nullptr;
+    if (!isDone) BeginFamilies();
+    return !isDone;
+  }
+
   void Finish() override {
-    for (Family* family : order_) {
-      for (const Place& place : family->places) PutMetric(place.metric);
-      PutMetric(family->flag);
-      PutMetric(family->info);
-    }
-    output_.Put("# EOF\n");
+    if (dialect_ == Dialect::openMetrics) output_.Put("# EOF\n");
     output_.Finish();
   }
 
  private:
-  struct Place {
-    Role role;
-    std::string name;  // of a label
-    int decimals;
-    Metric metric;  // of a figure
-  };
+  static constexpr size_t kMostBytes = size_t{192} << 20;
 
-  // The metrics of a report.
-  struct Family {
-    std::vector<Place> places;  // one for each column
-    Metric flag;
-    Metric info;
-    bool hasInfo = false;
-    std::unordered_set<std::string> rows;  // their labels
-  };
-
-  static void MakeFamily(const RowTable& table, Family& family) {
-    constexpr std::string_view kStats = "-stats";
-    std::string_view report = table.report->name;
-    if (report.ends_with(kStats)) report.remove_suffix(kStats.size());
-    const std::string start = "tally_" + SnakeCase(report) + "_";
-    family.flag = {start + "flag", "", "gauge", ""};
-    family.info = {start + "info", "", "gauge", ""};
-    for (const RowColumn& column : table.columns) AddPlace(column, start, family);
+  void BeginReport(const RowTable& table) {
+    report_ = table.report;
+    columns_.assign(table.columns.begin(), table.columns.end());
+    metrics_ = MetricsOf(report_->name, columns_);
+    first_ = 0;
+    BeginFamilies();
   }
 
-  static void AddPlace(const RowColumn& column, const std::string& start, Family& family) {
-    const Role role = RoleOf(column);
-    const std::string name = SnakeCase(column.name);
-    const std::string help = Trimmed(column.description);
-    Place& place = family.places.emplace_back(Place{role, name, DecimalsOf(column.kind), {}});
-    const auto explain = [&](Metric& metric, const std::string& label) {
-      metric.help += (metric.help.empty() ? "" : "; ") + label + ": " + help;
-    };
-    switch (role) {
-      case Role::label:
-        break;
-      case Role::info:
-        family.hasInfo = true;
-        explain(family.info, name);
-        break;
-      case Role::flag:
-        place.name = column.name;
-        explain(family.flag, column.name);
-        break;
-      case Role::figure:
-        place.metric = {start + FigureName(column), help, column.isCounter ? "counter" : "gauge",
-                        ""};
-        break;
+  // Takes rows for all families that have not been put out.
+  void BeginFamilies() {
+    end_ = metrics_.families.size();
+    rows_.Clear(columns_.size());
+    DropOthers();
+  }
+
+  // Keeps no columns but those of the families to put out.
+  void DropOthers() {
+    std::vector<bool> isUsed(columns_.size());
+    for (size_t i = first_; i < end_; ++i) {
+      for (const size_t column : metrics_.families[i].columns) isUsed[column] = true;
+    }
+    for (size_t i = 0; i < isUsed.size(); ++i) {
+      if (!isUsed[i]) rows_.Drop(i);
     }
   }
 
-  void PutValue(Place& place, const Value& value, const std::string& labels, std::string& info) {
-    switch (place.role) {
-      case Role::label:
-        break;
-      case Role::info:
-        PutLabel(place.name, value, info);
-        break;
-      case Role::flag: {
-        if (value.type == ValueType::none) break;
-        std::string flag = labels;
-        PutLabel("flag", place.name, flag);
-        AddSample(family_->flag, flag, value.number != 0 ? "1" : "0");
-        break;
+  void LeaveFamilies() {
+    if (end_ - first_ == 1) {
+      throw Error("metrics of too many rows for the memory: export a shorter time, or less often");
+    }
+    end_ = first_ + (end_ - first_) / 2;
+    DropOthers();
+  }
+
+  void PutFamily(const MetricFamily& family) {
+    hasHead_ = false;
+    start_ = family.name + SuffixOf(family.type);
+    for (size_t begin = 0; begin < order_.size();) {
+      size_t end = begin + 1;
+      const auto series = rows_.At(order_[begin]).series;
+      while (end < order_.size() && rows_.At(order_[end]).series == series) ++end;
+      PutSeries(family, Rows(order_).subspan(begin, end - begin));
+      begin = end;
+    }
+  }
+
+  // The samples of one series.
+  void PutSeries(const MetricFamily& family, Rows rows) {
+    const std::string_view labels = rows_.LabelsOf(rows.front());
+    switch (family.type) {
+      case MetricType::gauge:
+      case MetricType::counter:
+        return PutFigure(family, labels, rows);
+      case MetricType::flags:
+        return PutFlags(family, labels, rows);
+      case MetricType::states:
+        return PutStates(family, labels, rows);
+      case MetricType::info:
+        return PutInfo(family, labels, rows);
+    }
+  }
+
+  void PutFigure(const MetricFamily& family, std::string_view labels, Rows rows) {
+    const size_t column = family.columns.front();
+    const int decimals = DecimalsOf(columns_[column]);
+    for (const uint32_t row : rows) {
+      const Value value = rows_.ValueOf(column, row);
+      if (value.type == ValueType::none) continue;
+      number_.clear();
+      PutScaled(value, decimals, number_);
+      PutSample(family, labels, "", number_, row);
+    }
+  }
+
+  void PutFlags(const MetricFamily& family, std::string_view labels, Rows rows) {
+    for (const size_t column : family.columns) {
+      const std::string flag = std::string(",flag=\"") + columns_[column].name + '"';
+      for (const uint32_t row : rows) {
+        const Value value = rows_.ValueOf(column, row);
+        if (value.type == ValueType::none) continue;
+        PutSample(family, labels, flag, value.number != 0 ? "1" : "0", row);
       }
-      case Role::figure:
-        if (value.type == ValueType::none) break;
-        AddSample(place.metric, labels, Scaled(value, place.decimals));
-        break;
     }
   }
 
-  void AddSample(Metric& metric, const std::string& labels, std::string_view value) {
-    const size_t before = metric.samples.size();
-    metric.samples += metric.name;
-    metric.samples += labels;
-    metric.samples += "} ";
-    metric.samples += value;
-    metric.samples += ending_;
-    size_ += metric.samples.size() - before;
-    if (size_ > TextOutput::kLargestFile) {
-      throw Error("metrics of more than 1 GiB: export a shorter time, or fewer hosts");
+  void PutStates(const MetricFamily& family, std::string_view labels, Rows rows) {
+    const size_t column = family.columns.front();
+    for (const uint32_t row : rows) {
+      const Value value = rows_.ValueOf(column, row);
+      if (value.type == ValueType::none) continue;
+      for (const char* state : columns_[column].states) {
+        const std::string label = "," + family.name + "=\"" + state + '"';
+        PutSample(family, labels, label, value.text == state ? "1" : "0", row);
+      }
     }
   }
 
-  void PutMetric(const Metric& metric) {
-    if (metric.samples.empty()) return;
-    output_.Put("# HELP " + metric.name + ' ' + metric.help + "\n# TYPE " + metric.name + ' ' +
-                metric.type + '\n');
-    output_.Put(metric.samples);
+  // Those of the same words stand together.
+  void PutInfo(const MetricFamily& family, std::string_view labels, Rows rows) {
+    std::vector<std::pair<std::string, uint32_t>> infos;
+    for (const uint32_t row : rows) {
+      std::string words;
+      for (const size_t column : family.columns) {
+        PutLabel(metrics_.names[column], rows_.ValueOf(column, row), words);
+      }
+      infos.emplace_back(std::move(words), row);
+    }
+    std::ranges::stable_sort(infos, {}, &std::pair<std::string, uint32_t>::first);
+    for (const auto& [words, row] : infos) PutSample(family, labels, words, "1", row);
+  }
+
+  void PutSample(const MetricFamily& family, std::string_view labels, std::string_view more,
+                 std::string_view number, uint32_t row) {
+    if (!hasHead_) PutHead(family);
+    hasHead_ = true;
+    output_.Put(start_);
+    output_.Put(labels);
+    output_.Put(more);
+    output_.Put("} ");
+    output_.Put(number);
+    if (hasTimes_) PutTime(rows_.TakenOf(row));
+    output_.Put('\n');
     output_.EndRow();
   }
 
+  // OpenMetrics has seconds, the text format milliseconds.
+  void PutTime(int64_t taken) {
+    const bool isText = dialect_ == Dialect::text;
+    number_ = " ";
+    PutScaled({ValueType::signedNumber, static_cast<uint64_t>(isText ? taken / 1000 : taken), {}},
+              isText ? 0 : 6, number_);
+    output_.Put(number_);
+  }
+
+  void PutHead(const MetricFamily& family) {
+    const bool isText = dialect_ == Dialect::text;
+    const std::string name = isText ? start_ : family.name;
+    output_.Put("# TYPE " + name + ' ' + TypeOf(family.type, isText) + '\n');
+    if (!isText && !family.unit.empty()) {
+      output_.Put("# UNIT " + name + ' ' + family.unit + '\n');
+    }
+    output_.Put("# HELP " + name + ' ' + family.help + '\n');
+  }
+
+  static const char* TypeOf(MetricType type, bool isText) {
+    if (type == MetricType::counter) return "counter";
+    if (type == MetricType::states && !isText) return "stateset";
+    return type == MetricType::info && !isText ? "info" : "gauge";
+  }
+
   TextOutput output_;
+  Dialect dialect_;
   bool hasTimes_;
-  std::map<const tally::Report*, Family> families_;
-  std::vector<Family*> order_;
-  Family* family_ = nullptr;  // of the table that was begun last
-  std::string host_;          // its labels before those of the row
-  std::string ending_;        // of its samples
-  size_t size_ = 0;
+
+  // The report at hand.
+  const tally::Report* report_ = nullptr;
+  std::vector<RowColumn> columns_;
+  ReportMetrics metrics_;
+  size_t first_ = 0;  // of the families to put out of these rows
+  size_t end_ = 0;
+  MetricRows rows_;
+  std::string host_;  // of the moment at hand, as its label
+  std::string labels_;
   std::string complaint_;
+
+  // The family at hand.
+  std::vector<uint32_t> order_;
+  std::string start_;  // of its samples
+  bool hasHead_ = false;
+  std::string number_;
 };
 
 }  // namespace
 
 std::unique_ptr<RowFormat> MakeOpenMetrics(const FormatOptions& options) {
-  return std::make_unique<OpenMetricsFormat>(options);
+  return std::make_unique<OpenMetricsFormat>(options, Dialect::openMetrics);
+}
+
+std::unique_ptr<RowFormat> MakePrometheus(const FormatOptions& options) {
+  return std::make_unique<OpenMetricsFormat>(options, Dialect::text);
 }
 
 }  // namespace ksicache

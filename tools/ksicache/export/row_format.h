@@ -19,7 +19,8 @@ struct RowColumn {
   tally::Kind kind;
   bool isKey;
   bool isCounter;
-  const char* unit;  // that its numbers are in; empty: they have none
+  const char* unit;                     // that its numbers are in; empty: they have none
+  std::span<const char* const> states;  // all that its texts may be; none: anything
 };
 
 enum class ValueType : uint8_t { none, text, flag, signedNumber, unsignedNumber };

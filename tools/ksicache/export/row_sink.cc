@@ -59,7 +59,7 @@ void RowSink::TakeColumns(const tally::Report& report) {
     const int shift = figure.toUnit == nullptr ? 0 : BitsOf(figure.kind) - BitsOf(shown_);
     places_.push_back({figure, desc.conversion[0] == 'L', shift});
     columns_.push_back({desc.name, desc.description, figure.kind, figure.isKey, figure.isCounter,
-                        UnitOf(figure, shown_)});
+                        UnitOf(figure, shown_), figure.states});
   }
   values_.resize(columns_.size());
 }

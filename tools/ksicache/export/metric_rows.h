@@ -1,0 +1,83 @@
+// The rows of a report on many moments, column by column, in as little memory as they take.
+#ifndef TOOLS_KSICACHE_EXPORT_METRIC_ROWS_H_
+#define TOOLS_KSICACHE_EXPORT_METRIC_ROWS_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <map>
+#include <span>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+#include "tools/ksicache/export/row_format.h"
+
+namespace ksicache {
+
+class MetricRows {
+ public:
+  // One row: what it is of, and the moment.
+  struct Row {
+    uint32_t series;
+    uint32_t moment;
+  };
+
+  // Forgets all, to take rows of so many columns.
+  void Clear(size_t columns);
+
+  // Rows of a moment follow. False if there is another one of that host and time, which counts no
+  // more if `isLater`, and else instead of this one.
+  bool BeginMoment(const std::string& host, int64_t time, int64_t taken);
+
+  // A row of the moment that was begun last, told apart from others by its labels. Labels that the
+  // moment has already get one more.
+  void Add(std::string& labels, std::span<const Value> values);
+
+  // Keeps the values of a column no more, nor those to come.
+  void Drop(size_t column);
+
+  // About the bytes that all this takes.
+  size_t Size() const;
+
+  // All rows that count, those of a series together, by their times.
+  std::vector<uint32_t> Order() const;
+
+  const Row& At(uint32_t row) const { return rows_[row]; }
+  size_t Count() const { return rows_.size(); }
+  int64_t TakenOf(uint32_t row) const { return moments_[rows_[row].moment].taken; }
+  std::string_view LabelsOf(uint32_t row) const { return *labels_[rows_[row].series]; }
+  Value ValueOf(size_t column, uint32_t row) const;
+
+ private:
+  struct Moment {
+    std::string host;
+    int64_t taken;
+    bool counts;
+  };
+
+  // The numbers of a column, or of its texts; they have one type.
+  struct Column {
+    ValueType type = ValueType::none;
+    bool isKept = true;
+    std::vector<uint64_t> numbers;
+    std::vector<bool> known;
+  };
+
+  uint64_t NumberOf(const Value& value);
+
+  std::vector<Column> columns_;
+  std::vector<Row> rows_;
+  std::vector<Moment> moments_;
+  std::map<std::pair<std::string, int64_t>, uint32_t> momentOf_;
+  std::unordered_map<std::string, uint32_t> seriesOf_;
+  std::vector<const std::string*> labels_;  // of the series
+  std::vector<uint32_t> seenIn_;            // the moment, counted from 1, that had the series last
+  std::unordered_map<std::string, uint64_t> textOf_;
+  std::vector<const std::string*> texts_;
+  size_t textSize_ = 0;
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_EXPORT_METRIC_ROWS_H_
