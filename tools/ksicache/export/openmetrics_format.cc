@@ -107,6 +107,7 @@ class OpenMetricsFormat : public RowFormat {
 
   bool EndReports() override {
     order_ = rows_.Order();
+    times_.clear();
     for (size_t i = first_; i < end_; ++i) PutFamily(metrics_.families[i]);
     first_ = end_;
     const bool isDone = first_ == metrics_.families.size();
@@ -191,7 +192,7 @@ class OpenMetricsFormat : public RowFormat {
     for (const uint32_t row : rows) {
       const Value value = rows_.ValueOf(column, row);
       if (value.type == ValueType::none) continue;
-      number_.clear();
+      number_.clear();  // its memory is used again
       PutScaled(value, decimals, number_);
       PutSample(family, labels, "", number_, row);
     }
@@ -238,23 +239,22 @@ class OpenMetricsFormat : public RowFormat {
                  std::string_view number, uint32_t row) {
     if (!hasHead_) PutHead(family);
     hasHead_ = true;
-    output_.Put(start_);
-    output_.Put(labels);
-    output_.Put(more);
-    output_.Put("} ");
-    output_.Put(number);
-    if (hasTimes_) PutTime(rows_.TakenOf(row));
-    output_.Put('\n');
+    output_.PutAll({start_, labels, more, "} ", number, hasTimes_ ? TimeOf(row) : "", "\n"});
     output_.EndRow();
   }
 
   // OpenMetrics has seconds, the text format milliseconds.
-  void PutTime(int64_t taken) {
-    const bool isText = dialect_ == Dialect::text;
-    number_ = " ";
-    PutScaled({ValueType::signedNumber, static_cast<uint64_t>(isText ? taken / 1000 : taken), {}},
-              isText ? 0 : 6, number_);
-    output_.Put(number_);
+  std::string_view TimeOf(uint32_t row) {
+    const uint32_t moment = rows_.At(row).moment;
+    if (times_.size() <= moment) times_.resize(moment + size_t{1});
+    std::string& time = times_[moment];
+    if (time.empty()) {
+      const bool isText = dialect_ == Dialect::text;
+      const int64_t taken = isText ? rows_.TakenOf(row) / 1000 : rows_.TakenOf(row);
+      time = ' ';
+      PutScaled({ValueType::signedNumber, static_cast<uint64_t>(taken), {}}, isText ? 0 : 6, time);
+    }
+    return time;
   }
 
   void PutHead(const MetricFamily& family) {
@@ -290,7 +290,8 @@ class OpenMetricsFormat : public RowFormat {
 
   // The family at hand.
   std::vector<uint32_t> order_;
-  std::string start_;  // of its samples
+  std::vector<std::string> times_;  // of the moments, as far as they were needed
+  std::string start_;               // of its samples
   bool hasHead_ = false;
   std::string number_;
 };

@@ -4,6 +4,7 @@
 #include <charconv>
 #include <cstddef>
 #include <cstdint>
+#include <initializer_list>
 #include <string>
 #include <string_view>
 
@@ -24,6 +25,13 @@ class TextOutput {
 
   void Put(char c) { text_ += c; }
   void Put(std::string_view text) { text_ += text; }
+  // In one piece.
+  void PutAll(std::initializer_list<std::string_view> texts) {
+    size_t size = text_.size();
+    for (const std::string_view text : texts) size += text.size();
+    if (size > text_.capacity()) text_.reserve(2 * size);
+    for (const std::string_view text : texts) text_ += text;
+  }
   // REQUIRES: the value is a number.
   void PutNumber(const Value& value) {
     value.type == ValueType::signedNumber ? PutInteger(static_cast<int64_t>(value.number))
