@@ -8,6 +8,7 @@
 //   column REPORT LEVEL NAME MARKS DESCRIPTION
 //          MARKS are "-" and letters: u in the display unit, f always shown, b blank in the Total
 //          row
+//   metric REPORT NAME TYPE   as samples are called; TYPE as OpenMetrics has it
 //   node   PATH
 
 #include <algorithm>
@@ -15,10 +16,13 @@
 #include <cstdio>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "frontend/usage.h"
 #include "knvlibs/catalogue.h"
 #include "reports/reports.h"
+#include "tools/ksicache/export/metric_families.h"
+#include "tools/ksicache/export/row_sink.h"
 
 namespace {
 
@@ -60,6 +64,32 @@ void PrintColumn(const Report& report, uint32_t levels, const ColumnInfo& column
               marks.c_str(), static_cast<int>(description.size()), description.data());
 }
 
+const char* TypeOf(ksicache::MetricType type) {
+  switch (type) {
+    case ksicache::MetricType::counter:
+      return "counter";
+    case ksicache::MetricType::states:
+      return "stateset";
+    case ksicache::MetricType::info:
+      return "info";
+    case ksicache::MetricType::gauge:
+    case ksicache::MetricType::flags:
+      break;
+  }
+  return "gauge";
+}
+
+void PrintMetrics(const Report& report) {
+  std::vector<ksicache::RowColumn> columns;
+  for (const ColumnInfo& column : ksicache::ColumnsOf(report)) {
+    columns.push_back(ksicache::RowColumnOf(column, tally::DisplayUnit::b));
+  }
+  for (const ksicache::MetricFamily& family : ksicache::MetricsOf(report.name, columns).families) {
+    std::printf("metric\t%s\t%s%s\t%s\n", report.name, family.name.c_str(),
+                ksicache::SuffixOf(family.type), TypeOf(family.type));
+  }
+}
+
 void PrintReport(const tally::ReportUsage& usage) {
   const Report* const report = tally::FindReport(usage.name);
   if (report == nullptr) return;
@@ -75,6 +105,7 @@ void PrintReport(const tally::ReportUsage& usage) {
   for (const tally::ReportVariant& variant : report->variants) {
     for (const ColumnInfo& column : variant.columns) PrintColumn(*report, variant.levels, column);
   }
+  PrintMetrics(*report);
 }
 
 }  // namespace

@@ -34,14 +34,19 @@ const char* UnitOf(const tally::Figure& figure, DisplayUnit unit) {
   return figure.kind == Kind::percent ? "%" : "";
 }
 
-// Those of the level that it goes down to by itself.
+}  // namespace
+
 std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report) {
   const auto variant = std::ranges::find(report.variants, report.frame->defaultLevels,
                                          &tally::ReportVariant::levels);
   return (variant == report.variants.end() ? report.variants.front() : *variant).columns;
 }
 
-}  // namespace
+RowColumn RowColumnOf(const tally::ColumnInfo& column, DisplayUnit unit) {
+  const auto& [desc, figure] = column;
+  return {desc.name,        desc.description,     figure.kind,  figure.isKey,
+          figure.isCounter, UnitOf(figure, unit), figure.states};
+}
 
 void RowSink::Expect(const tally::Report& report, const Origin& origin) {
   if (report_ != &report) TakeColumns(report);
@@ -55,11 +60,11 @@ void RowSink::TakeColumns(const tally::Report& report) {
   shown_ = unit_.value_or(report.frame->allowBytes ? DisplayUnit::b : DisplayUnit::kb);
   places_.clear();
   columns_.clear();
-  for (const auto& [desc, figure] : ColumnsOf(report)) {
+  for (const tally::ColumnInfo& column : ColumnsOf(report)) {
+    const auto& [desc, figure] = column;
     const int shift = figure.toUnit == nullptr ? 0 : BitsOf(figure.kind) - BitsOf(shown_);
     places_.push_back({figure, desc.conversion[0] == 'L', shift});
-    columns_.push_back({desc.name, desc.description, figure.kind, figure.isKey, figure.isCounter,
-                        UnitOf(figure, shown_), figure.states});
+    columns_.push_back(RowColumnOf(column, shown_));
   }
   values_.resize(columns_.size());
 }

@@ -14,6 +14,12 @@
 
 namespace ksicache {
 
+// The columns of a report, those of the level that it goes down to by itself.
+std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report);
+
+// A column as a format sees it that shows memory in this unit.
+RowColumn RowColumnOf(const tally::ColumnInfo& column, tally::DisplayUnit unit);
+
 // Gives a format the items of a report, and totals that the kernel counts itself. Other totals and
 // the rows of tags say nothing that the items do not, and are left out; so are rules, notes and
 // descriptions. Texts are as Escaped makes them, so that all of them are UTF-8.
