@@ -1,12 +1,18 @@
 // ksicache export as a SQLite database and as metrics.
+#include <cstdio>
 #include <cstdlib>
+#include <memory>
 #include <set>
 #include <string>
 #include <vector>
 
 #include "knvlibs/sqlite.h"
+#include "reports/reports.h"
 #include "tests/ksicache/export_fixture.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/metric_name.h"
+#include "tools/ksicache/export/row_sink.h"
 
 namespace ksi {
 namespace {
@@ -62,6 +68,11 @@ TEST_F(ExportFormats, SqliteHasATableForEachReport) {
                                       "comp_stats|NULL|Num times host in high state|01",
                                       "guest_stats|NULL|Scheduler group ID|10",
                                       "lpage_stats|NULL|Scheduler group ID|10"}));
+  EXPECT_EQ(Query(file,
+                  "SELECT name || '|' || description || '|' || isKey FROM columns "
+                  "WHERE report = 'vm_stats' AND name IN ('host', 'time') ORDER BY name"),
+            (std::vector<std::string>{"host|The host that the row is of|1",
+                                      "time|When it was read, in UTC|1"}));
   EXPECT_EQ(Query(file, "PRAGMA integrity_check"), std::vector<std::string>{"ok"});
 }
 
@@ -319,6 +330,49 @@ TEST_F(ExportFormats, MetricsOfASpanHaveTheirTimes) {
                            "@10:05Z..10:05Z: comp-stats: there is another moment of "
                            "hypervisor.example.org at 2026-11-21T10:05:00Z: metrics have the later "
                            "one\n");
+}
+
+// The same metrics, however often the rows have to be given for want of memory.
+TEST_F(ExportFormats, MetricsNeedLittleMemory) {
+  const tally::Report& report = *tally::FindReport("vm-stats");
+  std::vector<ksicache::RowColumn> columns;
+  for (const tally::ColumnInfo& column : ksicache::ColumnsOf(report)) {
+    columns.push_back(ksicache::RowColumnOf(column, tally::DisplayUnit::b));
+  }
+  int readings = 0;
+  const auto metrics = [&](size_t mostBytes) {
+    const std::unique_ptr<ksicache::RowFormat> format = ksicache::MakeOpenMetrics(
+        {.file = nullptr, .hasManyReports = false, .hasSpans = true, .mostBytes = mostBytes});
+    testing::internal::CaptureStdout();
+    readings = 0;
+    do {
+      ++readings;
+      for (int64_t minute = 0; minute < 5; ++minute) {
+        const ksicache::Origin origin = {"h", "", minute * 60'000'000};
+        format->Begin({&report, columns, &origin});
+        for (uint64_t machine = 0; machine < 200; ++machine) {
+          std::vector<ksicache::Value> values;
+          for (const ksicache::RowColumn& column : columns) {
+            const bool isText = column.kind == tally::Kind::text;
+            values.push_back(
+                {isText ? ksicache::ValueType::text : ksicache::ValueType::unsignedNumber,
+                 machine * 100 + (column.isKey ? 0 : static_cast<uint64_t>(minute)), "same"});
+          }
+          format->Row(values);
+        }
+      }
+    } while (format->EndReports());
+    format->Finish();
+    std::fflush(stdout);
+    return testing::internal::GetCapturedStdout();
+  };
+  const std::string once = metrics(size_t{1} << 30);
+  EXPECT_EQ(readings, 1);
+  EXPECT_EQ(Lines(once).size(), 28'078u);
+  EXPECT_EQ(metrics(100'000), once);
+  EXPECT_GT(readings, 3);
+  EXPECT_THROW(metrics(10'000), ksicache::Error);
+  testing::internal::GetCapturedStdout();
 }
 
 // A strict parser has no complaint, with times and without.

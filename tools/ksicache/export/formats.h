@@ -2,6 +2,7 @@
 #ifndef TOOLS_KSICACHE_EXPORT_FORMATS_H_
 #define TOOLS_KSICACHE_EXPORT_FORMATS_H_
 
+#include <cstddef>
 #include <memory>
 
 #include "tools/ksicache/export/row_format.h"
@@ -11,9 +12,10 @@ namespace ksicache {
 
 // What is common to all rows.
 struct FormatOptions {
-  NewFile* file;        // null: standard output
-  bool hasManyReports;  // so that each row says of which it is
-  bool hasSpans;        // so that hosts have rows of several times
+  NewFile* file;                         // null: standard output
+  bool hasManyReports;                   // so that each row says of which it is
+  bool hasSpans;                         // so that hosts have rows of several times
+  size_t mostBytes = size_t{192} << 20;  // of rows that are kept to be put in order
 };
 
 struct FormatInfo {

@@ -47,7 +47,7 @@ class MetricRows {
   size_t Count() const { return rows_.size(); }
   int64_t TakenOf(uint32_t row) const { return moments_[rows_[row].moment].taken; }
   std::string_view LabelsOf(uint32_t row) const { return *labels_[rows_[row].series]; }
-  Value ValueOf(size_t column, uint32_t row) const;
+  Value ValueOf(size_t place, uint32_t row) const;
 
  private:
   struct Moment {

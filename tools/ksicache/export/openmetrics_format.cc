@@ -82,7 +82,10 @@ void PutLabel(std::string_view name, const Value& value, std::string& labels) {
 class OpenMetricsFormat : public RowFormat {
  public:
   OpenMetricsFormat(const FormatOptions& options, Dialect dialect)
-      : output_(options.file), dialect_(dialect), hasTimes_(options.hasSpans) {}
+      : output_(options.file),
+        dialect_(dialect),
+        hasTimes_(options.hasSpans),
+        mostBytes_(options.mostBytes) {}
 
   void Begin(const RowTable& table) override {
     if (table.report != report_) BeginReport(table);
@@ -100,7 +103,7 @@ class OpenMetricsFormat : public RowFormat {
     labels = host_;
     for (const size_t key : metrics_.keys) PutLabel(metrics_.names[key], values[key], labels);
     rows_.Add(labels, values);
-    if (rows_.Size() > kMostBytes) LeaveFamilies();
+    if (rows_.Size() > mostBytes_) LeaveFamilies();
   }
 
   std::string TakeComplaint() override { return std::exchange(complaint_, {}); }
@@ -122,8 +125,6 @@ class OpenMetricsFormat : public RowFormat {
   }
 
  private:
-  static constexpr size_t kMostBytes = size_t{192} << 20;
-
   void BeginReport(const RowTable& table) {
     report_ = table.report;
     columns_.assign(table.columns.begin(), table.columns.end());
@@ -276,6 +277,7 @@ class OpenMetricsFormat : public RowFormat {
   TextOutput output_;
   Dialect dialect_;
   bool hasTimes_;
+  size_t mostBytes_;
 
   // The report at hand.
   const tally::Report* report_ = nullptr;

@@ -58,9 +58,14 @@ class SqliteFormat : public RowFormat {
 
  private:
   static constexpr int kFirstColumn = 3;
+  static constexpr RowColumn kFirstColumns[] = {
+      {"host", "The host that the row is of", tally::Kind::text, true, false, "", {}},
+      {"time", "When it was read, in UTC", tally::Kind::text, true, false, "", {}},
+  };
 
   void MakeTable(const RowTable& table) {
     const std::string name = TableName(*table.report);
+    for (const RowColumn& column : kFirstColumns) Describe(name, column);
     std::string columns = "host TEXT NOT NULL, time TEXT NOT NULL";
     std::string parameters = "?, ?";
     for (const RowColumn& column : table.columns) {
