@@ -108,7 +108,7 @@ struct MomentFacts {
   int64_t taken = 0;      // us since 1970, by the clock on the wall
   int64_t uptime = 0;     // us since the host started, sleep included; 0: not known
   uint64_t duration = 0;  // us that reading it took
-  uint64_t cpu = 0;       // us of CPU that it took
+  uint64_t cpu = 0;       // us of CPU that it took, and writing the one before
   uint64_t skipped = 0;   // moments before it that were left out
   Status loss = kOk;      // why something was left out of an answer
   uint64_t refused = 0;   // reads that failed for want of rights

@@ -59,6 +59,8 @@ class RecordingDamage : public RecordingTest {
     Recorder recorder(store);
     for (int64_t i = 0; i < 10; ++i) {
       moments_.push_back(NoiseAt(i));
+      // As the recorded host is called with which it is gone on.
+      moments_.back().host = Host("unknown");
       recorder.Add(moments_.back().host, moments_.back().facts, moments_.back().readings);
       if (i == 6) recorder.Pack();
     }
@@ -233,10 +235,7 @@ TEST_F(RecordingDamage, CheckNamesTheMoment) {
   const harness::Result result = Run(
       {"record", "--root", RecordedHost("systemd-server"), "--every", "1s", "--count", "1", file_});
   EXPECT_EQ(result.status, 0);
-  EXPECT_EQ(result.err, "ksicache: " + file_ +
-                            ": its last moment is of the host h, those to come of unknown\n"
-                            "ksicache: " +
-                            file_ + ": its last moments are damaged, and stay so: 1\n");
+  EXPECT_EQ(result.err, "ksicache: " + file_ + ": its last moments are damaged, and stay so: 1\n");
   Output({"dump", file_});
 }
 

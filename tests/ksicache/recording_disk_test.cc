@@ -37,14 +37,14 @@ class RecordingDisk : public RecordingTest {
   }
 
   // A recorder that does not wait for the clock, with what it says in files elsewhere.
-  pid_t Start() const {
+  pid_t Start(const char* every = "1s") const {
     const pid_t child = fork();
     if (child != 0) return child;
     dup2(open(Path("out").c_str(), O_WRONLY | O_CREAT, 0600), STDOUT_FILENO);
     dup2(open(Path("err").c_str(), O_WRONLY | O_CREAT, 0600), STDERR_FILENO);
     setenv("LD_PRELOAD", KSICACHE_SET_CLOCK, 1);
     setenv("SET_CLOCK", "1795255200", 1);
-    execl(KSICACHE_PROGRAM, "ksicache", "record", "--every", "1s", "--root",
+    execl(KSICACHE_PROGRAM, "ksicache", "record", "--every", every, "--root",
           RecordedHost("systemd-server").c_str(), file_.c_str(), nullptr);
     _exit(127);
   }
@@ -86,6 +86,14 @@ class RecordingDisk : public RecordingTest {
     }
   }
 
+  // Ends a recorder that has dropped moments.
+  static void Stop(pid_t recorder) {
+    kill(recorder, SIGTERM);
+    int status = 0;
+    ASSERT_EQ(waitpid(recorder, &status, 0), recorder);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+  }
+
   void RecordWhileTheDiskFills() const {
     const pid_t recorder = Start();
     const bool began = WaitFor([this] { return IsThere(); });
@@ -97,11 +105,8 @@ class RecordingDisk : public RecordingTest {
     std::filesystem::remove(disk_ + "/other");
     const bool wentOn = WaitFor([this] { return HasSaid("is recorded again"); });
     usleep(100'000);
-    kill(recorder, SIGTERM);
-    int status = 0;
-    ASSERT_EQ(waitpid(recorder, &status, 0), recorder);
+    Stop(recorder);
     ASSERT_TRUE(began && stopped && wentOn) << FileContent(Path("err"));
-    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
   }
 
   const std::string disk_ = Path("disk");
@@ -126,6 +131,25 @@ TEST_F(RecordingDisk, AFullOneIsToldOnceAndHarmsNothing) {
     const std::string moments = Output({"moments", file_});
     EXPECT_NE(moments.find(dropped[1].str() + " skipped before"), std::string::npos) << moments;
     ExpectHasAllOf(*OpenFile(file_), *OpenFile(Path("copy.ksi")));
+  });
+}
+
+// Where a file cannot grow as it likes to, it grows by what is needed; and the account of an hour
+// tells what was dropped.
+TEST_F(RecordingDisk, TheLastRoomIsForMoments) {
+  ExpectBounded([this] {
+    ASSERT_TRUE(MountDisk());
+    const pid_t recorder = Start("1m");
+    const bool began = WaitFor([this] { return IsThere(); });
+    WriteContent(disk_ + "/some", std::string(40960, 'x'));
+    FillDisk();
+    const std::regex account(", [1-9][0-9]* dropped; each took ");
+    const bool stopped =
+        WaitFor([&] { return std::regex_search(FileContent(Path("out")), account); });
+    std::filesystem::remove(disk_ + "/some");
+    const bool wentOn = WaitFor([this] { return HasSaid("is recorded again"); });
+    Stop(recorder);
+    EXPECT_TRUE(began && stopped && wentOn) << FileContent(Path("err"));
   });
 }
 

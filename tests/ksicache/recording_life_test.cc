@@ -24,6 +24,7 @@
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/recording_fixture.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/retention.h"
 
 namespace ksi {
 namespace {
@@ -304,12 +305,14 @@ TEST_F(RecordingLife, TheBoundOfAgeHoldsForEver) {
   constexpr int64_t kKeep = 500 * kSecond;
   RecordingStore store(file_, kUnbounded);
   Recorder recorder(store);
+  ksicache::Retention retention(kKeep);
   int64_t size = 0;
   for (int64_t next = 0; next < 2000; ++next) {
     const Moment moment = MomentAt(next);
     recorder.Add(moment.host, moment.facts, moment.readings);
     recorder.Tidy();
-    store.RemoveBefore(moment.facts.taken - kKeep);
+    retention.Add(store.Parts().back().chunk, {"", (next + 1) * kSecond, moment.facts.taken});
+    store.RemoveBefore(retention.FirstKept(store.Parts().front().chunk));
     const Part& first = store.Parts().front();
     ASSERT_EQ(first.number, first.chunk);
     // All of the first chunk but a moment may be too old.

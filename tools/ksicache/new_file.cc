@@ -13,6 +13,7 @@
 #include <optional>
 
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/recording_lock.h"
 
 namespace ksicache {
 namespace {
@@ -160,6 +161,16 @@ void NewFile::CheckTarget() const {
   if (!S_ISREG(info.st_mode) && !S_ISLNK(info.st_mode)) {
     throw Error(name_ + ": is not a file, and not replaced");
   }
+  RequireNotRecorded();
+}
+
+// Else it would be recorded into a file that has no name.
+void NewFile::RequireNotRecorded() const {
+  if (!replace_) return;
+  const Descriptor file(openat(directory_.Get(), entry_.c_str(),
+                               O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
+  const std::string recorder = file ? RecorderOf(file.Get()) : "";
+  if (!recorder.empty()) throw Error(name_ + ": is being recorded by " + recorder);
 }
 
 void NewFile::RefuseInput(const std::string& fileName) const {
@@ -196,6 +207,7 @@ void NewFile::Fill(int fd, std::span<const std::byte> content) const {
 
 void NewFile::Commit(std::span<const std::byte> content) {
   if (standardOutput_) return Fill(STDOUT_FILENO, content);
+  RequireNotRecorded();
   if (unnamed_) Fill(unnamed_.Get(), content);
   if (!unnamed_ || !CommitUnnamed()) CommitNamed(content);
   SyncDirectory();

@@ -51,6 +51,7 @@ class NewFile {
  private:
   void OpenListing();
   void CheckTarget() const;
+  void RequireNotRecorded() const;
   void OpenUnnamed();
   void Fill(int fd, std::span<const std::byte> content) const;
   bool LinkUnnamed(const std::string& entry) const;

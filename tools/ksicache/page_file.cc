@@ -95,8 +95,7 @@ int PageFile::Open(ksi::Database* database) {
   const int code = sqlite3_initialize();
   if (code != SQLITE_OK) return code;
   pages_.clear();
-  std::string header(ksi::cache::kPageSize, '\0');
-  end_ = pread(descriptor_, header.data(), header.size(), 0) < 0 ? 0 : EndIn(header);
+  end_ = EndOnDisk();
   vfs_ = ksi::sqlite_file::MakeVfs("ksi-recording", static_cast<int>(sizeof(Handle)), OpenFile);
   vfs_.pAppData = this;
   vfs_.xDelete = NoDelete;
@@ -210,6 +209,14 @@ bool PageFile::Flush() {
   pages_.clear();
   return isWritten;
 }
+
+int64_t PageFile::EndOnDisk() const {
+  std::string header(kCountAt + 4, '\0');
+  const ssize_t size = pread(descriptor_, header.data(), header.size(), 0);
+  return size < static_cast<ssize_t>(header.size()) ? 0 : EndIn(header);
+}
+
+bool PageFile::IsWhole() const { return SizeOnDisk() >= end_ && EndOnDisk() == end_; }
 
 bool PageFile::Sync() const { return fdatasync(descriptor_) == 0; }
 

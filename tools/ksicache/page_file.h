@@ -37,6 +37,9 @@ class PageFile {
   // Whether pages stand elsewhere than where SQLite wrote them: it has to be opened anew.
   bool HasMoved() const { return hasMoved_; }
 
+  // Whether the file is still as long as it was left, and says so itself.
+  [[nodiscard]] bool IsWhole() const;
+
   // Brings what has been flushed to the disk; false, errno says why.
   [[nodiscard]] bool Sync() const;
 
@@ -53,6 +56,7 @@ class PageFile {
   void MoveInner();
   [[nodiscard]] bool WritePages(int64_t from, int64_t to) const;
   int64_t SizeOnDisk() const;
+  int64_t EndOnDisk() const;
 
   int descriptor_;
   sqlite3_vfs vfs_;

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include <knvlibs/ksi_status.h>
+#include "knvlibs/recording/chunk.h"
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
@@ -23,14 +24,16 @@ ksi::Bytes PartOf(const ksi::ChunkWriter& chunk, size_t first) {
 
 }  // namespace
 
-Recorder::Recorder(RecordingStore& store, Singles singles) : store_(store), singles_(singles) {
+Recorder::Recorder(RecordingStore& store, Singles singles, int64_t longestChunk)
+    : store_(store), singles_(singles), longestChunk_(longestChunk) {
   if (!store.Parts().empty()) next_ = store.Parts().back().End();
 }
 
 // What a chunk's moments have in common; in one the clock only goes on.
 bool Recorder::Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& facts) const {
   return chunk_ != nullptr && chunk_->Count() < kChunkMoments && chunk_->Host() == host &&
-         chunk_->Last().taken < facts.taken;
+         chunk_->Last().taken < facts.taken &&
+         ksi::chunk::Minus(facts.taken, chunk_->At(0).taken) <= longestChunk_;
 }
 
 void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,

@@ -9,6 +9,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <vector>
 
@@ -28,8 +29,10 @@ class Recorder {
   // process takes some more of them.
   enum class Singles { kWritten, kLeftOut };
 
-  // Goes on where the recording ends.
-  explicit Recorder(RecordingStore& store, Singles singles = Singles::kWritten);
+  // Goes on where the recording ends. From the first moment of a chunk to the last are at most
+  // `longestChunk` us.
+  explicit Recorder(RecordingStore& store, Singles singles = Singles::kWritten,
+                    int64_t longestChunk = std::numeric_limits<int64_t>::max());
 
   // Adds a moment, whose readings are in the order of SortReadings. Fails with an Error: then it is
   // not there, and a later one may be.
@@ -51,6 +54,7 @@ class Recorder {
 
   RecordingStore& store_;
   Singles singles_;
+  int64_t longestChunk_;
   std::unique_ptr<ksi::ChunkWriter> chunk_;  // none: the next moment starts one
   int64_t chunkNumber_ = 0;                  // of its first moment
   int64_t next_ = 0;                         // the number of the next moment

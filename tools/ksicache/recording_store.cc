@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -14,6 +15,7 @@
 #include <knvlibs/ksi_status.h>
 #include "knvlibs/cache_format.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/recording_lock.h"
 
 namespace ksicache {
 namespace {
@@ -40,19 +42,6 @@ constexpr const char* kSetPart =
     "UPDATE part SET moments = ?2, number = ?3, chunk = ?4, first = ?5, last = ?6, size = ?7, "
     "block = ?8 WHERE id = ?1";
 constexpr const char* kFreePart = "UPDATE part SET moments = 0 WHERE id = ?1";
-
-// Where the locks lie, beyond all that a file can hold.
-constexpr off_t kLockAt = off_t{1} << 61;
-constexpr off_t kTellingLockAt = kLockAt + 1;
-
-struct flock LockAt(off_t place) {
-  struct flock lock = {};
-  lock.l_type = F_WRLCK;
-  lock.l_whence = SEEK_SET;
-  lock.l_start = place;
-  lock.l_len = 1;
-  return lock;
-}
 
 struct CloseBlob {
   void operator()(sqlite3_blob* blob) const { sqlite3_blob_close(blob); }
@@ -126,22 +115,13 @@ RecordingStore::RecordingStore(std::string name, int file, int64_t maxSize)
   TakeStock();
 }
 
-// Two locks: one that is this opening's, and one that tells whose it is.
 void RecordingStore::Lock() {
-  struct flock lock = LockAt(kLockAt);
-  if (fcntl(file_.Get(), F_OFD_SETLK, &lock) == 0) return TellWhose();
+  if (LockRecording(file_.Get())) return TellWhose();
   if (errno != EAGAIN && errno != EACCES) throw SystemError(name_, errno);
-  lock = LockAt(kTellingLockAt);
-  const bool isTold = fcntl(file_.Get(), F_GETLK, &lock) == 0 && lock.l_type != F_UNLCK;
-  throw Error(name_ + ": is being recorded by " +
-              (isTold && lock.l_pid > 0 ? "process " + std::to_string(lock.l_pid)
-                                        : std::string("another process")));
+  throw Error(name_ + ": is being recorded by " + RecorderOf(file_.Get()));
 }
 
-void RecordingStore::TellWhose() {
-  struct flock lock = LockAt(kTellingLockAt);
-  static_cast<void>(fcntl(file_.Get(), F_SETLK, &lock));
-}
+void RecordingStore::TellWhose() { TellRecorder(file_.Get()); }
 
 std::unique_ptr<ksi::RecordingFile> RecordingStore::Read() const {
   auto opened = std::make_unique<ksi::CacheDatabase>();
@@ -149,6 +129,7 @@ std::unique_ptr<ksi::RecordingFile> RecordingStore::Read() const {
   std::string why = opened->Why();
   std::unique_ptr<ksi::RecordingFile> recording;
   if (status == ksi::kOk) status = ksi::RecordingFile::Make(std::move(opened), &recording, &why);
+  if (status == KSI_STATUS_NO_MEMORY) throw std::bad_alloc();
   if (status == KSI_STATUS_INVALID_METADATA) throw DataError(name_ + ": is no recording");
   if (status != ksi::kOk) {
     throw DataError(name_ + ": " + (why.empty() ? StatusText(status) : "damaged: " + why));
@@ -203,8 +184,32 @@ void RecordingStore::Connect() {
   }
 }
 
+void RecordingStore::RequireThere() const {
+  struct stat named = {};
+  struct stat open = {};
+  const bool isNamed = lstat(name_.c_str(), &named) == 0;
+  // Where it may not be looked for it may be.
+  if (!isNamed && errno != ENOENT && errno != ENOTDIR) return;
+  if (!isNamed || fstat(file_.Get(), &open) != 0 || named.st_dev != open.st_dev ||
+      named.st_ino != open.st_ino) {
+    throw FileLost(name_ + ": was removed or replaced while it was recorded");
+  }
+  RequireWhole();
+}
+
+void RecordingStore::RequireWhole() const {
+  if (database_ == nullptr || pages_->IsWhole()) return;
+  throw FileLost(name_ + ": was truncated or written by others while it was recorded");
+}
+
 void RecordingStore::Ready() {
-  if (database_ == nullptr) TakeStock();
+  RequireWhole();
+  if (database_ != nullptr) return;
+  try {
+    TakeStock();
+  } catch (const DataError& error) {
+    throw FileLost(error.what());
+  }
 }
 
 void RecordingStore::Execute(const char* sql) {
@@ -289,14 +294,9 @@ void RecordingStore::KeepSpare(size_t count) {
   while (blocks_.size() < wanted && HasOldChunk()) RemoveFirstChunk();
 }
 
-void RecordingStore::RemoveBefore(int64_t time) {
+void RecordingStore::RemoveBefore(int64_t chunk) {
   Ready();
-  const auto isOld = [this, time] {
-    const int64_t chunk = parts_.front().chunk;
-    return std::ranges::all_of(
-        parts_, [=](const Part& each) { return each.chunk != chunk || each.last < time; });
-  };
-  while (HasOldChunk() && isOld()) RemoveFirstChunk();
+  while (HasOldChunk() && parts_.front().chunk < chunk) RemoveFirstChunk();
 }
 
 bool RecordingStore::HasOldChunk() const {
@@ -306,12 +306,22 @@ bool RecordingStore::HasOldChunk() const {
 void RecordingStore::RemoveFirstChunk() {
   std::vector<Part> removed;
   const int64_t chunk = parts_.front().chunk;
+  CountGone(chunk);
   for (std::vector<Part>* list : {&parts_, &replaced_}) {
     const auto isOfIt = [chunk](const Part& each) { return each.chunk == chunk; };
     std::ranges::copy_if(*list, std::back_inserter(removed), isOfIt);
     std::erase_if(*list, isOfIt);
   }
   Remove(removed);
+}
+
+void RecordingStore::CountGone(int64_t chunk) {
+  for (const Part& part : parts_) {
+    if (part.chunk != chunk) break;
+    gone_.first = gone_.moments == 0 ? part.first : std::min(gone_.first, part.first);
+    gone_.last = gone_.moments == 0 ? part.last : std::max(gone_.last, part.last);
+    gone_.moments += part.moments;
+  }
 }
 
 void RecordingStore::Remove(const std::vector<Part>& parts) {
@@ -339,6 +349,13 @@ size_t RecordingStore::Room() const {
   return static_cast<size_t>(std::max(maxSize_ - Size(), int64_t{0}) / kBlockOnDisk);
 }
 
+// The last room of a disk is for moments, not for what may come.
+size_t RecordingStore::RoomOnDisk() const {
+  struct statvfs info = {};
+  if (fstatvfs(file_.Get(), &info) != 0) return 0;
+  return info.f_bavail * info.f_frsize / kBlockOnDisk;
+}
+
 void RecordingStore::Grow(size_t count) {
   if (count == 0) return;
   Execute("BEGIN");
@@ -348,11 +365,20 @@ void RecordingStore::Grow(size_t count) {
   for (auto id = last - static_cast<int64_t>(count) + 1; id <= last; ++id) blocks_.push_back(id);
 }
 
+void RecordingStore::Reserve(size_t count) {
+  // What SQLite writes at once is held in memory.
+  constexpr size_t kAtOnce = 1024;
+  Ready();
+  for (count = std::min(count, Room()); blocks_.size() < count;) {
+    Grow(std::min(kAtOnce, count - blocks_.size()));
+  }
+}
+
 std::vector<int64_t> RecordingStore::TakeBlocks(size_t count) {
   while (blocks_.size() < count) {
     const size_t wanting = count - blocks_.size();
     if (Room() >= wanting) {
-      Grow(std::min(Room(), std::max(wanting, moreBlocks_)));
+      Grow(std::min(Room(), std::max(wanting, std::min(moreBlocks_, RoomOnDisk()))));
     } else if (HasOldChunk()) {
       RemoveFirstChunk();
     } else {

@@ -8,8 +8,10 @@
 #include <cstdint>
 #include <deque>
 #include <memory>
+#include <stdexcept>
 #include <string>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "knvlibs/recording/recording_file.h"
@@ -19,8 +21,14 @@
 
 namespace ksicache {
 
-// Every call may fail with an Error. What it was to write is then not there, or whole, and all else
-// is as it was.
+// The file is not any more what was recorded into.
+class FileLost : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// Every call may fail with an Error, those that write also with a FileLost. What it was to write is
+// then not there, or whole, and all else is as it was.
 class RecordingStore {
  public:
   using Part = ksi::RecordingFile::Part;
@@ -29,7 +37,7 @@ class RecordingStore {
   static constexpr int64_t kSmallestFile = int64_t{4} << 20;
 
   // By so many blocks a recording grows at least.
-  static constexpr size_t kMoreBlocks = 64;
+  static constexpr size_t kMoreBlocks = 16;
 
   // The content of an empty recording of `host`, with room in so many blocks.
   static ksi::Bytes Empty(const std::string& host, size_t blocks = kMoreBlocks);
@@ -53,11 +61,25 @@ class RecordingStore {
   // for whoever copies the file meanwhile.
   void Replace(Part part, ksi::ByteView content);
 
-  // Removes the chunks whose moments are all older than that.
-  void RemoveBefore(int64_t time);
+  // Removes the chunks before that of this number.
+  void RemoveBefore(int64_t chunk);
+
+  // The moments that have left since this was asked last: how many, and from when to when.
+  struct Gone {
+    int64_t moments = 0;
+    int64_t first = 0;
+    int64_t last = 0;
+  };
+  Gone TakeGone() { return std::exchange(gone_, {}); }
+
+  // Makes room for so many blocks, as far as the file may grow.
+  void Reserve(size_t count);
 
   // Brings all to the disk.
   void Sync();
+
+  // Fails with a FileLost if the file is another one than its name means, or has been harmed.
+  void RequireThere() const;
 
   // The file, to read what it holds; by what is open, for another file may have its name.
   std::unique_ptr<ksi::RecordingFile> Read() const;
@@ -72,6 +94,7 @@ class RecordingStore {
   void Lock();
   void TakeStock();
   void Connect();
+  void RequireWhole() const;
   void Ready();
   void Execute(const char* sql);
   void Require(bool good);
@@ -81,8 +104,10 @@ class RecordingStore {
   void Put(Part part, ksi::ByteView content, bool replaces);
   bool HasOldChunk() const;
   void RemoveFirstChunk();
+  void CountGone(int64_t chunk);
   void Remove(const std::vector<Part>& parts);
   size_t Room() const;
+  size_t RoomOnDisk() const;
   void Grow(size_t count);
   void KeepSpare(size_t count);
   std::vector<int64_t> TakeBlocks(size_t count);
@@ -105,6 +130,7 @@ class RecordingStore {
   // Blocks that were taken since moments were packed, and the most until that was done.
   size_t taken_ = 0;
   size_t mostTaken_ = 0;
+  Gone gone_;
 };
 
 }  // namespace ksicache
