@@ -78,7 +78,8 @@ function __ksicache_words
     set -e words[1]
     while set -q words[1]
         switch $words[1]
-            case --root --mode --every --keep --max-size --count --format --unit --output -u -o
+            case --root --mode --every --keep --max-size --count --format --unit --output -u -o \
+                --report --by --top --since --fail-above -r
                 set -e words[1]
             case '-*'
             case '*'
@@ -113,7 +114,7 @@ function __ksicache_wants_file
             not set -q words[2]
         case info check moments join
             true
-        case load extract
+        case load extract diff
             not set -q words[3]
         case export
             set -q words[2]
@@ -131,6 +132,7 @@ complete -c ksicache -n $no_command -a extract -d 'Make a capture of a moment'
 complete -c ksicache -n $no_command -a join -d 'Make a recording of captures'
 complete -c ksicache -n $no_command -a info -d 'Say which host a file is of'
 complete -c ksicache -n $no_command -a dump -d 'Show what a file holds'
+complete -c ksicache -n $no_command -a diff -d 'Say what changed, and who grew'
 complete -c ksicache -n $no_command -a export -d 'Write the rows of reports'
 complete -c ksicache -n $no_command -a load -d 'Make a file from JSON'
 complete -c ksicache -n $no_command -a check -d 'Say what is wrong with a file'
@@ -148,7 +150,13 @@ complete -c ksicache -n '__ksicache_command record' -l max-size -x -a '500M 1G 2
 complete -c ksicache -n '__ksicache_command record' -l count -x -d 'End after so many moments'
 complete -c ksicache -n '__ksicache_command moments' -l remarks -d 'List only moments with something to remark'
 complete -c ksicache -n '__ksicache_command moments' -l summary -d 'Sum the moments up instead'
-complete -c ksicache -n '__ksicache_command dump' -l json -d 'Dump as JSON'
+complete -c ksicache -n '__ksicache_command dump diff' -l json -d 'Print JSON'
+complete -c ksicache -n '__ksicache_command diff' -s r -l report -x -a '(__ksicache_report_names | string match -v "all*")' -d 'Compare the rows of this report'
+complete -c ksicache -n '__ksicache_command diff' -l by -x -d 'Rank by this column'
+complete -c ksicache -n '__ksicache_command diff' -l top -x -a '3 5 10 20' -d 'Show so many of each kind'
+complete -c ksicache -n '__ksicache_command diff' -l since -x -a '1h 6h 1d 7d' -d 'Say who grew steadily for so long'
+complete -c ksicache -n '__ksicache_command diff' -l fail-above -x -a '100M 500M 1G' -d 'End with status 3 if any grew by more'
+complete -c ksicache -n '__ksicache_command diff' -l across-hosts -d 'Compare moments of two hosts'
 complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics prometheus' -d 'Write in this format'
-complete -c ksicache -n '__ksicache_command export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
+complete -c ksicache -n '__ksicache_command diff export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
 complete -c ksicache -n '__ksicache_command export' -s o -l output -r -F -d 'Make a file'

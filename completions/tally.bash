@@ -352,16 +352,20 @@ declare -gA _ksicache_values=(
   [--max-size]='500M 1G 2G'
   [--format]='csv json sqlite openmetrics prometheus'
   [--unit]='mb kb pg b'
+  [--top]='3 5 10 20'
+  [--since]='1h 6h 1d 7d'
+  [--fail-above]='100M 500M 1G'
 )
 
 _ksicache() {
   local _tally_line word command='' count=0 skip='' head='' i
+  local valued='root|mode|every|keep|max-size|count|format|unit|output|report|by|top|since|fail-above'
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
     if [[ -n $skip ]]; then
       skip=
-    elif [[ $word =~ ^(--(root|mode|every|keep|max-size|count|format|unit|output)|-[uo])$ ]]; then
+    elif [[ $word =~ ^(--($valued)|-[uor])$ ]]; then
       skip=$word
     elif [[ $word != -* ]]; then
       if [[ -z $command ]]; then command=$word; else count=$((count + 1)); fi
@@ -375,11 +379,14 @@ _ksicache() {
   case $skip in
     -u) skip=--unit ;;
     -o) skip=--output ;;
+    -r) skip=--report ;;
   esac
   if [[ $skip == --root ]]; then
     _tally_reply_files "$head" "$word" -d
   elif [[ $skip == --output ]]; then
     _tally_reply_files "$head" "$word" -f
+  elif [[ $skip == --report ]]; then
+    _tally_reply "$head" "$word" "$_tally_reports"
   elif [[ -n $skip ]]; then
     _tally_reply "$head" "$word" "${_ksicache_values[$skip]-}"
   elif [[ $word == -* ]]; then
@@ -388,6 +395,10 @@ _ksicache() {
       record) _tally_reply '' "$word" '--every --keep --max-size --count --mode --root' ;;
       moments) _tally_reply '' "$word" '--remarks --summary' ;;
       dump) _tally_reply '' "$word" --json ;;
+      diff)
+        _tally_reply '' "$word" \
+          '--report -r --by --top --since --unit -u --json --fail-above --across-hosts'
+        ;;
       export) _tally_reply '' "$word" '--format --unit -u --output -o --force --mode' ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
@@ -395,9 +406,9 @@ _ksicache() {
   else
     case $command$count in
       0)
-        _tally_reply '' "$word" 'capture record moments extract join info dump export load check'
+        _tally_reply '' "$word" 'capture record moments extract join info dump diff export load check'
         ;;
-      capture0 | record0 | moments* | extract[01] | join* | info* | dump0 | check* | load[01])
+      capture0 | record0 | moments* | extract[01] | join* | info* | dump0 | diff[01] | check* | load[01])
         _tally_reply_files '' "$word" -f
         ;;
       dump*) _tally_reply '' "$word" "$_ksicache_nodes" ;;

@@ -15,8 +15,8 @@ TEST_F(Ksicache, HelpAndVersion) {
   EXPECT_EQ(Output({"--version"}), "ksicache " KSICACHE_VERSION "\n");
 }
 
-constexpr const char* kCommands[] = {"capture", "record", "moments", "extract", "join",
-                                     "info",    "dump",   "load",    "check"};
+constexpr const char* kCommands[] = {"capture", "record", "moments", "extract", "join", "info",
+                                     "dump",    "diff",   "export",  "load",    "check"};
 
 TEST_F(Ksicache, HelpSaysAll) {
   std::string text = Output({"--help"});
@@ -33,7 +33,7 @@ Shows what FILE holds, each field of each record with its unit, of all nodes or
 of those named, such as sched/groups/groupName.
 
 Options:
-      --json  dump as JSON
+      --json  print JSON
   -h, --help  show this message
 )");
   const std::string help = Output({"--help"});

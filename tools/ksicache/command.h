@@ -50,6 +50,9 @@ struct Command {
 
 // The options that more than one command takes.
 inline constexpr Option kForce = {"force", nullptr, "replace FILE if it exists"};
+inline constexpr Option kJson = {"json", nullptr, "print JSON"};
+inline constexpr Option kUnit = {"unit", "UNIT", "show memory in mb, kb, pg (4 KB pages) or b",
+                                 'u'};
 
 }  // namespace ksicache
 

@@ -16,7 +16,7 @@ reads instead of the host it runs on.
 
 constexpr std::string_view kExitStatus = R"(
 Exit status: 0 if all went well, 1 if something failed or check found something
-wrong, 2 if the command line is wrong.
+wrong, 2 if the command line is wrong, 3 if diff found more than --fail-above.
 )";
 
 // What a usage stands behind.

@@ -23,8 +23,9 @@ constexpr Unit kTimes[] = {{"", ksi::kSecond},
                            {"m", ksi::kMinute},
                            {"h", ksi::kHour},
                            {"d", ksi::kDay}};
-constexpr Unit kSizes[] = {
-    {"", 1}, {"K", 1 << 10}, {"M", 1 << 20}, {"G", 1 << 30}, {"T", int64_t{1} << 40}};
+constexpr Unit kSizes[] = {{"", 1},        {"K", 1 << 10},          {"k", 1 << 10},
+                           {"M", 1 << 20}, {"m", 1 << 20},          {"G", 1 << 30},
+                           {"g", 1 << 30}, {"T", int64_t{1} << 40}, {"t", int64_t{1} << 40}};
 constexpr Unit kOne[] = {{"", 1}};
 
 int64_t QuantityOf(const CommandLine& line, const Option& option, int64_t standard,

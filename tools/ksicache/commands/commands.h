@@ -13,12 +13,14 @@ extern const Command kExtract;
 extern const Command kJoin;
 extern const Command kInfo;
 extern const Command kDump;
+extern const Command kDiff;
 extern const Command kExport;
 extern const Command kLoad;
 extern const Command kCheck;
 
-inline constexpr const Command* kCommands[] = {&kCapture, &kRecord, &kMoments, &kExtract, &kJoin,
-                                               &kInfo,    &kDump,   &kExport,  &kLoad,    &kCheck};
+inline constexpr const Command* kCommands[] = {&kCapture, &kRecord, &kMoments, &kExtract,
+                                               &kJoin,    &kInfo,   &kDump,    &kDiff,
+                                               &kExport,  &kLoad,   &kCheck};
 
 }  // namespace ksicache
 

@@ -16,8 +16,6 @@
 namespace ksicache {
 namespace {
 
-constexpr Option kJson = {"json", nullptr, "dump as JSON"};
-
 class Dumper {
  public:
   Dumper(const ksi::CacheFile& file, const CommandLine& line)

@@ -2,7 +2,6 @@
 #include <algorithm>
 #include <memory>
 #include <optional>
-#include <set>
 #include <span>
 #include <string>
 #include <vector>
@@ -10,7 +9,7 @@
 #include "framework/name_list.h"
 #include "reports/reports.h"
 #include "tools/ksicache/commands/commands.h"
-#include "tools/ksicache/diagnostics.h"
+#include "tools/ksicache/complaints.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/row_sink.h"
@@ -24,7 +23,6 @@ namespace ksicache {
 namespace {
 
 constexpr Option kFormat = {"format", "FORMAT", "json, sqlite, openmetrics or prometheus, not csv"};
-constexpr Option kUnit = {"unit", "UNIT", "show memory in mb, kb, pg (4 KB pages) or b", 'u'};
 constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
 constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kForce, &kMode};
 
@@ -101,31 +99,6 @@ std::optional<NewFile> FileOf(const CommandLine& line, const FormatInfo& format)
   if (!isFile && !format.needsFile) return std::nullopt;
   return std::make_optional<NewFile>(*name, line.Has(kForce), ModeOf(line));
 }
-
-// Says what is wrong with files, each thing once however many moments have it.
-class Complaints {
- public:
-  // `name`: empty for the host itself.
-  void BeginFile(const std::string& name) { before_ = name.empty() ? "" : name + ": "; }
-
-  void Say(const std::string& text) {
-    isEmpty_ = false;
-    if (said_.insert(before_ + text).second) PrintError(before_ + text);
-  }
-
-  // What the library has said meanwhile: what it could not read.
-  void SayDiagnostics() {
-    for (const std::string& text : diagnostics_.TakeKept()) Say(text);
-  }
-
-  bool IsEmpty() const { return isEmpty_; }
-
- private:
-  std::string before_;
-  Diagnostics diagnostics_;
-  std::set<std::string> said_;
-  bool isEmpty_ = true;
-};
 
 // Puts reports into a format, of one file after the other.
 class Exporter {

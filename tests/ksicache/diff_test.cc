@@ -1,0 +1,311 @@
+// What two moments differ in, and who explains it.
+#include <nlohmann/json.hpp>
+
+#include <string>
+#include <vector>
+
+#include "tests/ksicache/export_fixture.h"
+
+namespace ksi {
+namespace {
+
+using nlohmann::json;
+
+class Diff : public ExportTest {
+ protected:
+  static inline const std::string kBefore = kIncident + "@10:02Z";
+  static inline const std::string kAfter = kIncident + "@10:05Z";
+
+  static json Json(std::vector<std::string> args) {
+    args.insert(args.begin(), "diff");
+    args.emplace_back("--json");
+    const std::string out = Output(args);
+    const json value = json::parse(out, nullptr, false);
+    EXPECT_FALSE(value.is_discarded()) << out;
+    return value;
+  }
+
+  // The example host, later and with changes.
+  std::string Later(const std::string& name,
+                    std::vector<std::pair<std::string, std::string>> changes) const {
+    changes.emplace_back("2026-11-21T10:00:00Z", "2026-11-21T10:10:00Z");
+    return ExampleWith(name, changes);
+  }
+
+  static json RowCalled(const json& rows, const std::string& column, const std::string& name) {
+    for (const json& row : rows) {
+      if (row["row"][column] == name) return row;
+    }
+    return {};
+  }
+
+  static json PartCalled(const json& diff, const std::string& name) {
+    for (const json& part : diff["parts"]) {
+      if (part["what"] == name) return part;
+    }
+    return {};
+  }
+};
+
+TEST_F(Diff, OneScreen) {
+  EXPECT_EQ(Output({"diff", kBefore, kAfter}),
+            R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
+
+KB                                       before        after       growth   part
+total                                 268435456    268435456            0
+free                                  138092636      1974364   -136118272
+in use                                130342820    266461092    136118272   100%
+  kernel                                3145728      3145728            0     0%
+  caches                                5242880      5242880            0     0%
+  others                              117170084    253288356    136118272   100%
+
+who explains it                          before        after       growth   part
+12 machines                           113908928    113908928            0     0%
+12 overheads of machines                1731300      1731300            0     0%
+8 user worlds                           1208592    137326864    136118272   100%
+  storage-daemon                         194152    136312424    136118272   100%
+14 heaps                                 589824       589824            0     0%
+nobody                                                                  0     0%
+in use                                                          136118272   100%
+
+groups, which contain the above          before        after       growth   part
+  services                              1223884    137342156    136118272   100%
+)");
+}
+
+TEST_F(Diff, TheLaterMomentMayComeFirst) {
+  const std::string out = Output({"diff", kAfter, kBefore, "-u", "mb", "--top", "1"});
+  EXPECT_TRUE(
+      out.starts_with("hypervisor.example.org, 2026-11-21T10:05:00Z to "
+                      "2026-11-21T10:02:00Z: -3m 0s, the later one first\n"))
+      << out;
+  EXPECT_NE(out.find("  storage-daemon                         133117          189      -132928"
+                     "   100%\n"),
+            std::string::npos)
+      << out;
+}
+
+TEST_F(Diff, Report) {
+  EXPECT_EQ(Output({"diff", kBefore, kAfter, "-r", "vm-stats"}),
+            R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
+vm-stats, KB, by swapped
+
+                               before           after         growth    a second
+build-linux, schedGrp 1060
+  swapped                     1509948         9437184        7927236
+mail, schedGrp 1050
+  ballooned                   2264924         5242880        2977956
+
+2 rows changed, 0 of them new and 0 gone; 10 did not
+)");
+  EXPECT_EQ(Output({"diff", kBefore, kAfter, "-r", "VM-stats", "--by", "BALLOONED", "-u", "mb",
+                    "--top", "1"}),
+            R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
+vm-stats, MB, by ballooned
+
+                               before           after         growth    a second
+mail, schedGrp 1050
+  ballooned                      2211            5120           2909
+
+2 rows changed, 0 of them new and 0 gone; 10 did not; 1 not shown
+)");
+}
+
+TEST_F(Diff, ReportWithoutNames) {
+  EXPECT_EQ(Output({"diff", kBefore, kAfter, "-r", "comp-stats", "-u", "mb"}),
+            R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
+comp-stats, MB, by otherConsumed
+
+                               before           after         growth    a second
+host
+  otherConsumed                114423          247351         132928
+  free                         134856            1928        -132928
+  memState                       High            Hard              -
+
+1 row changed, 0 of them new and 0 gone; 0 did not
+)");
+}
+
+TEST_F(Diff, ReportForPrograms) {
+  EXPECT_EQ(Output({"diff", kBefore, kAfter, "-r", "swap-stats", "--json"}),
+            R"({"before":{"host":"hypervisor.example.org","time":"2026-11-21T10:02:00Z"},)"
+            R"("after":{"host":"hypervisor.example.org","time":"2026-11-21T10:05:00Z"},)"
+            R"("seconds":180,"rebooted":false,"report":"swap-stats","unit":"KB","by":"swapped",)"
+            R"("unchanged":11,"changed":1,"rows":[)"
+            "\n"
+            R"({"row":{"name":"build-linux","schedGrp":1060},"state":"changed","columns":)"
+            R"({"swapped":{"before":1509948,"after":9437184,"growth":7927236}}})"
+            "\n]}\n");
+}
+
+// What was counted for ever has a rate; a count that fell began again.
+TEST_F(Diff, Counters) {
+  const std::string later =
+      Later("later.ksi", {{R"("numSuccAllocs":160042,"numFailAllocs":0)",
+                           R"("numSuccAllocs":160642,"numFailAllocs":3)"},
+                          {R"("numSuccAllocs":1920504)", R"("numSuccAllocs":5)"}});
+  const json diff = Json({kExample, later, "-r", "heap-stats"});
+  ASSERT_EQ(diff["rows"].size(), 3U) << diff;
+  const json grown = diff["rows"][0]["columns"];
+  EXPECT_EQ(grown["numSuccAllocs"]["growth"], 600);
+  EXPECT_EQ(grown["numSuccAllocs"]["perSecond"], 1.0);
+  EXPECT_EQ(grown["numSuccAllocs"]["restarted"], false);
+  EXPECT_EQ(grown["numFailAllocs"]["perSecond"], 0.005);
+  const json restarted = diff["rows"][2]["columns"]["numSuccAllocs"];
+  EXPECT_EQ(restarted["after"], 5);
+  EXPECT_EQ(restarted["growth"], nullptr);
+  EXPECT_EQ(restarted["perSecond"], nullptr);
+  EXPECT_EQ(restarted["restarted"], true);
+  EXPECT_NE(Output({"diff", kExample, later, "-r", "heap-stats"})
+                .find("  numSuccAllocs               1920504               5      restarted\n"),
+            std::string::npos);
+}
+
+// A number that another thing has now is no jump.
+TEST_F(Diff, ANumberTakenAgain) {
+  const std::string later =
+      Later("later.ksi", {{R"("text":"storage-daemon")", R"("text":"another")"}});
+  const json diff = Json({kExample, later, "-r", "uw-stats"});
+  const json gone = RowCalled(diff["rows"], "name", "storage-daemon");
+  const json came = RowCalled(diff["rows"], "name", "another");
+  EXPECT_EQ(gone["state"], "gone");
+  EXPECT_EQ(gone["columns"]["mapped"],
+            json::parse(R"({"before":196608,"after":null,"growth":-196608})"));
+  EXPECT_EQ(came["state"], "new");
+  EXPECT_EQ(came["row"]["schedGrp"], 307);
+  EXPECT_EQ(came["columns"]["mapped"],
+            json::parse(R"({"before":null,"after":196608,"growth":196608})"));
+
+  const std::string screen = Output({"diff", kExample, later, "-u", "mb"});
+  EXPECT_NE(screen.find("8 user worlds                              1180         1180            0"
+                        "      -\n"
+                        "  another                                   new          189          189"
+                        "      -\n"
+                        "  storage-daemon                            189         gone         -189"
+                        "      -\n"),
+            std::string::npos)
+      << screen;
+}
+
+// Whose figure is not known at one of the moments is told, and in no sum.
+TEST_F(Diff, WithoutAFigure) {
+  const std::string later =
+      Later("later.ksi", {{R"("mapped":196608)", R"("mapped":18446744073709551615)"}});
+  const json worlds = PartCalled(Json({kExample, later}), "user worlds");
+  EXPECT_EQ(worlds["withoutFigure"], 1);
+  EXPECT_EQ(worlds["count"], 8);
+  EXPECT_EQ(worlds["before"], 1208592 - 194152);
+  EXPECT_EQ(worlds["growth"], 0);
+  EXPECT_NE(Output({"diff", kExample, later}).find("  1 more without a figure, not added\n"),
+            std::string::npos);
+}
+
+// Of what a report cannot tell nothing is known; the rest is shown.
+TEST_F(Diff, AReportThatFails) {
+  std::string text = FileContent(TALLY_EXAMPLE_JSON);
+  const size_t begin = text.find(R"({"node":"memory/comprehensive")");
+  text.replace(begin, text.find("}}", begin) + 2 - begin,
+               R"({"node":"memory/comprehensive","keys":[],"status":"0xbad005a"})");
+  WriteContent(Path("later.json"), text);
+  Output({"load", Path("later.json"), Path("later.ksi")});
+  const harness::Result result = Run({"diff", kExample, Path("later.ksi"), "--fail-above", "1"});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err,
+            "ksicache: " + Path("later.ksi") + ": comp-stats: 0xbad005a Permission denied\n");
+  EXPECT_NE(result.out.find("free                                  138092636            -"
+                            "            -\n"),
+            std::string::npos)
+      << result.out;
+  EXPECT_NE(result.out.find("nobody                                                   "
+                            "               -      -\n"),
+            std::string::npos)
+      << result.out;
+  EXPECT_NE(result.out.find("12 machines                           113908928    113908928"),
+            std::string::npos);
+}
+
+// One file is enough.
+TEST_F(Diff, OneFile) {
+  const auto times = [](const std::string& name) {
+    const json diff = Json({name});
+    return diff["before"]["time"].get<std::string>() + " " +
+           diff["after"]["time"].get<std::string>();
+  };
+  EXPECT_EQ(times(kIncident), "2026-11-21T10:02:00Z 2026-11-21T10:06:00Z");
+  EXPECT_EQ(times(kIncident + "@10:04Z"), "2026-11-21T10:04:00Z 2026-11-21T10:06:00Z");
+  EXPECT_EQ(times(kIncident + "@10:03Z..10:05Z"), "2026-11-21T10:03:00Z 2026-11-21T10:05:00Z");
+  EXPECT_EQ(times(kIncident + "@.."), "2026-11-21T10:02:00Z 2026-11-21T10:06:00Z");
+}
+
+TEST_F(Diff, OtherHosts) {
+  const std::string other = ExampleWith("a17.ksi", {{"hypervisor.example.org", "a17"}});
+  ExpectFailure({"diff", kExample, other},
+                "they are of two hosts, hypervisor.example.org and a17: --across-hosts compares "
+                "them");
+  EXPECT_EQ(Output({"diff", kExample, other, "-r", "vm-stats", "--across-hosts"}),
+            R"(hypervisor.example.org, 2026-11-21T10:00:00Z to a17, 2026-11-21T10:00:00Z: 0s
+Another boot or host: groups and processes are matched by their names.
+vm-stats, KB
+
+                               before           after         growth    a second
+
+0 rows changed, 0 of them new and 0 gone; 12 did not
+)");
+}
+
+// A capture alone is compared with what the library reads by itself.
+TEST_F(Diff, WithThisHost) {
+  const harness::Result refused = Run({"diff", kExample});
+  EXPECT_EQ(refused.status, 1);
+  EXPECT_TRUE(refused.err.starts_with("ksicache: they are of two hosts, hypervisor.example.org"))
+      << refused.err;
+  const harness::Result result = Run({"diff", kExample, "-r", "comp-stats", "--across-hosts"});
+  EXPECT_EQ(result.status, 0) << result.err;
+  EXPECT_NE(result.out.find("1 row changed"), std::string::npos) << result.out;
+}
+
+TEST_F(Diff, FailAbove) {
+  const auto status = [](std::vector<std::string> args) {
+    args.insert(args.begin(), "diff");
+    return Run(args).status;
+  };
+  // 136118272 KB.
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "129G"}), 3);
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "130G"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "139385110528"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "139385110527"}), 3);
+  EXPECT_EQ(status({kAfter, kBefore, "--fail-above", "1"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--fail-above", "7g"}), 3);
+  EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--fail-above", "8g", "-u", "mb"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--by", "ballooned", "--fail-above", "3g"}),
+            0);
+  ExpectFailure(
+      {"diff", kBefore, kAfter, "-r", "lpage-stats", "--by", "nrBackings", "--fail-above", "1"},
+      "--fail-above takes memory, and nrBackings is none: --by names another column", 2);
+}
+
+TEST_F(Diff, Misused) {
+  ExpectFailure({"diff", kExample, "--by", "free"}, "--by goes with --report", 2);
+  ExpectFailure({"diff", kExample, "-r", "none"}, "there is no report none", 2);
+  ExpectFailure({"diff", kBefore, kAfter, "-r", "vm-stats", "--by", "none"},
+                "vm-stats has no column none that could grow", 2);
+  ExpectFailure({"diff", kBefore, kAfter, "-r", "vm-stats", "--by", "name"},
+                "vm-stats has no column name that could grow", 2);
+  ExpectFailure({"diff", kExample, "-u", "gb"}, "--unit is mb, kb, pg or b", 2);
+  ExpectFailure({"diff", kExample, "--top", "0"}, "--top takes a number from 1 on: 0", 2);
+  ExpectFailure({"diff", kExample, kExample, "--fail-above", "much"},
+                "--fail-above takes a size such as 500M or 2G: much", 2);
+  ExpectFailure({"diff", kExample, kExample, "--since", "1h"}, "--since takes one FILE", 2);
+  ExpectFailure({"diff", kExample, "--since", "1h", "-r", "vm-stats"},
+                "--since looks at all memory, and takes no --report", 2);
+  ExpectFailure({"diff", kExample, "--since", "1h"}, kExample + ": --since takes a recording");
+  ExpectFailure({"diff", kIncident, "--since", "1h"},
+                kIncident + ": it has 5 moments in that time, and a trend takes 12");
+  ExpectFailure({"diff", kIncident + "@09:00Z"},
+                kIncident +
+                    "@09:00Z: there is no moment so early: moments are of "
+                    "2026-11-21T10:02:00Z to 2026-11-21T10:06:00Z");
+}
+
+}  // namespace
+}  // namespace ksi

@@ -1,0 +1,263 @@
+#include "tests/ksicache/leak_host.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <numbers>
+
+#include <knvlibs/ksi_records.h>
+#include "knvlibs/node_table.h"
+
+namespace ksi {
+namespace {
+
+constexpr uint64_t kMegabyte = 1024;  // in KB
+constexpr uint64_t kTotal = 256 * 1024 * kMegabyte;
+
+constexpr int64_t kRoot = 0;
+constexpr int64_t kServices = 1;
+constexpr int64_t kMachinesGroup = 2;
+constexpr int64_t kFirstMachine = 100;
+constexpr int64_t kFirstProcess = 1000;
+
+template <class Record>
+std::span<const std::byte> BytesOf(const Record& record) {
+  return std::as_bytes(std::span(&record, 1));
+}
+
+Keys KeysOf(int64_t number) { return {{{KeyKind::kNumber, number, {}}}, 1}; }
+
+double Between(double least, double most, std::mt19937_64& random) {
+  return std::uniform_real_distribution<double>(least, most)(random);
+}
+
+template <size_t kSize>
+void PutText(const std::string& text, char (&field)[kSize]) {
+  std::memcpy(field, text.data(), std::min(text.size(), kSize - 1));
+}
+
+std::string Numbered(const char* name, size_t number) { return name + std::to_string(number); }
+
+}  // namespace
+
+Figure::Figure(double base, double noise, Course course, std::mt19937_64& random)
+    : base_(base),
+      noise_(base * noise),
+      course_(course),
+      swing_(base * Between(0.1, 0.5, random)),
+      period_(Between(0.05, 0.4, random)),
+      phase_(Between(0, 1, random)) {}
+
+uint64_t Figure::At(size_t moment, size_t count, double days, std::mt19937_64& random) {
+  const double part = static_cast<double>(moment) / static_cast<double>(count - 1);
+  std::normal_distribution<double> normal;
+  double figure = base_ + growth_ * part + noise_ * normal(random);
+  walked_ += swing_ * normal(random) / std::sqrt(static_cast<double>(count));
+  switch (course_) {
+    case Course::level:
+      break;
+    case Course::sawTooth:
+      figure += swing_ * std::fmod(part / period_ + phase_, 1);
+      break;
+    case Course::dailyWave:
+      figure += swing_ * std::sin(2 * std::numbers::pi * (days + phase_));
+      break;
+    case Course::step:
+      figure += part > phase_ ? swing_ : 0;
+      break;
+    case Course::walk:
+      figure += walked_;
+      break;
+  }
+  // The kernel counts pages.
+  return std::max<int64_t>(0, std::llround(figure / 4)) * 4;
+}
+
+LeakHost::LeakHost(uint32_t seed, size_t count) : random_(seed), count_(count) {
+  for (Figure& figure : mapped_) figure = MakeFigure(8e6);
+  for (Figure& figure : saved_) figure = MakeFigure(1e6);
+  for (Figure& figure : overhead_) figure = MakeFigure(2e5);
+  for (Figure& figure : resident_) figure = MakeFigure(5e5);
+  for (Figure& figure : tables_) figure = MakeFigure(8e3);
+  for (Figure& figure : heaps_) figure = MakeFigure(1e5);
+  for (Figure& figure : pools_) figure = MakeFigure(1e6);
+  kernel_ = MakeFigure(4e6);
+  caches_ = MakeFigure(1e7);
+}
+
+Figure LeakHost::MakeFigure(double base) {
+  const auto course = static_cast<Course>(random_() % 5);
+  return {base * Between(0.5, 2, random_), Between(0.005, 0.03, random_), course, random_};
+}
+
+// The one that leaks does nothing else but what noise does; all others go on.
+void LeakHost::Leak(Kind kind) {
+  const auto leak = [this](Figure& figure, double base, double sign) {
+    figure = {base, Between(0.005, 0.03, random_), Course::level, random_};
+    figure.Leak(sign * Between(4, 30, random_) * figure.Noise());
+  };
+  const auto guilty = [this](const char* what, const std::string& name) {
+    what_ = what;
+    name_ = name;
+  };
+  const size_t number = random_() % kPools;
+  switch (kind) {
+    case Kind::heap:
+      leak(heaps_[number], 1e5, 1);
+      return guilty("heaps", Numbered("heap", number));
+    case Kind::machine:
+      leak(mapped_[number], 8e6, 1);
+      // What it shares would come between.
+      saved_[number] = {1e5, 0.01, Course::level, random_};
+      return guilty("machines", Numbered("vm", number));
+    case Kind::process:
+      leak(resident_[number], 5e5, 1);
+      return guilty("user worlds", Numbered("process", number));
+    case Kind::pageTables:
+      leak(tables_[number], 8e3, 1);
+      return guilty("page tables", Numbered("process", number));
+    case Kind::largePages:
+      leak(pools_[number], 1e6, 1);
+      return guilty("pools of large pages", Numbered("huge", number) + " of node 0");
+    case Kind::sharing:
+      leak(saved_[number], 4e6, -1);
+      return guilty("page sharing", Numbered("vm", number));
+  }
+}
+
+uint64_t LeakHost::Now(Figure& figure) {
+  const double days = static_cast<double>(moment_) * static_cast<double>(Every()) / 86400;
+  return figure.At(moment_, count_, days, random_);
+}
+
+void LeakHost::AddGroup(int64_t id, const std::string& name, int64_t parent, uint32_t flags,
+                        uint64_t consumed, uint64_t overhead,
+                        const std::vector<int64_t>& children) {
+  KSI_GroupName nameRecord = {};
+  PutText(name, nameRecord.text);
+  KSI_GroupMemoryStats stats = {};
+  stats.consumed = consumed;
+  stats.ovhd = overhead;
+  const auto add = [&](uint16_t node, const auto& record) {
+    builder_.AddValue(*FindNode(node), KeysOf(id), BytesOf(record));
+  };
+  add(node::sched_groups_groupName, nameRecord);
+  add(node::sched_groups_groupTag, KSI_GroupTag{});
+  add(node::sched_groups_parentGroupID, parent);
+  add(node::sched_groups_groupFlags, flags);
+  add(node::sched_groups_groupLeaderID, static_cast<int32_t>(id));
+  add(node::sched_groups_memAllocationInKB, KSI_GroupAllocation{0, -1, 0, -1, {}});
+  add(node::sched_groups_stats_capacity, KSI_GroupCapacity{});
+  add(node::sched_groups_stats_memoryStats, stats);
+  std::vector<Key> list;
+  for (const int64_t child : children) list.push_back({KeyKind::kNumber, child, {}});
+  builder_.AddList(*FindNode(node::sched_groups_members_groups), KeysOf(id), list);
+}
+
+void LeakHost::AddMachines() {
+  std::vector<int64_t> machines;
+  uint64_t all = 0;
+  for (size_t i = 0; i < kMachines; ++i) {
+    const int64_t id = kFirstMachine + 10 * static_cast<int64_t>(i);
+    machines.push_back(id);
+    KSI_VmmTally tally = {};
+    tally.memSizeLimit = tally.memSize = 64 * 1024 * kMegabyte;
+    tally.sharedSaved = tally.shared = Now(saved_[i]);
+    tally.mapped = Now(mapped_[i]) + 8 * 1024 * kMegabyte;
+    const uint64_t overhead = Now(overhead_[i]);
+    const uint64_t consumed = tally.mapped - tally.sharedSaved + overhead;
+    all += consumed;
+    AddGroup(id, Numbered("vm", i), kMachinesGroup, KSI_GROUP_VM, consumed, overhead, {id + 1});
+    AddGroup(id + 1, "vmm", id, KSI_GROUP_LEAF | KSI_GROUP_VMM_SUB_CONTAINER, consumed, 0, {});
+    const Keys client = KeysOf(id);
+    builder_.AddValue(*FindNode(node::sched_memClients_tally_vmm), client, BytesOf(tally));
+    builder_.AddValue(*FindNode(node::sched_memClients_swapInfo), client, BytesOf(KSI_SwapInfo{}));
+    builder_.AddValue(*FindNode(node::worldGroups_vmmLeaderID), client,
+                      BytesOf(static_cast<int32_t>(id)));
+  }
+  AddGroup(kMachinesGroup, "machines", kRoot, KSI_GROUP_PREDEFINED, all, 0, machines);
+  consumed_ += all;
+}
+
+void LeakHost::AddProcesses() {
+  std::vector<int64_t> processes;
+  uint64_t all = 0;
+  for (size_t i = 0; i < kProcesses; ++i) {
+    const int64_t id = kFirstProcess + static_cast<int64_t>(i);
+    processes.push_back(id);
+    KSI_UwTally tally = {};
+    tally.max = tally.minLimit = -1;
+    tally.mapped = tally.memSize = Now(resident_[i]);
+    all += tally.mapped;
+    AddGroup(id, Numbered("process", i), kServices, KSI_GROUP_LEAF | KSI_GROUP_USER_WORLD,
+             tally.mapped, Now(tables_[i]), {});
+    builder_.AddValue(*FindNode(node::sched_memClients_tally_uw), KeysOf(id), BytesOf(tally));
+  }
+  AddGroup(kServices, "services", kRoot, KSI_GROUP_PREDEFINED, all, 0, processes);
+  consumed_ += all;
+}
+
+void LeakHost::AddHost() {
+  const auto add = [this](uint16_t node, const Keys& keys, const auto& record) {
+    builder_.AddValue(*FindNode(node), keys, BytesOf(record));
+  };
+  const auto text = [](const std::string& name) { return Key{KeyKind::kText, 0, name}; };
+  std::vector<std::string> names;
+  std::vector<Key> list;
+  for (size_t i = 0; i < kHeaps; ++i) names.push_back(Numbered("heap", i));
+  for (size_t i = 0; i < kHeaps; ++i) {
+    list.push_back(text(names[i]));
+    KSI_HeapStats heap = {};
+    PutText(names[i], heap.name);
+    heap.max = 2U << 30;
+    heap.size = 1U << 30;
+    heap.avail = heap.size - static_cast<uint32_t>(Now(heaps_[i])) * 1024;
+    add(node::system_heaps_stats, {{text(names[i])}, 1}, heap);
+  }
+  builder_.AddList(*FindNode(node::system_heaps), {}, list);
+
+  KSI_MemInfo info = {};
+  info.numNodes = 1;
+  add(node::memory_memInfo, {}, info);
+  add(node::sched_globalStats_numVMs, {}, uint32_t{kMachines});
+  add(node::memory_lpage_nodeList_psharePool, KeysOf(0), KSI_LargePagePool{});
+  list.clear();
+  names.clear();
+  for (size_t i = 0; i < kPools; ++i) names.push_back(Numbered("huge", i));
+  for (size_t i = 0; i < kPools; ++i) {
+    list.push_back(text(names[i]));
+    KSI_LargePagePool pool = {};
+    pool.nrLPages = 4096;
+    pool.nrFreeSPages = pool.nrLPages * 512 - static_cast<uint32_t>(Now(pools_[i]) / 4);
+    add(node::memory_lpage_nodeList_vmPools, {{{KeyKind::kNumber, 0, {}}, text(names[i])}, 2},
+        pool);
+  }
+  builder_.AddList(*FindNode(node::memory_lpage_nodeList_vmPools), KeysOf(0), list);
+  add(node::memory_pshare_stats, {}, KSI_PshareStats{});
+
+  KSI_Comprehensive memory = {};
+  memory.total = memory.managedByMemMap = kTotal;
+  memory.dataAndHeap = Now(kernel_);
+  memory.knvClientConsumed = Now(caches_);
+  memory.otherConsumed = consumed_;
+  memory.free = kTotal - memory.dataAndHeap - memory.knvClientConsumed - memory.otherConsumed;
+  add(node::memory_comprehensive, {}, memory);
+  add(node::sched_globalStats_memory_tally, {}, KSI_GlobalTally{});
+  for (const std::string_view state : kMemoryStates) {
+    add(node::sched_globalStats_memory_stateTransitions, {{{KeyKind::kText, 0, state}}, 1},
+        KSI_StateTransitions{});
+  }
+}
+
+std::vector<MomentReading> LeakHost::Next() {
+  consumed_ = 0;
+  AddMachines();
+  AddProcesses();
+  AddGroup(kRoot, "host", -1, KSI_GROUP_PREDEFINED, consumed_, 0, {kServices, kMachinesGroup});
+  AddHost();
+  ++moment_;
+  return builder_.Take();
+}
+
+}  // namespace ksi

@@ -1,0 +1,90 @@
+// A host's memory at one moment, and who has it.
+#ifndef TOOLS_KSICACHE_DIFF_MEMORY_H_
+#define TOOLS_KSICACHE_DIFF_MEMORY_H_
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "tools/ksicache/report_run.h"
+
+namespace ksicache {
+
+// Of what the things are that have memory.
+enum class Part : uint8_t {
+  machines,
+  overheads,
+  userWorlds,
+  pageTables,
+  heaps,
+  groups,
+  heapUse,
+  largePages,
+  machineSharing,
+  hostSharing,
+};
+
+struct PartInfo {
+  Part part;
+  const char* name;    // of many
+  const char* of;      // what stands before the name of one
+  const char* source;  // the report and the column
+  bool isAdded;        // to what is explained: no two that are added have memory in common
+  bool isSaved;        // it is memory that is not needed: what is lost of it grows elsewhere
+};
+
+inline constexpr PartInfo kParts[] = {
+    {Part::machines, "machines", "machine ", "vm-stats consumed", true, false},
+    {Part::overheads, "overheads of machines", "overhead of ", "vm-stats ovhd", true, false},
+    {Part::userWorlds, "user worlds", "user world ", "uw-stats consumed", true, false},
+    {Part::pageTables, "page tables", "page tables of ", "group-stats ovhd", true, false},
+    {Part::heaps, "heaps", "heap ", "heap-stats size", true, false},
+    {Part::groups, "groups", "group ", "group-stats consumed", false, false},
+    {Part::heapUse, "heaps", "heap ", "heap-stats used", false, false},
+    {Part::largePages, "pools of large pages", "large pages ", "lpool-stats nrLPages", false,
+     false},
+    {Part::machineSharing, "page sharing", "sharing lost by ", "vm-stats sharedSaved", false, true},
+    {Part::hostSharing, "page sharing", "sharing lost by ", "pshare-stats reclaimed", false, true},
+};
+
+constexpr const PartInfo& InfoOf(Part part) { return kParts[static_cast<size_t>(part)]; }
+
+// What one thing has, in bytes.
+struct Amount {
+  std::string identity;  // in its part
+  std::string name;
+  int64_t number = -1;  // the kernel's, of a group; -1: it has none
+  std::optional<int64_t> bytes;
+  std::optional<int64_t> limit;  // that it cannot grow beyond
+};
+
+// The host's own figures, in bytes.
+struct HostMemory {
+  std::optional<int64_t> total;
+  std::optional<int64_t> free;
+  std::optional<int64_t> kernel;
+  std::optional<int64_t> caches;
+  std::optional<int64_t> others;
+};
+
+struct Memory {
+  HostMemory host;
+  // None: it could not be told who they are.
+  std::array<std::optional<std::vector<Amount>>, std::size(kParts)> parts;
+  std::vector<std::string> complaints;  // why reports have failed
+
+  const std::optional<std::vector<Amount>>& Of(Part part) const {
+    return parts[static_cast<size_t>(part)];
+  }
+};
+
+// Reads that of the moment which the library answers from. `byPath`: the numbers of groups and
+// processes are not to be part of identities, but the names on the way to them.
+Memory ReadMemory(const Origin& origin, bool byPath);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_DIFF_MEMORY_H_

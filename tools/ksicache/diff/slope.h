@@ -1,0 +1,51 @@
+// Slopes that a few wild points, steps and saw-teeth do not bend.
+#ifndef TOOLS_KSICACHE_DIFF_SLOPE_H_
+#define TOOLS_KSICACHE_DIFF_SLOPE_H_
+
+#include <cstddef>
+#include <optional>
+#include <span>
+
+namespace ksicache {
+
+struct Point {
+  double x;
+  double y;
+};
+
+// The median of the slopes between all pairs of points, half of which may be anything (Theil and
+// Sen). Of more than kMostPairedPoints so many, evenly spread, are taken. 0 if no two have
+// different x.
+inline constexpr size_t kMostPairedPoints = 400;
+double MedianSlope(std::span<const Point> points);
+
+// The fewest points that a trend can be told from: one for each of its stretches.
+inline constexpr size_t kStretches = 12;
+
+// A line through the medians of the stretches of a series, each as many points long.
+struct Trend {
+  double growth;  // of the line, from the first point to the last
+  double wander;  // between the medians that lie farthest above and below the line
+  double noise;   // what the wander would be if noise alone moved each point; 0: not known
+
+  // Whether it grew all the time. Where the points are moved by noise alone, the growth has to
+  // stand out from that. Where chance carries a figure on from point to point the wander is larger
+  // than the noise, and such a figure hardly ever grows by so many times its wander; no more does
+  // one that goes up and down, or in a step.
+  bool IsSteady() const {
+    constexpr double kTimesNoise = 2;
+    constexpr double kMostNoise = 1.8;
+    constexpr double kTimesWander = 8;
+    if (growth <= 0) return false;
+    const bool isNoise = wander < kMostNoise * noise;
+    return growth > kTimesWander * wander || (isNoise && growth > kTimesNoise * noise);
+  }
+};
+
+// None of too few points.
+// REQUIRES: x does not fall.
+std::optional<Trend> TrendOf(std::span<const Point> points);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_DIFF_SLOPE_H_

@@ -1,0 +1,158 @@
+#include "tools/ksicache/diff/steady_output.h"
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <span>
+#include <string>
+
+#include "tools/ksicache/diff/json_text.h"
+#include "tools/ksicache/diff/text.h"
+#include "tools/ksicache/diff/unit.h"
+#include "tools/ksicache/output.h"
+
+namespace ksicache {
+namespace {
+
+constexpr double kHour = 3600;
+
+using Growths = std::vector<SteadyGrowth>;
+
+std::span<const SteadyGrowth> FirstOf(const Growths& growths, size_t top) {
+  return std::span(growths).first(std::min(top, growths.size()));
+}
+
+std::optional<int64_t> In(tally::DisplayUnit unit, std::optional<double> bytes) {
+  if (!bytes || !(std::fabs(*bytes) < 9e18)) return std::nullopt;
+  return std::llround(*bytes / static_cast<double>(BytesIn(unit)));
+}
+
+std::optional<int64_t> In(tally::DisplayUnit unit, std::optional<int64_t> bytes) {
+  if (!bytes) return bytes;
+  return *bytes / BytesIn(unit);
+}
+
+std::optional<double> PerHour(const SteadyGrowth& growth) {
+  if (!growth.perSecond) return std::nullopt;
+  return *growth.perSecond * kHour;
+}
+
+class Screen {
+ public:
+  Screen(tally::DisplayUnit unit, size_t top) : unit_(unit), top_(top) {}
+
+  void Print(const SteadyGrowths& growths) const {
+    const double seconds = static_cast<double>(growths.last.taken - growths.first.taken) / 1e6;
+    PrintLine(growths.last.host + ", " + growths.first.time + " to " + growths.last.time + ": " +
+              DurationText(seconds));
+    PrintLine(std::to_string(growths.samples) + " of " + std::to_string(growths.moments) +
+              " moments read" + (growths.isSinceBoot ? ", since the host was started" : ""));
+    PrintLine("");
+    Header(tally::UnitTitle(unit_));
+    for (const SteadyGrowth& growth : growths.host) PrintGrowth(growth, growth.name);
+    PrintLine("");
+    PrintAll("who grows steadily", "nobody grows steadily", growths.things);
+    if (growths.groups.empty()) return;
+    PrintLine("");
+    PrintAll("groups, which contain the above", "", growths.groups);
+  }
+
+ private:
+  static void Header(const std::string& what) {
+    PrintLine(OnTheLeft(what, 34) + OnTheRight("now", 13) + OnTheRight("growth", 12) +
+              OnTheRight("an hour", 11) + OnTheRight("full in", 10));
+  }
+
+  void PrintGrowth(const SteadyGrowth& growth, const std::string& name) const {
+    const std::string full = growth.fullIn ? DurationText(*growth.fullIn) : "";
+    std::string line = OnTheLeft(name, 34) + OnTheRight(NumberText(In(unit_, growth.now)), 13) +
+                       OnTheRight(NumberText(In(unit_, growth.growth)), 12) +
+                       OnTheRight(NumberText(In(unit_, PerHour(growth))), 11);
+    if (!full.empty()) line += OnTheRight(full, 10);
+    PrintLine(line);
+  }
+
+  void PrintAll(const char* title, const char* none, const Growths& growths) const {
+    if (growths.empty()) return PrintLine(none);
+    Header(title);
+    std::map<std::string, int> known;
+    for (const SteadyGrowth& growth : growths) ++known[growth.info->of + growth.name];
+    for (const SteadyGrowth& growth : FirstOf(growths, top_)) {
+      const std::string name = growth.info->of + growth.name;
+      const bool isNumbered = known[name] > 1 && growth.number >= 0;
+      PrintGrowth(growth, name + (isNumbered ? " " + std::to_string(growth.number) : ""));
+    }
+    const size_t more = growths.size() - FirstOf(growths, top_).size();
+    if (more != 0) PrintLine("and " + std::to_string(more) + " more");
+  }
+
+  tally::DisplayUnit unit_;
+  size_t top_;
+};
+
+void PutGrowth(const SteadyGrowth& growth, tally::DisplayUnit unit, JsonText& json) {
+  json.NewLine();
+  json.Begin('{');
+  if (growth.info != nullptr) {
+    json.Name("what");
+    json.PutText(growth.info->name);
+    json.Name("source");
+    json.PutText(growth.info->source);
+  }
+  json.Name("name");
+  json.PutText(std::string_view(growth.name).substr(growth.name.find_first_not_of(' ')));
+  if (growth.number >= 0) {
+    json.Name("group");
+    json.PutNumber(growth.number);
+  }
+  json.Name("now");
+  json.PutNumber(In(unit, growth.now));
+  json.Name("growth");
+  json.PutNumber(In(unit, growth.growth));
+  json.Name("perHour");
+  json.PutNumber(In(unit, PerHour(growth)));
+  json.Name("fullInSeconds");
+  json.PutReal(growth.fullIn);
+  json.End('}');
+}
+
+void PutGrowths(const char* name, std::span<const SteadyGrowth> growths, tally::DisplayUnit unit,
+                JsonText& json) {
+  json.Name(name);
+  json.Begin('[');
+  for (const SteadyGrowth& growth : growths) PutGrowth(growth, unit, json);
+  json.End(']');
+}
+
+}  // namespace
+
+void PrintSteady(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t top) {
+  Screen(unit, top).Print(growths);
+}
+
+void PrintSteadyJson(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t top) {
+  JsonText json;
+  json.Begin('{');
+  json.Name("host");
+  json.PutText(growths.last.host);
+  json.Name("from");
+  json.PutText(growths.first.time);
+  json.Name("to");
+  json.PutText(growths.last.time);
+  json.Name("sinceBoot");
+  json.PutFlag(growths.isSinceBoot);
+  json.Name("moments");
+  json.PutNumber(static_cast<int64_t>(growths.moments));
+  json.Name("read");
+  json.PutNumber(static_cast<int64_t>(growths.samples));
+  json.Name("unit");
+  json.PutText(tally::UnitTitle(unit));
+  PutGrowths("memory", growths.host, unit, json);
+  PutGrowths("things", FirstOf(growths.things, top), unit, json);
+  PutGrowths("groups", FirstOf(growths.groups, top), unit, json);
+  json.End('}');
+  json.NewLine();
+  json.Flush();
+}
+
+}  // namespace ksicache

@@ -1,0 +1,34 @@
+// How figures stand in the tables that people read, which are 80 columns wide.
+#ifndef TOOLS_KSICACHE_DIFF_TEXT_H_
+#define TOOLS_KSICACHE_DIFF_TEXT_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace ksicache {
+
+// What stands for a figure that has no value.
+inline constexpr const char* kNoFigure = "-";
+
+// "5m 0s", "2d 3h": the two largest units.
+std::string DurationText(double seconds);
+
+std::string NumberText(std::optional<int64_t> number);
+
+// With one digit behind the point, and with more where it would be 0.
+std::string RateText(std::optional<double> rate);
+
+// The part of a whole in percent: "12%", "<1%". None without a whole.
+std::string PartText(std::optional<int64_t> part, std::optional<int64_t> whole);
+
+// The text in `width` columns; one that is too long loses its middle on the left, and keeps all on
+// the right.
+std::string OnTheLeft(std::string_view text, size_t width);
+std::string OnTheRight(std::string_view text, size_t width);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_DIFF_TEXT_H_
