@@ -3,6 +3,8 @@
 //   groups COUNT   COUNT groups below the root, in containers of 1,000
 //   deep           a chain of 12 levels, with 2,000 groups beside its sixth
 //   vms COUNT      COUNT virtual machines
+//   processes COUNT  COUNT user worlds in containers of 1,000, and what the host tells of its
+//   memory
 //
 // Figures come from a generator with a fixed seed: rows differ in their digits, as real ones do.
 
@@ -72,6 +74,34 @@ class Host {
     Value("sched/memClients/swapInfo", client, swap);
   }
 
+  // What the report on user worlds reads of the world group `client` of group `id`.
+  void AddUserWorld(int64_t id, int32_t client) {
+    Value("sched/groups/groupLeaderID", id, client);
+    KSI_UwTally uw{};
+    uw.memSize = uw.mapped = uw.pageable = Unsigned();
+    Value("sched/memClients/tally/uw", client, uw);
+  }
+
+  // The memory of the host, with a heap.
+  void AddMemory() {
+    KSI_Comprehensive memory{};
+    memory.total = memory.managedByMemMap = uint64_t{1} << 30;
+    memory.free = Unsigned();
+    Value("memory/comprehensive", memory);
+    Value("sched/globalStats/memory/tally", KSI_GlobalTally{});
+    for (const std::string_view state : ksi::kMemoryStates) {
+      writer_.AddValue(Node("sched/globalStats/memory/stateTransitions"),
+                       {{{ksi::KeyKind::kText, 0, state}}, 1},
+                       std::as_bytes(std::span(&kTransitions, 1)));
+    }
+    const ksi::Key heap = {ksi::KeyKind::kText, 0, "heap"};
+    writer_.AddList(Node("system/heaps"), {}, std::span(&heap, 1));
+    KSI_HeapStats stats{};
+    std::snprintf(stats.name, sizeof stats.name, "heap");
+    stats.size = 1U << 20;
+    writer_.AddValue(Node("system/heaps/stats"), {{heap}, 1}, std::as_bytes(std::span(&stats, 1)));
+  }
+
   void Commit() {
     writer_.Commit({.signature = std::string(ksi::kDefinitions.signature),
                     .built = std::string(ksi::kDefinitions.built),
@@ -80,6 +110,8 @@ class Host {
   }
 
  private:
+  static constexpr KSI_StateTransitions kTransitions = {};
+
   static const ksi::Node& Node(std::string_view path) { return *ksi::FindNode(path); }
 
   static ksi::Keys Keys(int64_t number) {
@@ -91,6 +123,11 @@ class Host {
   template <class Record>
   void Value(std::string_view path, int64_t key, const Record& record) {
     writer_.AddValue(Node(path), Keys(key), std::as_bytes(std::span(&record, 1)));
+  }
+
+  template <class Record>
+  void Value(std::string_view path, const Record& record) {
+    writer_.AddValue(Node(path), {}, std::as_bytes(std::span(&record, 1)));
   }
 
   int64_t Amount() { return static_cast<int64_t>(Unsigned()); }
@@ -106,7 +143,8 @@ std::vector<int64_t> Range(int64_t from, int64_t count) {
   return ids;
 }
 
-void AddGroups(Host& host, int64_t count) {
+// `flags`: of the groups in the containers.
+void AddGroups(Host& host, int64_t count, uint32_t flags) {
   constexpr int64_t kContainerSize = 1000;
   // A container's id stands before those of its groups.
   constexpr int64_t kStride = kContainerSize + 1;
@@ -116,7 +154,12 @@ void AddGroups(Host& host, int64_t count) {
     containers.push_back(container);
     const std::vector<int64_t> groups =
         Range(container + 1, std::min(kContainerSize, count - made));
-    for (const int64_t group : groups) host.AddGroup(group, container, KSI_GROUP_LEAF, {});
+    for (const int64_t group : groups) {
+      host.AddGroup(group, container, flags, {});
+      if ((flags & KSI_GROUP_USER_WORLD) != 0) {
+        host.AddUserWorld(group, static_cast<int32_t>(group));
+      }
+    }
     host.AddGroup(container, kRoot, KSI_GROUP_CONTAINER, groups);
   }
   host.AddGroup(kRoot, kNoParent, KSI_GROUP_PREDEFINED, containers);
@@ -155,13 +198,16 @@ void AddVirtualMachines(Host& host, int64_t count) {
 int Make(const std::string& fileName, std::string_view shape, int64_t count) {
   Host host(fileName);
   if (shape == "groups") {
-    AddGroups(host, count);
+    AddGroups(host, count, KSI_GROUP_LEAF);
   } else if (shape == "deep") {
     AddDeep(host);
   } else if (shape == "vms") {
     AddVirtualMachines(host, count);
+  } else if (shape == "processes") {
+    AddGroups(host, count, KSI_GROUP_LEAF | KSI_GROUP_USER_WORLD);
+    host.AddMemory();
   } else {
-    std::fputs("make_cache: SHAPE is groups, deep or vms\n", stderr);
+    std::fputs("make_cache: SHAPE is groups, deep, vms or processes\n", stderr);
     return 2;
   }
   host.Commit();
@@ -172,7 +218,7 @@ int Make(const std::string& fileName, std::string_view shape, int64_t count) {
 
 int main(int argc, char** argv) {
   if (argc < 3) {
-    std::fputs("Usage: make_cache FILE groups|deep|vms [COUNT]\n", stderr);
+    std::fputs("Usage: make_cache FILE groups|deep|vms|processes [COUNT]\n", stderr);
     return 2;
   }
   try {

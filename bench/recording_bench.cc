@@ -77,6 +77,7 @@ class Model {
     const uint16_t node =
         ksi::IdOf(*ksi::FindNode(ksi::RecordedNodes()[reading.question.node].path));
     return node == ksi::node::sched_groups_groupFlags ||
+           node == ksi::node::sched_groups_parentGroupID ||
            node == ksi::node::sched_groups_groupLeaderID ||
            node == ksi::node::worldGroups_vmmLeaderID || node == ksi::node::memory_memInfo;
   }
@@ -124,19 +125,32 @@ class Model {
     }
   }
 
-  // The root has all other groups, and the first groups a machine each.
+  // The root has all other groups but those of the machines' monitors, which the first groups have,
+  // with a machine each.
   static void FillList(const ksi::Node& node, ksi::Kind kind, int number,
                        std::vector<ksi::OwnKey>& entries) {
     if (kind != ksi::Kind::kList) return;
     const auto add = [&](int first, int end) {
       for (int i = first; i < end; ++i) entries.push_back(NameOf(node.entries, i));
     };
-    if (node.entries == ksi::Instance::kGroup && number == 0) add(1, kGroups);
-    if (node.entries == ksi::Instance::kClient && number > 0 && number < kMachines) {
-      add(number, number + 1);
+    if (node.entries == ksi::Instance::kGroup && number == 0) {
+      add(1, kMachines);
+      add(2 * kMachines, kGroups);
     }
+    if (node.entries == ksi::Instance::kGroup && IsMachine(number)) {
+      add(kMachines + number, kMachines + number + 1);
+    }
+    if (node.entries == ksi::Instance::kClient && IsMachine(number)) add(number, number + 1);
     if (node.entries == ksi::Instance::kHeap) add(0, kHeaps);
     if (node.entries == ksi::Instance::kRemapType) add(0, 3);
+  }
+
+  static bool IsMachine(int group) { return group > 0 && group < kMachines; }
+  static bool IsMonitor(int group) { return IsMachine(group - kMachines); }
+
+  static uint32_t FlagsOf(int group) {
+    if (IsMachine(group)) return KSI_GROUP_VM;
+    return IsMonitor(group) ? KSI_GROUP_VMM_SUB_CONTAINER : KSI_GROUP_USER_CREATED;
   }
 
   static ksi::OwnKey NameOf(ksi::Instance instance, int number) {
@@ -154,7 +168,10 @@ class Model {
     };
     switch (node) {
       case ksi::node::sched_groups_groupFlags:
-        put(static_cast<uint32_t>(number > 0 && number < kMachines ? KSI_GROUP_VM : 0));
+        put(FlagsOf(number));
+        break;
+      case ksi::node::sched_groups_parentGroupID:
+        put(int64_t{IsMonitor(number) ? number - kMachines : number == 0 ? -1 : 0});
         break;
       case ksi::node::sched_groups_groupLeaderID:
       case ksi::node::worldGroups_vmmLeaderID:

@@ -80,5 +80,44 @@ TEST_F(DiffSince, IsQuietWhereNothingLeaks) {
   EXPECT_LE(alarms, 1U);
 }
 
+// The screen, with when what is full.
+TEST_F(DiffSince, Screen) {
+  LeakHost host(2, kMoments);
+  host.Leak(LeakHost::Kind::heap);
+  Record(Path("r.rec"), MomentsOf(host));
+  const std::string out = Output({"diff", "--since", "7d", Path("r.rec"), "--top", "1"});
+  EXPECT_EQ(out, R"(h, 2026-11-21T10:00:00Z to 2026-11-23T09:40:48Z: 1d 23h
+150 of 150 moments read
+
+KB                                          now      growth    an hour   full in
+free                                  178999464           -          -
+in use                                 89435992           -          -
+  kernel                                6698168           -          -
+  caches                               10659072           -          -
+  others                               72078752           -          -
+
+who grows steadily                          now      growth    an hour   full in
+heap heap0                               110844       10728        225  367d 20h
+)");
+}
+
+// What was before the host was started anew is left out, and names are matched across it.
+TEST_F(DiffSince, AfterAReboot) {
+  LeakHost host(2, kMoments);
+  std::vector<Moment> moments = MomentsOf(host);
+  for (size_t i = 0; i < moments.size(); ++i) moments[i].host.boot = i < 100 ? "1" : "2";
+  const json steady = SteadyOf(moments);
+  EXPECT_EQ(steady["sinceBoot"], true);
+  EXPECT_EQ(steady["moments"], 50);
+  const json diff = json::parse(Output({"diff", Path("r.rec"), "-r", "uw-stats", "--json"}));
+  EXPECT_EQ(diff["rebooted"], true);
+  EXPECT_EQ(diff["changed"], 8);
+  for (const json& row : diff["rows"]) EXPECT_EQ(row["state"], "changed") << row;
+  EXPECT_TRUE(
+      Output({"diff", Path("r.rec")})
+          .find("Another boot or host: groups and processes are matched by their names.\n") !=
+      std::string::npos);
+}
+
 }  // namespace
 }  // namespace ksi

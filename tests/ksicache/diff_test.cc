@@ -1,7 +1,12 @@
 // What two moments differ in, and who explains it.
 #include <nlohmann/json.hpp>
 
+#include <cstdint>
+#include <cstdlib>
+#include <random>
+#include <regex>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tests/ksicache/export_fixture.h"
@@ -30,6 +35,27 @@ class Diff : public ExportTest {
                     std::vector<std::pair<std::string, std::string>> changes) const {
     changes.emplace_back("2026-11-21T10:00:00Z", "2026-11-21T10:10:00Z");
     return ExampleWith(name, changes);
+  }
+
+  // Each of the figures that are compared is up to twice what it was, or a tenth, or not known;
+  // names of heaps and user worlds may be others.
+  static std::string WithOtherFigures(const std::string& text, std::mt19937& random) {
+    static const std::regex kFigure(
+        R"re("(mapped|sharedSaved|ovhd|consumed|size|free|total)":([0-9]+))re");
+    std::string changed;
+    auto from = text.begin();
+    for (std::sregex_iterator match(text.begin(), text.end(), kFigure), end; match != end;
+         ++match) {
+      const uint64_t figure = std::stoull((*match)[2]);
+      const bool isUnknown = random() % 30 == 0 && (*match)[1] != "free" && (*match)[1] != "total";
+      const uint64_t now = isUnknown ? UINT64_MAX : figure * (1 + random() % 20) / 10;
+      const bool isKept = random() % 2 == 0 || (*match)[1] == "size";
+      changed.append(from, text.begin() + match->position());
+      changed += "\"" + (*match)[1].str() + "\":" + std::to_string(isKept ? figure : now);
+      from = text.begin() + match->position() + match->length();
+    }
+    changed.append(from, text.end());
+    return changed;
   }
 
   static json RowCalled(const json& rows, const std::string& column, const std::string& name) {
@@ -282,6 +308,38 @@ TEST_F(Diff, FailAbove) {
   ExpectFailure(
       {"diff", kBefore, kAfter, "-r", "lpage-stats", "--by", "nrBackings", "--fail-above", "1"},
       "--fail-above takes memory, and nrBackings is none: --by names another column", 2);
+}
+
+// Whatever becomes of a host, what is printed adds up, in any unit: the rows to their part, and the
+// parts and nobody to what is in use.
+TEST_F(Diff, AddsUp) {
+  std::mt19937 random(14);
+  const std::string text = FileContent(TALLY_EXAMPLE_JSON);
+  for (int i = 0; i < 20; ++i) {
+    SCOPED_TRACE(i);
+    WriteContent(Path("later.json"), WithOtherFigures(text, random));
+    Output({"load", "--force", Path("later.json"), Path("later.ksi")});
+    for (const char* unit : {"kb", "mb", "b"}) {
+      const json diff = Json({kExample, Path("later.ksi"), "-u", unit, "--top", "1000"});
+      const auto growthOf = [](const json& of) { return of["growth"].get<int64_t>(); };
+      int64_t all = diff["nobody"].get<int64_t>();
+      for (const json& part : diff["parts"]) {
+        if (!part["added"].get<bool>()) continue;
+        all += growthOf(part);
+        int64_t rows = 0;
+        for (const json& row : part["rows"]) {
+          rows += growthOf(row);
+          ASSERT_EQ(growthOf(row), row["after"].get<int64_t>() - row["before"].get<int64_t>());
+        }
+        // A row drops less than a unit at each moment.
+        const int64_t most = unit == std::string("mb") ? part["count"].get<int64_t>() + 1 : 0;
+        ASSERT_LE(std::abs(growthOf(part) - rows), most) << part;
+      }
+      ASSERT_EQ(all, growthOf(diff["host"]["used"]));
+      ASSERT_EQ(growthOf(diff["host"]["used"]),
+                growthOf(diff["host"]["total"]) - growthOf(diff["host"]["free"]));
+    }
+  }
 }
 
 TEST_F(Diff, Misused) {

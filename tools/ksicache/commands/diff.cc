@@ -69,7 +69,7 @@ int DiffHost(const CommandLine& line) {
   Complaints complaints;
   ReadBoth(sides, [&](const Origin& origin, bool isAfter) {
     complaints.BeginFile(isAfter ? sides.names.after : sides.names.before);
-    memory[isAfter] = ReadMemory(origin, !sides.HaveSameNumbers());
+    memory[isAfter] = ReadMemory(origin, {.byPath = !sides.HaveSameNumbers()});
     complaints.SayDiagnostics();
     for (const std::string& complaint : memory[isAfter].complaints) complaints.Say(complaint);
   });

@@ -30,8 +30,8 @@ std::optional<int64_t> Times(std::optional<int64_t> number, int64_t size) {
 
 class Reader {
  public:
-  Reader(const Origin& origin, bool byPath) : origin_(origin) {
-    if (byPath) Try([&] { paths_.emplace(origin_); });
+  Reader(const Origin& origin, const MemoryOptions& options) : origin_(origin), options_(options) {
+    if (options.byPath) Try([&] { paths_.emplace(origin_); });
   }
 
   Memory Run() {
@@ -40,8 +40,10 @@ class Reader {
     ReadUserWorlds();
     ReadGroups();
     ReadHeaps();
-    ReadLargePages();
-    ReadSharing();
+    if (options_.isAll) {
+      ReadLargePages();
+      ReadSharing();
+    }
     return std::move(memory_);
   }
 
@@ -194,6 +196,7 @@ class Reader {
   }
 
   const Origin& origin_;
+  const MemoryOptions& options_;
   std::optional<GroupPaths> paths_;
   std::unordered_set<int64_t> machines_;  // and what is below them
   std::unordered_set<int64_t> worlds_;
@@ -202,6 +205,8 @@ class Reader {
 
 }  // namespace
 
-Memory ReadMemory(const Origin& origin, bool byPath) { return Reader(origin, byPath).Run(); }
+Memory ReadMemory(const Origin& origin, const MemoryOptions& options) {
+  return Reader(origin, options).Run();
+}
 
 }  // namespace ksicache

@@ -81,9 +81,16 @@ struct Memory {
   }
 };
 
-// Reads that of the moment which the library answers from. `byPath`: the numbers of groups and
-// processes are not to be part of identities, but the names on the way to them.
-Memory ReadMemory(const Origin& origin, bool byPath);
+struct MemoryOptions {
+  // The numbers of groups and processes are not to be part of identities, but the names on the way
+  // to them.
+  bool byPath = false;
+  // Large pages and page sharing, too, which are no part of a balance.
+  bool isAll = false;
+};
+
+// Reads that of the moment which the library answers from.
+Memory ReadMemory(const Origin& origin, const MemoryOptions& options);
 
 }  // namespace ksicache
 

@@ -8,11 +8,12 @@
 namespace ksicache {
 namespace {
 
-// The lower one of two in the middle.
+// REQUIRES: there are numbers.
 double MedianOf(std::span<double> numbers) {
-  const auto middle = numbers.begin() + static_cast<std::ptrdiff_t>((numbers.size() - 1) / 2);
+  const auto middle = numbers.begin() + static_cast<std::ptrdiff_t>(numbers.size() / 2);
   std::ranges::nth_element(numbers, middle);
-  return *middle;
+  if (numbers.size() % 2 != 0) return *middle;
+  return (*middle + *std::max_element(numbers.begin(), middle)) / 2;
 }
 
 double MedianSlopeOfAll(std::span<const Point> points) {

@@ -23,7 +23,9 @@
 namespace ksicache {
 namespace {
 
-constexpr size_t kMostSamples = 300;
+// So many moments of more than these are read.
+constexpr size_t kMostSamples = 200;
+constexpr size_t kFewMoments = 400;
 
 // All figures of all samples take no more than this.
 constexpr size_t kMostFigures = size_t{32} << 20;
@@ -35,6 +37,7 @@ struct Stretch {
   int64_t from;
   int64_t to;
   bool isSinceBoot;
+  int64_t moments;  // about so many
 };
 
 Stretch StretchOf(const std::string& name, int64_t since) {
@@ -44,7 +47,7 @@ Stretch StretchOf(const std::string& name, int64_t since) {
   const auto& parts = recording->Parts();
   if (parts.empty()) throw DataError("it has no moments yet");
   const ksi::Span all = {parts.front().first, parts.back().last};
-  Stretch stretch = {0, all.last, false};
+  Stretch stretch = {0, all.last, false, 0};
   if (name != fileName) {
     const std::string when = name.substr(fileName.size() + 1);
     const std::optional<int64_t> time = ksi::TimeOf(when, all);
@@ -69,21 +72,27 @@ Stretch StretchOf(const std::string& name, int64_t since) {
     boot = host.boot;
     begin = part->first;
   }
+  for (const ksi::RecordingFile::Part& part : parts) {
+    if (part.last >= stretch.from && part.first <= stretch.to) stretch.moments += part.moments;
+  }
   return stretch;
 }
 
-// Which moments are read: one in each of many stretches of the same length, anywhere in it. So
+// Which moments are read: all of a few, or one in each of many stretches of the same length, anywhere in it. So
 // what goes up and down does not look as if it went slowly up.
 class Choice {
  public:
   explicit Choice(const Stretch& stretch)
       : from_(static_cast<double>(stretch.from)),
-        step_(static_cast<double>(stretch.to - stretch.from) / kMostSamples) {}
+        step_(stretch.moments <= int64_t{kFewMoments}
+                  ? 0
+                  : static_cast<double>(stretch.to - stretch.from) / kMostSamples) {}
 
   bool Takes(int64_t taken) {
     const auto time = static_cast<double>(taken);
+    if (step_ == 0) return true;
     if (time < due_) return false;
-    const double next = step_ == 0 ? 0 : std::floor((time - from_) / step_) + 1;
+    const double next = std::floor((time - from_) / step_) + 1;
     const double anywhere = static_cast<double>(random_()) / static_cast<double>(random_.max());
     due_ = from_ + (next + anywhere) * step_;
     return true;
@@ -146,7 +155,7 @@ class Collector {
 
  private:
   void Take(const Origin& origin) {
-    const Memory memory = ReadMemory(origin, false);
+    const Memory memory = ReadMemory(origin, {.isAll = true});
     complaints_.SayDiagnostics();
     for (const std::string& complaint : memory.complaints) complaints_.Say(complaint);
     const auto& host = memory.host;
