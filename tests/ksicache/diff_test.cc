@@ -79,23 +79,26 @@ TEST_F(Diff, OneScreen) {
 
 KB                                       before        after       growth   part
 total                                 268435456    268435456            0
-free                                  138092636      1974364   -136118272
-in use                                130342820    266461092    136118272   100%
+free                                  138092636       921600   -137171036
+in use                                130342820    267513856    137171036   100%
   kernel                                3145728      3145728            0     0%
   caches                                5242880      5242880            0     0%
-  others                              117170084    253288356    136118272   100%
+  others                              117170084    254341120    137171036   100%
 
 who explains it                          before        after       growth   part
-12 machines                           113908928    113908928            0     0%
+12 machines                           113908928    103003736    -10905192    -8%
+  build-linux                          14696852      6769616     -7927236    -6%
+  mail                                  6845104      3867148     -2977956    -2%
 12 overheads of machines                1731300      1731300            0     0%
-8 user worlds                           1208592    137326864    136118272   100%
-  storage-daemon                         194152    136312424    136118272   100%
+8 user worlds                           1208592    149284820    148076228   108%
+  storage-daemon                         194152    148270380    148076228   108%
 14 heaps                                 589824       589824            0     0%
 nobody                                                                  0     0%
-in use                                                          136118272   100%
+in use                                                          137171036   100%
 
 groups, which contain the above          before        after       growth   part
-  services                              1223884    137342156    136118272   100%
+  services                              1223884    149300112    148076228   108%
+  machines                            115640228    104735036    -10905192    -8%
 )");
 }
 
@@ -105,8 +108,8 @@ TEST_F(Diff, TheLaterMomentMayComeFirst) {
       out.starts_with("hypervisor.example.org, 2026-11-21T10:05:00Z to "
                       "2026-11-21T10:02:00Z: -3m 0s, the later one first\n"))
       << out;
-  EXPECT_NE(out.find("  storage-daemon                         133117          189      -132928"
-                     "   100%\n"),
+  EXPECT_NE(out.find("  storage-daemon                         144795          189      -144606"
+                     "   108%\n"),
             std::string::npos)
       << out;
 }
@@ -114,13 +117,17 @@ TEST_F(Diff, TheLaterMomentMayComeFirst) {
 TEST_F(Diff, Report) {
   EXPECT_EQ(Output({"diff", kBefore, kAfter, "-r", "vm-stats"}),
             R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
-vm-stats, KB, by swapped
+vm-stats, KB, by consumed
 
                                before           after         growth    a second
 build-linux, schedGrp 1060
+  consumed                   14696852         6769616       -7927236
   swapped                     1509948         9437184        7927236
+  mapped                     16106132         8178896       -7927236
 mail, schedGrp 1050
+  consumed                    6845104         3867148       -2977956
   ballooned                   2264924         5242880        2977956
+  mapped                      7549744         4571788       -2977956
 
 2 rows changed, 0 of them new and 0 gone; 10 did not
 )");
@@ -131,7 +138,9 @@ vm-stats, MB, by ballooned
 
                                before           after         growth    a second
 mail, schedGrp 1050
+  consumed                       6684            3776          -2908
   ballooned                      2211            5120           2909
+  mapped                         7372            4464          -2908
 
 2 rows changed, 0 of them new and 0 gone; 10 did not; 1 not shown
 )");
@@ -144,8 +153,11 @@ comp-stats, MB, by otherConsumed
 
                                before           after         growth    a second
 host
-  otherConsumed                114423          247351         132928
-  free                         134856            1928        -132928
+  otherConsumed                114423          248380         133957
+  free                         134856             900        -133956
+  numClear                         13              14              1      0.0056
+  numSoft                           5               6              1      0.0056
+  numHard                           1               2              1      0.0056
   memState                       High            Hard              -
 
 1 row changed, 0 of them new and 0 gone; 0 did not
@@ -295,14 +307,14 @@ TEST_F(Diff, FailAbove) {
     args.insert(args.begin(), "diff");
     return Run(args).status;
   };
-  // 136118272 KB.
-  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "129G"}), 3);
-  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "130G"}), 0);
-  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "139385110528"}), 0);
-  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "139385110527"}), 3);
-  EXPECT_EQ(status({kAfter, kBefore, "--fail-above", "1"}), 0);
-  EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--fail-above", "7g"}), 3);
-  EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--fail-above", "8g", "-u", "mb"}), 0);
+  // 148076228 KB.
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "141G"}), 3);
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "142G"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "151630057472"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "151630057471"}), 3);
+  EXPECT_EQ(status({kAfter, kBefore, "--fail-above", "8G"}), 0);
+  EXPECT_EQ(status({kBefore, kAfter, "-r", "swap-stats", "--fail-above", "7g"}), 3);
+  EXPECT_EQ(status({kBefore, kAfter, "-r", "swap-stats", "--fail-above", "8g", "-u", "mb"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--by", "ballooned", "--fail-above", "3g"}),
             0);
   ExpectFailure(

@@ -137,7 +137,7 @@ std::optional<int64_t> ReportDiff::LargestBytes() const {
   int64_t largest = 0;
   for (const RowChange& row : changed_) largest = std::max(largest, GrowthOf(row));
   const std::string_view unit = Columns()[*by_].unit;
-  const auto found = std::ranges::find(tally::kUnitNames, unit, &tally::UnitName::title);
+  const auto* found = std::ranges::find(tally::kUnitNames, unit, &tally::UnitName::title);
   int64_t bytes = 0;
   const bool isTooLarge = __builtin_mul_overflow(largest, BytesIn(found->unit), &bytes);
   return isTooLarge ? INT64_MAX : bytes;

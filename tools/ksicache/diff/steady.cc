@@ -78,8 +78,8 @@ Stretch StretchOf(const std::string& name, int64_t since) {
   return stretch;
 }
 
-// Which moments are read: all of a few, or one in each of many stretches of the same length, anywhere in it. So
-// what goes up and down does not look as if it went slowly up.
+// Which moments are read: all of a few, or one in each of many stretches of the same length,
+// anywhere in it. So what goes up and down does not look as if it went slowly up.
 class Choice {
  public:
   explicit Choice(const Stretch& stretch)
@@ -93,7 +93,8 @@ class Choice {
     if (step_ == 0) return true;
     if (time < due_) return false;
     const double next = std::floor((time - from_) / step_) + 1;
-    const double anywhere = static_cast<double>(random_()) / static_cast<double>(random_.max());
+    const double anywhere =
+        static_cast<double>(random_()) / static_cast<double>(std::mt19937::max());
     due_ = from_ + (next + anywhere) * step_;
     return true;
   }

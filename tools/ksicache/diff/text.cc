@@ -12,7 +12,7 @@ namespace {
 
 std::string Formatted(const char* format, double number) {
   std::array<char, 400> text = {};
-  std::snprintf(text.data(), text.size(), format, number);
+  static_cast<void>(std::snprintf(text.data(), text.size(), format, number));
   return text.data();
 }
 
