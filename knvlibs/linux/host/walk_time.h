@@ -14,6 +14,9 @@ constexpr std::chrono::seconds kWalkTime{1};
 
 // A process up to this size may be walked at once: that takes some milliseconds.
 constexpr uint64_t kShortWalkKB = uint64_t{256} << 10;
+// So much of page tables holds that size in pages of 4 KB. What a process has only read is in them
+// alone: it is walked, but counts as neither in memory nor swapped.
+constexpr uint64_t kShortWalkTablesKB = kShortWalkKB / 512;
 
 // Whether there is time left for a walk; that there is none is told once in a reading.
 bool MayWalk(const LinuxHost& host);

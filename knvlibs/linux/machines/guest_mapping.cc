@@ -82,7 +82,9 @@ bool MayHoldModule(const std::vector<Mapping>& left) {
 
 bool IsShort(const LinuxHost& host, const Process& process) {
   const Figure size = SumOf({process.vmRss, process.vmSwap});
-  return !host.IsThisMachine() || (size && *size <= kShortWalkKB);
+  const Figure tables = process.vmPte;
+  return !host.IsThisMachine() ||
+         (size && *size <= kShortWalkKB && tables && *tables <= kShortWalkTablesKB);
 }
 
 // Whether the kernel moves memory to the NUMA node that uses it: then kernels that do not tell of
