@@ -38,6 +38,7 @@ struct Reading {
 
   // What is left of the time that monitors may take.
   std::chrono::steady_clock::duration monitorTime = kMonitorTime;
+  int heldLooks = kHeldLooks;
 
   // The machines of libvirt, once one was asked for.
   std::optional<LibvirtDomains> libvirt;

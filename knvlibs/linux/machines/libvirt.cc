@@ -73,7 +73,7 @@ bool IsThere(const LinuxHost& host, const GroupTree& tree, const LibvirtDaemon& 
     return std::ranges::any_of(daemon.sockets, [&](const char* name) {
       const std::string socket = daemon.directory + name;
       return IsOwn(socket, daemon.owner, S_IFSOCK) &&
-             Listens(host, process.pid, socket).value_or(true);
+             FindListener(host, process.pid, socket) != Listening::kNot;
     });
   });
 }

@@ -10,9 +10,13 @@
 
 namespace ksi {
 
-// Whether process `pid` listens at the socket that it calls `path`, by /proc/PID/net/unix and
+// How a process stands to a socket. One that is held has a client, or one that waits to be let in:
+// a further one would have to wait, too, and would stay in the queue as long.
+enum class Listening : uint8_t { kNot, kFree, kHeld };
+
+// How process `pid` stands to the socket that it calls `path`, by /proc/PID/net/unix and
 // /proc/PID/fd; none if these may not be read.
-std::optional<bool> Listens(const LinuxHost& host, int32_t pid, std::string_view path);
+std::optional<Listening> FindListener(const LinuxHost& host, int32_t pid, std::string_view path);
 
 }  // namespace ksi
 

@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <thread>
 
 #include <knvlibs/ksi.h>
 #include "knvlibs/json.h"
@@ -145,6 +146,19 @@ void AskRecorded(const LinuxHost& host, const QemuCommandLine& line, GuestMemory
   Converse(host, channel, line, memory);
 }
 
+// Whether a process listens and nobody holds its monitor: who connects to one that is held stays in
+// its queue, gone or not, and takes the place of others. Where it cannot be looked up, the
+// connection tells who listens.
+bool IsFree(const LinuxHost& host, int32_t pid, const std::string& path) {
+  int& looks = host.Kept().heldLooks;
+  for (;;) {
+    const Listening found = FindListener(host, pid, path).value_or(Listening::kFree);
+    if (found != Listening::kHeld || looks == 0) return found == Listening::kFree;
+    --looks;
+    std::this_thread::sleep_for(kHeldWait);
+  }
+}
+
 void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, GuestMemory& memory) {
   std::chrono::steady_clock::duration& left = host.Kept().monitorTime;
   if (left <= std::chrono::steady_clock::duration::zero()) {
@@ -157,10 +171,8 @@ void AskLive(const LinuxHost& host, int32_t pid, const QemuCommandLine& line, Gu
   const LinuxHost::TimePoint start = host.Now();
   const auto patience = std::min<std::chrono::steady_clock::duration>(kMonitorPatience, left);
   MonitorSocket socket(host.TimeSource(), start + patience);
-  // Where the listener cannot be looked up, the connection tells who it is.
   Process process;
-  if (ReadProcess(host, pid, process) == kOk && process.user &&
-      Listens(host, pid, line.monitor).value_or(true)) {
+  if (ReadProcess(host, pid, process) == kOk && process.user && IsFree(host, pid, line.monitor)) {
     errno = 0;
     if (socket.Connect(line.monitor, pid, *process.user)) Converse(host, socket, line, memory);
     host.TellShortage(line.monitor, errno);

@@ -19,6 +19,11 @@ namespace ksi {
 constexpr std::chrono::milliseconds kMonitorPatience{250};
 constexpr std::chrono::seconds kMonitorTime{1};
 
+// How often a reading looks whether a monitor that somebody holds is left again, for all of them
+// together, and how long it waits before: whoever asked it last may be about to go.
+constexpr int kHeldLooks = 10;
+constexpr std::chrono::milliseconds kHeldWait{10};
+
 // What a monitor tells of its guest. KB.
 struct GuestMemory {
   enum class Balloon : uint8_t { kNone, kActive, kUnknown };

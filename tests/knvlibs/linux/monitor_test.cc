@@ -18,15 +18,18 @@
 #include <ctime>
 #include <filesystem>
 #include <functional>
+#include <span>
 #include <string>
 #include <system_error>
 #include <thread>
 #include <utility>
+#include <vector>
 
 #include <knvlibs/ksi.h>
 #include "knvlibs/linux/machines/listener.h"
 #include "knvlibs/linux/machines/monitor_socket.h"
 #include "knvlibs/linux/machines/qmp.h"
+#include "knvlibs/linux/reading.h"
 #include "tests/knvlibs/host_tree.h"
 
 namespace ksi {
@@ -260,13 +263,7 @@ TEST(MonitorSocketTest, WhoHangsUpIsLeft) {
 class ListenerTest : public testing::Test {
  protected:
   ListenerTest() {
-    tree_.Write("/proc/7/net/unix",
-                "Num       RefCount Protocol Flags    Type St Inode Path\n"
-                "ffff0001: 00000002 00000000 00010000 0001 01 23 /run/web of a guest\n"
-                "ffff0002: 00000002 00000000 00010000 0001 01 24 /run/other\n"
-                "ffff0003: 00000003 00000000 00000000 0001 03 25 /run/client\n"
-                "ffff0004: 00000002 00000000 00010000 0001 01 26\n"
-                "nonsense\n");
+    tree_.Write("/proc/7/net/unix", sockets_);
     std::filesystem::create_directories(tree_.Root() + "/proc/7/fd");
     for (const int inode : {23, 25, 26}) Open(inode);
   }
@@ -276,27 +273,55 @@ class ListenerTest : public testing::Test {
                                     tree_.Root() + "/proc/7/fd/" + std::to_string(inode));
   }
 
-  std::optional<bool> Listening(std::string_view path) {
-    return Listens(LinuxHost(tree_.Root()), 7, path);
+  // Adds a socket of the listener's path.
+  void Connect(const std::string& state, const std::string& inode) {
+    sockets_ += "ffff0009: 00000003 00000000 00000000 0001 " + state + " " + inode +
+                " /run/web of a guest\n";
+    tree_.Write("/proc/7/net/unix", sockets_);
   }
+
+  std::optional<Listening> Find(std::string_view path) {
+    return FindListener(LinuxHost(tree_.Root()), 7, path);
+  }
+
+  std::string sockets_ =
+      "Num       RefCount Protocol Flags    Type St Inode Path\n"
+      "ffff0001: 00000002 00000000 00010000 0001 01 23 /run/web of a guest\n"
+      "ffff0002: 00000002 00000000 00010000 0001 01 24 /run/other\n"
+      "ffff0003: 00000003 00000000 00000000 0001 03 25 /run/client\n"
+      "ffff0004: 00000002 00000000 00010000 0001 01 26\n"
+      "nonsense\n";
 
   HostTree tree_;
 };
 
 TEST_F(ListenerTest, IsTheProcessThatHasTheListeningSocketOpen) {
-  EXPECT_EQ(Listening("/run/web of a guest"), true);
-  EXPECT_EQ(Listening("/run/other"), false) << "of another process";
-  EXPECT_EQ(Listening("/run/client"), false) << "connected, not listening";
-  EXPECT_EQ(Listening("/run/web"), false);
-  EXPECT_EQ(Listening(""), false);
+  EXPECT_EQ(Find("/run/web of a guest"), Listening::kFree);
+  EXPECT_EQ(Find("/run/other"), Listening::kNot) << "of another process";
+  EXPECT_EQ(Find("/run/client"), Listening::kNot) << "connected, not listening";
+  EXPECT_EQ(Find("/run/web"), Listening::kNot);
+  EXPECT_EQ(Find(""), Listening::kNot);
+}
+
+TEST_F(ListenerTest, IsHeldByWhoWasLetIn) {
+  Connect("03", "31");
+  EXPECT_EQ(Find("/run/web of a guest"), Listening::kFree) << "let in by another process";
+  Open(31);
+  EXPECT_EQ(Find("/run/web of a guest"), Listening::kHeld);
+  EXPECT_EQ(Find("/run/other"), Listening::kNot);
+}
+
+TEST_F(ListenerTest, IsHeldByWhoWaits) {
+  Connect("02", "0");
+  EXPECT_EQ(Find("/run/web of a guest"), Listening::kHeld);
 }
 
 TEST_F(ListenerTest, CannotBeToldWithoutTheFiles) {
   std::filesystem::remove_all(tree_.Root() + "/proc/7/fd");
-  EXPECT_EQ(Listening("/run/web of a guest"), std::nullopt);
+  EXPECT_EQ(Find("/run/web of a guest"), std::nullopt);
   std::filesystem::create_directories(tree_.Root() + "/proc/7/fd");
   std::filesystem::remove(tree_.Root() + "/proc/7/net/unix");
-  EXPECT_EQ(Listening("/run/web of a guest"), std::nullopt);
+  EXPECT_EQ(Find("/run/web of a guest"), std::nullopt);
 }
 
 // Whole conversations.
@@ -346,7 +371,7 @@ TEST(MonitorTest, AStrangersSocketIsNotKnockedAt) {
   const Endpoint endpoint;
   ASSERT_EQ(listen(endpoint.Fd(), 8), 0);
   const LinuxHost host("/", StandingClock);
-  if (!Listens(host, getppid(), endpoint.Path())) {
+  if (!FindListener(host, getppid(), endpoint.Path())) {
     GTEST_SKIP() << "the parent's descriptors may not be read";
   }
   const GuestMemory memory = ReadGuestMemory(host, getppid(), LineOf(endpoint.Path()));
@@ -398,26 +423,68 @@ TEST(MonitorTest, ARefusalIsNoShortage) {
               "^$");
 }
 
-TEST(MonitorTest, AllOfAReadingHaveASecondTogether) {
+TEST(MonitorTest, WhatSomebodyHoldsIsLeftAlone) {
   const Endpoint endpoint;
   ASSERT_EQ(listen(endpoint.Fd(), 8), 0);
+  const LinuxHost host("/", StandingClock);
+  const auto ask = [&] { return ReadGuestMemory(host, getpid(), LineOf(endpoint.Path())); };
+  MonitorSocket client(StandingClock, kDistant);
+  ASSERT_TRUE(client.Connect(endpoint.Path(), getpid(), geteuid()));
+  EXPECT_EQ(ask().balloon, GuestMemory::Balloon::kUnknown);
+  EXPECT_EQ(host.Kept().heldLooks, 0) << "it might have been left";
+  const int letIn = accept(endpoint.Fd(), nullptr, nullptr);
+  EXPECT_EQ(ask().balloon, GuestMemory::Balloon::kUnknown);
+  EXPECT_EQ(endpoint.CountWaiting(), 0) << "nobody is to have come";
+  EXPECT_EQ(host.Kept().monitorTime, kMonitorTime) << "others have their time";
+  EXPECT_EQ(host.LossStatus(), kOk);
+  close(letIn);
+}
+
+TEST(MonitorTest, WhatIsLeftMeanwhileIsAsked) {
+  // Lets in and leaves before it answers: as if somebody had asked just before.
+  const Endpoint endpoint;
+  ASSERT_EQ(listen(endpoint.Fd(), 8), 0);
+  MonitorSocket client(StandingClock, kDistant);
+  ASSERT_TRUE(client.Connect(endpoint.Path(), getpid(), geteuid()));
+  const int first = accept(endpoint.Fd(), nullptr, nullptr);
+  const LinuxHost host("/", StandingClock);
+  host.Kept().heldLooks = 3000;  // however long this machine takes
+  std::thread monitor([&] {
+    close(first);
+    const int second = accept(endpoint.Fd(), nullptr, nullptr);
+    Answering({R"({"return": {}})", R"({"return": {"actual": 1048576}})", "{}"})(second);
+    close(second);
+  });
+  EXPECT_EQ(ReadGuestMemory(host, getpid(), LineOf(endpoint.Path())).actual, 1024u);
+  shutdown(endpoint.Fd(), SHUT_RDWR);
+  monitor.join();
+}
+
+TEST(MonitorTest, AllOfAReadingHaveASecondTogether) {
+  const std::vector<Endpoint> endpoints(5);
+  for (const Endpoint& endpoint : endpoints) ASSERT_EQ(listen(endpoint.Fd(), 8), 0);
   // Each look takes a quarter of a second: of three at a monitor the second ends its patience.
   LinuxHost host("/", LeapingClock);
-  const auto ask = [&](int count) {
+  const auto ask = [&](size_t count) {
     testing::internal::CaptureStderr();
-    for (int i = 0; i < count; ++i) {
+    for (const Endpoint& endpoint : std::span(endpoints).first(count)) {
       EXPECT_EQ(ReadGuestMemory(host, getpid(), LineOf(endpoint.Path())).balloon,
                 GuestMemory::Balloon::kUnknown);
     }
     return testing::internal::GetCapturedStderr();
   };
+  const auto countWaiting = [&] {
+    int count = 0;
+    for (const Endpoint& endpoint : endpoints) count += endpoint.CountWaiting();
+    return count;
+  };
   EXPECT_EQ(ask(5),
             "virtual machines: no time left to ask all of them: their balloons have no value\n");
-  EXPECT_EQ(endpoint.CountWaiting(), 2);
+  EXPECT_EQ(countWaiting(), 2);
   EXPECT_EQ(host.LossStatus(), KSI_STATUS_TIMEOUT);
   host.BeginReading();
   EXPECT_EQ(ask(1), "");
-  EXPECT_EQ(endpoint.CountWaiting(), 1) << "a new reading has time again";
+  EXPECT_EQ(countWaiting(), 1) << "a new reading has time again";
 }
 
 }  // namespace
