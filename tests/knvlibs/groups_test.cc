@@ -605,6 +605,14 @@ TEST_F(HugetlbTest, WithoutTheControllerTheProcessesTell) {
   EXPECT_EQ(uint64_t{Jobs().consumed}, kNoValue);
 }
 
+TEST_F(HugetlbTest, WhoHasNoneSharesNone) {
+  tree_.Write("/sys/fs/cgroup/jobs/memory.peak", "9999360\n");
+  WriteHuge(kPid, 0);
+  for (const int32_t pid : {101, 102}) WriteHuge(pid, 6144);
+  EXPECT_EQ(uint64_t{Jobs().consumed}, 1024u);
+  EXPECT_EQ(uint64_t{Jobs().consumedPeak}, 9765u);
+}
+
 TEST_F(HugetlbTest, MayBeMountedToCountAsMemory) {
   tree_.Write("/proc/self/mounts",
               "cgroup2 /sys/fs/cgroup cgroup2 rw,memory_hugetlb_accounting 0 0\n");

@@ -368,8 +368,10 @@ Status GroupTree::ReadHugetlb(const LinuxHost& host, const Group& group, uint64_
   if (inUse == 0) return kOk;
   const Status status = cgroups_.ReadHugetlb(host, group.path, hugetlb);
   if (status != kOk || hugetlb) return status;
-  // Without the controller the processes tell, unless some have pages in common.
-  if (hugetlb_ && *hugetlb_ <= inUse) hugetlb = ProcessHugetlbOf(group);
+  // Without the controller the processes tell, unless some have pages in common. Who has none shares
+  // none.
+  const Figure own = ProcessHugetlbOf(group);
+  if (own == 0u || (hugetlb_ && *hugetlb_ <= inUse)) hugetlb = own;
   return kOk;
 }
 
