@@ -100,7 +100,7 @@ void TakeSmaps(const std::vector<Mapping>& blocks, GuestMapping& guest) {
   Smaps sum = blocks.front().smaps;
   for (const Mapping& block : std::span(blocks).subspan(1)) sum.Add(block.smaps);
   guest.resident = SumOf({sum.rss, sum.hugetlb});
-  guest.referenced = sum.referenced;
+  if (sum.hugetlb == 0u) guest.referenced = sum.referenced;
   guest.swapped = sum.swap;
   guest.huge = SumOf({sum.anonHugePages, sum.shmemPmdMapped, sum.hugetlb});
   guest.merged = sum.ksm;
@@ -163,6 +163,7 @@ Status MeasureGuest(const LinuxHost& host, int32_t pid, const QemuMappings& mapp
   }
   guest.resident = LesserOf(guest.resident, size);
   guest.huge = LesserOf(guest.huge, size);
+  if (!guest.resident) guest.referenced = guest.merged = std::nullopt;  // parts of nothing known
   return status;
 }
 

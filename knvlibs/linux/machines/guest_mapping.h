@@ -31,7 +31,7 @@ bool IsMade(const QemuMappings& mappings, const MachineMemory& start);
 struct GuestMapping {
   MachineMemory memory;
   Figure resident;    // hugetlb too, but not the kernel's zero page
-  Figure referenced;  // only small processes tell
+  Figure referenced;  // only small processes tell, and not of hugetlb
   Figure swapped;
   Figure huge;    // of the resident, in pages of 2 MB or more
   Figure merged;  // of the resident, by page sharing

@@ -46,8 +46,9 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const VirtualMachin
 }
 
 // What of the guest's memory is in use. Only of a small process the pages tell; else its own cgroup
-// does, of what is in memory.
+// does, of what is in memory. Of huge pages of hugetlb neither does.
 Figure TouchedOf(const MachineUse& use) {
+  if (use.hugetlb != 0u) return std::nullopt;
   if (use.mapping->referenced) return use.mapping->referenced;
   return LesserOf(use.events->active, use.mapping->resident);
 }

@@ -117,6 +117,21 @@ TEST_F(MachineTest, WithRoomAndMoreThatMayBeMemoryIsNotTold) {
   EXPECT_EQ(+Tally().memSize, 1024u);
 }
 
+TEST_F(MachineTest, WhatItTouchesIsNotToldOfHugePages) {
+  WriteQemu(kPid, "1", "-smp", "2");
+  const auto map = [this](const std::string& hugetlb) {
+    tree_.Write(ProcessFile(kPid, "smaps"),
+                "100000-200000 rw-p 0 00:00 0\nRss: 100 kB\nReferenced: 90 kB\n"
+                "Private_Hugetlb: " +
+                    hugetlb + " kB\nVmFlags: rd wr dc\n");
+  };
+  map("0");
+  EXPECT_EQ(+Tally().touched, 90u);
+  map("512");
+  EXPECT_EQ(+Tally().mapped, 612u);
+  EXPECT_EQ(+Tally().touched, kNoValue);
+}
+
 TEST_F(MachineTest, WithTwoBlocksOfOneSizeWhatIsThereIsNotTold) {
   WriteQemu(kPid, "1", "-smp", "2");
   WriteMappings(kPid, "1000000-1100000 rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n");
