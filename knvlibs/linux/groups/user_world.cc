@@ -28,11 +28,12 @@ void FillMapped(const Process& process, const ProcessKsm& ksm, KSI_UwTally& reco
   record.sharedSaved = isTold ? std::min(*ksm.saved, *mapped) : 0;
 }
 
-// A mapping can be locked or pinned before all of it is in memory.
+// A mapping can be locked or pinned before all of it is in memory. Where more is held than there is
+// in memory, only a walk tells how much of that is held.
 Figure PinnedOf(const Process& process) {
   const Figure held = SumOf({process.vmLck, process.vmPin, process.hugetlb});
   const Figure mapped = process.Mapped();
-  return held && mapped ? Figure(std::min(*held, *mapped)) : std::nullopt;
+  return held && mapped && *held <= *mapped ? held : std::nullopt;
 }
 
 // Walks nothing: what the scan has held of the process is enough, though it may have ended since.
