@@ -202,7 +202,8 @@ GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuComman
 bool AreCurrent(Figure sent, Figure now, Figure interval) {
   if (!sent || !now || !interval) return false;
   const uint64_t age = Less(*now, *sent) + Less(*sent, *now);  // clocks may be set
-  return age <= ProductOf(interval, 2).value_or(0) && interval != 0u;
+  const uint64_t most = std::min(ProductOf(interval, 2).value_or(0), kMostStatisticsAge);
+  return age <= most && interval != 0u;
 }
 
 }  // namespace ksi

@@ -45,6 +45,9 @@ GuestMemory UnaskedGuest(const QemuCommandLine& line);
 // there. What is not answered in time is not told.
 GuestMemory ReadGuestMemory(const LinuxHost& host, int32_t pid, const QemuCommandLine& line);
 
+// What is older is not current, however seldom a guest is asked. Seconds.
+constexpr uint64_t kMostStatisticsAge = 300;
+
 // Whether figures that a guest sent at `sent` are those of `now` (seconds of the same clock): not
 // older than two of the intervals, in seconds, at which it is asked for them.
 bool AreCurrent(Figure sent, Figure now, Figure interval);

@@ -237,6 +237,15 @@ TEST_F(QmpTest, WhatAnswersOtherwiseTellsNothing) {
   }
 }
 
+TEST(AreCurrentTest, NotWhatIsOlderThanTwoIntervalsOrFiveMinutes) {
+  EXPECT_TRUE(AreCurrent(1000, 1020, 10));
+  EXPECT_FALSE(AreCurrent(1000, 1021, 10));
+  EXPECT_TRUE(AreCurrent(1000, 1300, 86400));
+  EXPECT_FALSE(AreCurrent(1000, 1301, 86400));
+  EXPECT_FALSE(AreCurrent(1000, 1301, UINT64_MAX));
+  EXPECT_FALSE(AreCurrent(1000, 1000, 0));
+}
+
 TEST_F(QmpTest, StatisticsAreOfNowOrNone) {
   const auto totalOf = [&](const std::string& lastUpdate, const std::string& interval) {
     return Ask(hello_ + "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": " +
