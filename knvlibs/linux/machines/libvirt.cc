@@ -115,6 +115,7 @@ void TakeDomain(const LibvirtDomain& domain, Figure now, GuestMemory& guest) {
   if (domain.actual) {
     guest.balloon = GuestMemory::Balloon::kActive;
     guest.actual = domain.actual;
+    guest.hasDriver = domain.lastUpdate.value_or(0) != 0;
   }
   guest.modules = domain.modules;
   if (!AreCurrent(domain.lastUpdate, now, domain.period)) return;

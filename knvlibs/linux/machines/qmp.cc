@@ -80,11 +80,10 @@ void AskForStatistics(const LinuxHost& host, Conversation& monitor, const std::s
   if (balloon.empty() || balloon.find_first_not_of(kIdCharacters) != std::string::npos) return;
   const std::optional<Json> result = AskDevice(monitor, balloon, "guest-stats");
   if (!result) return;
+  const Figure sent = NumberOf(FindMember(&*result, "last-update"));
+  memory.hasDriver = sent.value_or(0) != 0;
   const std::optional<Json> interval = AskDevice(monitor, balloon, "guest-stats-polling-interval");
-  if (!interval || !AreCurrent(NumberOf(FindMember(&*result, "last-update")), WallClock(host),
-                               NumberOf(&*interval))) {
-    return;
-  }
+  if (!interval || !AreCurrent(sent, WallClock(host), NumberOf(&*interval))) return;
   const Json* statistics = FindMember(&*result, "stats");
   memory.total = KBOf(statistics, "stat-total-memory");
   memory.available = KBOf(statistics, "stat-available-memory");

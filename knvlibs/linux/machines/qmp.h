@@ -29,7 +29,8 @@ struct GuestMemory {
   enum class Balloon : uint8_t { kNone, kActive, kUnknown };
 
   Balloon balloon = Balloon::kUnknown;
-  Figure actual;  // what the balloon leaves to the guest
+  bool hasDriver = false;  // the guest's driver has sent something
+  Figure actual;           // what the balloon leaves to the guest
   // As the guest counts, if it has done so lately.
   Figure total;
   Figure available;  // without its having to swap

@@ -72,16 +72,18 @@ void FillSharing(const MachineUse& use, KSI_VmmTally& record) {
 }
 
 void FillBalloon(const GuestMemory& guest, Figure memory, KSI_VmmTally& record) {
+  const Figure ballooned = DifferenceOf(memory, guest.actual);
   switch (guest.balloon) {
     case GuestMemory::Balloon::kNone:
       break;
     case GuestMemory::Balloon::kActive:
-      record.balloonActive = 1;
-      record.ballooned = FieldOf(DifferenceOf(memory, guest.actual));
+      // The device is there without a driver, too; what it was given only a driver can have taken.
+      record.balloonActive = guest.hasDriver || ballooned.value_or(0) != 0 ? 1 : 0;
+      record.ballooned = FieldOf(ballooned);
       record.balloonTgt = FieldOf(std::nullopt);
       break;
     case GuestMemory::Balloon::kUnknown:
-      // A flag has no third state: it is set where a balloon is known to be there.
+      // A flag has no third state: it is set where a driver is known to be there.
       record.ballooned = FieldOf(std::nullopt);
       record.balloonTgt = FieldOf(std::nullopt);
       break;

@@ -292,6 +292,7 @@ TEST(TakeDomainTest, FiguresOfTheGuestAreOfNowOrNone) {
   GuestMemory guest;
   TakeDomain(domain, 1020, guest);
   EXPECT_EQ(guest.balloon, GuestMemory::Balloon::kActive);
+  EXPECT_TRUE(guest.hasDriver);
   EXPECT_EQ(guest.actual, 1024u);
   EXPECT_EQ(guest.total, 900u);
   EXPECT_EQ(guest.available, 300u);

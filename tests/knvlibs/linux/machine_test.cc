@@ -166,6 +166,24 @@ TEST_F(MachineTest, WhatItsMonitorTellsIsItsMemory) {
   EXPECT_EQ(+Stats().ovhd, 4000u - 1730 + 12);
 }
 
+TEST_F(MachineTest, HasABalloonThatWorksWhereADriverIsShown) {
+  WriteQemu(kPid, "1", "-qmp", "unix:/run/q");
+  WriteCommandLine(kPid, {"qemu-system-x86_64", "-m", "1", "-qmp", "unix:/run/q", "-device",
+                          "virtio-balloon,id=b"});
+  const auto isActive = [this](const char* actual, const char* lastUpdate) {
+    tree_.Write("/run/q", std::string("{\"QMP\": {}}\n{\"return\": {}}\n{\"return\": "
+                                      "{\"actual\": ") +
+                              actual + "}}\n{\"return\": {\"stats\": {}, \"last-update\": " +
+                              lastUpdate + "}}\n{\"return\": 0}\n");
+    const KSI_VmmTally tally = Tally();
+    EXPECT_NE(+tally.ballooned, kNoValue);
+    return tally.balloonActive != 0;
+  };
+  EXPECT_FALSE(isActive("1048576", "0")) << "the firmware has none";
+  EXPECT_TRUE(isActive("524288", "0"));
+  EXPECT_TRUE(isActive("1048576", "17"));
+}
+
 TEST_F(MachineTest, AMachineThatEndsAfterTheScanIsShownAsItStartedIfItCannotHaveChanged) {
   WriteQemu(kPid, "1", "-smp", "2");
   WriteQemu(kPid + 1, "1,slots=1,maxmem=64M", "-smp", "2");

@@ -195,6 +195,7 @@ TEST_F(QmpTest, TellsTheBalloonAndTheGuest) {
           "\"stat-available-memory\": 18446744073709551615}, \"last-update\": 1085}}\n"
           "{\"return\": 10}\n");
   EXPECT_EQ(memory.balloon, GuestMemory::Balloon::kActive);
+  EXPECT_TRUE(memory.hasDriver);
   EXPECT_EQ(memory.actual, 1024u);
   EXPECT_EQ(memory.total, 4u);
   EXPECT_EQ(memory.available, std::nullopt);
@@ -204,6 +205,7 @@ TEST_F(QmpTest, StatisticsThatWereNeverSentAreNone) {
   const GuestMemory memory = Ask(hello_ +
                                  "{\"return\": {\"actual\": 1048576}}\n{\"return\": {\"stats\": "
                                  "{\"stat-total-memory\": 4096}, \"last-update\": 0}}\n");
+  EXPECT_FALSE(memory.hasDriver);
   EXPECT_EQ(memory.actual, 1024u);
   EXPECT_EQ(memory.total, std::nullopt);
 }
