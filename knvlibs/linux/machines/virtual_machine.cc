@@ -137,6 +137,21 @@ Status FillSwapSpace(const LinuxHost& host, const MachineSwap& swap, KSI_SwapInf
   return kOk;
 }
 
+// Whether more of the machine is swapped than when the reading began: by its own cgroup, else by
+// its process.
+Status FillSwapping(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
+                    const MachineSwap& swap, KSI_SwapInfo& record) {
+  if (machine.swapAtFirst && swap.current) {
+    record.isSwapping = *swap.current > *machine.swapAtFirst ? 1 : 0;
+    return kOk;
+  }
+  Process now;
+  const Status status = ReadProcess(host, machine.pid, now);
+  const Figure first = tree.ProcessOf(tree.At(machine.group)).vmSwap;
+  record.isSwapping = first && now.vmSwap && *now.vmSwap > *first ? 1 : 0;
+  return status;
+}
+
 Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine,
                     KSI_SwapInfo& record) {
   MachineUse use;
@@ -145,9 +160,9 @@ Status ReadSwapInfo(const LinuxHost& host, const GroupTree& tree, const VirtualM
   MachineSwap swap;
   status = tree.ReadSwap(host, machine, swap);
   if (status == kOk) status = FillSwapSpace(host, swap, record);
+  if (status == kOk) status = FillSwapping(host, tree, machine, swap, record);
   if (status != kOk) return status;
 
-  record.isSwapping = swap.current > machine.swapAtFirst && machine.swapAtFirst ? 1 : 0;
   record.swapped = FieldOf(SwappedOf(use));
   record.swapRead = FieldOf(use.events->swapcached);
   record.swapIn = FieldOf(use.events->swpin);

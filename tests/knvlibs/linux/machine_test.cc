@@ -449,6 +449,25 @@ TEST_F(SwappedMachineTest, IsSwappingIfItsSwapHasGrownSinceTheReportBegan) {
   }
 }
 
+TEST_F(MachineTest, WithoutACgroupOfItsOwnIsSwappingIfItsProcessIs) {
+  WriteQemu(kPid, "1", "-smp", "2");
+  LinuxSource source(tree_.Root());
+  const auto writeSwap = [this](int swap) {
+    tree_.Write(ProcessFile(kPid, "status"),
+                "Name:\tqemu\nVmSize:\t 9 kB\nVmRSS:\t 4 kB\nVmSwap:\t " + std::to_string(swap) +
+                    " kB\nThreads:\t2\n");
+  };
+  for (const auto& [now, isSwapping] : {std::pair(2001, 1), {2000, 0}, {1999, 0}}) {
+    source.Refresh();
+    writeSwap(2000);
+    EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
+    writeSwap(now);
+    KSI_SwapInfo swap = {};
+    ASSERT_EQ(GetValue(source, "sched/memClients/swapInfo", {int64_t{kPid}}, &swap), kOk);
+    EXPECT_EQ(uint8_t{swap.isSwapping}, isSwapping) << now;
+  }
+}
+
 TEST_F(SwappedMachineTest, WhatIsCompressedIsNotSwappedToo) {
   tree_.Write("/sys/module/zswap/parameters/enabled", "Y\n");
   tree_.Write(ProcessFile(kPid, "smaps"),
