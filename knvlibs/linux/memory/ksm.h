@@ -11,14 +11,16 @@ namespace ksi {
 
 // Pages, by the names of the files. A kernel without page sharing has shared nothing.
 struct Ksm {
+  bool isTold = true;  // else nothing of this is known: the kernel's files are hidden
   uint64_t pagesShared = 0;   // that stand for several
   uint64_t pagesSharing = 0;  // more that would be there without them
   Figure zeroPages = 0;       // of processes, in whose place the kernel's zero page is mapped
   bool hasScanned = false;
 
-  bool IsSharing() const { return pagesShared != 0 || zeroPages != 0u; }
+  bool IsSharing() const { return !isTold || pagesShared != 0 || zeroPages != 0u; }
 
-  // What of so much merged memory of a process is saved: of pages that share one, one stays.
+  // What of so much merged memory of a process is saved: of pages that share one, one stays. None
+  // if it is not told how many do.
   Figure SavedOf(Figure merged) const;
 };
 
