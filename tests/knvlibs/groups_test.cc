@@ -565,6 +565,35 @@ TEST_F(GroupsTest, WhatIsLockedOrPinnedOrHugeIsNotSwappedAndInMemory) {
   EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, kNoValue);
 }
 
+TEST_F(GroupsTest, ALimitIsTheSmallestOnTheWayUp) {
+  constexpr int64_t kBelow = 8;
+  const std::string jobs = "/sys/fs/cgroup/jobs/";
+  WriteCgroup("/jobs/below", kBelow, "101\n");
+  WriteProcess(101, "worker");
+  const auto limitOf = [this](int64_t group) {
+    return uint64_t{Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", group).bMax};
+  };
+  const auto expect = [&](uint64_t above, uint64_t below) {
+    EXPECT_EQ(limitOf(kRootGroup), kNoValue);
+    EXPECT_EQ(limitOf(kJobs), above);
+    EXPECT_EQ(limitOf(kProcessGroup + kPid), above);
+    EXPECT_EQ(limitOf(kBelow), below);
+    EXPECT_EQ(limitOf(kProcessGroup + 101), below);
+  };
+  expect(kNoValue, kNoValue);
+  tree_.Write(jobs + "below/memory.max", "4194304\n");
+  expect(kNoValue, 4096);
+  tree_.Write(jobs + "memory.max", "2097152\n");
+  expect(2048, 2048);
+  tree_.Write(jobs + "memory.high", "max\n");
+  tree_.Write(jobs + "below/memory.high", "1048576\n");
+  expect(2048, 1024);
+  tree_.Write(jobs + "memory.high", "0\n");
+  expect(0, 0);
+  // What is set stays as it is.
+  EXPECT_EQ(int64_t{Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kBelow).max}, 4096);
+}
+
 // Huge pages of hugetlb, which a cgroup's current does not count: 6 MB of them are in use.
 class HugetlbTest : public GroupsTest {
  protected:

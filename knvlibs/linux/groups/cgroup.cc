@@ -170,6 +170,12 @@ Status CgroupHierarchy::ReadLimit(const LinuxHost& host, std::string_view path,
   return ReadAmount(host, path, name, std::nullopt, limit);
 }
 
+Status CgroupHierarchy::ReadHigh(const LinuxHost& host, std::string_view path, Figure& high) const {
+  high.reset();
+  if (version_ != Version::k2) return kOk;
+  return ReadAmount(host, path, "memory.high", std::nullopt, high);
+}
+
 Status CgroupHierarchy::ReadUsage(const LinuxHost& host, std::string_view path,
                                   MemcgUsage& usage) const {
   usage = MemcgUsage();

@@ -93,6 +93,8 @@ class CgroupHierarchy {
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, std::string_view path,
                                        Figure& reserved) const;
   [[nodiscard]] Status ReadLimit(const LinuxHost& host, std::string_view path, Figure& limit) const;
+  // From where on it is slowed down until it has less; only version 2 does that.
+  [[nodiscard]] Status ReadHigh(const LinuxHost& host, std::string_view path, Figure& high) const;
   [[nodiscard]] Status ReadUsage(const LinuxHost& host, std::string_view path,
                                  MemcgUsage& usage) const;
   // What huge pages of hugetlb are charged to it beside `current`; none where the controller for

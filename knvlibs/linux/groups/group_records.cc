@@ -250,12 +250,16 @@ Status ReadUse(const LinuxHost& host, const GroupTree& tree, const Group& group,
 
 Status ReadGroupMemoryStats(const LinuxHost& host, const GroupTree& tree, const Group& group,
                             KSI_GroupMemoryStats& record) {
-  Figure reserved;
+  Figure reserved = 0;
   Figure limit;
   Figure effective;
   Figure saved;
+  const Group* settings = SettingsOf(tree, group);
   Status status = ReadUse(host, tree, group, record);
-  if (status == kOk) status = ReadSettings(host, tree, group, reserved, limit);
+  if (status == kOk && settings != nullptr) {
+    status = tree.ReadReservation(host, *settings, reserved);
+  }
+  if (status == kOk) status = tree.ReadEffectiveLimit(host, group, limit);
   if (status == kOk) status = ReadEffectiveReservation(host, tree, group, effective);
   if (status != kOk) return status;
   status = tree.ReadSharedSaved(host, group, saved);

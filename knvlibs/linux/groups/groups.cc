@@ -88,6 +88,7 @@ Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
     if (group.children.empty()) group.flags |= KSI_GROUP_LEAF;
   }
   tree.reserved_.resize(tree.groups_.size());
+  tree.limits_.resize(tree.groups_.size());
   tree.ksm_.resize(tree.processes_.size());
   tree.cgroupOfPid_.clear();
   tree.byPath_.clear();
@@ -355,6 +356,36 @@ Status GroupTree::ReadReservation(const LinuxHost& host, const Group& group,
   return kOk;
 }
 
+namespace {
+
+// The smaller of two limits, of which none is no limit.
+Figure StricterOf(Figure one, Figure other) {
+  if (!one || !other) return one ? one : other;
+  return LesserOf(one, other);
+}
+
+}  // namespace
+
+Status GroupTree::ReadEffectiveLimit(const LinuxHost& host, const Group& group,
+                                     Figure& limit) const {
+  limit.reset();
+  if (group.parent == Group::kNone) return kOk;  // nothing is set for the root
+  std::optional<Figure>& known = limits_[static_cast<size_t>(&group - groups_.data())];
+  if (!known) {
+    Figure own;
+    Figure high;
+    Status status = ReadEffectiveLimit(host, At(group.parent), limit);
+    if (status == kOk && group.kind == Group::Kind::kCgroup) {
+      status = cgroups_.ReadLimit(host, group.path, own);
+      if (status == kOk) status = cgroups_.ReadHigh(host, group.path, high);
+    }
+    if (status != kOk) return status;
+    known = StricterOf(limit, StricterOf(own, high));
+  }
+  limit = *known;
+  return kOk;
+}
+
 Figure GroupTree::ProcessHugetlbOf(const Group& group) const {
   if (group.IsProcess()) return group.kind == Group::Kind::kVmm ? 0 : ProcessOf(group).hugetlb;
   Figure sum = 0;
@@ -368,8 +399,8 @@ Status GroupTree::ReadHugetlb(const LinuxHost& host, const Group& group, uint64_
   if (inUse == 0) return kOk;
   const Status status = cgroups_.ReadHugetlb(host, group.path, hugetlb);
   if (status != kOk || hugetlb) return status;
-  // Without the controller the processes tell, unless some have pages in common. Who has none shares
-  // none.
+  // Without the controller the processes tell, unless some have pages in common. Who has none
+  // shares none.
   const Figure own = ProcessHugetlbOf(group);
   if (own == 0u || (hugetlb_ && *hugetlb_ <= inUse)) hugetlb = own;
   return kOk;

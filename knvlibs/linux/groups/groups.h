@@ -114,6 +114,10 @@ class GroupTree {
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, const Group& group,
                                        Figure& reserved) const;
 
+  // The smallest limit on the way up from a group, in KB; none if there is none.
+  [[nodiscard]] Status ReadEffectiveLimit(const LinuxHost& host, const Group& group,
+                                          Figure& limit) const;
+
   // What huge pages of hugetlb are used in a cgroup beside what its `current` counts; `inUse` is
   // what all of the host have. None where that cannot be told.
   [[nodiscard]] Status ReadHugetlb(const LinuxHost& host, const Group& group, uint64_t inUse,
@@ -153,6 +157,7 @@ class GroupTree {
   Figure hugetlb_;  // of all processes
   // What has been asked for, of each group and of each process.
   mutable std::vector<std::optional<Figure>> reserved_;
+  mutable std::vector<std::optional<Figure>> limits_;  // effective ones
   mutable std::vector<std::optional<ProcessKsm>> ksm_;
 
   // Only while the tree grows.
