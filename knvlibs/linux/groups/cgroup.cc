@@ -232,10 +232,15 @@ Status CgroupHierarchy::ReadUsage1(const LinuxHost& host, std::string_view path,
 Status CgroupHierarchy::ReadSwap(const LinuxHost& host, std::string_view path,
                                  MemcgSwap& swap) const {
   swap = MemcgSwap();
-  if (version_ != Version::k2) return kOk;
-  const Status status = ReadAmount(host, path, "memory.swap.max", std::nullopt, swap.max);
-  if (status != kOk) return status;
-  return ReadAmount(host, path, "memory.swap.current", std::nullopt, swap.current);
+  const bool is1 = version_ == Version::k1;
+  const char* const limit = is1 ? "memory.memsw.limit_in_bytes" : "memory.swap.max";
+  const char* const usage = is1 ? "memory.memsw.usage_in_bytes" : "memory.swap.current";
+  Figure used;
+  Status status = ReadAmount(host, path, limit, std::nullopt, swap.max);
+  if (status == kOk) status = ReadAmount(host, path, usage, std::nullopt, used);
+  swap.left = DifferenceOf(swap.max, used);
+  if (!is1) swap.current = used;
+  return status;
 }
 
 Status CgroupHierarchy::ReadHugetlb(const LinuxHost& host, std::string_view path,

@@ -46,10 +46,11 @@ struct MemcgEvents {
   Figure secPageTables;  // of KVM
 };
 
-// The swap of one cgroup and all below it, in KB; only version 2 tells.
+// The swap of one cgroup and all below it, in KB.
 struct MemcgSwap {
-  Figure max;  // none is no limit
-  Figure current;
+  Figure max;      // none is no limit; in version 1 that of memory and swap together
+  Figure left;     // below it
+  Figure current;  // only version 2 tells
 };
 
 // The files of a cgroup that tell of its huge pages of hugetlb, one for each of their sizes. None

@@ -319,10 +319,9 @@ Status GroupTree::ReadSwap(const LinuxHost& host, const VirtualMachine& machine,
     MemcgSwap each;
     status = cgroups_.ReadSwap(host, At(at).path, each);
     if (at == machine.cgroup) swap.current = each.current;
-    if (!each.max || !each.current) continue;
-    const uint64_t left = Less(*each.max, *each.current);
+    if (!each.left) continue;
     swap.limit = std::min(swap.limit.value_or(*each.max), *each.max);
-    swap.left = std::min(swap.left.value_or(left), left);
+    swap.left = std::min(swap.left.value_or(*each.left), *each.left);
   }
   return status;
 }

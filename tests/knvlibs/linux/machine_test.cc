@@ -449,6 +449,24 @@ TEST_F(SwappedMachineTest, IsSwappingIfItsSwapHasGrownSinceTheReportBegan) {
   }
 }
 
+TEST_F(MachineTest, InVersion1HasTheSwapThatMemoryLeavesOfTheLimitOfBoth) {
+  const std::string root = "/sys/fs/cgroup/memory/";
+  const std::string own = root + "machine.slice/web.scope/";
+  tree_.Write("/proc/meminfo", "SwapTotal: 10000 kB\nSwapFree: 6000 kB\n");
+  WriteQemu(kPid, "1", "-smp", "2");
+  for (const std::string& each : {root, root + "machine.slice/"}) {
+    tree_.Write(each + "cgroup.procs", "");
+  }
+  tree_.Write(own + "cgroup.procs", "100\n");
+  tree_.Write(own + "memory.memsw.limit_in_bytes", "4096000\n");
+  tree_.Write(own + "memory.memsw.usage_in_bytes", "1024000\n");
+  const auto swap = Get<KSI_SwapInfo>("sched/memClients/swapInfo", kPid);
+  EXPECT_EQ(uint64_t{swap.totalReg}, 4000u);
+  EXPECT_EQ(uint64_t{swap.freeReg}, 3000u);
+  tree_.Write(own + "memory.memsw.limit_in_bytes", "9223372036854771712\n");
+  EXPECT_EQ(uint64_t{Get<KSI_SwapInfo>("sched/memClients/swapInfo", kPid).totalReg}, 10000u);
+}
+
 TEST_F(MachineTest, WithoutACgroupOfItsOwnIsSwappingIfItsProcessIs) {
   WriteQemu(kPid, "1", "-smp", "2");
   LinuxSource source(tree_.Root());
