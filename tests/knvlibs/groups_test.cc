@@ -565,6 +565,17 @@ TEST_F(GroupsTest, WhatIsLockedOrPinnedOrHugeIsNotSwappedAndInMemory) {
   EXPECT_EQ(uint64_t{Get<KSI_UwTally>("sched/memClients/tally/uw", kPid).pinned}, kNoValue);
 }
 
+TEST_F(GroupsTest, ANameIsWhatTheProcessIsCalled) {
+  const auto nameOf = [this](const std::string& inStatus) {
+    WriteProcess(kPid, inStatus);
+    return NameOf(kProcessGroup + kPid);
+  };
+  EXPECT_EQ(nameOf("a\\\\b"), "a\\b");
+  EXPECT_EQ(nameOf("a\\\\nb"), "a\\nb") << "a backslash and an n";
+  EXPECT_EQ(nameOf("a\\nb"), "a?b") << "a newline";
+  EXPECT_EQ(nameOf("a\\"), "a\\") << "no kernel writes that";
+}
+
 TEST_F(GroupsTest, ALimitIsTheSmallestOnTheWayUp) {
   constexpr int64_t kBelow = 8;
   const std::string jobs = "/sys/fs/cgroup/jobs/";

@@ -55,12 +55,23 @@ bool ParsePid(std::string_view text, int32_t& pid) {
 // The last field of interest: signals, capabilities and the like come behind it.
 constexpr std::string_view kLastField = "Threads";
 
+// A name is up to 15 bytes of anything; only newlines and backslashes come escaped.
+std::string Unescaped(std::string_view text) {
+  std::string name;
+  while (!text.empty()) {
+    const bool isNewline = text.starts_with("\\n");
+    const bool isEscaped = isNewline || text.starts_with("\\\\");
+    name += isNewline ? '\n' : text.front();
+    text.remove_prefix(isEscaped ? 2 : 1);
+  }
+  return name;
+}
+
 // Takes one field of the status file; false if it is not understood. Many are none of ours.
 bool TakeField(std::string_view name, std::string_view value, Process& process,
                StatusFacts& facts) {
-  // A name is up to 15 bytes of anything; only newlines and backslashes come escaped.
   if (name == "Name") {
-    process.name = Printable(value.empty() ? value : value.substr(1));
+    process.name = Printable(Unescaped(value.empty() ? value : value.substr(1)));
   } else if (name == "State") {
     facts.state = Trimmed(value).substr(0, 1);
   } else if (name == "Uid") {
