@@ -576,6 +576,18 @@ TEST_F(GroupsTest, ANameIsWhatTheProcessIsCalled) {
   EXPECT_EQ(nameOf("a\\"), "a\\") << "no kernel writes that";
 }
 
+TEST_F(GroupsTest, ProcessesThatAreNotVisibleAreToldOnce) {
+  WriteCgroup("/jobs", kJobs, "0\n100\n0\n");
+  WriteCgroup("/more", 8, "0\n");
+  LinuxSource source(tree_.Root());
+  testing::internal::CaptureStderr();
+  EXPECT_EQ(GetIds(source, "sched/groups/members/groups", {kJobs}),
+            (std::vector<int64_t>{kProcessGroup + kPid}));
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "/sys/fs/cgroup/jobs/cgroup.procs: lists processes that are not visible from here: "
+            "such are left out\n");
+}
+
 TEST_F(GroupsTest, ALimitIsTheSmallestOnTheWayUp) {
   constexpr int64_t kBelow = 8;
   const std::string jobs = "/sys/fs/cgroup/jobs/";

@@ -126,8 +126,13 @@ Status CgroupHierarchy::ReadProcesses(const LinuxHost& host, std::string_view pa
     if (!ParseNumber(line, pid) || pid > INT32_MAX) {
       return host.NotUnderstoodOnce("cgroup.procs", file, lines.Number());
     }
-    // 0 is a process that is not visible from here.
-    if (pid != 0) pids.push_back(static_cast<int32_t>(pid));
+    if (pid != 0) {
+      pids.push_back(static_cast<int32_t>(pid));
+    } else if (host.First("unseen processes")) {
+      // Of another PID namespace.
+      Warning("%s: lists processes that are not visible from here: such are left out\n",
+              Printable(file).c_str());
+    }
   }
   return kOk;
 }
