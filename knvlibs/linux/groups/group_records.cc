@@ -196,7 +196,7 @@ Status ReadOverhead(const LinuxHost& host, const GroupTree& tree, const VirtualM
   overhead.reset();
   if (!mapping.resident) return kOk;
   const Status status = ReadKvmTables(host, tree, machine, meminfo, tables);
-  const Process& process = tree.ProcessOf(tree.At(machine.group));
+  const Process& process = machine.measured;
   overhead = SumOf({DifferenceOf(process.Mapped(), mapping.resident), process.vmPte, tables});
   return status;
 }

@@ -70,6 +70,7 @@ struct VirtualMachine {
   // What takes long to find out, once it was asked.
   mutable std::optional<QemuMappings> mappings;  // until they have been measured
   mutable std::optional<GuestMapping> mapping;
+  mutable Process measured;  // the process beside `mapping`: what it has beside its guest's memory
   mutable std::optional<GuestMemory> guest;
   mutable std::optional<MemcgEvents> events;  // of its own cgroup
   mutable std::optional<std::optional<bool>> usesKvm;

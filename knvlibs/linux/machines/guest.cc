@@ -124,8 +124,9 @@ Status GetMapping(const LinuxHost& host, const GroupTree& tree, const VirtualMac
                   const GuestMapping*& mapping) {
   if (!machine.mapping) {
     GuestMapping read;
-    const Status status = ReadMapping(host, tree, machine, read);
+    Status status = ReadMapping(host, tree, machine, read);
     machine.mappings.reset();
+    if (status == kOk) status = ReadProcess(host, machine.pid, machine.measured);
     if (status != kOk) return status;
     machine.mapping = std::move(read);
   }

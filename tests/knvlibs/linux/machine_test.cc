@@ -184,6 +184,22 @@ TEST_F(MachineTest, HasABalloonThatWorksWhereADriverIsShown) {
   EXPECT_TRUE(isActive("1048576", "17"));
 }
 
+TEST_F(MachineTest, WhatItTakesBesideItsGuestIsOfOneMoment) {
+  WriteQemu(kPid, "1", "-smp", "2");
+  LinuxSource source(tree_.Root());
+  ASSERT_EQ(GetIds(source, "sched/groups/members/groups", {int64_t{0}}).size(), 2u);
+  // Since the scan the guest has come to use all of its memory.
+  tree_.Write(ProcessFile(kPid, "smaps"),
+              "100000-200000 rw-p 0 00:00 0\nRss: 1024 kB\nVmFlags: rd wr dc\n");
+  tree_.Write(ProcessFile(kPid, "status"),
+              "Name:\tqemu\nVmSize:\t 9 kB\nVmRSS:\t 4024 kB\nVmPTE:\t 12 kB\nThreads:\t2\n");
+  KSI_GroupMemoryStats stats = {};
+  ASSERT_EQ(GetValue(source, "sched/groups/stats/memoryStats", {kProcessGroup | kPid}, &stats),
+            kOk);
+  EXPECT_EQ(+stats.ovhd, 3000u + 12);
+  EXPECT_EQ(+stats.consumed, 4000u) << "that is of the scan, as of all processes";
+}
+
 TEST_F(MachineTest, AMachineThatEndsAfterTheScanIsShownAsItStartedIfItCannotHaveChanged) {
   WriteQemu(kPid, "1", "-smp", "2");
   WriteQemu(kPid + 1, "1,slots=1,maxmem=64M", "-smp", "2");
