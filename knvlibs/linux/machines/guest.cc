@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include <knvlibs/ksi.h>
 #include "knvlibs/linux/host/wall_clock.h"
 #include "knvlibs/linux/machines/libvirt.h"
 #include "knvlibs/linux/reading.h"
@@ -39,6 +40,15 @@ const LibvirtDomain* FindDomain(const LinuxHost& host, const GroupTree& tree,
   return found == domains->end() ? nullptr : &found->second;
 }
 
+// A machine of libvirt whose monitor nobody else can ask.
+void TellUnknown(const LinuxHost& host, const QemuCommandLine& line) {
+  if (!host.IsThisMachine() || !line.isOfLibvirt || !line.monitor.empty()) return;
+  if (!host.First("libvirt")) return;
+  Warning(
+      "libvirt: it does not run, or not know all machines that it started: their balloons and "
+      "guests have no value\n");
+}
+
 // What libvirt tells, else its monitor; both only of a machine that is made.
 GuestMemory AskFor(const LinuxHost& host, const GroupTree& tree, const VirtualMachine& machine) {
   if (!machine.isQemu) return {};
@@ -48,6 +58,7 @@ GuestMemory AskFor(const LinuxHost& host, const GroupTree& tree, const VirtualMa
     TakeDomain(*domain, WallClock(host), guest);
     return guest;
   }
+  TellUnknown(host, machine.commandLine);
   return MayBeAsked(host, tree, machine) ? ReadGuestMemory(host, machine.pid, machine.commandLine)
                                          : guest;
 }

@@ -223,6 +223,8 @@ void FindMemory(const Parts& parts, QemuCommandLine& line) {
 }
 
 void FindMonitor(const Parts& parts, QemuCommandLine& line) {
+  // The name that libvirt gives it.
+  line.isOfLibvirt = std::ranges::find(parts.monitors, "charmonitor") != parts.monitors.end();
   Monitor monitor = parts.monitor;
   for (const Properties& socket : parts.sockets) {
     const std::string id = FindOrEmpty(socket, "id");

@@ -13,11 +13,12 @@
 namespace ksi {
 
 struct QemuCommandLine {
-  std::string name;      // -name; may be empty
-  std::string uuid;      // -uuid; may be empty
-  MachineMemory memory;  // that the machine starts with: -m, and the modules that are named
-  Figure maxMemory;      // with all modules it has room for, maxmem=, in KB
-  std::string monitor;   // path of the socket that answers QMP; may be empty
+  std::string name;          // -name; may be empty
+  std::string uuid;          // -uuid; may be empty
+  MachineMemory memory;      // that the machine starts with: -m, and the modules that are named
+  Figure maxMemory;          // with all modules it has room for, maxmem=, in KB
+  std::string monitor;       // path of the socket that answers QMP; may be empty
+  bool isOfLibvirt = false;  // libvirt has started it, and holds its monitor
   // QEMU makes its machine only when that socket has had its first client.
   bool waitsForClient = false;
   bool hasBalloon = false;

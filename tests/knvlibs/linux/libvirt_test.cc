@@ -12,6 +12,7 @@
 
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/linux/machines/domain_xml.h"
+#include "knvlibs/linux/machines/guest.h"
 #include "knvlibs/linux/machines/libvirt.h"
 #include "knvlibs/linux/machines/libvirt_client.h"
 #include "tests/knvlibs/host_tree.h"
@@ -277,6 +278,29 @@ TEST_F(DaemonTest, IsNotWhereOthersMayWrite) {
 TEST_F(DaemonTest, IsNotSomebodyElse) {
   ++daemon_.owner;
   EXPECT_FALSE(IsBelieved());
+}
+
+// A machine of a libvirt that does not run.
+
+TEST(UnknownDomainTest, IsToldOnce) {
+  const LinuxHost host("/");
+  const GroupTree tree;
+  const auto ask = [&](bool isOfLibvirt, const char* monitor) {
+    VirtualMachine machine;
+    machine.pid = INT32_MAX;
+    machine.commandLine.uuid = "6f7d3c1a-0000-4000-8000-000000000000";
+    machine.commandLine.isOfLibvirt = isOfLibvirt;
+    machine.commandLine.monitor = monitor;
+    testing::internal::CaptureStderr();
+    EXPECT_EQ(GetGuest(host, tree, machine).actual, std::nullopt);
+    return testing::internal::GetCapturedStderr();
+  };
+  EXPECT_EQ(ask(false, ""), "");
+  EXPECT_EQ(ask(true, "/none"), "") << "its monitor may tell";
+  EXPECT_EQ(ask(true, ""),
+            "libvirt: it does not run, or not know all machines that it started: their balloons "
+            "and guests have no value\n");
+  EXPECT_EQ(ask(true, ""), "");
 }
 
 // What is taken of a domain.

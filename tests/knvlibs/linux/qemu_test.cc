@@ -239,6 +239,16 @@ TEST_F(QmpTest, WhatAnswersOtherwiseTellsNothing) {
   }
 }
 
+TEST(QemuCommandLineTest, AMachineOfLibvirtHasItsMonitor) {
+  const char* const socket = "socket,id=charmonitor,fd=25,server=on,wait=off";
+  const QemuCommandLine line =
+      Parse({"-chardev", socket, "-mon", "chardev=charmonitor,id=monitor,mode=control"});
+  EXPECT_TRUE(line.isOfLibvirt);
+  EXPECT_EQ(line.monitor, "");
+  EXPECT_FALSE(Parse({"-chardev", socket}).isOfLibvirt);
+  EXPECT_FALSE(Parse({"-qmp", "unix:/run/q"}).isOfLibvirt);
+}
+
 TEST(AreCurrentTest, NotWhatIsOlderThanTwoIntervalsOrFiveMinutes) {
   EXPECT_TRUE(AreCurrent(1000, 1020, 10));
   EXPECT_FALSE(AreCurrent(1000, 1021, 10));
