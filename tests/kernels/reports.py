@@ -429,6 +429,15 @@ def is_reserved(directory):
     return False
 
 
+def effective_limit(directory):
+    """The smallest limit here or above."""
+    limits = []
+    while directory.rstrip("/") != CGROUPS:
+        limits += [kernel.limit(f"{directory}/{file}") for file in ("memory.max", "memory.high")]
+        directory = os.path.dirname(directory)
+    return min((limit for limit in limits if limit is not None), default=None)
+
+
 def children(directory):
     return [entry.path for entry in os.scandir(directory) if entry.is_dir(follow_symlinks=False)]
 
@@ -442,7 +451,7 @@ def group_row(directory, own, **figures):
         "max": said["max"],
         "minLimit": None,
         "bMin": said["min"],
-        "bMax": said["max"],
+        "bMax": effective_limit(directory),
         "eMin": None if is_reserved(directory) else 0,
         "eMinPeak": None if is_reserved(directory) else 0,
         "conResv": 0,
@@ -644,7 +653,9 @@ def swapped_of(pid, own):
 
 def touched_of(pid, own, resident):
     said = kernel.status(pid)
-    if said["VmRSS"] + said["VmSwap"] <= 256 * 1024:
+    if said["HugetlbPages"]:
+        return None
+    if said["VmRSS"] + said["VmSwap"] <= 256 * 1024 and said["VmPTE"] <= 512:
         return guest_memory(pid)["referenced"]
     stat = stat_of(own)
     return min((stat["active_anon"] + stat["active_file"]) // 1024, resident) if own else None
