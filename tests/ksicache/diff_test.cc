@@ -312,7 +312,7 @@ TEST_F(Diff, FailAbove) {
   EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "142G"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "151630057472"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "151630057471"}), 3);
-  EXPECT_EQ(status({kAfter, kBefore, "--fail-above", "8G"}), 0);
+  EXPECT_EQ(status({kAfter, kBefore, "--fail-above", "11G"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "swap-stats", "--fail-above", "7g"}), 3);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "swap-stats", "--fail-above", "8g", "-u", "mb"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--by", "ballooned", "--fail-above", "3g"}),
