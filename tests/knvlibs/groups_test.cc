@@ -198,7 +198,7 @@ TEST_F(GroupsTest, NamesAreDecodedAndHarmless) {
   WriteCgroup("/a\\x2db\\x0ac.slice", 8, "");
   EXPECT_EQ(NameOf(8), "a-b?c.slice");
   WriteProcess(kPid, "(a) b: \x1b[2Jc\\n");
-  EXPECT_EQ(NameOf(kProcessGroup + kPid), "(a) b: ?[2Jc\\n");
+  EXPECT_EQ(NameOf(kProcessGroup + kPid), "(a) b: ?[2Jc?");
   const std::string longName(70, 'n');
   WriteCgroup("/" + longName, 9, "");
   EXPECT_EQ(NameOf(9), longName.substr(0, 64));
