@@ -197,7 +197,7 @@ TEST_F(Ksicache, WhatTheDiskDoesNotTakeIsToldAndReplacesNothing) {
   EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"a.json", "a.ksi"}));
 
   // Nothing but that unnamed files are unknown is a reason to make one with a name.
-  for (int n = 2; n <= 4; ++n) {
+  for (int n = 2; n <= 5; ++n) {
     program.environment.back() = "FAIL=open:" + std::to_string(n);
     result = harness::RunProgram(program);
     EXPECT_EQ(result.status, 1) << n;

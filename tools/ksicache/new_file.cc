@@ -169,7 +169,12 @@ void NewFile::RequireNotRecorded() const {
   if (!replace_) return;
   const Descriptor file(openat(directory_.Get(), entry_.c_str(),
                                O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
-  const std::string recorder = file ? RecorderOf(file.Get()) : "";
+  if (!file) {
+    // A file that is not there, is a link or may not be read is nobody's recording that is known of.
+    if (errno == ENOENT || errno == ELOOP || errno == EACCES) return;
+    throw SystemError(name_, errno);
+  }
+  const std::string recorder = RecorderOf(file.Get());
   if (!recorder.empty()) throw Error(name_ + ": is being recorded by " + recorder);
 }
 
