@@ -284,12 +284,13 @@ Status RecordingFile::FindMoment(int64_t time, int64_t& number) {
   const int64_t wanted = SecondOf(time);
   int64_t best = 0;  // the second of `number`
   number = -1;
-  for (auto part = parts_.rbegin(); part != parts_.rend(); ++part) {
-    const bool isBehind = number >= 0 && SecondOf(part->last) <= best;
-    if (isBehind || SecondOf(part->first) > wanted) continue;
+  for (size_t i = parts_.size(); i-- > 0;) {
+    const Part& part = parts_[i];
+    const bool isBehind = number >= 0 && SecondOf(part.last) <= best;
+    if (isBehind || SecondOf(part.first) > wanted) continue;
     int64_t candidate = 0;
     int64_t second = 0;
-    const Status status = FindIn(*part, wanted, candidate, second);
+    const Status status = FindIn(part, wanted, candidate, second);
     if (status != kOk) return status;
     if (number >= 0 && second <= best) continue;
     number = candidate;

@@ -40,7 +40,7 @@ void MomentWalk::Walk(const Part& part) {
   if (file_.ReadFacts(part, facts) != ksi::kOk) return complain_(file_.Why());
   if (!knowsHost) complain_(why);
   const size_t blocks = ksi::cache::BlocksOf(static_cast<size_t>(part.size));
-  const double bytes = static_cast<double>(blocks * ksi::cache::kBlockSize);
+  const auto bytes = static_cast<double>(blocks * ksi::cache::kBlockSize);
   for (size_t i = 0; i < facts.size(); ++i) {
     WalkedMoment moment;
     moment.number = part.number + static_cast<int64_t>(i);

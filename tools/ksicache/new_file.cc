@@ -170,7 +170,8 @@ void NewFile::RequireNotRecorded() const {
   const Descriptor file(openat(directory_.Get(), entry_.c_str(),
                                O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
   if (!file) {
-    // A file that is not there, is a link or may not be read is nobody's recording that is known of.
+    // A file that is not there, is a link or may not be read is nobody's recording that is known
+    // of.
     if (errno == ENOENT || errno == ELOOP || errno == EACCES) return;
     throw SystemError(name_, errno);
   }

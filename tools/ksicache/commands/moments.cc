@@ -53,7 +53,7 @@ class Chosen {
   // told by those around it.
   bool Needs(const ksi::RecordingFile::Part& part) const {
     const auto& parts = recording_->Parts();
-    const size_t place = static_cast<size_t>(&part - parts.data());
+    const auto place = static_cast<size_t>(&part - parts.data());
     const size_t end = std::min(place + 2, parts.size());
     const auto hasSome = [this](const ksi::RecordingFile::Part& each) {
       return (!times_ || (each.first <= times_->last && times_->first <= each.last)) &&

@@ -65,6 +65,7 @@ class Comparison {
 
   static std::vector<std::string> Identities(const std::vector<Amount>& amounts) {
     std::vector<std::string> identities;
+    identities.reserve(amounts.size());
     for (const Amount& amount : amounts) identities.push_back(amount.identity);
     return identities;
   }
