@@ -23,8 +23,8 @@ std::optional<NamedSpan> SpanOf(const std::string& name);
 bool IsSpan(const std::string& name);
 
 // The times that are meant, which are seconds as a whole. FROM and TO are as of recording/when.h,
-// but that a TO without a date is the first such time after FROM; without them, and with "first" and
-// "last", there is no bound, wherever the clock was set. Fails with a DataError if there are no
+// but that a TO without a date is the first such time after FROM; without them, and with "first"
+// and "last", there is no bound, wherever the clock was set. Fails with a DataError if there are no
 // moments, or if one is no time.
 ksi::Span TimesOf(const NamedSpan& named, const ksi::RecordingFile& recording);
 

@@ -11,7 +11,7 @@ namespace ksi {
 
 // Pages, by the names of the files. A kernel without page sharing has shared nothing.
 struct Ksm {
-  bool isTold = true;  // else nothing of this is known: the kernel's files are hidden
+  bool isTold = true;         // else nothing of this is known: the kernel's files are hidden
   uint64_t pagesShared = 0;   // that stand for several
   uint64_t pagesSharing = 0;  // more that would be there without them
   Figure zeroPages = 0;       // of processes, in whose place the kernel's zero page is mapped

@@ -71,7 +71,8 @@ const FormatInfo& FormatOf(const CommandLine& line) {
   for (const FormatInfo& format : kFormats) {
     if (*name == format.name) return format;
   }
-  throw UsageError("there is no format " + *name + ": there are csv, json, sqlite, openmetrics and prometheus");
+  throw UsageError("there is no format " + *name +
+                   ": there are csv, json, sqlite, openmetrics and prometheus");
 }
 
 // None: that of each report.
