@@ -97,8 +97,19 @@ in use                                 89435992           -          -
   others                               72078752           -          -
 
 who grows steadily                          now      growth    an hour   full in
-heap heap0                               110844       10728        225  367d 20h
+heap heap0                               110844        9836        225  367d 20h
 )");
+}
+
+// The afternoon's leak begins after some minutes, and the heap is full before the end.
+TEST_F(DiffSince, FindsARamp) {
+  const std::string out =
+      Output({"diff", "--since", "4h", TALLY_EXAMPLES "/afternoon.rec", "-u", "mb"});
+  EXPECT_NE(
+      out.find(
+          "\nheap netPktHeap                             465         407        131     21m 4s\n"),
+      std::string::npos)
+      << out;
 }
 
 // What was before the host was started anew is left out, and names are matched across it.

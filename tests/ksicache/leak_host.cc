@@ -71,7 +71,7 @@ uint64_t Figure::At(size_t moment, size_t count, double days, std::mt19937_64& r
       break;
   }
   // The kernel counts pages.
-  return std::max<int64_t>(0, std::llround(figure / 4)) * 4;
+  return static_cast<uint64_t>(std::max<int64_t>(0, std::llround(figure / 4))) * 4;
 }
 
 LeakHost::LeakHost(uint32_t seed, size_t count) : random_(seed), count_(count) {

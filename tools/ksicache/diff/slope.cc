@@ -84,7 +84,17 @@ std::optional<Trend> TrendOf(std::span<const Point> points) {
     above = std::max(above, off);
     below = std::min(below, off);
   }
-  return Trend{slope * (points.back().x - points.front().x), above - below, NoiseOf(points)};
+  Trend trend = {.growth = slope * (points.back().x - points.front().x),
+                 .wander = above - below,
+                 .noise = NoiseOf(points),
+                 .grown = medians.back().y - medians.front().y,
+                 .rises = 0,
+                 .falls = 0};
+  for (size_t i = 1; i < kStretches; ++i) {
+    if (medians[i].y > medians[i - 1].y) ++trend.rises;
+    if (medians[i].y < medians[i - 1].y) ++trend.falls;
+  }
+  return trend;
 }
 
 }  // namespace ksicache

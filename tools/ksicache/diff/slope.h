@@ -27,18 +27,26 @@ struct Trend {
   double growth;  // of the line, from the first point to the last
   double wander;  // between the medians that lie farthest above and below the line
   double noise;   // what the wander would be if noise alone moved each point; 0: not known
+  double grown;   // from the first median to the last
+  size_t rises;   // of the medians, above the one before
+  size_t falls;   // and below it
 
   // Whether it grew all the time. Where the points are moved by noise alone, the growth has to
   // stand out from that. Where chance carries a figure on from point to point the wander is larger
   // than the noise, and such a figure hardly ever grows by so many times its wander; no more does
-  // one that goes up and down, or in a step.
+  // one that goes up and down, or in a step. One that began or ended to grow meanwhile wanders for
+  // that alone; it is told by never having gone back.
   bool IsSteady() const {
     constexpr double kTimesNoise = 2;
     constexpr double kMostNoise = 1.8;
     constexpr double kTimesWander = 8;
+    constexpr double kTimesWanderRising = 3;
+    constexpr size_t kMostRests = 3;
     if (growth <= 0) return false;
     const bool isNoise = wander < kMostNoise * noise;
-    return growth > kTimesWander * wander || (isNoise && growth > kTimesNoise * noise);
+    const bool isRising = falls == 0 && rises + kMostRests >= kStretches - 1;
+    return growth > (isRising ? kTimesWanderRising : kTimesWander) * wander ||
+           (isNoise && growth > kTimesNoise * noise);
   }
 };
 

@@ -220,9 +220,9 @@ class Collector {
       const std::vector<Point> points = PointsOf(series, sign);
       const std::optional<Trend> trend = TrendOf(points);
       if (!trend || !trend->IsSteady()) continue;
-      const double slope = (isSaved ? 1 : sign) * MedianSlope(points);
-      growth.perSecond = slope;
-      growth.growth = slope * (points.back().x - points.front().x);
+      const double direction = isSaved ? 1 : sign;
+      growth.perSecond = direction * MedianSlope(points);
+      growth.growth = direction * trend->grown;
     }
     return growth;
   }
