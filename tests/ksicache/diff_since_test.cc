@@ -107,7 +107,7 @@ TEST_F(DiffSince, FindsARamp) {
       Output({"diff", "--since", "4h", TALLY_EXAMPLES "/afternoon.rec", "-u", "mb"});
   EXPECT_NE(
       out.find(
-          "\nheap netPktHeap                             465         407        131     21m 4s\n"),
+          "\nheap netPktHeap                             465         407        131    21m 4s\n"),
       std::string::npos)
       << out;
 }
