@@ -13,6 +13,7 @@
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/moment_report.h"
 #include "tools/ksicache/named_span.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
@@ -24,7 +25,8 @@ namespace {
 
 constexpr Option kFormat = {"format", "FORMAT", "json, sqlite, openmetrics or prometheus, not csv"};
 constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
-constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kForce, &kMode};
+constexpr Option kCluster = {"cluster", "NAME", "have tables over all servers of this cluster"};
+constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kCluster, &kForce, &kMode};
 
 using Reports = std::vector<const tally::Report*>;
 
@@ -40,9 +42,11 @@ std::string ReportNames() {
 }
 
 const tally::Report* ReportCalled(const std::string& name) {
+  if (tally::SameName(name, kMomentReport.name)) return &kMomentReport;
   const tally::Report* report = tally::FindReport(name.c_str());
   if (report == nullptr) {
-    throw UsageError("there is no report " + name + ": there are " + ReportNames() + ", or all");
+    throw UsageError("there is no report " + name + ": there are " + ReportNames() +
+                     ",\nall of these, and moments");
   }
   return report;
 }
@@ -101,6 +105,15 @@ std::optional<NewFile> FileOf(const CommandLine& line, const FormatInfo& format)
   return std::make_optional<NewFile>(*name, line.Has(kForce), ModeOf(line));
 }
 
+// None if the option is not there.
+std::string ClusterOf(const CommandLine& line, const FormatInfo& format) {
+  const std::string* name = line.ValueOf(kCluster);
+  if (name != nullptr && !format.isSchema) {
+    throw UsageError("--cluster is for the format clickhouse-schema");
+  }
+  return name == nullptr ? "" : *name;
+}
+
 // Puts reports into a format, of one file after the other.
 class Exporter {
  public:
@@ -111,6 +124,12 @@ class Exporter {
   void Export(std::span<const tally::Report* const> reports, std::span<const std::string> files) {
     if (!isByReport_) return ExportTogether(reports, files);
     for (size_t i = 0; i < reports.size(); ++i) ExportTogether(reports.subspan(i, 1), files);
+  }
+
+  // What the reports have, without their rows.
+  void Describe(std::span<const tally::Report* const> reports) {
+    hasBegun_ = true;
+    for (const tally::Report* report : reports) sink_.Expect(*report, {});
   }
 
   // Whether nothing was left out.
@@ -170,15 +189,19 @@ int Export(const CommandLine& line) {
   const std::optional<tally::DisplayUnit> unit = UnitOf(line, info);
   std::optional<NewFile> file = FileOf(line, info);
   const std::span<const std::string> files = std::span(line.arguments).subspan(1);
+  if (info.isSchema && !files.empty()) {
+    throw UsageError(std::string(info.name) + " is the same for all files, and takes none");
+  }
   for (const std::string& name : files) {
     if (file) file->RefuseInput(FileNameOf(name));
   }
   const std::unique_ptr<RowFormat> format =
       info.make({.file = file ? &*file : nullptr,
                  .hasManyReports = reports.size() > 1,
-                 .hasSpans = std::ranges::any_of(files, IsSpan)});
+                 .hasSpans = std::ranges::any_of(files, IsSpan),
+                 .cluster = ClusterOf(line, info)});
   Exporter exporter(info, *format, unit);
-  exporter.Export(reports, files);
+  info.isSchema ? exporter.Describe(reports) : exporter.Export(reports, files);
   if (exporter.HasBegun()) format->Finish();
   return exporter.IsWhole() ? 0 : 1;
 }

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <memory>
+#include <string>
 
 #include "tools/ksicache/export/row_format.h"
 #include "tools/ksicache/new_file.h"
@@ -16,6 +17,7 @@ struct FormatOptions {
   bool hasManyReports;                   // so that each row says of which it is
   bool hasSpans;                         // so that hosts have rows of several times
   size_t mostBytes = size_t{192} << 20;  // of rows that are kept to be put in order
+  std::string cluster = {};              // of a schema
 };
 
 struct FormatInfo {
@@ -23,6 +25,7 @@ struct FormatInfo {
   bool isInBaseUnits;  // bytes, whatever -u says
   bool needsFile;      // it is nothing to print
   bool isByReport;     // a report's rows of all moments stand together
+  bool isSchema;       // it has no rows
   std::unique_ptr<RowFormat> (*make)(const FormatOptions& options);
 };
 
@@ -31,14 +34,16 @@ std::unique_ptr<RowFormat> MakeJson(const FormatOptions& options);
 std::unique_ptr<RowFormat> MakeSqlite(const FormatOptions& options);  // REQUIRES: a file
 std::unique_ptr<RowFormat> MakeOpenMetrics(const FormatOptions& options);
 std::unique_ptr<RowFormat> MakePrometheus(const FormatOptions& options);
+std::unique_ptr<RowFormat> MakeClickHouseSchema(const FormatOptions& options);
 
 // The first one is taken if none is named.
 inline constexpr FormatInfo kFormats[] = {
-    {"csv", false, false, true, MakeCsv},
-    {"json", false, false, false, MakeJson},
-    {"sqlite", false, true, false, MakeSqlite},
-    {"openmetrics", true, false, true, MakeOpenMetrics},
-    {"prometheus", true, false, true, MakePrometheus},
+    {"csv", false, false, true, false, MakeCsv},
+    {"json", false, false, false, false, MakeJson},
+    {"sqlite", false, true, false, false, MakeSqlite},
+    {"openmetrics", true, false, true, false, MakeOpenMetrics},
+    {"prometheus", true, false, true, false, MakePrometheus},
+    {"clickhouse-schema", false, false, true, true, MakeClickHouseSchema},
 };
 
 }  // namespace ksicache

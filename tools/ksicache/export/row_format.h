@@ -19,6 +19,7 @@ struct RowColumn {
   tally::Kind kind;
   bool isKey;
   bool isCounter;
+  bool isSigned;                        // its numbers are
   const char* unit;                     // that its numbers are in; empty: they have none
   std::span<const char* const> states;  // all that its texts may be; none: anything
 };

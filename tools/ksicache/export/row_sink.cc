@@ -44,8 +44,8 @@ std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report) {
 
 RowColumn RowColumnOf(const tally::ColumnInfo& column, DisplayUnit unit) {
   const auto& [desc, figure] = column;
-  return {desc.name,        desc.description,     figure.kind,  figure.isKey,
-          figure.isCounter, UnitOf(figure, unit), figure.states};
+  return {desc.name,        desc.description, figure.kind,          figure.isKey,
+          figure.isCounter, figure.isSigned,  UnitOf(figure, unit), figure.states};
 }
 
 void RowSink::Expect(const tally::Report& report, const Origin& origin) {

@@ -3,23 +3,17 @@
 //
 // Numbers are integers; one beyond their 63 bits is a real number, which is less exact and not
 // another one. A figure without a value is NULL, a flag 0 or 1.
-#include <algorithm>
 #include <bit>
 #include <map>
 #include <string>
 
 #include "knvlibs/sqlite.h"
 #include "tools/ksicache/export/formats.h"
+#include "tools/ksicache/export/table_name.h"
 #include "tools/ksicache/memory_database.h"
 
 namespace ksicache {
 namespace {
-
-std::string TableName(const tally::Report& report) {
-  std::string name = report.name;
-  std::ranges::replace(name, '-', '_');
-  return name;
-}
 
 const char* TypeOf(const RowColumn& column) {
   return column.kind == tally::Kind::text ? "TEXT" : "INTEGER";
