@@ -19,8 +19,8 @@
 #include <vector>
 
 #include <knvlibs/ksi_records.h>
-#include "knvlibs/catalogue.h"
 #include "knvlibs/source.h"
+#include "tests/harness/made_host.h"
 #include "tools/ksicache/cache_writer.h"
 
 namespace {
@@ -36,50 +36,48 @@ class Host {
   void AddGroup(int64_t id, int64_t parent, uint32_t flags, std::span<const int64_t> children) {
     KSI_GroupName name{};
     std::snprintf(name.text, sizeof name.text, "group.%lld", static_cast<long long>(id));
-    Value("sched/groups/groupName", id, name);
+    host_.Value("sched/groups/groupName", name, id);
     KSI_GroupTag tag{};
     std::snprintf(tag.text, sizeof tag.text, "tag%d", static_cast<int>(id % 10));
-    Value("sched/groups/groupTag", id, tag);
-    Value("sched/groups/parentGroupID", id, parent);
-    Value("sched/groups/groupFlags", id, flags);
-    Value("sched/groups/memAllocationInKB", id,
-          KSI_GroupAllocation{Amount(), Amount(), 1000, -1, {}});
+    host_.Value("sched/groups/groupTag", tag, id);
+    host_.Value("sched/groups/parentGroupID", parent, id);
+    host_.Value("sched/groups/groupFlags", flags, id);
+    host_.Value("sched/groups/memAllocationInKB",
+                KSI_GroupAllocation{Amount(), Amount(), 1000, -1, {}}, id);
     KSI_GroupCapacity capacity{};
     capacity.conResv = Unsigned();
     capacity.availResv = Unsigned();
-    Value("sched/groups/stats/capacity", id, capacity);
+    host_.Value("sched/groups/stats/capacity", capacity, id);
     KSI_GroupMemoryStats stats{};
     stats.memSize = stats.memSizePeak = Unsigned();
     stats.consumed = stats.consumedPeak = Unsigned();
     stats.touched = stats.bActive = stats.allocTgt = Unsigned();
     stats.eMin = stats.bMin = stats.ovhd = Unsigned();
-    Value("sched/groups/stats/memoryStats", id, stats);
+    host_.Value("sched/groups/stats/memoryStats", stats, id);
 
-    std::vector<ksi::Key> list;
-    for (const int64_t child : children) list.push_back({ksi::KeyKind::kNumber, child, {}});
-    writer_.AddList(Node("sched/groups/members/groups"), Keys(id), list);
+    host_.List("sched/groups/members/groups", children, id);
   }
 
   // What the reports on virtual machines read of the world group `client` of group `id`.
   void AddVirtualMachine(int64_t id, int32_t client) {
-    Value("sched/groups/groupLeaderID", id, client);
-    Value("worldGroups/vmmLeaderID", client, client);
+    host_.Value("sched/groups/groupLeaderID", client, id);
+    host_.Value("worldGroups/vmmLeaderID", client, client);
     KSI_VmmTally vmm{};
     vmm.memSizeLimit = vmm.memSize = Unsigned();
     vmm.mapped = vmm.touched = vmm.allocTgt = Unsigned();
     vmm.shared = vmm.sharedSaved = vmm.zero = Unsigned() / 8;
-    Value("sched/memClients/tally/vmm", client, vmm);
+    host_.Value("sched/memClients/tally/vmm", vmm, client);
     KSI_SwapInfo swap{};
     swap.swapped = Unsigned() / 16;
-    Value("sched/memClients/swapInfo", client, swap);
+    host_.Value("sched/memClients/swapInfo", swap, client);
   }
 
   // What the report on user worlds reads of the world group `client` of group `id`.
   void AddUserWorld(int64_t id, int32_t client) {
-    Value("sched/groups/groupLeaderID", id, client);
+    host_.Value("sched/groups/groupLeaderID", client, id);
     KSI_UwTally uw{};
     uw.memSize = uw.mapped = uw.pageable = Unsigned();
-    Value("sched/memClients/tally/uw", client, uw);
+    host_.Value("sched/memClients/tally/uw", uw, client);
   }
 
   // The memory of the host, with a heap.
@@ -87,19 +85,17 @@ class Host {
     KSI_Comprehensive memory{};
     memory.total = memory.managedByMemMap = uint64_t{1} << 30;
     memory.free = Unsigned();
-    Value("memory/comprehensive", memory);
-    Value("sched/globalStats/memory/tally", KSI_GlobalTally{});
+    host_.Value("memory/comprehensive", memory);
+    host_.Value("sched/globalStats/memory/tally", KSI_GlobalTally{});
     for (const std::string_view state : ksi::kMemoryStates) {
-      writer_.AddValue(Node("sched/globalStats/memory/stateTransitions"),
-                       {{{ksi::KeyKind::kText, 0, state}}, 1},
-                       std::as_bytes(std::span(&kTransitions, 1)));
+      host_.Value("sched/globalStats/memory/stateTransitions", KSI_StateTransitions{}, state);
     }
-    const ksi::Key heap = {ksi::KeyKind::kText, 0, "heap"};
-    writer_.AddList(Node("system/heaps"), {}, std::span(&heap, 1));
+    constexpr std::string_view kHeap = "heap";
+    host_.List("system/heaps", std::span(&kHeap, 1));
     KSI_HeapStats stats{};
     std::snprintf(stats.name, sizeof stats.name, "heap");
     stats.size = 1U << 20;
-    writer_.AddValue(Node("system/heaps/stats"), {{heap}, 1}, std::as_bytes(std::span(&stats, 1)));
+    host_.Value("system/heaps/stats", stats, kHeap);
   }
 
   void Commit() {
@@ -110,30 +106,11 @@ class Host {
   }
 
  private:
-  static constexpr KSI_StateTransitions kTransitions = {};
-
-  static const ksi::Node& Node(std::string_view path) { return *ksi::FindNode(path); }
-
-  static ksi::Keys Keys(int64_t number) {
-    ksi::Keys keys;
-    keys.at[keys.count++] = {ksi::KeyKind::kNumber, number, {}};
-    return keys;
-  }
-
-  template <class Record>
-  void Value(std::string_view path, int64_t key, const Record& record) {
-    writer_.AddValue(Node(path), Keys(key), std::as_bytes(std::span(&record, 1)));
-  }
-
-  template <class Record>
-  void Value(std::string_view path, const Record& record) {
-    writer_.AddValue(Node(path), {}, std::as_bytes(std::span(&record, 1)));
-  }
-
   int64_t Amount() { return static_cast<int64_t>(Unsigned()); }
   uint64_t Unsigned() { return random_() % (1U << (10 + random_() % 18)); }
 
   ksicache::CacheWriter writer_;
+  tally::testing::MadeHost host_{writer_};
   std::mt19937 random_{20261121};
 };
 
