@@ -78,7 +78,7 @@ function __ksicache_words
     set -e words[1]
     while set -q words[1]
         switch $words[1]
-            case --root --mode --every --keep --max-size --count --format --unit --output -u -o \
+            case --root --mode --every --keep --max-size --count --format --unit --output --cluster -u -o \
                 --report --by --top --since --fail-above -r
                 set -e words[1]
             case '-*'
@@ -157,6 +157,7 @@ complete -c ksicache -n '__ksicache_command diff' -l top -x -a '3 5 10 20' -d 'S
 complete -c ksicache -n '__ksicache_command diff' -l since -x -a '1h 6h 1d 7d' -d 'Say who grew steadily for so long'
 complete -c ksicache -n '__ksicache_command diff' -l fail-above -x -a '100M 500M 1G' -d 'End with status 3 if any grew by more'
 complete -c ksicache -n '__ksicache_command diff' -l across-hosts -d 'Compare moments of two hosts'
-complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics prometheus' -d 'Write in this format'
+complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics prometheus clickhouse-schema' -d 'Write in this format'
 complete -c ksicache -n '__ksicache_command diff export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
+complete -c ksicache -n '__ksicache_command export' -l cluster -x -d 'Have tables over all servers of this cluster'
 complete -c ksicache -n '__ksicache_command export' -s o -l output -r -F -d 'Make a file'

@@ -350,7 +350,7 @@ declare -gA _ksicache_values=(
   [--every]='1s 5s 10s 30s 1m'
   [--keep]='1d 7d 30d'
   [--max-size]='500M 1G 2G'
-  [--format]='csv json sqlite openmetrics prometheus'
+  [--format]='csv json sqlite openmetrics prometheus clickhouse-schema'
   [--unit]='mb kb pg b'
   [--top]='3 5 10 20'
   [--since]='1h 6h 1d 7d'
@@ -359,7 +359,7 @@ declare -gA _ksicache_values=(
 
 _ksicache() {
   local _tally_line word command='' count=0 skip='' head='' i
-  local valued='root|mode|every|keep|max-size|count|format|unit|output|report|by|top|since|fail-above'
+  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|report|by|top|since|fail-above'
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
@@ -399,7 +399,7 @@ _ksicache() {
         _tally_reply '' "$word" \
           '--report -r --by --top --since --unit -u --json --fail-above --across-hosts'
         ;;
-      export) _tally_reply '' "$word" '--format --unit -u --output -o --force --mode' ;;
+      export) _tally_reply '' "$word" '--format --unit -u --output -o --cluster --force --mode' ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac

@@ -332,6 +332,41 @@ TEST_F(ExportFormats, MetricsOfASpanHaveTheirTimes) {
                            "one\n");
 }
 
+TEST_F(ExportFormats, TablesForClickHouse) {
+  EXPECT_EQ(Output({"export", "moments", "--format=clickhouse-schema", "--cluster", "it's"}),
+            R"(CREATE TABLE IF NOT EXISTS moments
+(
+  host String,
+  time DateTime,
+  `built` Nullable(String) COMMENT 'when the kernel\'s definitions were built'
+)
+ENGINE = MergeTree PARTITION BY toYYYYMM(time) ORDER BY (host, time);
+CREATE TABLE IF NOT EXISTS moments_all AS moments
+ENGINE = Distributed('it\'s', currentDatabase(), 'moments', sipHash64(host));
+)");
+  const std::string tables =
+      Output({"export", "vm-stats,heap-stats", "--format=clickhouse-schema", "-u", "mb"});
+  for (const char* line :
+       {"\n  `b` Nullable(UInt8) COMMENT 'Is balloon driver active?',\n",
+        "\n  `consumed` Nullable(UInt64) COMMENT 'Host physical memory consumed by guest, MB',\n",
+        "\n  `dynGrow` Nullable(Int64) COMMENT 'dynamically growable',\n"}) {
+    EXPECT_NE(tables.find(line), std::string::npos) << line << tables;
+  }
+  EXPECT_EQ(tables.find("_all"), std::string::npos);
+  ExpectFailure({"export", "all", "--format=clickhouse-schema", kExample},
+                "clickhouse-schema is the same for all files, and takes none", 2);
+  ExpectFailure({"export", "all", "--cluster", "c", kExample},
+                "--cluster is for the format clickhouse-schema", 2);
+}
+
+TEST_F(ExportFormats, MomentsSayOfWhichKernelTheyAre) {
+  const std::string rows = Output({"export", "moments", kIncident + "@10:04Z..10:05Z"});
+  EXPECT_EQ(rows.substr(0, 16), "host,time,built\n");
+  const std::string built(kDefinitions.built);
+  EXPECT_NE(rows.find(",2026-11-21T10:04:00Z," + built + "\n"), std::string::npos) << rows;
+  EXPECT_NE(rows.find(",2026-11-21T10:05:00Z," + built + "\n"), std::string::npos) << rows;
+}
+
 // The same metrics, however often the rows have to be given for want of memory.
 TEST_F(ExportFormats, MetricsNeedLittleMemory) {
   const tally::Report& report = *tally::FindReport("vm-stats");

@@ -475,17 +475,19 @@ TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
   ExpectFailure({"export"},
                 "not as in:\nUsage: ksicache export REPORT[,REPORT...]|all "
                 "[FILE[@WHEN|@FROM..TO]...]\n                       [--format FORMAT] "
-                "[--unit UNIT] [--output OUT] [--force]\n                       [--mode MODE]",
+                "[--unit UNIT] [--output OUT]\n                       [--cluster NAME] [--force] "
+                "[--mode MODE]",
                 2);
   ExpectFailure({"export", "vm-stats,vm-stats"}, "vm-stats is named twice", 2);
   ExpectFailure({"export", "vm-stats,", kExample},
                 "there is no report : there are group-stats, vm-stats, uw-stats, pshare-stats, "
                 "pshareHint-stats, swap-stats, buddy-stats, comp-stats, lpool-stats, heap-stats, "
-                "guest-stats, zip-stats, lpage-stats, asyncremap-stats and pmem-stats, or all",
+                "guest-stats, zip-stats, lpage-stats, asyncremap-stats and pmem-stats, or all "
+                "of these, or moments",
                 2);
   ExpectFailure({"export", "all", "--format=xml"},
-                "there is no format xml: there are csv, json, sqlite, openmetrics and "
-                "prometheus",
+                "there is no format xml: there are csv, json, sqlite, openmetrics, "
+                "prometheus and clickhouse-schema",
                 2);
   ExpectFailure({"export", "all", "-u", "gb"}, "--unit is mb, kb, pg or b", 2);
   ExpectFailure({"export", "all", "--force"}, "--force is for a file, not standard output", 2);

@@ -23,7 +23,7 @@
 namespace ksicache {
 namespace {
 
-constexpr Option kFormat = {"format", "FORMAT", "json, sqlite, openmetrics or prometheus, not csv"};
+constexpr Option kFormat = {"format", "FORMAT", "write another format than csv"};
 constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
 constexpr Option kCluster = {"cluster", "NAME", "have tables over all servers of this cluster"};
 constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kCluster, &kForce, &kMode};
@@ -46,7 +46,7 @@ const tally::Report* ReportCalled(const std::string& name) {
   const tally::Report* report = tally::FindReport(name.c_str());
   if (report == nullptr) {
     throw UsageError("there is no report " + name + ": there are " + ReportNames() +
-                     ",\nall of these, and moments");
+                     ", or all of these, or moments");
   }
   return report;
 }
@@ -76,7 +76,7 @@ const FormatInfo& FormatOf(const CommandLine& line) {
     if (*name == format.name) return format;
   }
   throw UsageError("there is no format " + *name +
-                   ": there are csv, json, sqlite, openmetrics and prometheus");
+                   ": there are csv, json, sqlite, openmetrics, prometheus and clickhouse-schema");
 }
 
 // None: that of each report.
@@ -215,7 +215,8 @@ const Command kExport = {
     .help = R"(Writes the rows of reports of tally, or of all fifteen, without their totals: of
 each FILE, of all moments of a recording from FROM to TO, or of this host. The
 columns are host, time, report where there are several, and those of the report
-under their names. A figure without a value is an empty field, or null.
+under their names. A figure without a value is an empty field, or null. Formats
+are csv, json, sqlite, openmetrics, prometheus and clickhouse-schema.
 )",
     .options = kOptions,
     .fewest = 1,

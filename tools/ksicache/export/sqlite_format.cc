@@ -53,8 +53,8 @@ class SqliteFormat : public RowFormat {
  private:
   static constexpr int kFirstColumn = 3;
   static constexpr RowColumn kFirstColumns[] = {
-      {"host", "The host that the row is of", tally::Kind::text, true, false, "", {}},
-      {"time", "When it was read, in UTC", tally::Kind::text, true, false, "", {}},
+      {"host", "The host that the row is of", tally::Kind::text, true, false, false, "", {}},
+      {"time", "When it was read, in UTC", tally::Kind::text, true, false, false, "", {}},
   };
 
   void MakeTable(const RowTable& table) {
