@@ -26,48 +26,53 @@ void PutNumbers(const std::vector<size_t>& numbers, ByteWriter& out) {
 class NodeWriter::Columns {
  public:
   Columns(const NodeWriter& writer, size_t from, std::array<ByteWriter, chunk::kStreams>& streams)
-      : from_(from), streams_(streams) {
+      : from_(from), streams_(streams), changes_(writer.node_->cells.size()) {
     for (const Tracked& each : writer.readings_) Collect(each);
-    const std::vector<RecordCell>& cells = writer.node_->cells;
-    for (uint32_t i = 0; i < cells.size(); ++i) {
-      for (Series& each : series_) PutCell(cells[i], i, each);
+    for (size_t i = 0; i < changes_.size(); ++i) {
+      for (const Bytes* first : firsts_) PutFirst(writer.node_->cells[i], *first);
+      PutCell(i);
     }
   }
 
  private:
-  // The changes of a reading, by cell; those up to `next` have been put.
-  struct Series {
-    const Tracked* reading;
-    std::vector<Change> changes;
-    size_t next = 0;
+  // A change of a cell of one of the series.
+  struct Placed {
+    size_t series;
+    const Change* change;
   };
 
+  // Reading by reading, and of each by moments: so each cell has its changes in their order.
   void Collect(const Tracked& tracked) {
     if (tracked.went < from_ || tracked.reading.answer.status != kOk) return;
-    const auto begin = std::ranges::lower_bound(tracked.changes, from_, {}, &Change::moment);
-    Series& made = series_.emplace_back();
-    made.reading = &tracked;
-    made.changes.assign(begin, tracked.changes.end());
-    std::ranges::stable_sort(made.changes, {}, &Change::cell);
+    if (tracked.came >= from_) firsts_.push_back(&tracked.first);
+    auto change = std::ranges::lower_bound(tracked.changes, from_, {}, &Change::moment);
+    for (; change != tracked.changes.end(); ++change) {
+      changes_[change->cell].push_back({series_.size(), &*change});
+    }
+    series_.push_back(&tracked);
   }
 
-  void PutCell(const RecordCell& cell, uint32_t index, Series& series) {
-    if (series.reading->came >= from_) PutFirst(cell, series.reading->first);
-    const size_t begin = series.next;
-    while (series.next < series.changes.size() && series.changes[series.next].cell == index) {
-      ++series.next;
+  void PutCell(size_t cell) {
+    for (std::span<const Placed> rest = changes_[cell]; !rest.empty();) {
+      const auto end = std::ranges::find_if_not(
+          rest, [&rest](size_t series) { return series == rest.front().series; }, &Placed::series);
+      const auto count = static_cast<size_t>(end - rest.begin());
+      PutChanges(cell, rest.first(count));
+      rest = rest.subspan(count);
     }
-    if (begin == series.next) {
-      ++gap_;
-      return;
-    }
-    streams_[chunk::kGaps].Unsigned(std::exchange(gap_, 0));
-    streams_[chunk::kCounts].Unsigned(series.next - begin - 1);
-    size_t moment = std::max(series.reading->came + 1, from_);
-    for (const Change& change : std::span(series.changes).subspan(begin, series.next - begin)) {
-      streams_[chunk::kSteps].Unsigned(change.moment - moment);
-      streams_[chunk::kDeltas].Signed(change.delta, streams_[chunk::kMore]);
-      moment = change.moment + 1;
+  }
+
+  // Those of one series.
+  void PutChanges(size_t cell, std::span<const Placed> changes) {
+    const size_t series = changes.front().series;
+    const size_t place = cell * series_.size() + series;
+    streams_[chunk::kGaps].Unsigned(place - std::exchange(next_, place + 1));
+    streams_[chunk::kCounts].Unsigned(changes.size() - 1);
+    size_t moment = std::max(series_[series]->came + 1, from_);
+    for (const Placed& each : changes) {
+      streams_[chunk::kSteps].Unsigned(each.change->moment - moment);
+      streams_[chunk::kDeltas].Signed(each.change->delta, streams_[chunk::kMore]);
+      moment = each.change->moment + 1;
     }
   }
 
@@ -81,8 +86,10 @@ class NodeWriter::Columns {
 
   size_t from_;
   std::array<ByteWriter, chunk::kStreams>& streams_;
-  std::vector<Series> series_;
-  uint64_t gap_ = 0;
+  std::vector<const Tracked*> series_;
+  std::vector<const Bytes*> firsts_;          // the records that series came with
+  std::vector<std::vector<Placed>> changes_;  // by cell
+  size_t next_ = 0;                           // the place behind the last one put
 };
 
 void NodeWriter::Add(std::span<const MomentReading> readings) {

@@ -25,8 +25,8 @@ using ksi::cache::kBlockSize;
 
 constexpr size_t kPieceSize = kBlockSize - kBlockHead;
 
-// By so many rows the table of parts grows; the first are for a week.
-constexpr size_t kFirstParts = 2304;
+// By so many rows the table of parts grows; the first are for three days.
+constexpr size_t kFirstParts = 1280;
 constexpr size_t kMoreParts = 256;
 
 // A block with what leads to it, in the file.
