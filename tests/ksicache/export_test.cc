@@ -272,6 +272,10 @@ TEST_F(ExportTest, TakesAMomentOfARecording) {
   EXPECT_EQ(states(kIncident + "@10:04:01Z.."), all.substr(78));
   EXPECT_EQ(states(kIncident + "@..10:02:59Z"), all.substr(0, 26));
   EXPECT_EQ(states(kIncident + "@10:03Z..10:04Z"), all.substr(26, 52));
+  EXPECT_EQ(states(kIncident + "@09:00Z.."), all);
+  EXPECT_EQ(states(kIncident + "@09:00Z..11:00Z"), all);
+  EXPECT_EQ(states(kIncident + "@..11:00Z"), all);
+  EXPECT_EQ(states(kIncident + "@10:05Z..10:03Z"), all.substr(78));
 }
 
 // Times without a date are of one day, and none is of the day before the other.
@@ -310,6 +314,9 @@ TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
   expect(kIncident + "@11:00..11x",
          "11x is no time, as those of 10:05..10:10, -1h.. and first..last are: " + kSpan);
   expect(kIncident + "@2026-11-22T10:00Z..", "there is no moment in that time: " + kSpan);
+  expect(kIncident + "@11:00Z..", "there is no moment in that time: " + kSpan);
+  expect(kIncident + "@11:00Z..12:00Z", "there is no moment in that time: " + kSpan);
+  expect(kIncident + "@..09:00Z", "there is no moment in that time: " + kSpan);
   expect(kIncident + "@2026-11-20T10:00Z", "there is no moment so early: " + kSpan);
   expect(kExample + "@..", "is no recording");
   expect(Path("none@.."), "No such file or directory");

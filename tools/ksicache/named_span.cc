@@ -5,11 +5,15 @@
 #include <cstdint>
 #include <string_view>
 
+#include "knvlibs/recording/chunk.h"
 #include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 
 namespace ksicache {
 namespace {
+
+using ksi::chunk::Minus;
+using ksi::chunk::Plus;
 
 // `span`: as of TimeOf.
 int64_t TimeIn(const std::string& when, const ksi::Span& span, const ksi::Span& all) {
@@ -19,6 +23,17 @@ int64_t TimeIn(const std::string& when, const ksi::Span& span, const ksi::Span& 
                     "moments are of " + ksi::TextOfSpan(all));
   }
   return *time / ksi::kSecond * ksi::kSecond;
+}
+
+// A time of day that was not recorded is the one nearest to what was: at 11:00 a recording that
+// ended at 10:06 has nothing, though 11:00 of the day before is before all of it.
+int64_t BehindAll(int64_t from, const ksi::Span& all) {
+  const int64_t later = Plus(from, ksi::kDay);
+  return Minus(all.first, from) > Minus(later, all.last) ? later : from;
+}
+int64_t BeforeAll(int64_t to, const ksi::Span& all) {
+  const int64_t earlier = Minus(to, ksi::kDay);
+  return Minus(to, all.last) > Minus(all.first, earlier) ? earlier : to;
 }
 
 // Whether a time has no date, so that each day has it.
@@ -47,11 +62,14 @@ ksi::Span TimesOf(const NamedSpan& named, const ksi::RecordingFile& recording) {
   ksi::Span times = {all.first / ksi::kSecond * ksi::kSecond, all.last};
   if (!named.from.empty() && named.from != "first") {
     times.first = TimeIn(named.from, recorded, all);
+    if (IsOfAnyDay(named.from)) times.first = BehindAll(times.first, all);
   }
   if (!named.to.empty() && named.to != "last") {
-    const ksi::Span dayFromThere = {times.first, times.first + ksi::kDay - 1};
-    times.last =
-        TimeIn(named.to, IsOfAnyDay(named.to) ? dayFromThere : recorded, all) + ksi::kSecond - 1;
+    const ksi::Span dayFromThere = {times.first, Plus(times.first, ksi::kDay - 1)};
+    const bool isOfAnyDay = IsOfAnyDay(named.to);
+    times.last = TimeIn(named.to, isOfAnyDay ? dayFromThere : recorded, all);
+    if (isOfAnyDay && named.from.empty()) times.last = BeforeAll(times.last, all);
+    times.last += ksi::kSecond - 1;
   }
   return times;
 }
