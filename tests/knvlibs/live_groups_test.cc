@@ -318,11 +318,15 @@ class PluggedMemoryTest : public testing::TestWithParam<RoomyGuest> {
     ASSERT_TRUE(Eventually([&] { return TryCommand(command); })) << command;
   }
 
+  void AddBackend(const std::string& id, const std::string& size, const char* prealloc) const {
+    Command(R"({"execute":"object-add","arguments":{"qom-type":"memory-backend-ram","id":")" + id +
+            R"(","prealloc":)" + prealloc + R"(,"size":)" + size + "}}");
+  }
+
   // `device` is the driver and what it is told more.
   void Plug(const std::string& id, const std::string& size,
-            const std::string& device = R"("pc-dimm")") {
-    Command(R"({"execute":"object-add","arguments":{"qom-type":"memory-backend-ram","id":")" + id +
-            R"(","prealloc":true,"size":)" + size + "}}");
+            const std::string& device = R"("pc-dimm")") const {
+    AddBackend(id, size, "true");
     Command(R"({"execute":"device_add","arguments":{"driver":)" + device + R"(,"memdev":")" + id +
             R"(","id":"dimm-)" + id + R"("}})");
   }
@@ -374,6 +378,19 @@ TEST_P(PluggedMemoryTest, IsMemoryOfTheGuest) {
   Plug("persistent", "134217728", R"("nvdimm","label-size":131072)");
   const double persistent = MappedOnceItHas(start + 320 + 126);
   EXPECT_GE(persistent - large, 126 * 1024);
+}
+
+TEST_P(PluggedMemoryTest, IsNotMistakenForWhatNothingUses) {
+  const int64_t start = GetParam().memory;
+  // One before and one behind it.
+  AddBackend("before", "67108864", "false");
+  Plug("small", "67108864");
+  AddBackend("behind", "67108864", "false");
+  EXPECT_GE(MappedOnceItHas(start + 64), 65536) << "all of it is there";
+  AddBackend("as-machine", std::to_string(start << 20), "false");
+  const double mapped = MappedOnceItHas(start + 64);
+  EXPECT_GE(mapped, 65536 + 256) << "the firmware has touched some memory";
+  EXPECT_LE(mapped, 2 * 65536);
 }
 
 INSTANTIATE_TEST_SUITE_P(

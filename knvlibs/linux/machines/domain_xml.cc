@@ -115,13 +115,13 @@ class DomainWalk {
     if (!isKB_ || !ParseNumber(text, size)) return false;
     MemoryModule& module = modules_.back();
     if (what == "size") {
-      module.block = size;
+      module.block.size = size;
       if (!isCurrentTold_) module.size = size;
     } else if (what == "current") {
       module.size = size;
       isCurrentTold_ = true;
     } else {
-      module.size = DifferenceOf(module.block, size);
+      module.size = DifferenceOf(module.block.size, size);
     }
     return true;
   }

@@ -68,8 +68,9 @@ MachineMemory MemoryOf(const QemuCommandLine& line, const GuestMemory& guest) {
   MachineMemory memory = line.memory;
   if (!memory.base && guest.base) {
     memory.base = guest.base;
-    memory.blocks = {guest.base};
+    memory.blocks = {{guest.base, {}}};
   }
+  if (memory.blocks.size() == 1) memory.blocks.front().address = guest.baseAddress;
   if (guest.modules) memory.modules = guest.modules;
   return memory;
 }

@@ -10,6 +10,11 @@
 namespace ksi {
 namespace {
 
+struct FoundBlock {
+  Mapping mapping;
+  bool isTold;  // by its address that it is this one
+};
+
 uint64_t SizeOf(const Mapping& mapping) { return (mapping.end - mapping.start) / 1024; }
 
 // Joins what the kernel has cut: mappings side by side of the same memory.
@@ -28,47 +33,57 @@ std::vector<Mapping> Joined(const std::vector<Mapping>& mappings) {
   return joined;
 }
 
-// The mapping of a block of guest memory: the smallest that holds it, for the kernel may have
-// joined it with a neighbour.
-std::vector<Mapping>::iterator FindBlock(std::vector<Mapping>& mappings, uint64_t size) {
+// The mapping of a block of guest memory: that at its address, else the smallest that holds it, for
+// the kernel may have joined it with a neighbour.
+std::vector<Mapping>::iterator FindBlock(std::vector<Mapping>& mappings, const MemoryBlock& block) {
   auto best = mappings.end();
   for (auto at = mappings.begin(); at != mappings.end(); ++at) {
-    if (SizeOf(*at) >= size && (best == mappings.end() || SizeOf(*at) < SizeOf(*best))) best = at;
+    const bool isThere =
+        !block.address || (at->start <= *block.address && *block.address < at->end);
+    if (!isThere || SizeOf(*at) < block.size) continue;
+    if (best == mappings.end() || SizeOf(*at) < SizeOf(*best)) best = at;
   }
   return best;
 }
 
 // The mappings of all blocks, and those that are left; none if one of them is not there.
-std::vector<Mapping> FindBlocks(const std::vector<Figure>& sizes, std::vector<Mapping>& left) {
-  std::vector<Mapping> blocks;
-  for (const Figure& size : sizes) {
-    const auto block = size ? FindBlock(left, *size) : left.end();
-    if (block == left.end()) return {};
-    blocks.push_back(*block);
-    left.erase(block);
+std::vector<FoundBlock> FindBlocks(std::vector<MemoryBlock> blocks, std::vector<Mapping>& left) {
+  // What has an address is not to be taken for another block.
+  std::ranges::stable_partition(blocks,
+                                [](const MemoryBlock& block) { return block.address.has_value(); });
+  std::vector<FoundBlock> found;
+  for (const MemoryBlock& block : blocks) {
+    const auto mapping = block.size ? FindBlock(left, block) : left.end();
+    if (mapping == left.end()) return {};
+    found.push_back({*mapping, block.address.has_value()});
+    left.erase(mapping);
   }
-  return blocks;
+  return found;
 }
 
 // Whether one of the blocks may be another one than that: there is other memory of its size, such
-// as of a module that is about to be plugged in.
-bool MayBeMistaken(const std::vector<Mapping>& blocks, const std::vector<Mapping>& all) {
-  const auto isBlock = [&blocks](const Mapping& other) {
-    return std::ranges::find(blocks, other.start, &Mapping::start) != blocks.end();
-  };
-  return std::ranges::any_of(all, [&](const Mapping& other) {
-    return other.isDontCopy && !isBlock(other) &&
-           std::ranges::any_of(
-               blocks, [&other](const Mapping& block) { return SizeOf(block) == SizeOf(other); });
+// as of a module that is about to be plugged in. Only smaps tells what cannot be a guest's.
+bool MayBeMistaken(const std::vector<FoundBlock>& blocks, const std::vector<Mapping>& left,
+                   MappingsFile file) {
+  return std::ranges::any_of(left, [&](const Mapping& other) {
+    const bool mayBeMemory = other.isDontCopy || file == MappingsFile::kMaps;
+    return mayBeMemory && std::ranges::any_of(blocks, [&other](const FoundBlock& block) {
+             return !block.isTold && SizeOf(block.mapping) == SizeOf(other);
+           });
   });
 }
 
 // QEMU's default memory is the largest thing that it keeps from its children.
-std::vector<Mapping> FindDefault(std::vector<Mapping> mappings) {
-  std::erase_if(mappings, [](const Mapping& mapping) { return !mapping.isDontCopy; });
-  const auto largest = std::ranges::max_element(mappings, {}, SizeOf);
-  if (largest == mappings.end()) return {};
-  return {*largest};
+std::vector<FoundBlock> FindDefault(std::vector<Mapping>& left) {
+  auto largest = left.end();
+  for (auto at = left.begin(); at != left.end(); ++at) {
+    if (!at->isDontCopy) continue;
+    if (largest == left.end() || SizeOf(*at) > SizeOf(*largest)) largest = at;
+  }
+  if (largest == left.end()) return {};
+  const FoundBlock block = {*largest, false};
+  left.erase(largest);
+  return {block};
 }
 
 // Whether memory for a guest may be left. Memory of devices is kept from children, too: that of a
@@ -96,9 +111,9 @@ bool MayBalance(const LinuxHost& host) {
           balances.value_or(0) != 0);
 }
 
-void TakeSmaps(const std::vector<Mapping>& blocks, GuestMapping& guest) {
-  Smaps sum = blocks.front().smaps;
-  for (const Mapping& block : std::span(blocks).subspan(1)) sum.Add(block.smaps);
+void TakeSmaps(const std::vector<FoundBlock>& blocks, GuestMapping& guest) {
+  Smaps sum = blocks.front().mapping.smaps;
+  for (const FoundBlock& block : std::span(blocks).subspan(1)) sum.Add(block.mapping.smaps);
   guest.resident = SumOf({sum.rss, sum.hugetlb});
   if (sum.hugetlb == 0u) guest.referenced = sum.referenced;
   guest.swapped = sum.swap;
@@ -106,11 +121,11 @@ void TakeSmaps(const std::vector<Mapping>& blocks, GuestMapping& guest) {
   guest.merged = sum.ksm;
 }
 
-Status TakePages(const LinuxHost& host, int32_t pid, const std::vector<Mapping>& blocks,
+Status TakePages(const LinuxHost& host, int32_t pid, const std::vector<FoundBlock>& blocks,
                  GuestMapping& guest) {
   std::vector<AddressRange> ranges;
   ranges.reserve(blocks.size());
-  for (const Mapping& block : blocks) ranges.push_back({block.start, block.end});
+  for (const auto& [mapping, isTold] : blocks) ranges.push_back({mapping.start, mapping.end});
   PageCounts counts;
   const Status status = CountPages(host, pid, ranges, counts);
   guest.resident = counts.resident;
@@ -144,14 +159,14 @@ Status MeasureGuest(const LinuxHost& host, int32_t pid, const QemuMappings& mapp
   guest = GuestMapping();
   const bool isSmaps = mappings.file == MappingsFile::kSmaps;
   std::vector<Mapping> left = mappings.mappings;
-  std::vector<Mapping> blocks =
+  std::vector<FoundBlock> blocks =
       memory.base ? FindBlocks(memory.AllBlocks(), left) : FindDefault(left);
-  if (!memory.base && !blocks.empty()) memory.base = SizeOf(blocks.front());
+  if (!memory.base && !blocks.empty()) memory.base = SizeOf(blocks.front().mapping);
   if (!isSure && (!isSmaps || blocks.empty() || MayHoldModule(left))) {
     memory.modules.reset();
     blocks.clear();
   }
-  const bool mayBeMistaken = MayBeMistaken(blocks, mappings.mappings);
+  const bool mayBeMistaken = MayBeMistaken(blocks, left, mappings.file);
   guest.memory = std::move(memory);
   if (blocks.empty() || mayBeMistaken) return kOk;
   // The kernel may have joined a block with what lies beside it.

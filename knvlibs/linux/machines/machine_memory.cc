@@ -18,9 +18,9 @@ Figure MachineMemory::BalloonSize() const {
   return size;
 }
 
-std::vector<Figure> MachineMemory::AllBlocks() const {
+std::vector<MemoryBlock> MachineMemory::AllBlocks() const {
   if (!modules || blocks.empty()) return {};
-  std::vector<Figure> all = blocks;
+  std::vector<MemoryBlock> all = blocks;
   for (const MemoryModule& module : *modules) all.push_back(module.block);
   return all;
 }

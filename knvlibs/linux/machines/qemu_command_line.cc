@@ -4,6 +4,7 @@
 #include <optional>
 #include <string_view>
 #include <unordered_map>
+#include <unordered_set>
 
 #include "knvlibs/json.h"
 #include "knvlibs/linux/host/text.h"
@@ -100,6 +101,7 @@ struct Monitor {
 struct Parts {
   Properties memory;
   std::vector<Backend> backends;
+  std::unordered_set<std::string> nodes;  // ids of backends that are memory of the machine itself
   std::vector<Properties> devices;
   std::vector<Properties> sockets;
   std::vector<std::string> monitors;  // ids of character devices
@@ -156,7 +158,11 @@ void Take(std::string_view option, const std::string& value, Parts& parts, QemuC
   } else if (option == "accel") {
     parts.accelerators += FindOrEmpty(ParseProperties(value, "accel"), "accel") + ':';
   } else if (option == "machine" || option == "M") {
-    parts.accelerators += FindOrEmpty(ParseProperties(value, "type"), "accel") + ':';
+    const Properties machine = ParseProperties(value, "type");
+    parts.accelerators += FindOrEmpty(machine, "accel") + ':';
+    parts.nodes.insert(FindOrEmpty(machine, "memory-backend"));
+  } else if (option == "numa") {
+    parts.nodes.insert(FindOrEmpty(ParseEither(value, "type"), "memdev"));
   } else if (option == "readconfig") {
     parts.hasConfig = true;
   } else if (option == "qmp" || option == "qmp-pretty") {
@@ -173,7 +179,7 @@ bool IsModule(const std::string& driver) {
 
 MemoryModule ModuleOf(const Properties& device, Figure block) {
   const std::string driver = FindOrEmpty(device, "driver");
-  MemoryModule module = {.size = block, .block = block, .isDimm = driver == "pc-dimm"};
+  MemoryModule module = {.size = block, .block = {block, {}}, .isDimm = driver == "pc-dimm"};
   // How much of it the guest has is agreed upon while it runs.
   if (driver.starts_with("virtio-mem-")) module.size.reset();
   const std::string* label = Find(device, "label-size");
@@ -195,6 +201,12 @@ std::unordered_map<std::string, const Properties*> DevicesByBackend(const Parts&
   return devices;
 }
 
+// Whether a backend that no device has is memory of the machine itself. What a file says of that is
+// not known.
+bool IsNode(const Parts& parts, const Backend& backend) {
+  return parts.hasConfig || parts.nodes.contains(backend.id);
+}
+
 void FindMemory(const Parts& parts, QemuCommandLine& line) {
   MachineMemory& memory = line.memory;
   if (parts.backends.size() > kMostBackends) {
@@ -203,20 +215,23 @@ void FindMemory(const Parts& parts, QemuCommandLine& line) {
   }
   memory.base = ParseSize(FindOrEmpty(parts.memory, "size"), kMegabytes);
   // Memory of the machine itself may be cut into backends, one for each of its NUMA nodes.
-  std::vector<Figure> nodes;
+  std::vector<MemoryBlock> nodes;
   Figure nodesSize = 0;
   const auto devices = DevicesByBackend(parts);
   for (const Backend& backend : parts.backends) {
     const auto device = devices.find(backend.id);
-    if (device == devices.end()) {
-      nodes.push_back(backend.size);
-      nodesSize = SumOf({nodesSize, backend.size});
-    } else if (IsModule(FindOrEmpty(*device->second, "driver"))) {
+    if (device != devices.end()) {
+      if (!IsModule(FindOrEmpty(*device->second, "driver"))) continue;
       memory.modules->push_back(ModuleOf(*device->second, backend.size));
+    } else if (IsNode(parts, backend)) {
+      nodes.push_back({backend.size, {}});
+      nodesSize = SumOf({nodesSize, backend.size});
+    } else {
+      line.hasSpares = true;
     }
   }
   if (memory.base) {
-    memory.blocks = nodesSize == memory.base ? nodes : std::vector<Figure>{memory.base};
+    memory.blocks = nodesSize == memory.base ? nodes : std::vector<MemoryBlock>{{memory.base, {}}};
   }
   const std::string* maximum = Find(parts.memory, "maxmem");
   line.maxMemory = maximum == nullptr ? memory.Size() : ParseSize(*maximum, kMegabytes);

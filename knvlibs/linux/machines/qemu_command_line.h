@@ -21,14 +21,15 @@ struct QemuCommandLine {
   bool isOfLibvirt = false;  // libvirt has started it, and holds its monitor
   // QEMU makes its machine only when that socket has had its first client.
   bool waitsForClient = false;
+  bool hasSpares = false;  // memory backends that the machine may have no use for
   bool hasBalloon = false;
   std::string balloon;          // id of the balloon device; may be empty
   std::optional<bool> usesKvm;  // none if the command line does not tell
 
   // Whether the machine may have other memory than it started with.
   bool MayChange() const;
-  // Whether what memory it has is told here.
-  bool TellsMemory() const { return memory.base && !MayChange(); }
+  // Whether what memory it has, and nothing else that may be taken for it, is told here.
+  bool TellsMemory() const { return memory.base && !MayChange() && !hasSpares; }
 };
 
 // Whether this command line is that of QEMU running a whole machine.

@@ -2,11 +2,14 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <thread>
+#include <vector>
 
 #include <knvlibs/ksi.h>
 #include "knvlibs/json.h"
@@ -89,26 +92,97 @@ void AskForStatistics(const LinuxHost& host, Conversation& monitor, const std::s
   memory.available = KBOf(statistics, "stat-available-memory");
 }
 
-// The size of the backend of a module, "/objects/mem1".
-Figure BackendSize(const Json& backends, const Json* module) {
-  const std::string* path = TextOf(FindMember(module, "memdev"));
-  if (path == nullptr) return std::nullopt;
-  const std::string_view id = std::string_view(*path).substr(path->rfind('/') + 1);
-  for (const auto& [name, backend] : backends.members) {
-    const std::string* own = TextOf(FindMember(&backend, "id"));
-    if (own != nullptr && *own == id) return KBOf(&backend, "size");
+// The last part of "/objects/mem1".
+std::string_view IdOf(std::string_view path) { return path.substr(path.rfind('/') + 1); }
+
+// The sizes of the backends by their ids.
+using Backends = std::map<std::string, Figure, std::less<>>;
+
+Backends BackendsOf(const Json& list) {
+  Backends backends;
+  for (const auto& [name, backend] : list.members) {
+    const std::string* id = TextOf(FindMember(&backend, "id"));
+    if (id != nullptr) backends.emplace(*id, KBOf(&backend, "size"));
+  }
+  return backends;
+}
+
+// The backend of a module, and where the guest has it.
+struct Device {
+  std::string_view backend;
+  Figure guestAddress;
+};
+
+Device DeviceOf(const Json* data) {
+  const std::string* path = TextOf(FindMember(data, "memdev"));
+  const Figure address = NumberOf(FindMember(data, "addr"));
+  return {path == nullptr ? std::string_view() : IdOf(*path),
+          address ? address : NumberOf(FindMember(data, "memaddr"))};
+}
+
+MemoryModule ModuleOf(const Backends& backends, const Json& device) {
+  const Json* data = FindMember(&device, "data");
+  const std::string* type = TextOf(FindMember(&device, "type"));
+  const auto backend = backends.find(DeviceOf(data).backend);
+  MemoryModule module;
+  module.size = KBOf(data, "size");
+  if (backend != backends.end()) module.block.size = backend->second;
+  module.isDimm = type != nullptr && *type == "dimm";
+  return module;
+}
+
+// The backend that the guest has at an address, and where QEMU has it: "Host virtual address for
+// 0x0 (pc.ram) is 0x7f34efe00000".
+struct Place {
+  std::string backend;
+  Figure address;
+};
+
+Place AskForPlace(Conversation& monitor, Figure guestAddress) {
+  constexpr std::string_view kIs = ") is 0x";
+  if (!guestAddress) return {};
+  const std::optional<Json> answer = AskFor(
+      monitor, R"({"execute":"human-monitor-command","arguments":{"command-line":"gpa2hva )" +
+                   std::to_string(*guestAddress) + R"("}})");
+  const std::string* text = answer ? TextOf(&*answer) : nullptr;
+  if (text == nullptr) return {};
+  const size_t name = text->find('(');
+  const size_t is = text->find(kIs);
+  uint64_t address = 0;
+  std::string_view rest = *text;
+  if (name > is || is == std::string::npos) return {};
+  rest.remove_prefix(is + kIs.size());
+  if (!ParseHex(rest.substr(0, rest.find_first_of("\r\n")), address)) return {};
+  return {std::string(IdOf(text->substr(name + 1, is - name - 1))), address};
+}
+
+// Where machines begin to have their own memory.
+constexpr uint64_t kMemoryStarts[] = {0, uint64_t{1} << 30, uint64_t{2} << 30};
+
+// Where QEMU has the machine's own memory, if another backend that is no module's has its size.
+Figure AskForBase(Conversation& monitor, const Backends& others, Figure size) {
+  const auto isLike = [size](const auto& other) { return other.second == size; };
+  if (std::ranges::count_if(others, isLike) < 2) return std::nullopt;
+  for (const uint64_t start : kMemoryStarts) {
+    const Place place = AskForPlace(monitor, start);
+    const auto found = others.find(place.backend);
+    if (found != others.end() && isLike(*found)) return place.address;
   }
   return std::nullopt;
 }
 
-MemoryModule ModuleOf(const Json& backends, const Json& device) {
-  const Json* data = FindMember(&device, "data");
-  const std::string* type = TextOf(FindMember(&device, "type"));
-  MemoryModule module;
-  module.size = KBOf(data, "size");
-  module.block = BackendSize(backends, data);
-  module.isDimm = type != nullptr && *type == "dimm";
-  return module;
+// Where QEMU has what could be taken for another backend by its size.
+void AskForAddresses(Conversation& monitor, Backends backends, const std::vector<Device>& devices,
+                     GuestMemory& memory) {
+  for (const Device& device : devices) backends.erase(std::string(device.backend));
+  for (size_t i = 0; i < devices.size(); ++i) {
+    MemoryBlock& block = (*memory.modules)[i].block;
+    const auto isLike = [&block](const auto& other) { return other.second == block.size; };
+    if (std::ranges::none_of(backends, isLike)) continue;
+    const Place place = AskForPlace(monitor, devices[i].guestAddress);
+    if (place.backend == devices[i].backend) block.address = place.address;
+  }
+  memory.baseAddress = AskForBase(monitor, backends, memory.base);
 }
 
 // Nothing is told of modules that do not add up to what there is: one may have come in between.
@@ -118,15 +192,20 @@ void AskForModules(Conversation& monitor, GuestMemory& memory) {
   const auto summary = AskFor(monitor, R"({"execute":"query-memory-size-summary"})");
   if (!summary) return;
   memory.base = KBOf(&*summary, "base-memory");
-  const auto devices = AskFor(monitor, R"({"execute":"query-memory-devices"})");
-  const auto backends = AskFor(monitor, R"({"execute":"query-memdev"})");
-  if (!devices || !backends || devices->members.size() > kMostModules) return;
+  const auto list = AskFor(monitor, R"({"execute":"query-memory-devices"})");
+  const auto objects = AskFor(monitor, R"({"execute":"query-memdev"})");
+  if (!list || !objects || list->members.size() > kMostModules) return;
+  const Backends backends = BackendsOf(*objects);
+  std::vector<Device> devices;
   MachineMemory machine = {.base = 0, .blocks = {}, .modules = {{}}};
-  for (const auto& [name, device] : devices->members) {
-    machine.modules->push_back(ModuleOf(*backends, device));
+  for (const auto& [name, device] : list->members) {
+    devices.push_back(DeviceOf(FindMember(&device, "data")));
+    machine.modules->push_back(ModuleOf(backends, device));
   }
   const Figure plugged = KBOf(&*summary, "plugged-memory");
-  if (plugged && machine.Size() == plugged) memory.modules = std::move(machine.modules);
+  if (!plugged || machine.Size() != plugged) return;
+  memory.modules = std::move(machine.modules);
+  AskForAddresses(monitor, backends, devices, memory);
 }
 
 void Converse(const LinuxHost& host, Channel& channel, const QemuCommandLine& line,

@@ -34,8 +34,9 @@ struct GuestMemory {
   // As the guest counts, if it has done so lately.
   Figure total;
   Figure available;  // without its having to swap
-  // What the machine has.
+  // What the machine has, and the address of the block that is its base.
   Figure base;
+  Figure baseAddress;
   std::optional<std::vector<MemoryModule>> modules;
 };
 

@@ -43,7 +43,9 @@ TEST(DomainXmlTest, TellsOfModules) {
              "<size unit='KiB'>8192</size><block unit='KiB'>2048</block>"
              "<requested unit='KiB'>6144</requested><current unit='KiB'>4096</current>") +
       "<memballoon model='virtio'>\n<stats period='5'/>\n</memballoon>\n"));
-  EXPECT_EQ(xml.modules, (Modules{{2048, 2048, true}, {3968, 4096, false}, {4096, 8192, false}}));
+  EXPECT_EQ(
+      xml.modules,
+      (Modules{{2048, {2048, {}}, true}, {3968, {4096, {}}, false}, {4096, {8192, {}}, false}}));
   EXPECT_EQ(xml.period, 5u);
 }
 
@@ -97,7 +99,7 @@ TEST(LibvirtClientTest, TellsOfDomains) {
   EXPECT_EQ(web.usable, 300u);
   EXPECT_EQ(web.lastUpdate, 1095u);
   EXPECT_EQ(web.period, 10u);
-  EXPECT_EQ(web.modules, (Modules{{2048, 2048, true}}));
+  EXPECT_EQ(web.modules, (Modules{{2048, {2048, {}}, true}}));
   const LibvirtDomain& db = answer.domains[1];
   EXPECT_EQ(db.name, "db");
   EXPECT_EQ(db.uuid, "11111111-2222-4333-8444-000000000001");

@@ -142,6 +142,74 @@ TEST_F(MachineTest, WithTwoBlocksOfOneSizeWhatIsThereIsNotTold) {
   EXPECT_EQ(+Tally().mapped, 1000u);
 }
 
+// A backend that nothing uses, as large as the machine's own memory or as its DIMM.
+class SpareBlockTest : public MachineTest {
+ protected:
+  // `places` is what the monitor says of the addresses that it is asked for.
+  KSI_VmmTally TallyBeside(const std::string& spare, const std::string& places) {
+    WriteQemu(kPid, "1,slots=1,maxmem=64M", "-qmp", "unix:/run/q");
+    tree_.Write("/run/q",
+                "{\"QMP\": {}}\n{\"return\": {}}\n{\"return\": {\"actual\": 3145728}}\n"
+                "{\"return\": {\"base-memory\": 1048576, \"plugged-memory\": 2097152}}\n"
+                "{\"return\": [{\"type\": \"dimm\", \"data\": {\"memdev\": \"/objects/d\", "
+                "\"addr\": 4294967296, \"size\": 2097152}}]}\n"
+                "{\"return\": [{\"id\": \"d\", \"size\": 2097152}, "
+                "{\"id\": \"pc.ram\", \"size\": 1048576}, {\"id\": \"spare\", \"size\": " +
+                    spare + "}]}\n" + places);
+    Map(spare == "1048576" ? "1100000" : "1200000");
+    const KSI_VmmTally tally = Tally();
+    EXPECT_EQ(+tally.memSize, 3072u);
+    return tally;
+  }
+
+  static std::string Place(const std::string& what) {
+    return "{\"return\": \"Host virtual address for " + what + "\\r\\n\"}\n";
+  }
+
+  // The machine's own memory is at 0x100000.
+  void Map(const std::string& spareEnd) {
+    WriteMappings(kPid, "1000000-" + spareEnd +
+                            " rw-p 0 00:00 0\nRss: 5 kB\nVmFlags: dc\n"
+                            "4000000-4200000 rw-p 0 00:00 0\nRss: 30 kB\nVmFlags: dc\n");
+  }
+};
+
+TEST_F(SpareBlockTest, IsNotTheDimmWhereTheMonitorTells) {
+  const auto mapped = [this](const char* place) {
+    return +TallyBeside("2097152", Place(place)).mapped;
+  };
+  EXPECT_EQ(mapped("0x100000000 (d) is 0x4000000"), 1030u);
+  EXPECT_EQ(mapped("0x100000000 (d) is 0x1000000"), 1005u);
+  EXPECT_EQ(mapped("0x100000000 (spare) is 0x4000000"), kNoValue) << "of another one";
+}
+
+TEST_F(SpareBlockTest, IsNotTheMachinesMemoryWhereTheMonitorTells) {
+  const auto mapped = [this](const char* place) {
+    return +TallyBeside("1048576", Place(place)).mapped;
+  };
+  EXPECT_EQ(mapped("0x0 (pc.ram) is 0x100000"), 1030u);
+  EXPECT_EQ(mapped("0x0 (pc.ram) is 0x1000000"), 35u);
+  EXPECT_EQ(mapped("0x0 (pc.ram) is 0x9000000"), kNoValue) << "nothing is mapped there";
+  EXPECT_EQ(mapped("0x0 (vga.vram) is 0x100000"), kNoValue);
+}
+
+TEST_F(SpareBlockTest, IsAskedForWhereTheMachineCannotChange) {
+  WriteProcess(kPid, "qemu", 3);
+  WriteCommandLine(kPid, {"qemu-system-x86_64", "-m", "1", "-object",
+                          "memory-backend-ram,id=spare,size=1M", "-qmp", "unix:/run/q"});
+  Map("1100000");
+  EXPECT_EQ(+Tally().memSize, 1024u);
+  EXPECT_EQ(+Tally().mapped, kNoValue);
+  tree_.Write("/run/q",
+              "{\"QMP\": {}}\n{\"return\": {}}\n{\"return\": {\"actual\": 1048576}}\n"
+              "{\"return\": {\"base-memory\": 1048576, \"plugged-memory\": 0}}\n"
+              "{\"return\": []}\n{\"return\": [{\"id\": \"pc.ram\", \"size\": 1048576}, "
+              "{\"id\": \"spare\", \"size\": 1048576}]}\n" +
+                  Place("0x0 (pc.ram) is 0x100000"));
+  EXPECT_EQ(+Tally().memSize, 1024u);
+  EXPECT_EQ(+Tally().mapped, 1000u);
+}
+
 TEST_F(MachineTest, WhatItsMonitorTellsIsItsMemory) {
   WriteQemu(kPid, "1,slots=1,maxmem=64M", "-qmp", "unix:/run/q");
   tree_.Write("/run/q",

@@ -53,9 +53,10 @@ TEST(QemuCommandLineTest, MemoryHasManyForms) {
 TEST(QemuCommandLineTest, BackendsAreNodesOrModules) {
   const QemuCommandLine nodes =
       Parse({"-m", "4G", "-object", "memory-backend-ram,id=a,size=1G", "-object",
-             R"({"qom-type":"memory-backend-memfd","id":"b","size":3221225472})"});
+             R"({"qom-type":"memory-backend-memfd","id":"b","size":3221225472})", "-numa",
+             "node,memdev=a", "-numa", "node,memdev=b"});
   EXPECT_EQ(nodes.memory.Size(), 4 * kGB);
-  EXPECT_EQ(nodes.memory.AllBlocks(), (std::vector<Figure>{kGB, 3 * kGB}));
+  EXPECT_EQ(nodes.memory.AllBlocks(), (std::vector<MemoryBlock>{{kGB, {}}, {3 * kGB, {}}}));
   EXPECT_FALSE(nodes.MayChange());
 
   const QemuCommandLine module =
@@ -64,8 +65,27 @@ TEST(QemuCommandLineTest, BackendsAreNodesOrModules) {
   EXPECT_EQ(module.memory.Size(), 5 * kGB);
   EXPECT_EQ(module.memory.BalloonSize(), 5 * kGB);
   EXPECT_EQ(module.maxMemory, 8 * kGB);
-  EXPECT_EQ(module.memory.AllBlocks(), (std::vector<Figure>{4 * kGB, kGB}));
+  EXPECT_EQ(module.memory.AllBlocks(), (std::vector<MemoryBlock>{{4 * kGB, {}}, {kGB, {}}}));
   EXPECT_TRUE(module.MayChange());
+}
+
+TEST(QemuCommandLineTest, BackendsThatNothingNamesAreSpare) {
+  const auto parse = [](const char* option, const char* value) {
+    return Parse({"-m", "1G", "-object", "memory-backend-ram,id=a,size=512M", "-object",
+                  "memory-backend-ram,id=b,size=512M", option, value});
+  };
+  const QemuCommandLine spare = parse("-smp", "2");
+  EXPECT_TRUE(spare.hasSpares);
+  EXPECT_FALSE(spare.TellsMemory()) << "a monitor may tell which memory it is";
+  EXPECT_FALSE(spare.MayChange());
+  EXPECT_EQ(spare.memory.AllBlocks(), (std::vector<MemoryBlock>{{kGB, {}}}));
+  EXPECT_TRUE(parse("-device", "pc-dimm,memdev=b").hasSpares);
+  EXPECT_TRUE(parse("-machine", "q35,memory-backend=a").hasSpares);
+  EXPECT_FALSE(parse("-readconfig", "nodes.cfg").hasSpares);
+  const QemuCommandLine whole = Parse(
+      {"-M", "pc,memory-backend=a", "-m", "1G", "-object", "memory-backend-ram,id=a,size=1G"});
+  EXPECT_FALSE(whole.hasSpares);
+  EXPECT_TRUE(whole.TellsMemory());
 }
 
 TEST(QemuCommandLineTest, PersistentMemoryIsMemoryButForItsLabelAndTheBalloon) {
@@ -74,7 +94,7 @@ TEST(QemuCommandLineTest, PersistentMemoryIsMemoryButForItsLabelAndTheBalloon) {
              "nvdimm,memdev=n,label-size=128K"});
   EXPECT_EQ(line.memory.Size(), 5 * kGB - 128);
   EXPECT_EQ(line.memory.BalloonSize(), 4 * kGB);
-  EXPECT_EQ(line.memory.AllBlocks(), (std::vector<Figure>{4 * kGB, kGB}));
+  EXPECT_EQ(line.memory.AllBlocks(), (std::vector<MemoryBlock>{{4 * kGB, {}}, {kGB, {}}}));
   EXPECT_EQ(Parse({"-m", "4G", "-object", "memory-backend-file,id=n,size=1G", "-device",
                    "nvdimm,memdev=n"})
                 .memory.Size(),
@@ -87,7 +107,7 @@ TEST(QemuCommandLineTest, HowMuchOfADeviceOfChangingSizeIsPluggedIsNotSaid) {
              "virtio-mem-pci,memdev=m,requested-size=1G"});
   EXPECT_EQ(line.memory.Size(), std::nullopt);
   EXPECT_EQ(line.memory.BalloonSize(), 4 * kGB);
-  EXPECT_EQ(line.memory.AllBlocks(), (std::vector<Figure>{4 * kGB, 2 * kGB}));
+  EXPECT_EQ(line.memory.AllBlocks(), (std::vector<MemoryBlock>{{4 * kGB, {}}, {2 * kGB, {}}}));
 }
 
 TEST(QemuCommandLineTest, WithRoomForModulesMemoryMayChange) {
@@ -346,10 +366,10 @@ class ModulesTest : public QmpTest {
   ModulesTest() { line_.maxMemory = 8 * kGB; }
 
   GuestMemory Told(const std::string& plugged, const std::string& devices,
-                   const std::string& backends) {
+                   const std::string& backends, const std::string& more = "") {
     return Ask(hello_ + "{\"error\": {\"class\": \"DeviceNotActive\"}}\n{\"return\": " +
                    "{\"base-memory\": 1073741824, \"plugged-memory\": " + plugged +
-                   "}}\n{\"return\": [" + devices + "]}\n{\"return\": [" + backends + "]}\n",
+                   "}}\n{\"return\": [" + devices + "]}\n{\"return\": [" + backends + "]}\n" + more,
                "");
   }
 
@@ -368,8 +388,9 @@ TEST_F(ModulesTest, HaveASizeAndABlock) {
   const GuestMemory memory =
       Told("7340032", dimm_ + ", " + persistent_ + ", " + changing_, backends_);
   EXPECT_EQ(memory.base, kGB);
-  EXPECT_EQ(memory.modules, (std::vector<MemoryModule>{
-                                {1024, 1024, true}, {2048, 2176, false}, {4096, 8192, false}}));
+  EXPECT_EQ(memory.modules,
+            (std::vector<MemoryModule>{
+                {1024, {1024, {}}, true}, {2048, {2176, {}}, false}, {4096, {8192, {}}, false}}));
 }
 
 TEST_F(ModulesTest, MayBeNone) {
@@ -383,8 +404,63 @@ TEST_F(ModulesTest, AreNotToldIfTheyDoNotAddUp) {
 }
 
 TEST_F(ModulesTest, WithoutABackendHaveNoBlock) {
-  EXPECT_EQ(Told("1048576", dimm_, "").modules,
-            (std::vector<MemoryModule>{{1024, std::nullopt, true}}));
+  EXPECT_EQ(Told("1048576", dimm_, "").modules, (std::vector<MemoryModule>{{1024, {}, true}}));
+}
+
+// What HMP says of a place in the guest.
+std::string PlaceText(const std::string& backend, const std::string& address) {
+  return "{\"return\": \"Host virtual address for 0x0 (" + backend + ") is 0x" + address +
+         "\\r\\n\"}\n";
+}
+
+class SpareTest : public ModulesTest {
+ protected:
+  // With a DIMM of 1 MB, and a backend that nobody uses.
+  GuestMemory ToldBeside(const std::string& spareSize, const std::string& places) {
+    return Told("1048576",
+                R"({"type": "dimm", "data": {"memdev": "/objects/d", "addr": 4294967296, )"
+                R"("size": 1048576}})",
+                R"({"id": "pc.ram", "size": 1073741824}, {"id": "d", "size": 1048576}, )"
+                R"({"id": "spare", "size": )" +
+                    spareSize + "}",
+                places);
+  }
+};
+
+TEST_F(SpareTest, OfOtherSizesAreNotMistaken) {
+  const GuestMemory memory = ToldBeside("4096", PlaceText("d", "7f00"));
+  EXPECT_EQ(memory.modules, (std::vector<MemoryModule>{{1024, {1024, {}}, true}}));
+  EXPECT_EQ(memory.baseAddress, std::nullopt);
+}
+
+TEST_F(SpareTest, OfAModulesSizeTheModulesAddressIsAskedFor) {
+  const GuestMemory memory = ToldBeside("1048576", PlaceText("d", "7f00"));
+  EXPECT_EQ(memory.modules, (std::vector<MemoryModule>{{1024, {1024, 0x7f00}, true}}));
+  EXPECT_EQ(memory.baseAddress, std::nullopt);
+}
+
+TEST_F(SpareTest, OfTheBasesSizeTheBasesAddressIsAskedFor) {
+  EXPECT_EQ(ToldBeside("1073741824", PlaceText("/objects/pc.ram", "7f2000000000")).baseAddress,
+            0x7f2000000000u);
+  // Not all machines begin at 0.
+  const std::string none = "{\"return\": \"No memory is mapped at address 0x0\\r\\n\"}\n";
+  const std::string flash = PlaceText("virt.flash0", "7f5000");
+  EXPECT_EQ(ToldBeside("1073741824", none + flash + PlaceText("pc.ram", "10")).baseAddress, 0x10u);
+  EXPECT_EQ(ToldBeside("1073741824", none + flash + none + PlaceText("pc.ram", "10")).baseAddress,
+            std::nullopt);
+}
+
+TEST_F(SpareTest, WhatIsNotThePlaceOfTheModuleIsNoAddress) {
+  for (const std::string& places :
+       {PlaceText("spare", "7f00"), PlaceText("", "7f00"), PlaceText("d", ""),
+        PlaceText("d", "7fg0"), PlaceText("d", "11112222333344445"), std::string(),
+        std::string("{\"return\": \"Memory at address 0x100000000 is not RAM\\r\\n\"}\n"),
+        std::string("{\"return\": \") is 0x10 (d\"}\n"), std::string("{\"return\": 7}\n"),
+        std::string("{\"error\": {\"class\": \"CommandNotFound\"}}\n")}) {
+    EXPECT_EQ(ToldBeside("1048576", places).modules,
+              (std::vector<MemoryModule>{{1024, {1024, {}}, true}}))
+        << places;
+  }
 }
 
 TEST_F(ModulesTest, AreAskedForOnlyWhereTheCommandLineDoesNotTell) {
