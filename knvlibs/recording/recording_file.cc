@@ -232,7 +232,10 @@ Status RecordingFile::ReadNext(int64_t& number, ChunkReader& reader) {
 
 Status RecordingFile::ReadWhole(int64_t number, ChunkReader& reader, Moment& moment, int64_t at) {
   const Status status = ReadMoment(number, reader, at);
-  if (status != kOk) return status;
+  return status == kOk ? ReadAll(number, reader, moment) : status;
+}
+
+Status RecordingFile::ReadAll(int64_t number, ChunkReader& reader, Moment& moment) {
   if (reader.ReadAll(moment) == kOk) return kOk;
   reader = {};
   return Damaged(*FindPart(number), "is damaged");

@@ -70,6 +70,9 @@ class RecordingFile {
   [[nodiscard]] Status ReadWhole(int64_t number, ChunkReader& reader, Moment& moment,
                                  int64_t at = kNoMoment);
 
+  // The same as a whole of the moment with `number`, which `reader` has been given.
+  [[nodiscard]] Status ReadAll(int64_t number, ChunkReader& reader, Moment& moment);
+
   // Goes on from the moment with `number`, which `reader` has been given, to the next one that
   // there is; KSI_STATUS_NOT_FOUND after the last.
   [[nodiscard]] Status ReadNext(int64_t& number, ChunkReader& reader);

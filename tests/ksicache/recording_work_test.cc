@@ -147,7 +147,10 @@ TEST_F(RecordingWork, ManyReadingsThatChangeInManyPartsAreDamage) {
   const auto [start, more] = PartsWithZeros(300'000, 1);
   AddChunks(1, start);
   AddMoments(1, 500, more);
-  ExpectEnds({"extract", file_, Path("out.ksi")}, "", "ksicache: " + file_ + ": damaged\n");
+  ExpectEnds({"extract", file_, Path("out.ksi")}, "",
+             "ksicache: " + file_ +
+                 ": damaged: the moment of 2026-11-21T10:00:00Z: the part of 2026-11-21T10:00:00Z "
+                 "is damaged\n");
 }
 
 // Each moment has all readings: as many as moments times readings, in a few KB.

@@ -63,10 +63,12 @@ ksi::OpenedCache OpenAny(const std::string& name, ksi::ChunkReader& moment) {
   return opened;
 }
 
-ksi::Moment WholeOf(ksi::ChunkReader& reader) {
+ksi::Moment WholeOf(const ksi::OpenedCache& opened, ksi::ChunkReader& reader) {
   ksi::Moment moment;
-  if (reader.ReadAll(moment) != ksi::kOk) throw DataError("damaged");
-  return moment;
+  const int64_t taken = reader.Facts().taken;
+  if (opened.recording->ReadAll(opened.number, reader, moment) == ksi::kOk) return moment;
+  throw DataError("damaged: the moment of " + ksi::TextOfTime(taken) + ": " +
+                  opened.recording->Why());
 }
 
 // The moment as a capture in memory.
@@ -131,7 +133,7 @@ OpenedFile::OpenedFile(const std::string& name) {
   if (opened.recording == nullptr) {
     file_ = std::move(opened.capture);
   } else {
-    Open(name, WholeOf(moment));
+    Open(name, WholeOf(opened, moment));
   }
 }
 
@@ -184,8 +186,9 @@ MomentHead HeadOf(const std::string& name) {
 
 ksi::Moment ReadMoment(const std::string& name) {
   ksi::ChunkReader moment;
-  if (OpenAny(name, moment).recording == nullptr) throw DataError("is no recording");
-  return WholeOf(moment);
+  const ksi::OpenedCache opened = OpenAny(name, moment);
+  if (opened.recording == nullptr) throw DataError("is no recording");
+  return WholeOf(opened, moment);
 }
 
 int64_t TakenOf(const ksi::CacheFile& capture) {
