@@ -19,6 +19,7 @@
 #include "knvlibs/linux/memory/buddyinfo.h"
 #include "knvlibs/linux/memory/ksm.h"
 #include "knvlibs/linux/memory/memory_nodes.h"
+#include "knvlibs/linux/memory/pressure.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
 #include "knvlibs/linux/pmem/nvdimm.h"
 
@@ -33,6 +34,7 @@ struct Reading {
   Once<Heaps, ReadHeaps> heaps;
   Once<NvdimmDevices, ReadNvdimmDevices> nvdimms;
   Once<Ksm, ReadKsm> ksm;
+  Once<Pressure, ReadPressure> pressure;
   Once<HugetlbCharges, ReadHugetlbCharges> hugetlbCharges;
   Once<GroupTree, GroupTree::Read> groups;
 

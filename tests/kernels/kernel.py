@@ -177,6 +177,11 @@ def limit(path, missing=None):
     return None if said == "max" else int(said) // 1024
 
 
+def pressure(path):
+    """In what part of the last ten seconds processes have waited for memory: some and all, in percent."""
+    return [float(re.search(rf"^{kind} avg10=([0-9.]+)", text(path), re.M)[1]) for kind in ("some", "full")]
+
+
 def ksm(name):
     said = text_or(f"/sys/kernel/mm/ksm/{name}", None)
     return None if said is None else int(said)

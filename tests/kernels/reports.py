@@ -193,7 +193,11 @@ def state():
     free, low, high, least = (sum(z[n] for z in zones) for n in ("free", "low", "high", "min"))
     middle = (least + low) / 2
     steps = [(high, "High"), (low, "Clear"), (middle, "Soft"), (least, "Hard")]
-    return next((name for bound, name in steps if free >= bound), "Low")
+    by_free = next((name for bound, name in steps if free >= bound), "Low")
+    some, full = kernel.pressure("/proc/pressure/memory")
+    by_pressure = "Low" if full >= 50 else "Hard" if full >= 10 else "Soft" if some >= 10 else "High"
+    order = ["High", "Clear", "Soft", "Hard", "Low"]
+    return max(by_free, by_pressure if free < 2 * high else "High", key=order.index)
 
 
 def comp_stats():
@@ -438,6 +442,24 @@ def effective_limit(directory):
     return min((limit for limit in limits if limit is not None), default=None)
 
 
+def protection(directory):
+    """What is kept of a group's memory, in any case or while there is other memory to take."""
+    if directory is None or directory.rstrip("/") == CGROUPS:
+        return 0
+    return max(kernel.limit(f"{directory}/memory.{name}") for name in ("min", "low"))
+
+
+def throttle(directory, own):
+    """The part of the time that is left to a group whose processes all wait at once, in percent."""
+    def file(of):
+        return "/proc/pressure/memory" if of.rstrip("/") == CGROUPS else f"{of}/memory.pressure"
+
+    if own is not None:
+        return 100 - int(kernel.pressure(file(own))[1] + 0.5)
+    # None, of a figure of 8 bits.
+    return 100 if kernel.pressure(file(directory))[0] < 0.5 else "255"
+
+
 def children(directory):
     return [entry.path for entry in os.scandir(directory) if entry.is_dir(follow_symlinks=False)]
 
@@ -450,13 +472,13 @@ def group_row(directory, own, **figures):
         "min": said["min"],
         "max": said["max"],
         "minLimit": None,
-        "bMin": said["min"],
+        "bMin": protection(own),
         "bMax": effective_limit(directory),
         "eMin": None if is_reserved(directory) else 0,
         "eMinPeak": None if is_reserved(directory) else 0,
         "conResv": 0,
         "availResv": said["min"],
-        "throttlePct": 100,
+        "throttlePct": throttle(directory, own),
         "tag": "",
         **figures,
     }

@@ -617,6 +617,92 @@ TEST_F(GroupsTest, ALimitIsTheSmallestOnTheWayUp) {
   EXPECT_EQ(int64_t{Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kBelow).max}, 4096);
 }
 
+// In a container, limits above what it sees hold, too.
+TEST_F(GroupsTest, InVersion1TheKernelTellsTheSmallestLimitOnTheWayUp) {
+  tree_.Write("/sys/fs/cgroup/cgroup.controllers", "");
+  WriteCgroup("/memory", 0, "");
+  WriteCgroup("/memory/jobs", kJobs, "100\n");
+  const std::string jobs = "/sys/fs/cgroup/memory/jobs/";
+  const auto expect = [this](uint64_t limit) {
+    for (const int64_t group : {kJobs, kProcessGroup + kPid}) {
+      const auto stats = Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", group);
+      EXPECT_EQ(uint64_t{stats.bMax}, limit) << group;
+    }
+    EXPECT_EQ(int64_t{Get<KSI_GroupAllocation>("sched/groups/memAllocationInKB", kJobs).max}, 4096);
+  };
+  tree_.Write(jobs + "memory.limit_in_bytes", "4194304\n");
+  expect(4096);
+  tree_.Write(jobs + "memory.stat", "hierarchical_memory_limit 2097152\n");
+  expect(2048);
+  // A hierarchy that was not used as one.
+  tree_.Write("/sys/fs/cgroup/memory/memory.limit_in_bytes", "1048576\n");
+  tree_.Write(jobs + "memory.stat", "hierarchical_memory_limit 9223372036854771712\n");
+  expect(kNoValue);
+}
+
+TEST_F(GroupsTest, MemoryLowIsABaseReservation) {
+  const std::string jobs = "/sys/fs/cgroup/jobs/";
+  const auto stats = [this] {
+    return Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", kJobs);
+  };
+  tree_.Write(jobs + "memory.low", "2097152\n");
+  EXPECT_EQ(uint64_t{stats().bMin}, 2048u);
+  EXPECT_EQ(uint64_t{stats().eMin}, 0u) << "it does not hold in any case";
+  tree_.Write(jobs + "memory.min", "4194304\n");
+  EXPECT_EQ(uint64_t{stats().bMin}, 4096u);
+  tree_.Write(jobs + "memory.low", "max\n");
+  EXPECT_EQ(uint64_t{stats().bMin}, kNoValue);
+}
+
+// For which part of the time groups may run, by what the kernel measures of waiting for memory.
+class ThrottleTest : public GroupsTest {
+ protected:
+  void WritePressure(const std::string& file, const std::string& some, const std::string& full) {
+    tree_.Write(file, "some avg10=" + some + " avg60=0.00 avg300=0.00 total=1\nfull avg10=" + full +
+                          " avg60=0.00 avg300=0.00 total=1\n");
+  }
+
+  uint32_t Throttle(int64_t group) {
+    return Get<KSI_GroupMemoryStats>("sched/groups/stats/memoryStats", group).throttlePct;
+  }
+
+  const std::string host_ = "/proc/pressure/memory";
+  const std::string jobs_ = "/sys/fs/cgroup/jobs/memory.pressure";
+  static constexpr uint32_t kNone = 255;
+};
+
+TEST_F(ThrottleTest, IsNotKnownWhereItIsNotMeasured) {
+  for (const int64_t group : {kRootGroup, kKernelGroup, kJobs, kProcessGroup + kPid}) {
+    EXPECT_EQ(Throttle(group), kNone) << group;
+  }
+  WritePressure(host_, "3.00", "1.00");
+  EXPECT_EQ(Throttle(kJobs), kNone);
+}
+
+TEST_F(ThrottleTest, IsNoneWhereNobodyWaits) {
+  WritePressure(host_, "0.49", "0.49");
+  WritePressure(jobs_, "90.00", "80.00");
+  for (const int64_t group : {kRootGroup, kKernelGroup, kJobs, kProcessGroup + kPid}) {
+    EXPECT_EQ(Throttle(group), 100u) << group;
+  }
+}
+
+TEST_F(ThrottleTest, IsWhatAllOfACgroupHaveWaited) {
+  WritePressure(host_, "0.50", "0.49");
+  WritePressure(jobs_, "0.50", "0.50");
+  EXPECT_EQ(Throttle(kRootGroup), 100u);
+  EXPECT_EQ(Throttle(kKernelGroup), kNone);
+  EXPECT_EQ(Throttle(kJobs), 99u);
+  EXPECT_EQ(Throttle(kProcessGroup + kPid), kNone) << "others may have waited there";
+  WritePressure(host_, "90.00", "7.51");
+  WritePressure(jobs_, "100.00", "100.00");
+  EXPECT_EQ(Throttle(kRootGroup), 92u);
+  EXPECT_EQ(Throttle(kJobs), 0u);
+  WritePressure(jobs_, "0.49", "0.10");
+  EXPECT_EQ(Throttle(kJobs), 100u);
+  EXPECT_EQ(Throttle(kProcessGroup + kPid), 100u);
+}
+
 // Huge pages of hugetlb, which a cgroup's current does not count: 6 MB of them are in use.
 class HugetlbTest : public GroupsTest {
  protected:

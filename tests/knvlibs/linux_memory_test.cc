@@ -215,6 +215,43 @@ TEST_F(LinuxMemory, StateFollowsFromTheWatermarks) {
   EXPECT_EQ(uint32_t{record.memState}, 4u);
 }
 
+// Little may be free, or enough, at the price of what is wanted again at once.
+TEST_F(LinuxMemory, StateFollowsFromThePressureWhereReclaimIsAtWork) {
+  const auto stateAt = [this](uint64_t free, const std::string& some, const std::string& full) {
+    tree_.Write("/proc/zoneinfo", Zoneinfo(free - 100));
+    tree_.Write("/proc/pressure/memory",
+                "some avg10=" + some + " avg60=0.00 avg300=0.00 total=1\n" + "full avg10=" + full +
+                    " avg60=99.00 avg300=99.00 total=1\n");
+    KSI_GlobalTally record = {};
+    EXPECT_EQ(Read(&record), kOk);
+    return uint32_t{record.memState};
+  };
+  EXPECT_EQ(stateAt(599, "9.99", "9.99"), 0u);
+  EXPECT_EQ(stateAt(599, "10.00", "9.99"), 2u);
+  EXPECT_EQ(stateAt(599, "10.00", "10.00"), 3u);
+  EXPECT_EQ(stateAt(599, "100.00", "49.99"), 3u);
+  EXPECT_EQ(stateAt(599, "50.00", "50.00"), 4u);
+  // What the watermarks say is the least.
+  EXPECT_EQ(stateAt(149, "10.00", "0.00"), 3u);
+  EXPECT_EQ(stateAt(149, "60.00", "50.00"), 4u);
+  // With so much free, who waits has come to a limit of his own.
+  EXPECT_EQ(stateAt(600, "100.00", "100.00"), 0u);
+}
+
+TEST_F(LinuxMemory, PressureThatIsNotUnderstoodIsSaid) {
+  for (const char* text :
+       {"some avg10=1\n", "some avg10=1.2.3\n", "some avg10=x.00\n", "some avg60=0.00\n",
+        "none avg10=0.00\n", "some avg10=.00\n", "some avg10=999999999999999999.00\n"}) {
+    tree_.Write("/proc/pressure/memory", text);
+    KSI_GlobalTally record = {};
+    testing::internal::CaptureStderr();
+    EXPECT_EQ(Read(&record), Status{KSI_STATUS_INVALID_METADATA}) << text;
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "/proc/pressure/memory: line 1 is not understood\n")
+        << text;
+  }
+}
+
 TEST_F(LinuxMemory, StatesWereNeverLeft) {
   LinuxSource source(tree_.Root());
   for (const char* state : {"high", "clear", "soft", "hard", "low"}) {

@@ -38,6 +38,12 @@ Figure KBOf(const FigureFile& stat, std::initializer_list<std::string_view> name
   return QuotientOf(bytes, 1024);
 }
 
+// In KB. Version 1 writes the largest number of whole pages for none.
+Figure LimitOf(uint64_t bytes) {
+  constexpr uint64_t kNone = uint64_t{1} << 62;
+  return bytes >= kNone ? std::nullopt : Figure(bytes / 1024);
+}
+
 // "hugetlb.2MB.current"
 std::string HugetlbFile(uint64_t sizeKB) {
   constexpr const char* kUnits[] = {"KB", "MB", "GB"};
@@ -139,8 +145,6 @@ Status CgroupHierarchy::ReadProcesses(const LinuxHost& host, std::string_view pa
 
 Status CgroupHierarchy::ReadAmount(const LinuxHost& host, std::string_view path,
                                    std::string_view name, Figure missing, Figure& amount) const {
-  // Version 1 writes the largest number of whole pages for "max".
-  constexpr uint64_t kVersion1Max = uint64_t{1} << 62;
   const std::string file = FileOf(path, name);
   std::string content;
   const Status status = host.ReadPiece(file, content);
@@ -153,7 +157,7 @@ Status CgroupHierarchy::ReadAmount(const LinuxHost& host, std::string_view path,
   if (content != "max" && !ParseNumber(content, bytes)) {
     return host.NotUnderstoodOnce(name, file, 1);
   }
-  amount = content == "max" || bytes >= kVersion1Max ? std::nullopt : Figure(bytes / 1024);
+  amount = content == "max" ? std::nullopt : LimitOf(bytes);
   return kOk;
 }
 
@@ -169,16 +173,38 @@ Status CgroupHierarchy::ReadReservation(const LinuxHost& host, std::string_view 
   return ReadAmount(host, path, "memory.min", 0, reserved);
 }
 
+Status CgroupHierarchy::ReadLow(const LinuxHost& host, std::string_view path, Figure& low) const {
+  low = 0;
+  return version_ == Version::k2 ? ReadAmount(host, path, "memory.low", 0, low) : kOk;
+}
+
 Status CgroupHierarchy::ReadLimit(const LinuxHost& host, std::string_view path,
                                   Figure& limit) const {
   const std::string_view name = version_ == Version::k2 ? "memory.max" : "memory.limit_in_bytes";
   return ReadAmount(host, path, name, std::nullopt, limit);
 }
 
+Status CgroupHierarchy::ReadHierarchicalLimit(const LinuxHost& host, std::string_view path,
+                                              std::optional<Figure>& limit) const {
+  limit.reset();
+  if (version_ != Version::k1) return kOk;
+  FigureFile stat;
+  const Status status = ReadStat(host, path, stat);
+  if (const Figure bytes = stat.Find("hierarchical_memory_limit")) limit = LimitOf(*bytes);
+  return status == KSI_STATUS_NOT_FOUND ? kOk : status;
+}
+
 Status CgroupHierarchy::ReadHigh(const LinuxHost& host, std::string_view path, Figure& high) const {
   high.reset();
   if (version_ != Version::k2) return kOk;
   return ReadAmount(host, path, "memory.high", std::nullopt, high);
+}
+
+Status CgroupHierarchy::ReadPressure(const LinuxHost& host, std::string_view path,
+                                     Pressure& pressure) const {
+  pressure = {};
+  if (version_ != Version::k2) return kOk;
+  return ReadPressureFile(host, FileOf(path, "memory.pressure"), pressure);
 }
 
 Status CgroupHierarchy::ReadUsage(const LinuxHost& host, std::string_view path,

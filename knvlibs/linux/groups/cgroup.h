@@ -4,12 +4,14 @@
 #define KNVLIBS_LINUX_GROUPS_CGROUP_H_
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/host/host.h"
+#include "knvlibs/linux/memory/pressure.h"
 #include "knvlibs/status.h"
 
 namespace ksi {
@@ -93,9 +95,17 @@ class CgroupHierarchy {
   // is not the end of a walk over the others.
   [[nodiscard]] Status ReadReservation(const LinuxHost& host, std::string_view path,
                                        Figure& reserved) const;
+  // What is taken only when there is nothing else to take; 0 in version 1.
+  [[nodiscard]] Status ReadLow(const LinuxHost& host, std::string_view path, Figure& low) const;
   [[nodiscard]] Status ReadLimit(const LinuxHost& host, std::string_view path, Figure& limit) const;
+  // The smallest limit on the way up, those out of sight too: only version 1 tells.
+  [[nodiscard]] Status ReadHierarchicalLimit(const LinuxHost& host, std::string_view path,
+                                             std::optional<Figure>& limit) const;
   // From where on it is slowed down until it has less; only version 2 does that.
   [[nodiscard]] Status ReadHigh(const LinuxHost& host, std::string_view path, Figure& high) const;
+  // Only version 2 tells.
+  [[nodiscard]] Status ReadPressure(const LinuxHost& host, std::string_view path,
+                                    Pressure& pressure) const;
   [[nodiscard]] Status ReadUsage(const LinuxHost& host, std::string_view path,
                                  MemcgUsage& usage) const;
   // What huge pages of hugetlb are charged to it beside `current`; none where the controller for

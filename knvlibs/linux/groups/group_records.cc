@@ -49,6 +49,20 @@ Status ReadSettings(const LinuxHost& host, const GroupTree& tree, const Group& g
   return status == kOk ? tree.Cgroups().ReadLimit(host, settings->path, limit) : status;
 }
 
+// What is kept for a group, come what may or while there is other memory to take.
+Status ReadProtection(const LinuxHost& host, const GroupTree& tree, const Group& group,
+                      Figure& kept) {
+  Figure low;
+  kept = 0;
+  const Group* settings = SettingsOf(tree, group);
+  if (settings == nullptr) return kOk;
+  Status status = tree.ReadReservation(host, *settings, kept);
+  if (status == kOk) status = tree.Cgroups().ReadLow(host, settings->path, low);
+  // None is all that it has.
+  kept = kept && low ? Figure(std::max(*kept, *low)) : std::nullopt;
+  return status;
+}
+
 // What is reserved for the cgroups below a group, in KB.
 Status ReadReservedBelow(const LinuxHost& host, const GroupTree& tree, const Group& group,
                          Figure& reserved) {
@@ -74,6 +88,42 @@ Status ReadEffectiveReservation(const LinuxHost& host, const GroupTree& tree, co
     if (reserved != 0u) effective.reset();
   }
   return kOk;
+}
+
+// The part of the time that waiting for memory has left to all who wait at once. Percent.
+Figure LeftBy(const Pressure& pressure) {
+  if (!pressure.full) return std::nullopt;
+  return Less(100, (*pressure.full + 50) / 100);
+}
+
+// The cgroup that a process is in.
+const Group& CgroupOf(const GroupTree& tree, const Group& group) {
+  const Group* at = &group;
+  while (at->kind != Group::Kind::kCgroup) at = &tree.At(at->parent);
+  return *at;
+}
+
+// The part of the time that a group may run. Who waits is counted for the host and for cgroups: of
+// a process that shares its cgroup, only that it did not wait is told, if nobody there did.
+Status ReadThrottle(const LinuxHost& host, const GroupTree& tree, const Group& group,
+                    Figure& percent) {
+  const Pressure* ofHost = nullptr;
+  Status status = host.Kept().pressure.Get(host, ofHost);
+  percent.reset();
+  if (status != kOk || !ofHost->some) return status;
+  if (ofHost->IsNone()) percent = 100;
+  if (group.id == kRootGroup) percent = LeftBy(*ofHost);
+  const Group* own = SettingsOf(tree, group);
+  const Group& measured = own == nullptr ? CgroupOf(tree, group) : *own;
+  if (percent || measured.id == kRootGroup) return kOk;
+  Pressure pressure;
+  status = tree.ReadPressure(host, measured, pressure);
+  if (own != nullptr) {
+    percent = LeftBy(pressure);
+  } else if (pressure.IsNone()) {
+    percent = 100;
+  }
+  return status;
 }
 
 Status ReadRoot(const LinuxHost& host, const FigureFile& meminfo, KSI_GroupMemoryStats& record) {
@@ -253,14 +303,13 @@ Status ReadGroupMemoryStats(const LinuxHost& host, const GroupTree& tree, const 
   Figure reserved = 0;
   Figure limit;
   Figure effective;
+  Figure throttle;
   Figure saved;
-  const Group* settings = SettingsOf(tree, group);
   Status status = ReadUse(host, tree, group, record);
-  if (status == kOk && settings != nullptr) {
-    status = tree.ReadReservation(host, *settings, reserved);
-  }
+  if (status == kOk) status = ReadProtection(host, tree, group, reserved);
   if (status == kOk) status = tree.ReadEffectiveLimit(host, group, limit);
   if (status == kOk) status = ReadEffectiveReservation(host, tree, group, effective);
+  if (status == kOk) status = ReadThrottle(host, tree, group, throttle);
   if (status != kOk) return status;
   status = tree.ReadSharedSaved(host, group, saved);
   if (status == KSI_STATUS_NOT_FOUND) saved.reset();  // a process that has ended since
@@ -271,8 +320,7 @@ Status ReadGroupMemoryStats(const LinuxHost& host, const GroupTree& tree, const 
   record.eMin = FieldOf(effective);
   record.eMinPeak = FieldOf(effective);
   record.sharedSaved = FieldOf(saved);
-  // Nothing holds a group's threads back for the sake of memory.
-  record.throttlePct = 100;
+  record.throttlePct = FieldOf<uint8_t>(throttle);
   return kOk;
 }
 

@@ -89,6 +89,7 @@ Status GroupTree::Read(const LinuxHost& host, GroupTree& tree) {
   }
   tree.reserved_.resize(tree.groups_.size());
   tree.limits_.resize(tree.groups_.size());
+  tree.pressures_.resize(tree.groups_.size());
   tree.ksm_.resize(tree.processes_.size());
   tree.cgroupOfPid_.clear();
   tree.byPath_.clear();
@@ -365,23 +366,49 @@ Figure StricterOf(Figure one, Figure other) {
 
 }  // namespace
 
+// Makes the limit above a cgroup what holds in it.
+Status GroupTree::TightenLimit(const LinuxHost& host, const Group& cgroup, Figure& limit) const {
+  std::optional<Figure> told;
+  Status status = cgroups_.ReadHierarchicalLimit(host, cgroup.path, told);
+  if (status != kOk) return status;
+  if (told) {
+    limit = *told;
+    return kOk;
+  }
+  Figure own;
+  Figure high;
+  status = cgroups_.ReadLimit(host, cgroup.path, own);
+  if (status == kOk) status = cgroups_.ReadHigh(host, cgroup.path, high);
+  limit = StricterOf(limit, StricterOf(own, high));
+  return status;
+}
+
 Status GroupTree::ReadEffectiveLimit(const LinuxHost& host, const Group& group,
                                      Figure& limit) const {
   limit.reset();
   if (group.parent == Group::kNone) return kOk;  // nothing is set for the root
   std::optional<Figure>& known = limits_[static_cast<size_t>(&group - groups_.data())];
   if (!known) {
-    Figure own;
-    Figure high;
     Status status = ReadEffectiveLimit(host, At(group.parent), limit);
     if (status == kOk && group.kind == Group::Kind::kCgroup) {
-      status = cgroups_.ReadLimit(host, group.path, own);
-      if (status == kOk) status = cgroups_.ReadHigh(host, group.path, high);
+      status = TightenLimit(host, group, limit);
     }
     if (status != kOk) return status;
-    known = StricterOf(limit, StricterOf(own, high));
+    known = limit;
   }
   limit = *known;
+  return kOk;
+}
+
+Status GroupTree::ReadPressure(const LinuxHost& host, const Group& group,
+                               Pressure& pressure) const {
+  std::optional<Pressure>& known = pressures_[static_cast<size_t>(&group - groups_.data())];
+  if (!known) {
+    const Status status = cgroups_.ReadPressure(host, group.path, pressure);
+    if (status != kOk) return status;
+    known = pressure;
+  }
+  pressure = *known;
   return kOk;
 }
 

@@ -28,6 +28,7 @@
 #include "knvlibs/linux/machines/kvm.h"
 #include "knvlibs/linux/machines/qemu_command_line.h"
 #include "knvlibs/linux/machines/qmp.h"
+#include "knvlibs/linux/memory/pressure.h"
 #include "knvlibs/status.h"
 
 namespace ksi {
@@ -119,6 +120,10 @@ class GroupTree {
   [[nodiscard]] Status ReadEffectiveLimit(const LinuxHost& host, const Group& group,
                                           Figure& limit) const;
 
+  // For which part of the time the processes of a cgroup have waited for memory.
+  [[nodiscard]] Status ReadPressure(const LinuxHost& host, const Group& group,
+                                    Pressure& pressure) const;
+
   // What huge pages of hugetlb are used in a cgroup beside what its `current` counts; `inUse` is
   // what all of the host have. None where that cannot be told.
   [[nodiscard]] Status ReadHugetlb(const LinuxHost& host, const Group& group, uint64_t inUse,
@@ -148,6 +153,8 @@ class GroupTree {
   size_t UnitOf(size_t group) const;
   size_t CountUserWorlds(size_t group) const;
   Figure ProcessHugetlbOf(const Group& group) const;
+  [[nodiscard]] Status TightenLimit(const LinuxHost& host, const Group& cgroup,
+                                    Figure& limit) const;
 
   CgroupHierarchy cgroups_;
   KvmSearch kvm_;
@@ -159,6 +166,7 @@ class GroupTree {
   // What has been asked for, of each group and of each process.
   mutable std::vector<std::optional<Figure>> reserved_;
   mutable std::vector<std::optional<Figure>> limits_;  // effective ones
+  mutable std::vector<std::optional<Pressure>> pressures_;
   mutable std::vector<std::optional<ProcessKsm>> ksm_;
 
   // Only while the tree grows.

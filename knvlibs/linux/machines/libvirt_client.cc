@@ -121,7 +121,8 @@ void FillXml(const Library& library, void* domain, Message& message) {
   if (!xml.modules || xml.modules->size() > kMostModules) return;
   message.moduleCount = xml.modules->size();
   std::ranges::transform(*xml.modules, message.modules.begin(), [](const MemoryModule& module) {
-    return Message::Module{FieldOf(module.size), FieldOf(module.block.size), module.isDimm ? 1u : 0u};
+    return Message::Module{FieldOf(module.size), FieldOf(module.block.size),
+                           module.isDimm ? 1u : 0u};
   });
 }
 
@@ -227,7 +228,8 @@ LibvirtDomain DomainOf(const Message& message) {
   domain.modules.emplace();
   for (size_t i = 0; i < message.moduleCount; ++i) {
     const Message::Module& module = message.modules[i];
-    domain.modules->push_back({FigureOf(module.size), {FigureOf(module.block), {}}, module.isDimm == 1});
+    domain.modules->push_back(
+        {FigureOf(module.size), {FigureOf(module.block), {}}, module.isDimm == 1});
   }
   return domain;
 }

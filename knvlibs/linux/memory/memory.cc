@@ -7,6 +7,7 @@
 #include "knvlibs/linux/host/figure_file.h"
 #include "knvlibs/linux/memory/iomem.h"
 #include "knvlibs/linux/memory/kernel_memory.h"
+#include "knvlibs/linux/memory/pressure.h"
 #include "knvlibs/linux/memory/zoneinfo.h"
 #include "knvlibs/linux/reader_tables.h"
 #include "knvlibs/linux/reading.h"
@@ -31,11 +32,28 @@ Zone TotalOf(const Zones& zones) {
 // The number of the memory state of a host with these sums: "high" while page reclaim has nothing
 // to do, "clear" while it works up to the high watermark, "soft" and "hard" in the upper and lower
 // half of what is left to it before allocations stall, "low" once they do.
-uint32_t StateOf(const Zone& sum) {
+uint32_t StateByFree(const Zone& sum) {
   const uint64_t floors[] = {sum.high, sum.low, sum.min + (sum.low - sum.min) / 2, sum.min};
-  uint32_t state = 0;
+  uint32_t state = KSI_MEMORY_STATE_HIGH;
   while (state < std::size(floors) && sum.free < floors[state]) ++state;
   return state;
+}
+
+// The same by what waiting for memory costs: page reclaim may keep some pages free at the price of
+// others that are wanted again at once.
+uint32_t StateByPressure(const Pressure& pressure) {
+  constexpr uint64_t kTenth = 1000;  // of the time
+  constexpr uint64_t kHalf = 5000;
+  if (pressure.full >= kHalf) return KSI_MEMORY_STATE_LOW;
+  if (pressure.full >= kTenth) return KSI_MEMORY_STATE_HARD;
+  return pressure.some >= kTenth ? KSI_MEMORY_STATE_SOFT : KSI_MEMORY_STATE_HIGH;
+}
+
+// Reclaim stops a little above the high watermark. Where twice as much is free it takes nothing
+// from the host: who waits then has come to the limit of a cgroup.
+uint32_t StateOf(const Zone& sum, const Pressure& pressure) {
+  const uint32_t state = StateByFree(sum);
+  return sum.free < 2 * sum.high ? std::max(state, StateByPressure(pressure)) : state;
 }
 
 // Low memory that the kernel keeps from the page allocator, in pages.
@@ -122,10 +140,12 @@ Status ReadComprehensive(const LinuxHost& host, const Keys& /*keys*/, KSI_Compre
 Status ReadGlobalTally(const LinuxHost& host, const Keys& /*keys*/, KSI_GlobalTally& record) {
   const FigureFile* meminfo = nullptr;
   const Zones* zones = nullptr;
+  const Pressure* pressure = nullptr;
   uint64_t total = 0;
   uint64_t heap = 0;
   Status status = host.Kept().meminfo.Get(host, meminfo);
   if (status == kOk) status = host.Kept().zones.Get(host, zones);
+  if (status == kOk) status = host.Kept().pressure.Get(host, pressure);
   if (status == kOk) status = meminfo->Require("MemTotal", total);
   if (status == kOk) status = ReadKernelMemory(host, heap);
   if (status != kOk) return status;
@@ -133,7 +153,7 @@ Status ReadGlobalTally(const LinuxHost& host, const Keys& /*keys*/, KSI_GlobalTa
   const Zone sum = TotalOf(*zones);
   record.managedByMemSched = Less(total, heap);
   record.minFree = sum.high * host.PageKB();
-  record.memState = StateOf(sum);
+  record.memState = StateOf(sum, *pressure);
   return kOk;
 }
 
