@@ -49,8 +49,8 @@ std::vector<Mapping>::iterator FindBlock(std::vector<Mapping>& mappings, const M
 // The mappings of all blocks, and those that are left; none if one of them is not there.
 std::vector<FoundBlock> FindBlocks(std::vector<MemoryBlock> blocks, std::vector<Mapping>& left) {
   // What has an address is not to be taken for another block.
-  std::ranges::stable_partition(blocks,
-                                [](const MemoryBlock& block) { return block.address.has_value(); });
+  std::stable_partition(blocks.begin(), blocks.end(),
+                        [](const MemoryBlock& block) { return block.address.has_value(); });
   std::vector<FoundBlock> found;
   for (const MemoryBlock& block : blocks) {
     const auto mapping = block.size ? FindBlock(left, block) : left.end();
