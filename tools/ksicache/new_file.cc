@@ -10,9 +10,12 @@
 #include <cerrno>
 #include <charconv>
 #include <cstdint>
+#include <cstdio>
+#include <memory>
 #include <optional>
 
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/mapped_file.h"
 #include "tools/ksicache/recording_lock.h"
 
 namespace ksicache {
@@ -193,7 +196,7 @@ void NewFile::RefuseInput(const std::string& fileName) const {
 }
 
 void NewFile::OpenUnnamed() {
-  unnamed_.Reset(openat(directory_.Get(), ".", O_TMPFILE | O_WRONLY | O_CLOEXEC, kMode));
+  unnamed_.Reset(openat(directory_.Get(), ".", O_TMPFILE | O_RDWR | O_CLOEXEC, kMode));
   if (unnamed_) return;
   const bool unknown = errno == EOPNOTSUPP || errno == EISDIR || errno == EINVAL;
   if (!unknown || faccessat(directory_.Get(), ".", W_OK | X_OK, AT_EACCESS) != 0) {
@@ -201,21 +204,45 @@ void NewFile::OpenUnnamed() {
   }
 }
 
-void NewFile::Fill(int fd, std::span<const std::byte> content) const {
+void NewFile::OpenElsewhere() {
+  const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::tmpfile(), std::fclose);
+  if (file != nullptr) unnamed_.Reset(dup(fileno(file.get())));
+  if (!unnamed_) throw SystemError("a temporary file", errno);
+  isElsewhere_ = true;
+}
+
+void NewFile::WriteTo(int fd, std::span<const std::byte> content) const {
   while (!content.empty()) {
     const ssize_t written = write(fd, content.data(), content.size());
     if (written < 0 && errno != EINTR) throw SystemError(name_ + ": cannot write", errno);
     if (written > 0) content = content.subspan(static_cast<size_t>(written));
   }
-  if (standardOutput_) return;
+}
+
+// Gives a file its rights, and brings it to the disk.
+void NewFile::Settle(int fd) const {
   if (fchmod(fd, mode_) != 0 || fsync(fd) != 0) throw SystemError(name_ + ": cannot write", errno);
 }
 
+void NewFile::Write(std::span<const std::byte> content) {
+  if (!standardOutput_ && !unnamed_) OpenElsewhere();
+  WriteTo(standardOutput_ ? STDOUT_FILENO : unnamed_.Get(), content);
+}
+
 void NewFile::Commit(std::span<const std::byte> content) {
-  if (standardOutput_) return Fill(STDOUT_FILENO, content);
+  if (standardOutput_ || unnamed_) {
+    Write(content);
+    return CommitWritten();
+  }
   RequireNotRecorded();
-  if (unnamed_) Fill(unnamed_.Get(), content);
-  if (!unnamed_ || !CommitUnnamed()) CommitNamed(content);
+  CommitNamed(content);
+  SyncDirectory();
+}
+
+void NewFile::CommitWritten() {
+  if (standardOutput_) return;
+  RequireNotRecorded();
+  if (isElsewhere_ || !CommitUnnamed()) CommitNamed(MappedFile(unnamed_.Get()).Content());
   SyncDirectory();
 }
 
@@ -227,6 +254,7 @@ bool NewFile::LinkUnnamed(const std::string& entry) const {
 
 // False if unnamed files get no names here: there is no /proc, or the file system refuses.
 bool NewFile::CommitUnnamed() const {
+  Settle(unnamed_.Get());
   if (LinkUnnamed(entry_)) return true;
   if (errno != EEXIST) return false;
   if (!replace_) throw Exists(name_);
@@ -245,7 +273,8 @@ void NewFile::CommitNamed(std::span<const std::byte> content) const {
                                O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kMode));
   if (!file) throw SystemError(name_, errno);
   const TemporaryEntry temporary(directory_.Get(), entry, file.Get());
-  Fill(file.Get(), content);
+  WriteTo(file.Get(), content);
+  Settle(file.Get());
   Rename(entry, file.Get());
 }
 

@@ -48,12 +48,19 @@ class NewFile {
   // there stands there still, unless it says that the file is whole.
   void Commit(std::span<const std::byte> content);
 
+  // The same of a file that is too large for the memory: adds to what is not there yet, and makes a
+  // file of all that was added. REQUIRES: something was, be it nothing.
+  void Write(std::span<const std::byte> content);
+  void CommitWritten();
+
  private:
   void OpenListing();
   void CheckTarget() const;
   void RequireNotRecorded() const;
   void OpenUnnamed();
-  void Fill(int fd, std::span<const std::byte> content) const;
+  void OpenElsewhere();
+  void WriteTo(int fd, std::span<const std::byte> content) const;
+  void Settle(int fd) const;
   bool LinkUnnamed(const std::string& entry) const;
   bool CommitUnnamed() const;
   void CommitNamed(std::span<const std::byte> content) const;
@@ -65,9 +72,10 @@ class NewFile {
   mode_t mode_;
   bool standardOutput_;
   Descriptor directory_;
-  Descriptor listing_;  // of the same, to bring it to the disk; none where it may not be read
-  std::string entry_;   // the target's name in its directory
-  Descriptor unnamed_;  // none where the file system has no such files
+  Descriptor listing_;        // of the same, to bring it to the disk; none where it may not be read
+  std::string entry_;         // the target's name in its directory
+  Descriptor unnamed_;        // none where the file system has no such files
+  bool isElsewhere_ = false;  // it is on another one, and gets no name
 };
 
 // The option of commands that make a file, and what it asks for. Fails with a UsageError.

@@ -1,5 +1,4 @@
 // join: captures and recordings of one host as one recording.
-#include <sys/mman.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -14,6 +13,7 @@
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/join_inputs.h"
+#include "tools/ksicache/mapped_file.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/progress.h"
@@ -31,16 +31,6 @@ bool IsSame(const ksi::Moment& a, const ksi::Moment& b) {
 
 // A file without a name, closed with its owner.
 using TemporaryFile = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
-
-void Commit(std::FILE* file, NewFile& target) {
-  const off_t size = lseek(fileno(file), 0, SEEK_END);
-  void* content =
-      size < 0 ? MAP_FAILED
-               : mmap(nullptr, static_cast<size_t>(size), PROT_READ, MAP_PRIVATE, fileno(file), 0);
-  if (content == MAP_FAILED) throw SystemError(target.Name(), errno);
-  target.Commit({static_cast<const std::byte*>(content), static_cast<size_t>(size)});
-  munmap(content, static_cast<size_t>(size));
-}
 
 int Join(const CommandLine& line) {
   const std::string& name = line.arguments[0];
@@ -74,7 +64,7 @@ int Join(const CommandLine& line) {
     }
     recorder.Pack();
   }
-  Commit(file.get(), target);
+  target.Commit(MappedFile(fileno(file.get())).Content());
   return inputs.IsDamaged() ? 1 : 0;
 }
 

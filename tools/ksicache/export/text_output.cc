@@ -5,21 +5,17 @@
 #include <algorithm>
 #include <span>
 
-#include "tools/ksicache/error.h"
 #include "tools/ksicache/output.h"
 
 namespace ksicache {
 
 TextOutput::TextOutput(NewFile* file)
-    : file_(file),
-      isTerminal_(file == nullptr && isatty(STDOUT_FILENO) == 1),
-      full_(file == nullptr ? kBlock : kLargestFile) {}
+    : file_(file), isTerminal_(file == nullptr && isatty(STDOUT_FILENO) == 1) {}
 
 void TextOutput::Flush() {
   if (file_ != nullptr) {
-    throw Error(file_->Name() + ": is larger than 1 GiB: standard output takes any size");
-  }
-  if (!isTerminal_) {
+    file_->Write(std::as_bytes(std::span(text_)));
+  } else if (!isTerminal_) {
     Print(text_);
   } else {
     // Nothing from outside reaches a terminal as a command.
@@ -33,8 +29,8 @@ void TextOutput::Flush() {
 }
 
 void TextOutput::Finish() {
-  if (file_ == nullptr) return Flush();
-  file_->Commit(std::as_bytes(std::span(text_)));
+  Flush();
+  if (file_ != nullptr) file_->CommitWritten();
 }
 
 bool IsSimple(std::string_view text) {

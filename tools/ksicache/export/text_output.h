@@ -17,9 +17,6 @@ namespace ksicache {
 // with an OutputError or an Error.
 class TextOutput {
  public:
-  // The most that a file may have: it is made in memory.
-  static constexpr size_t kLargestFile = size_t{1} << 30;
-
   // `file`: null for standard output.
   explicit TextOutput(NewFile* file);
 
@@ -40,7 +37,7 @@ class TextOutput {
 
   // The end of a row: what there is may go out.
   void EndRow() {
-    if (text_.size() >= full_) Flush();
+    if (text_.size() >= kBlock) Flush();
   }
 
   void Finish();
@@ -62,7 +59,6 @@ class TextOutput {
 
   NewFile* file_;
   bool isTerminal_;
-  size_t full_;
   std::string text_;
 };
 
