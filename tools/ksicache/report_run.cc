@@ -5,6 +5,7 @@
 #include <ctime>
 #include <memory>
 #include <optional>
+#include <vector>
 
 #include <knvlibs/ksi.h>
 #include <knvlibs/ksi_status.h>
@@ -37,12 +38,6 @@ void CheckDefinitions() {
                   ownBuilt);
 }
 
-void UseCache(const std::string& name) {
-  const ksi::Status status = KSI_UseCache(name.c_str(), 0);
-  if (status != ksi::kOk) throw DataError("cannot be read: " + StatusText(status));
-  CheckDefinitions();
-}
-
 Origin OriginOf(const std::string& host, int64_t taken) {
   return {host, ksi::TextOfTime(taken), taken};
 }
@@ -69,19 +64,16 @@ class SpanVisit {
     const auto& parts = recording->Parts();
     for (size_t i = 1; i < parts.size(); ++i) {
       isInOrder_ = isInOrder_ && parts[i - 1].last < parts[i].first;
+      if (parts[i].chunk == parts[i].number) chunks_.push_back(parts[i].first);
     }
   }
 
   void Run(const std::function<void(const Origin&)>& visit) {
-    // From the last moment of the second before on. Where the clock was set back, times lie in
-    // several places.
-    const int64_t before = wanted_.first - ksi::kSecond;
-    const bool isAfterFirst = isInOrder_ && before > all_.first;
-    UseCache(fileName_ + "@" + (isAfterFirst ? ksi::TextOfTime(before) : "first"));
+    Open();
     ksi::Status status = ksi::kOk;
     for (; status != KSI_STATUS_NOT_FOUND; status = KSI_SourceNextMoment(nullptr)) {
       if (status != ksi::kOk) {
-        wrong_ = "moments are missing: " + StatusText(status);
+        MissMoments(status);
       } else if (!Visit(visit)) {
         break;
       }
@@ -91,6 +83,33 @@ class SpanVisit {
   }
 
  private:
+  // After damage moments are read again from the next chunk on; of what is nothing but damage not
+  // all has to be tried.
+  static constexpr size_t kMostChunks = 100;
+
+  // Goes to the first moment that may be wanted: from the last one of the second before on. Where
+  // the clock was set back, times lie in several places.
+  void Open() {
+    const int64_t before = wanted_.first - ksi::kSecond;
+    const bool isAfterFirst = isInOrder_ && before > all_.first;
+    ksi::Status status = Use(isAfterFirst ? ksi::TextOfTime(before) : "first");
+    size_t tried = 0;
+    for (const int64_t start : chunks_) {
+      if (status != KSI_STATUS_METADATA_READ_ERROR || tried == kMostChunks) break;
+      if (isAfterFirst && start < before) continue;
+      MissMoments(status);
+      status = Use(ksi::TextOfTime(start));
+      ++tried;
+    }
+    if (status != ksi::kOk) throw DataError("cannot be read: " + StatusText(status));
+  }
+
+  ksi::Status Use(const std::string& when) const {
+    return KSI_UseCache((fileName_ + "@" + when).c_str(), 0);
+  }
+
+  void MissMoments(ksi::Status status) { wrong_ = "moments are missing: " + StatusText(status); }
+
   // False if no other moment can be wanted.
   bool Visit(const std::function<void(const Origin&)>& visit) {
     const Origin origin = CurrentOrigin();
@@ -110,6 +129,7 @@ class SpanVisit {
   ksi::Span all_ = {};
   ksi::Span wanted_ = {};
   bool isInOrder_ = true;
+  std::vector<int64_t> chunks_;  // when the first moment of each but the first chunk was taken
   bool isFound_ = false;
   std::string wrong_;
 };
@@ -124,8 +144,11 @@ Origin LiveOrigin() {
 
 void ForEachMoment(const std::string& name, const std::function<void(const Origin&)>& visit) {
   if (const std::optional<NamedSpan> span = SpanOf(name)) return SpanVisit(*span).Run(visit);
+  // The library says what is wrong with a file in a status, and so it is looked into first.
   const MomentHead head = HeadOf(name);
-  UseCache(name);
+  const ksi::Status status = KSI_UseCache(name.c_str(), 0);
+  if (status != ksi::kOk) throw DataError("cannot be read: " + StatusText(status));
+  CheckDefinitions();
   visit(OriginOf(head.host, head.taken));
 }
 
