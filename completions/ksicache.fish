@@ -79,6 +79,7 @@ function __ksicache_words
     while set -q words[1]
         switch $words[1]
             case --root --mode --every --keep --max-size --count --format --unit --output --cluster -u -o \
+                --columns --files-from -s \
                 --report --by --top --since --fail-above -r
                 set -e words[1]
             case '-*'
@@ -159,5 +160,9 @@ complete -c ksicache -n '__ksicache_command diff' -l fail-above -x -a '100M 500M
 complete -c ksicache -n '__ksicache_command diff' -l across-hosts -d 'Compare moments of two hosts'
 complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics prometheus clickhouse-schema' -d 'Write in this format'
 complete -c ksicache -n '__ksicache_command diff export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
+complete -c ksicache -n '__ksicache_command export' -s s -l columns -x -d 'Export only these columns'
+complete -c ksicache -n '__ksicache_command export' -l every -x -a '1m 5m 1h 1d' -d 'Take a moment of a recording so often'
+complete -c ksicache -n '__ksicache_command export' -l files-from -r -F -d 'Take also the files that this one names'
+complete -c ksicache -n '__ksicache_command export' -l append -d 'Add to a database'
 complete -c ksicache -n '__ksicache_command export' -l cluster -x -d 'Have tables over all servers of this cluster'
 complete -c ksicache -n '__ksicache_command export' -s o -l output -r -F -d 'Make a file'

@@ -359,13 +359,13 @@ declare -gA _ksicache_values=(
 
 _ksicache() {
   local _tally_line word command='' count=0 skip='' head='' i
-  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|report|by|top|since|fail-above'
+  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|files-from|report|by|top|since|fail-above'
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
     if [[ -n $skip ]]; then
       skip=
-    elif [[ $word =~ ^(--($valued)|-[uor])$ ]]; then
+    elif [[ $word =~ ^(--($valued)|-[uors])$ ]]; then
       skip=$word
     elif [[ $word != -* ]]; then
       if [[ -z $command ]]; then command=$word; else count=$((count + 1)); fi
@@ -380,10 +380,11 @@ _ksicache() {
     -u) skip=--unit ;;
     -o) skip=--output ;;
     -r) skip=--report ;;
+    -s) skip=--columns ;;
   esac
   if [[ $skip == --root ]]; then
     _tally_reply_files "$head" "$word" -d
-  elif [[ $skip == --output ]]; then
+  elif [[ $skip == --output || $skip == --files-from ]]; then
     _tally_reply_files "$head" "$word" -f
   elif [[ $skip == --report ]]; then
     _tally_reply "$head" "$word" "$_tally_reports"
@@ -399,7 +400,10 @@ _ksicache() {
         _tally_reply '' "$word" \
           '--report -r --by --top --since --unit -u --json --fail-above --across-hosts'
         ;;
-      export) _tally_reply '' "$word" '--format --unit -u --output -o --cluster --force --mode' ;;
+      export)
+        _tally_reply '' "$word" \
+          '--format --unit -u --columns -s --every --files-from --output -o --append --force --mode --cluster'
+        ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac

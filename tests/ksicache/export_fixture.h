@@ -58,13 +58,18 @@ class ExportTest : public Ksicache {
     return rows;
   }
 
-  // A recording of a host that has little, at these times.
-  std::string RecordingAt(const std::string& name, const std::vector<std::string>& times) const {
+  // A recording of a host that has little, at these times. `perKernel`: after so many moments the
+  // host has another kernel, which begins a chunk; 0: it never has.
+  std::string RecordingAt(const std::string& name, const std::vector<std::string>& times,
+                          size_t perKernel = 0) const {
     std::vector<std::string> join = {"join", Path(name)};
     for (size_t i = 0; i < times.size(); ++i) {
       const std::string capture = Path(name + std::to_string(i));
-      WriteContent(capture + ".json", R"({"ksiCache":1,"host":"h","taken":")" + times[i] +
-                                          R"(","readings":[
+      const std::string built = perKernel == 0 ? ""
+                                               : R"("built":"Mar 02 2026 11:20:0)" +
+                                                     std::to_string(i / perKernel) + R"(",)";
+      WriteContent(capture + ".json", R"({"ksiCache":1,"host":"h",)" + built + R"("taken":")" +
+                                          times[i] + R"(","readings":[
           {"node":"memory/pshare/stats","keys":[],"value":{"cow":)" +
                                           std::to_string(i) + "}}]}");
       EXPECT_EQ(Run({"load", capture + ".json", capture}).err, "");

@@ -1,6 +1,9 @@
 // ksicache export as a SQLite database and as metrics.
+#include <sys/resource.h>
+
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <memory>
 #include <set>
 #include <string>
@@ -13,6 +16,7 @@
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/metric_name.h"
 #include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/export/text_output.h"
 
 namespace ksi {
 namespace {
@@ -147,6 +151,116 @@ TEST_F(ExportFormats, SqliteTakesManyFiles) {
             (std::vector<std::string>{"2026-11-21T10:02:00ZHigh", "2026-11-21T10:03:00ZHigh",
                                       "2026-11-21T10:04:00ZHigh", "2026-11-21T10:05:00ZHard",
                                       "2026-11-21T10:06:00ZHigh", "2026-11-21T10:00:00ZHigh"}));
+}
+
+// Rows of a host and a time are found without going through all.
+TEST_F(ExportFormats, SqliteHasAnIndexOfIdentities) {
+  const std::string file = Path("host.db");
+  Output({"export", "vm-stats,comp-stats", "--format=sqlite", "-o", file, kExample});
+  EXPECT_EQ(Query(file,
+                  "SELECT sql FROM sqlite_schema WHERE type = 'index' AND sql IS NOT NULL "
+                  "ORDER BY name"),
+            (std::vector<std::string>{
+                "CREATE INDEX comp_stats_identity ON comp_stats(host, time)",
+                "CREATE INDEX vm_stats_identity ON vm_stats(host, time, \"name\", \"schedGrp\")"}));
+}
+
+// What is there already is not there twice, be it a part of a span or all of it.
+TEST_F(ExportFormats, SqliteIsAddedTo) {
+  const std::string file = Path("host.db");
+  const auto add = [&](const std::string& reports, const std::string& name) {
+    Output({"export", reports, "--format=sqlite", "--append", "-o", file, name});
+  };
+  // Made where there is none.
+  add("vm-stats", kIncident + "@10:02Z..10:04Z");
+  add("vm-stats", kIncident + "@10:03Z..10:05Z");
+  add("comp-stats,vm-stats", kIncident + "@..");
+  add("vm-stats,comp-stats", kExample);
+  add("vm-stats,comp-stats", kExample);
+  EXPECT_EQ(Query(file, "SELECT time || count(*) FROM vm_stats GROUP BY time"),
+            (std::vector<std::string>{"2026-11-21T10:00:00Z12", "2026-11-21T10:02:00Z12",
+                                      "2026-11-21T10:03:00Z12", "2026-11-21T10:04:00Z12",
+                                      "2026-11-21T10:05:00Z12", "2026-11-21T10:06:00Z12"}));
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM comp_stats"), std::vector<std::string>{"6"});
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM sqlite_schema WHERE name LIKE '%identity'"),
+            std::vector<std::string>{"2"});
+  EXPECT_EQ(Query(file, "PRAGMA integrity_check"), std::vector<std::string>{"ok"});
+  // As if all had been exported at once.
+  Output({"export", "vm-stats,comp-stats", "--format=sqlite", "-o", Path("once.db"), kExample,
+          kIncident + "@.."});
+  for (const std::string table : {"vm_stats", "comp_stats", "columns"}) {
+    const std::string rows = "SELECT count(*) FROM (SELECT * FROM " + table +
+                             " EXCEPT SELECT * FROM other." + table + ")";
+    const Database database = OpenAsOwner(file);
+    Statement query;
+    ASSERT_EQ(sqlite3_exec(database.get(), ("ATTACH '" + Path("once.db") + "' AS other").c_str(),
+                           nullptr, nullptr, nullptr),
+              SQLITE_OK);
+    ASSERT_EQ(query.Prepare(database.get(), rows.c_str()), SQLITE_OK);
+    ASSERT_EQ(query.Step(), SQLITE_ROW);
+    EXPECT_EQ(query.Number(0), 0) << table;
+  }
+}
+
+// Nothing is added to what is another database, or in other columns or units; all or nothing is.
+TEST_F(ExportFormats, SqliteIsAddedToOnlyIfItIsTheSame) {
+  const std::string file = Path("host.db");
+  Output({"export", "vm-stats", "--format=sqlite", "-o", file, "-u", "mb", kIncident + "@10:02Z"});
+  const std::string content = FileContent(file);
+  const auto refuse = [&](const std::vector<std::string>& more, const std::string& message,
+                          const std::string& to) {
+    std::vector<std::string> args = {
+        "export", "comp-stats,vm-stats", "--format=sqlite", "--append", "-o", to, kExample};
+    args.insert(args.end(), more.begin(), more.end());
+    ExpectFailure(args, to + ": " + message);
+  };
+  refuse({}, "vm_stats has other columns or units there", file);
+  refuse({"-u", "mb", "-s", "consumed"}, "vm_stats has other columns or units there", file);
+  EXPECT_EQ(FileContent(file), content);
+  const std::string capture = FileContent(kExample);
+  WriteContent(Path("copy.ksi"), capture);
+  refuse({}, "is no database of exported rows", Path("copy.ksi"));
+  EXPECT_EQ(FileContent(Path("copy.ksi")), capture);
+  WriteContent(Path("text"), std::string(5000, 't'));
+  refuse({}, "cannot write: file is not a database", Path("text"));
+  refuse({}, "is not a regular file", "/dev/null");
+  EXPECT_EQ(directory_.Names(), (std::vector<std::string>{"copy.ksi", "host.db", "text"}));
+  // Of nothing at all nothing is added, and a part with the status that says so.
+  EXPECT_EQ(Run({"export", "vm-stats", "--format=sqlite", "--append", "-o", file, "-u", "mb",
+                 Path("text")})
+                .status,
+            1);
+  EXPECT_EQ(FileContent(file), content);
+  EXPECT_EQ(Run({"export", "vm-stats", "--format=sqlite", "--append", "-o", file, "-u", "mb",
+                 Path("text"), kIncident + "@10:03Z"})
+                .status,
+            1);
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM vm_stats"), std::vector<std::string>{"24"});
+}
+
+// What somebody put into the file is not run.
+TEST_F(ExportFormats, SqliteIsAddedToWithoutItsTriggers) {
+  const std::string file = Path("host.db");
+  Output({"export", "comp-stats", "--format=sqlite", "-o", file, kIncident + "@10:02Z"});
+  RunSql(file,
+         "CREATE TABLE seen(n); CREATE TRIGGER spy AFTER INSERT ON comp_stats BEGIN "
+         "INSERT INTO seen VALUES(1); END");
+  Output({"export", "comp-stats", "--format=sqlite", "--append", "-o", file, kExample});
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM comp_stats"), std::vector<std::string>{"2"});
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM seen"), std::vector<std::string>{"0"});
+}
+
+// Rows of one identity and time are all there.
+TEST_F(ExportFormats, SqliteKeepsTwins) {
+  const std::string host = ExampleWith(
+      "twins.ksi",
+      {{R"("value":{"name":"acpi","dynGrow")", R"("value":{"name":"twin","dynGrow")"},
+       {R"("value":{"name":"config","dynGrow")", R"("value":{"name":"twin","dynGrow")"}});
+  const std::string file = Path("host.db");
+  Output({"export", "heap-stats", "--format=sqlite", "-o", file, host, kExample});
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM heap_stats WHERE name = 'twin'"),
+            std::vector<std::string>{"2"});
+  EXPECT_EQ(Query(file, "SELECT count(*) FROM heap_stats"), std::vector<std::string>{"28"});
 }
 
 TEST_F(ExportFormats, WritesMetrics) {
@@ -408,6 +522,27 @@ TEST_F(ExportFormats, MetricsNeedLittleMemory) {
   EXPECT_GT(readings, 3);
   EXPECT_THROW(metrics(10'000), ksicache::Error);
   testing::internal::GetCapturedStdout();
+}
+
+// Text goes out while it is made, also into a file.
+TEST_F(ExportFormats, TextTakesLittleMemory) {
+  const auto mostMemory = [] {
+    rusage usage = {};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss;
+  };
+  const std::string row(1000, 'r');
+  const long before = mostMemory();
+  ksicache::NewFile file(Path("large"), false, 0600);
+  ksicache::TextOutput output(&file);
+  for (int i = 0; i < 64'000; ++i) {
+    output.Put(row);
+    output.EndRow();
+  }
+  EXPECT_EQ(directory_.Names(), std::vector<std::string>());
+  output.Finish();
+  EXPECT_LT(mostMemory() - before, 16 << 10);
+  EXPECT_EQ(std::filesystem::file_size(Path("large")), 64'000'000u);
 }
 
 // A strict parser has no complaint, with times and without.

@@ -23,7 +23,7 @@ constexpr const char* kHints =
 
 TEST_F(ExportTest, WritesCsv) {
   EXPECT_EQ(Output({"export", "pshareHint-stats", kExample}), kHints);
-  EXPECT_EQ(Output({"export", "PSHAREHINT-stats", "--format", "csv", "--unit=KB", kExample}),
+  EXPECT_EQ(Output({"export", "PSHAREHINT-stats", "--format", "CSV", "--unit=KB", kExample}),
             kHints);
 }
 
@@ -322,6 +322,119 @@ TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
   expect(Path("none@.."), "No such file or directory");
 }
 
+// The first moment on or after each multiple of the time.
+TEST_F(ExportTest, TakesAMomentOfEachInterval) {
+  const std::string file = RecordingAt(
+      "thin.rec", {"2026-11-20T23:59:59Z", "2026-11-21T10:00:00Z", "2026-11-21T10:04:59Z",
+                   "2026-11-21T10:05:01Z", "2026-11-21T10:09:59Z", "2026-11-21T10:10:00Z",
+                   "2026-11-21T10:31:00Z"});
+  const auto times = [](const std::vector<std::string>& args) {
+    std::string text;
+    for (const Row& row : Cells(Output(args))) {
+      if (row[0] != "host") text += row[1].substr(8, 11) + " ";
+    }
+    return text;
+  };
+  EXPECT_EQ(times({"export", "pshare-stats", "--every", "5m", file + "@.."}),
+            "20T23:59:59 21T10:00:00 21T10:05:01 21T10:10:00 21T10:31:00 ");
+  EXPECT_EQ(times({"export", "pshare-stats", "--every", "1d", file + "@.."}),
+            "20T23:59:59 21T10:00:00 ");
+  // Each file has intervals of its own, and a single moment is one.
+  EXPECT_EQ(times({"export", "pshare-stats", "--every", "1h", file + "@10:04Z..", file + "@10:05Z",
+                   file + "@10:09Z.."}),
+            "21T10:04:59 21T10:04:59 21T10:09:59 ");
+}
+
+// Those that are named, whatever the case and the order, and those that tell rows apart.
+TEST_F(ExportTest, TakesTheColumnsThatAreNamed) {
+  const auto header = [](const std::vector<std::string>& args) { return Lines(Output(args))[0]; };
+  EXPECT_EQ(header({"export", "vm-stats", "-s", "SWAPPED:consumed:name", kExample}),
+            "host,time,name,schedGrp,consumed,swapped");
+  EXPECT_EQ(header({"export", "group-stats", "--columns=consumed", kExample}),
+            "host,time,gid,name,consumed");
+  EXPECT_EQ(Output({"export", "comp-stats", "-s", "free:memState", "--format=json", "-u", "mb",
+                    kIncident + "@10:05Z"}),
+            R"({"host":"hypervisor.example.org","time":"2026-11-21T10:05:00Z",)"
+            R"("free":900,"memState":"Hard"})"
+            "\n");
+  // Of several reports each has those that it has.
+  const std::vector<std::string> lines =
+      Lines(Output({"export", "comp-stats,heap-stats", "-s", "used:free", kExample}));
+  EXPECT_EQ(lines[0], "host,time,report,free");
+  EXPECT_EQ(lines[3], "host,time,report,name,used");
+  // The figures are those of all columns.
+  const std::vector<Row> all = Cells(Output({"export", "vm-stats", kExample}));
+  const std::vector<Row> some = Cells(Output({"export", "vm-stats", "-s", "touched", kExample}));
+  const auto place = static_cast<size_t>(std::ranges::find(all[0], "touched") - all[0].begin());
+  ASSERT_EQ(some.size(), all.size());
+  for (size_t row = 0; row < all.size(); ++row) EXPECT_EQ(some[row].back(), all[row][place]);
+}
+
+TEST_F(ExportTest, TakesAListOfFiles) {
+  const std::string one = RecordingAt("one.rec", {"2026-11-21T10:00:00Z"});
+  const std::string odd = Path("a\nb.ksi");
+  WriteContent(odd, FileContent(kExample));
+  const auto hosts = [](const std::vector<std::string>& args, const std::string& input = "") {
+    const harness::MemoryFile standardInput(input);
+    lseek(standardInput.Descriptor(), 0, SEEK_SET);
+    harness::Program program = Command(args);
+    program.files.emplace_back(STDIN_FILENO, standardInput.Descriptor());
+    const harness::Result result = harness::RunProgram(program);
+    EXPECT_EQ(result.err, "");
+    EXPECT_EQ(result.status, 0);
+    std::string text;
+    for (const Row& row : Cells(result.out)) text += row[0] + " ";
+    return text;
+  };
+  WriteContent(Path("lines"), one + "\n\n" + kIncident + "@10:05Z\n" + one + "@..");
+  EXPECT_EQ(hosts({"export", "pshare-stats", kExample, "--files-from", Path("lines")}),
+            "host hypervisor.example.org h hypervisor.example.org h ");
+  EXPECT_EQ(hosts({"export", "pshare-stats", "--files-from=-"},
+                  one + std::string(1, '\0') + odd + std::string(1, '\0')),
+            "host h hypervisor.example.org ");
+  // No file is not this host.
+  WriteContent(Path("none"), "\n");
+  ExpectFailure({"export", "pshare-stats", "--files-from", Path("none")},
+                Path("none") + ": names no file");
+  ExpectFailure({"export", "pshare-stats", "--files-from", Path("missing")},
+                Path("missing") + ": No such file or directory");
+}
+
+// Of a recording that is damaged somewhere the other chunks are exported.
+TEST_F(ExportTest, ExportsWhatIsNotDamagedOfARecording) {
+  std::vector<std::string> times;
+  for (int minute = 10; minute < 19; ++minute) {
+    times.push_back("2026-11-21T10:" + std::to_string(minute) + ":00Z");
+  }
+  const std::string file = RecordingAt("whole.rec", times, 3);
+  const std::string all = Output({"export", "pshare-stats", "-u", "pg", "-s", "cow", file + "@.."});
+  const std::vector<std::string> lines = Lines(all);
+  ASSERT_EQ(lines.size(), 10u);
+  const std::string damaged = Path("damaged.rec");
+  for (size_t chunk = 0; chunk < 3; ++chunk) {
+    SCOPED_TRACE(chunk);
+    WriteContent(damaged, FileContent(file));
+    RunSql(damaged,
+           "UPDATE block SET data = substr(data, 1, 10) || zeroblob(length(data) - 10) WHERE id = "
+           "(SELECT block FROM part WHERE number = " +
+               std::to_string(3 * chunk) + " AND moments = 3)");
+    const harness::Result result =
+        Run({"export", "pshare-stats", "-u", "pg", "-s", "cow", damaged + "@.."});
+    EXPECT_EQ(result.status, 1);
+    std::string rest;
+    for (size_t i = 0; i < lines.size(); ++i) {
+      if (i == 0 || (i - 1) / 3 != chunk) rest += lines[i] + "\n";
+    }
+    EXPECT_EQ(result.out, rest);
+    EXPECT_EQ(result.err, "ksicache: " + damaged + "@..: " + damaged + "@first: the part of " +
+                              times[3 * chunk] + " is damaged\nksicache: " + damaged +
+                              "@..: moments are missing: 0xbad0008 Metadata read error\n");
+    // Nothing is wrong with what was not asked for.
+  }
+  // Nothing is missing of what lies before it.
+  EXPECT_EQ(Cells(Output({"export", "pshare-stats", damaged + "@10:10Z..10:14Z"})).size(), 6u);
+}
+
 // What is wrong with one file is said, and the others have their turn.
 TEST_F(ExportTest, GoesOnAfterABrokenFile) {
   WriteContent(Path("broken.ksi"), FileContent(kExample).substr(0, 20'000));
@@ -456,6 +569,52 @@ TEST_F(ExportTest, MakesAFile) {
   EXPECT_EQ(directory_.Names(), std::vector<std::string>{"out.csv"});
 }
 
+// The file is there as soon as there was a moment, whatever of it is missing, and replaces what
+// stood there only then, in whatever format.
+TEST_F(ExportTest, ReplacesAFileByWhatCouldBeRead) {
+  WriteContent(Path("text"), "no cache file");
+  WriteContent(Path("less.json"), JsonWith(""));
+  Output({"load", Path("less.json"), Path("less.ksi")});
+  for (const std::string format : {"csv", "json", "sqlite", "openmetrics", "prometheus"}) {
+    SCOPED_TRACE(format);
+    WriteContent(Path("out"), "old");
+    const auto run = [&](const std::vector<std::string>& files) {
+      std::vector<std::string> args = {
+          "export", "comp-stats,vm-stats", "--format", format, "--force", "-o", Path("out")};
+      args.insert(args.end(), files.begin(), files.end());
+      EXPECT_EQ(Run(args).status, 1);
+      return FileContent(Path("out"));
+    };
+    EXPECT_EQ(run({Path("text"), Path("none")}), "old");
+    EXPECT_NE(run({Path("text"), Path("less.ksi")}), "old");
+    const std::string part = run({Path("text"), kExample});
+    Output({"export", "comp-stats,vm-stats", "--format", format, "--force", "-o", Path("out"),
+            kExample});
+    EXPECT_EQ(FileContent(Path("out")), part);
+  }
+}
+
+#ifndef TALLY_SANITIZED
+// A file is written as it is made, also where there are no unnamed ones beside it.
+TEST_F(ExportTest, WritesAFilePieceByPiece) {
+  const std::vector<std::string> args = {"export", "all", "--format=json", kIncident + "@.."};
+  const std::string rows = Output(args);
+  ASSERT_GT(rows.size(), 300'000u);
+  for (const std::string refused : {"", "openat", "linkat"}) {
+    SCOPED_TRACE(refused);
+    harness::Program program = Command(args);
+    program.args.insert(program.args.end(), {"-o", Path("out.json")});
+    program.environment.emplace_back("LD_PRELOAD=" KSICACHE_WITHOUT_UNNAMED_FILES);
+    program.environment.push_back("REFUSED=" + refused);
+    const harness::Result made = harness::RunProgram(program);
+    EXPECT_EQ(made.status, 0) << made.err;
+    EXPECT_EQ(FileContent(Path("out.json")), rows);
+    EXPECT_EQ(directory_.Names(), std::vector<std::string>{"out.json"});
+    unlink(Path("out.json").c_str());
+  }
+}
+#endif
+
 // No file is lost because it was taken for the output, by whatever name.
 TEST_F(ExportTest, ReplacesNoneOfItsInputs) {
   const std::string file = RecordingAt("own.rec", {"2026-11-21T10:00:00Z", "2026-11-21T10:01:00Z"});
@@ -482,20 +641,38 @@ TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
   ExpectFailure({"export"},
                 "not as in:\nUsage: ksicache export REPORT[,REPORT...]|all "
                 "[FILE[@WHEN|@FROM..TO]...]\n                       [--format FORMAT] "
-                "[--unit UNIT] [--output OUT]\n                       [--cluster NAME] [--force] "
-                "[--mode MODE]",
+                "[--unit UNIT] [--columns NAMES]\n                       [--every TIME] "
+                "[--files-from LIST] [--output OUT]\n                       [--append] [--force] "
+                "[--mode MODE] [--cluster NAME]",
                 2);
   ExpectFailure({"export", "vm-stats,vm-stats"}, "vm-stats is named twice", 2);
-  ExpectFailure({"export", "vm-stats,", kExample},
-                "there is no report : there are group-stats, vm-stats, uw-stats, pshare-stats, "
-                "pshareHint-stats, swap-stats, buddy-stats, comp-stats, lpool-stats, heap-stats, "
-                "guest-stats, zip-stats, lpage-stats, asyncremap-stats and pmem-stats, or all "
-                "of these, or moments",
-                2);
-  ExpectFailure({"export", "all", "--format=xml"},
-                "there is no format xml: there are csv, json, sqlite, openmetrics, "
-                "prometheus and clickhouse-schema",
-                2);
+  const harness::Result report = Run({"export", "vm-stats,", kExample});
+  EXPECT_EQ(report.status, 2);
+  EXPECT_EQ(report.err,
+            "ksicache: there is no report \n"
+            "There are group-stats, vm-stats, uw-stats, pshare-stats, pshareHint-stats,\n"
+            "swap-stats, buddy-stats, comp-stats, lpool-stats, heap-stats, guest-stats,\n"
+            "zip-stats, lpage-stats, asyncremap-stats, pmem-stats, all, moments\n");
+  const harness::Result format = Run({"export", "all", "--format=xml"});
+  EXPECT_EQ(format.status, 2);
+  EXPECT_EQ(format.err,
+            "ksicache: there is no format xml\n"
+            "There are csv, json, sqlite, openmetrics, prometheus, clickhouse-schema\n");
+  ExpectFailure({"export", "vm-stats,heap-stats", "-s", "used:free", kExample},
+                "no report that is exported has a column free", 2);
+  ExpectFailure({"export", "all", "-s", "::", kExample}, "--columns takes NAME[:NAME...]", 2);
+  ExpectFailure({"export", "all", "--every", "5m", kIncident + "@last"},
+                "--every is for FILE@FROM..TO", 2);
+  ExpectFailure({"export", "all", "--every", "5", "x@..", "--every=often"},
+                "--every takes a time such as 5s, 10m, 6h or 7d: often", 2);
+  ExpectFailure({"export", "all", "--append", "-o", Path("out.csv")},
+                "--append is for the format sqlite", 2);
+  ExpectFailure({"export", "all", "--append", "--format=sqlite"},
+                "--append takes a file: --output OUT", 2);
+  ExpectFailure({"export", "all", "--append", "--format=sqlite", "-o", "-"},
+                "--append takes a file: --output OUT", 2);
+  ExpectFailure({"export", "all", "--append", "--format=sqlite", "-o", Path("a"), "--force"},
+                "--append replaces nothing, and takes no --force", 2);
   ExpectFailure({"export", "all", "-u", "gb"}, "--unit is mb, kb, pg or b", 2);
   ExpectFailure({"export", "all", "--force"}, "--force is for a file, not standard output", 2);
   ExpectFailure({"export", "all", "-o", "-", "--mode=0644"},

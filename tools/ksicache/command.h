@@ -51,6 +51,8 @@ struct Command {
 // The options that more than one command takes.
 inline constexpr Option kForce = {"force", nullptr, "replace FILE if it exists"};
 inline constexpr Option kJson = {"json", nullptr, "print JSON"};
+inline constexpr Option kEvery = {"every", "TIME",
+                                  "take a moment each TIME; record alone does each 5s"};
 inline constexpr Option kUnit = {"unit", "UNIT", "show memory in mb, kb, pg (4 KB pages) or b",
                                  'u'};
 

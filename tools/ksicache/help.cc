@@ -22,6 +22,8 @@ wrong, 2 if the command line is wrong, 3 if diff found more than --fail-above.
 // What a usage stands behind.
 constexpr std::string_view kUsage = "Usage: ";
 
+constexpr size_t kWidth = 80;
+
 constexpr Option kHelpOption = {"help", nullptr, "show this message", 'h'};
 constexpr Option kVersionOption = {"version", nullptr, "show the version"};
 
@@ -75,7 +77,6 @@ std::string CommandList() {
 }  // namespace
 
 std::string UsageOf(const Command& command) {
-  constexpr size_t kWidth = 80;
   const std::string start = std::string("ksicache ") + command.name;
   std::string usage = start + " " + command.arguments;
   size_t width = kUsage.size() + usage.size();
@@ -90,6 +91,21 @@ std::string UsageOf(const Command& command) {
     usage += word;
   }
   return usage;
+}
+
+std::string ListOf(std::string_view start, std::span<const std::string_view> words) {
+  std::string list(start);
+  size_t width = start.size();
+  for (const std::string_view word : words) {
+    width += word.size() + 2;
+    if (width > kWidth) {
+      list.back() = '\n';
+      width = word.size() + 2;
+    }
+    list.append(word).append(", ");
+  }
+  list.replace(list.size() - 2, 2, "\n");
+  return list;
 }
 
 std::string Help() {

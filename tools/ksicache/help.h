@@ -2,7 +2,9 @@
 #ifndef TOOLS_KSICACHE_HELP_H_
 #define TOOLS_KSICACHE_HELP_H_
 
+#include <span>
 #include <string>
+#include <string_view>
 
 #include "tools/ksicache/command.h"
 
@@ -10,6 +12,9 @@ namespace ksicache {
 
 // "ksicache load JSON FILE [--force]", in as many lines as it takes behind "Usage: ".
 std::string UsageOf(const Command& command);
+
+// Words on lines of 80 characters, for a UsageError: "There are csv, json and so on".
+std::string ListOf(std::string_view start, std::span<const std::string_view> words);
 
 // What --help says, alone and after a command.
 std::string Help();

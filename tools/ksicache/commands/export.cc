@@ -1,54 +1,52 @@
 // export: the rows of reports for programs.
+#include <unistd.h>
+
 #include <algorithm>
+#include <cstdint>
 #include <memory>
 #include <optional>
-#include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "framework/name_list.h"
 #include "reports/reports.h"
 #include "tools/ksicache/commands/commands.h"
-#include "tools/ksicache/complaints.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/export/exporter.h"
 #include "tools/ksicache/export/formats.h"
 #include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/file_list.h"
+#include "tools/ksicache/help.h"
 #include "tools/ksicache/moment_report.h"
 #include "tools/ksicache/named_span.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
-#include "tools/ksicache/output.h"
-#include "tools/ksicache/report_run.h"
+#include "tools/ksicache/quantity.h"
 
 namespace ksicache {
 namespace {
 
 constexpr Option kFormat = {"format", "FORMAT", "write another format than csv"};
 constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
+constexpr Option kAppend = {"append", nullptr, "add to the database OUT what it has not"};
+constexpr Option kColumns = {"columns", "NAMES",
+                             "only these, such as used:free, and what rows are of", 's'};
+constexpr Option kFilesFrom = {"files-from", "LIST", "take also the files that LIST names"};
 constexpr Option kCluster = {"cluster", "NAME", "have tables over all servers of this cluster"};
-constexpr const Option* kOptions[] = {&kFormat, &kUnit, &kOutput, &kCluster, &kForce, &kMode};
+constexpr const Option* kOptions[] = {&kFormat, &kUnit,   &kColumns, &kEvery, &kFilesFrom,
+                                      &kOutput, &kAppend, &kForce,   &kMode,  &kCluster};
 
 using Reports = std::vector<const tally::Report*>;
-
-// "group-stats, vm-stats and pmem-stats"
-std::string ReportNames() {
-  std::string names;
-  const auto reports = tally::Reports();
-  for (const tally::Report* report : reports) {
-    if (!names.empty()) names += report == reports.back() ? " and " : ", ";
-    names += report->name;
-  }
-  return names;
-}
 
 const tally::Report* ReportCalled(const std::string& name) {
   if (tally::SameName(name, kMomentReport.name)) return &kMomentReport;
   const tally::Report* report = tally::FindReport(name.c_str());
-  if (report == nullptr) {
-    throw UsageError("there is no report " + name + ": there are " + ReportNames() +
-                     ", or all of these, or moments");
-  }
-  return report;
+  if (report != nullptr) return report;
+  std::vector<std::string_view> names;
+  for (const tally::Report* each : tally::Reports()) names.emplace_back(each->name);
+  names.insert(names.end(), {"all", kMomentReport.name});
+  throw UsageError("there is no report " + name, ListOf("There are ", names));
 }
 
 // Of "vm-stats,heap-stats".
@@ -72,11 +70,12 @@ Reports ReportsOf(const std::string& names) {
 const FormatInfo& FormatOf(const CommandLine& line) {
   const std::string* name = line.ValueOf(kFormat);
   if (name == nullptr) return kFormats[0];
+  std::vector<std::string_view> names;
   for (const FormatInfo& format : kFormats) {
-    if (*name == format.name) return format;
+    if (tally::SameName(*name, format.name)) return format;
+    names.emplace_back(format.name);
   }
-  throw UsageError("there is no format " + *name +
-                   ": there are csv, json, sqlite, openmetrics, prometheus and clickhouse-schema");
+  throw UsageError("there is no format " + *name, ListOf("There are ", names));
 }
 
 // None: that of each report.
@@ -105,6 +104,16 @@ std::optional<NewFile> FileOf(const CommandLine& line, const FormatInfo& format)
   return std::make_optional<NewFile>(*name, line.Has(kForce), ModeOf(line));
 }
 
+// The database to add to; empty: there is none yet, or it is not asked for.
+std::string DatabaseOf(const CommandLine& line, const FormatInfo& format) {
+  if (!line.Has(kAppend)) return "";
+  if (!format.isDatabase) throw UsageError("--append is for the format sqlite");
+  if (line.Has(kForce)) throw UsageError("--append replaces nothing, and takes no --force");
+  const std::string* name = line.ValueOf(kOutput);
+  if (name == nullptr || *name == "-") throw UsageError("--append takes a file: --output OUT");
+  return access(name->c_str(), F_OK) == 0 ? *name : "";
+}
+
 // None if the option is not there.
 std::string ClusterOf(const CommandLine& line, const FormatInfo& format) {
   const std::string* name = line.ValueOf(kCluster);
@@ -114,93 +123,66 @@ std::string ClusterOf(const CommandLine& line, const FormatInfo& format) {
   return name == nullptr ? "" : *name;
 }
 
-// Puts reports into a format, of one file after the other.
-class Exporter {
- public:
-  Exporter(const FormatInfo& info, RowFormat& format, std::optional<tally::DisplayUnit> unit)
-      : isByReport_(info.isByReport), format_(format), sink_(format, unit) {}
-
-  // No files: this host.
-  void Export(std::span<const tally::Report* const> reports, std::span<const std::string> files) {
-    if (!isByReport_) return ExportTogether(reports, files);
-    for (size_t i = 0; i < reports.size(); ++i) ExportTogether(reports.subspan(i, 1), files);
-  }
-
-  // What the reports have, without their rows.
-  void Describe(std::span<const tally::Report* const> reports) {
-    hasBegun_ = true;
-    for (const tally::Report* report : reports) sink_.Expect(*report, {});
-  }
-
-  // Whether nothing was left out.
-  bool IsWhole() const { return complaints_.IsEmpty(); }
-
-  // Whether there is anything at all, be it only that there are no rows.
-  bool HasBegun() const { return hasBegun_; }
-
- private:
-  void ExportTogether(std::span<const tally::Report* const> reports,
-                      std::span<const std::string> files) {
-    do {
-      if (files.empty()) ExportMoment(reports, LiveOrigin());
-      for (const std::string& name : files) ExportFile(reports, name);
-    } while (format_.EndReports());
-  }
-
-  void ExportFile(std::span<const tally::Report* const> reports, const std::string& name) {
-    complaints_.BeginFile(name);
-    Saying(
-        [&] { ForEachMoment(name, [&](const Origin& origin) { ExportMoment(reports, origin); }); });
-  }
-
-  void ExportMoment(std::span<const tally::Report* const> reports, const Origin& origin) {
-    for (const tally::Report* report : reports) {
-      hasBegun_ = true;
-      sink_.Expect(*report, origin);
-      Saying([&] { RunReport(*report, sink_); });
-      const std::string lost = sink_.TakeComplaint();
-      if (!lost.empty()) complaints_.Say(report->name + (": " + lost));
+// The names of --columns; none if it is not there.
+std::vector<std::string_view> WantedColumns(const CommandLine& line, const Reports& reports) {
+  std::vector<std::string_view> columns;
+  const std::string* list = line.ValueOf(kColumns);
+  if (list == nullptr) return columns;
+  tally::NameReader names(*list);
+  for (std::string_view name; names.Next(name);) {
+    const bool isThere = std::ranges::any_of(reports, [&](const tally::Report* report) {
+      return std::ranges::any_of(ColumnsOf(*report), [&](const tally::ColumnInfo& column) {
+        return tally::SameName(column.desc.name, name);
+      });
+    });
+    if (!isThere) {
+      throw UsageError("no report that is exported has a column " + std::string(name));
     }
+    columns.push_back(name);
   }
+  if (columns.empty()) throw UsageError("--columns takes NAME[:NAME...]");
+  return columns;
+}
 
-  // Goes on after what cannot be read.
-  template <class Action>
-  void Saying(Action&& action) {
-    std::string error;
-    try {
-      action();
-    } catch (const DataError& caught) {
-      error = caught.what();
-    }
-    complaints_.SayDiagnostics();
-    if (!error.empty()) complaints_.Say(error);
+std::vector<std::string> FilesOf(const CommandLine& line) {
+  std::vector<std::string> files(line.arguments.begin() + 1, line.arguments.end());
+  if (const std::string* list = line.ValueOf(kFilesFrom)) {
+    const std::vector<std::string> names = NamesIn(*list);
+    files.insert(files.end(), names.begin(), names.end());
   }
+  return files;
+}
 
-  bool isByReport_;
-  RowFormat& format_;
-  RowSink sink_;
-  Complaints complaints_;
-  bool hasBegun_ = false;
-};
+// Fails with a UsageError where options and files do not go together.
+void CheckFiles(const CommandLine& line, const FormatInfo& format,
+                const std::vector<std::string>& files, bool hasSpans) {
+  if (format.isSchema && !files.empty()) {
+    throw UsageError(std::string(format.name) + " is the same for all files, and takes none");
+  }
+  if (line.Has(kEvery) && !hasSpans) throw UsageError("--every is for FILE@FROM..TO");
+}
 
 int Export(const CommandLine& line) {
   const Reports reports = ReportsOf(line.arguments[0]);
   const FormatInfo& info = FormatOf(line);
   const std::optional<tally::DisplayUnit> unit = UnitOf(line, info);
-  std::optional<NewFile> file = FileOf(line, info);
-  const std::span<const std::string> files = std::span(line.arguments).subspan(1);
-  if (info.isSchema && !files.empty()) {
-    throw UsageError(std::string(info.name) + " is the same for all files, and takes none");
-  }
+  const std::vector<std::string_view> columns = WantedColumns(line, reports);
+  const int64_t every = DurationOf(line, kEvery, 0);
+  const std::string database = DatabaseOf(line, info);
+  std::optional<NewFile> file = database.empty() ? FileOf(line, info) : std::nullopt;
+  const std::vector<std::string> files = FilesOf(line);
+  const bool hasSpans = std::ranges::any_of(files, IsSpan);
+  CheckFiles(line, info, files, hasSpans);
   for (const std::string& name : files) {
     if (file) file->RefuseInput(FileNameOf(name));
   }
-  const std::unique_ptr<RowFormat> format =
-      info.make({.file = file ? &*file : nullptr,
-                 .hasManyReports = reports.size() > 1,
-                 .hasSpans = std::ranges::any_of(files, IsSpan),
-                 .cluster = ClusterOf(line, info)});
-  Exporter exporter(info, *format, unit);
+  const std::unique_ptr<RowFormat> format = info.make({.file = file ? &*file : nullptr,
+                                                       .hasManyReports = reports.size() > 1,
+                                                       .hasSpans = hasSpans,
+                                                       .cluster = ClusterOf(line, info),
+                                                       .database = database});
+  RowSink sink(*format, unit, columns);
+  Exporter exporter(info, *format, sink, every);
   info.isSchema ? exporter.Describe(reports) : exporter.Export(reports, files);
   if (exporter.HasBegun()) format->Finish();
   return exporter.IsWhole() ? 0 : 1;
@@ -213,10 +195,11 @@ const Command kExport = {
     .arguments = "REPORT[,REPORT...]|all [FILE[@WHEN|@FROM..TO]...]",
     .summary = "write the rows of reports for programs",
     .help = R"(Writes the rows of reports of tally, or of all fifteen, without their totals: of
-each FILE, of all moments of a recording from FROM to TO, or of this host. The
-columns are host, time, report where there are several, and those of the report
-under their names. A figure without a value is an empty field, or null. Formats
-are csv, json, sqlite, openmetrics, prometheus and clickhouse-schema.
+each FILE, of all moments of a recording from FROM to TO, of which --every takes
+one in each TIME, or of this host. The columns are host, time, report where
+there are several, and those of the report under their names. A figure without a
+value is an empty field, or null. Formats are csv, json, sqlite, openmetrics,
+prometheus and clickhouse-schema.
 )",
     .options = kOptions,
     .fewest = 1,

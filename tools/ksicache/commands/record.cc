@@ -31,7 +31,6 @@
 namespace ksicache {
 namespace {
 
-constexpr Option kEvery = {"every", "TIME", "take a moment each TIME instead of 5s"};
 constexpr Option kKeep = {"keep", "TIME", "keep moments for TIME instead of 7d"};
 constexpr Option kMaxSize = {"max-size", "SIZE", "let FILE grow to SIZE instead of 2G"};
 constexpr Option kCount = {"count", "N", "end after N moments"};

@@ -18,6 +18,7 @@ struct FormatOptions {
   bool hasSpans;                         // so that hosts have rows of several times
   size_t mostBytes = size_t{192} << 20;  // of rows that are kept to be put in order
   std::string cluster = {};              // of a schema
+  std::string database = {};             // to add to, instead of making a file
 };
 
 struct FormatInfo {
@@ -26,6 +27,7 @@ struct FormatInfo {
   bool needsFile;      // it is nothing to print
   bool isByReport;     // a report's rows of all moments stand together
   bool isSchema;       // it has no rows
+  bool isDatabase;     // a file of it can be added to
   std::unique_ptr<RowFormat> (*make)(const FormatOptions& options);
 };
 
@@ -38,12 +40,12 @@ std::unique_ptr<RowFormat> MakeClickHouseSchema(const FormatOptions& options);
 
 // The first one is taken if none is named.
 inline constexpr FormatInfo kFormats[] = {
-    {"csv", false, false, true, false, MakeCsv},
-    {"json", false, false, false, false, MakeJson},
-    {"sqlite", false, true, false, false, MakeSqlite},
-    {"openmetrics", true, false, true, false, MakeOpenMetrics},
-    {"prometheus", true, false, true, false, MakePrometheus},
-    {"clickhouse-schema", false, false, true, true, MakeClickHouseSchema},
+    {"csv", false, false, true, false, false, MakeCsv},
+    {"json", false, false, false, false, false, MakeJson},
+    {"sqlite", false, true, false, false, true, MakeSqlite},
+    {"openmetrics", true, false, true, false, false, MakeOpenMetrics},
+    {"prometheus", true, false, true, false, false, MakePrometheus},
+    {"clickhouse-schema", false, false, true, true, false, MakeClickHouseSchema},
 };
 
 }  // namespace ksicache

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "framework/name_list.h"
 #include "tools/ksicache/export/escaped_text.h"
 
 namespace ksicache {
@@ -60,19 +61,28 @@ void RowSink::TakeColumns(const tally::Report& report) {
   shown_ = unit_.value_or(report.frame->allowBytes ? DisplayUnit::b : DisplayUnit::kb);
   places_.clear();
   columns_.clear();
-  for (const tally::ColumnInfo& column : ColumnsOf(report)) {
+  const std::span<const tally::ColumnInfo> all = ColumnsOf(report);
+  for (size_t cell = 0; cell < all.size(); ++cell) {
+    const tally::ColumnInfo& column = all[cell];
+    if (!IsWanted(column)) continue;
     const auto& [desc, figure] = column;
     const int shift = figure.toUnit == nullptr ? 0 : BitsOf(figure.kind) - BitsOf(shown_);
-    places_.push_back({figure, desc.conversion[0] == 'L', shift});
+    places_.push_back({figure, cell, desc.conversion[0] == 'L', shift});
     columns_.push_back(RowColumnOf(column, shown_));
   }
   values_.resize(columns_.size());
 }
 
+bool RowSink::IsWanted(const tally::ColumnInfo& column) const {
+  if (wanted_.empty() || column.figure.isKey) return true;
+  return std::ranges::any_of(
+      wanted_, [&](std::string_view name) { return tally::SameName(name, column.desc.name); });
+}
+
 void RowSink::Row(tally::RowKind kind, std::span<const tally::Cell> cells) {
   if (kind != tally::RowKind::item && kind != tally::RowKind::counted) return;
   escaped_.clear();
-  for (size_t i = 0; i < cells.size(); ++i) values_[i] = ValueOf(i, cells[i]);
+  for (size_t i = 0; i < places_.size(); ++i) values_[i] = ValueOf(i, cells[places_[i].cell]);
   format_.Row(values_);
 }
 
@@ -92,7 +102,7 @@ Value RowSink::ValueOf(size_t place, const tally::Cell& cell) {
 
 // Nothing is cut or wraps on the way to the unit.
 Value RowSink::NumberOf(size_t place, uint64_t number) {
-  const auto& [figure, isWide, shift] = places_[place];
+  const auto& [figure, cell, isWide, shift] = places_[place];
   if (!isWide) {
     number = figure.isSigned ? static_cast<uint64_t>(static_cast<int32_t>(number))
                              : static_cast<uint32_t>(number);

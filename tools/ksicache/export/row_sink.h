@@ -7,6 +7,8 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
 #include "framework/report.h"
@@ -25,9 +27,11 @@ RowColumn RowColumnOf(const tally::ColumnInfo& column, tally::DisplayUnit unit);
 // descriptions. Texts are as Escaped makes them, so that all of them are UTF-8.
 class RowSink : public tally::Sink {
  public:
-  // Memory is in `unit`; none: in that of the report.
-  RowSink(RowFormat& format, std::optional<tally::DisplayUnit> unit)
-      : format_(format), unit_(unit) {}
+  // Memory is in `unit`; none: in that of the report. `columns`: the names of those to give,
+  // whatever the case, beside those that tell rows apart; none: all.
+  RowSink(RowFormat& format, std::optional<tally::DisplayUnit> unit,
+          std::vector<std::string_view> columns = {})
+      : format_(format), unit_(unit), wanted_(std::move(columns)) {}
 
   // What the next run is of. The format begins with its columns, even if no row follows.
   void Expect(const tally::Report& report, const Origin& origin);
@@ -45,17 +49,20 @@ class RowSink : public tally::Sink {
   // How the cells of a column become values.
   struct Place {
     tally::Figure figure;
+    size_t cell;  // its place in the row
     bool isWide;  // it is shown in 64 bits
     int shift;    // from the kernel's measure to the unit, to the left
   };
 
   void TakeColumns(const tally::Report& report);
+  bool IsWanted(const tally::ColumnInfo& column) const;
   Value ValueOf(size_t place, const tally::Cell& cell);
   Value NumberOf(size_t place, uint64_t number);
   std::string_view TextOf(std::string_view text);
 
   RowFormat& format_;
   std::optional<tally::DisplayUnit> unit_;
+  std::vector<std::string_view> wanted_;
   const tally::Report* report_ = nullptr;
   tally::DisplayUnit shown_ = tally::DisplayUnit::kb;
   std::vector<Place> places_;
