@@ -21,13 +21,6 @@ constexpr int64_t kMachinesGroup = 2;
 constexpr int64_t kFirstMachine = 100;
 constexpr int64_t kFirstProcess = 1000;
 
-template <class Record>
-std::span<const std::byte> BytesOf(const Record& record) {
-  return std::as_bytes(std::span(&record, 1));
-}
-
-Keys KeysOf(int64_t number) { return {{{KeyKind::kNumber, number, {}}}, 1}; }
-
 double Between(double least, double most, std::mt19937_64& random) {
   return std::uniform_real_distribution<double>(least, most)(random);
 }
@@ -139,20 +132,15 @@ void LeakHost::AddGroup(int64_t id, const std::string& name, int64_t parent, uin
   KSI_GroupMemoryStats stats = {};
   stats.consumed = consumed;
   stats.ovhd = overhead;
-  const auto add = [&](uint16_t node, const auto& record) {
-    builder_.AddValue(*FindNode(node), KeysOf(id), BytesOf(record));
-  };
-  add(node::sched_groups_groupName, nameRecord);
-  add(node::sched_groups_groupTag, KSI_GroupTag{});
-  add(node::sched_groups_parentGroupID, parent);
-  add(node::sched_groups_groupFlags, flags);
-  add(node::sched_groups_groupLeaderID, static_cast<int32_t>(id));
-  add(node::sched_groups_memAllocationInKB, KSI_GroupAllocation{0, -1, 0, -1, {}});
-  add(node::sched_groups_stats_capacity, KSI_GroupCapacity{});
-  add(node::sched_groups_stats_memoryStats, stats);
-  std::vector<Key> list;
-  for (const int64_t child : children) list.push_back({KeyKind::kNumber, child, {}});
-  builder_.AddList(*FindNode(node::sched_groups_members_groups), KeysOf(id), list);
+  made_.Value("sched/groups/groupName", nameRecord, id);
+  made_.Value("sched/groups/groupTag", KSI_GroupTag{}, id);
+  made_.Value("sched/groups/parentGroupID", parent, id);
+  made_.Value("sched/groups/groupFlags", flags, id);
+  made_.Value("sched/groups/groupLeaderID", static_cast<int32_t>(id), id);
+  made_.Value("sched/groups/memAllocationInKB", KSI_GroupAllocation{0, -1, 0, -1, {}}, id);
+  made_.Value("sched/groups/stats/capacity", KSI_GroupCapacity{}, id);
+  made_.Value("sched/groups/stats/memoryStats", stats, id);
+  made_.List("sched/groups/members/groups", children, id);
 }
 
 void LeakHost::AddMachines() {
@@ -170,11 +158,9 @@ void LeakHost::AddMachines() {
     all += consumed;
     AddGroup(id, Numbered("vm", i), kMachinesGroup, KSI_GROUP_VM, consumed, overhead, {id + 1});
     AddGroup(id + 1, "vmm", id, KSI_GROUP_LEAF | KSI_GROUP_VMM_SUB_CONTAINER, consumed, 0, {});
-    const Keys client = KeysOf(id);
-    builder_.AddValue(*FindNode(node::sched_memClients_tally_vmm), client, BytesOf(tally));
-    builder_.AddValue(*FindNode(node::sched_memClients_swapInfo), client, BytesOf(KSI_SwapInfo{}));
-    builder_.AddValue(*FindNode(node::worldGroups_vmmLeaderID), client,
-                      BytesOf(static_cast<int32_t>(id)));
+    made_.Value("sched/memClients/tally/vmm", tally, id);
+    made_.Value("sched/memClients/swapInfo", KSI_SwapInfo{}, id);
+    made_.Value("worldGroups/vmmLeaderID", static_cast<int32_t>(id), id);
   }
   AddGroup(kMachinesGroup, "machines", kRoot, KSI_GROUP_PREDEFINED, all, 0, machines);
   consumed_ += all;
@@ -192,49 +178,41 @@ void LeakHost::AddProcesses() {
     all += tally.mapped;
     AddGroup(id, Numbered("process", i), kServices, KSI_GROUP_LEAF | KSI_GROUP_USER_WORLD,
              tally.mapped, Now(tables_[i]), {});
-    builder_.AddValue(*FindNode(node::sched_memClients_tally_uw), KeysOf(id), BytesOf(tally));
+    made_.Value("sched/memClients/tally/uw", tally, id);
   }
   AddGroup(kServices, "services", kRoot, KSI_GROUP_PREDEFINED, all, 0, processes);
   consumed_ += all;
 }
 
 void LeakHost::AddHost() {
-  const auto add = [this](uint16_t node, const Keys& keys, const auto& record) {
-    builder_.AddValue(*FindNode(node), keys, BytesOf(record));
-  };
-  const auto text = [](const std::string& name) { return Key{KeyKind::kText, 0, name}; };
   std::vector<std::string> names;
-  std::vector<Key> list;
-  for (size_t i = 0; i < kHeaps; ++i) names.push_back(Numbered("heap", i));
   for (size_t i = 0; i < kHeaps; ++i) {
-    list.push_back(text(names[i]));
+    const std::string& name = names.emplace_back(Numbered("heap", i));
     KSI_HeapStats heap = {};
-    PutText(names[i], heap.name);
+    PutText(name, heap.name);
     heap.max = 2U << 30;
     heap.size = 1U << 30;
     heap.avail = heap.size - static_cast<uint32_t>(Now(heaps_[i])) * 1024;
-    add(node::system_heaps_stats, {{text(names[i])}, 1}, heap);
+    made_.Value("system/heaps/stats", heap, name);
   }
-  builder_.AddList(*FindNode(node::system_heaps), {}, list);
+  made_.List("system/heaps", names);
 
   KSI_MemInfo info = {};
   info.numNodes = 1;
-  add(node::memory_memInfo, {}, info);
-  add(node::sched_globalStats_numVMs, {}, uint32_t{kMachines});
-  add(node::memory_lpage_nodeList_psharePool, KeysOf(0), KSI_LargePagePool{});
-  list.clear();
+  made_.Value("memory/memInfo", info);
+  made_.Value("sched/globalStats/numVMs", uint32_t{kMachines});
+  constexpr int64_t kNode = 0;
+  made_.Value("memory/lpage/nodeList/psharePool", KSI_LargePagePool{}, kNode);
   names.clear();
-  for (size_t i = 0; i < kPools; ++i) names.push_back(Numbered("huge", i));
   for (size_t i = 0; i < kPools; ++i) {
-    list.push_back(text(names[i]));
     KSI_LargePagePool pool = {};
     pool.nrLPages = 4096;
     pool.nrFreeSPages = pool.nrLPages * 512 - static_cast<uint32_t>(Now(pools_[i]) / 4);
-    add(node::memory_lpage_nodeList_vmPools, {{{KeyKind::kNumber, 0, {}}, text(names[i])}, 2},
-        pool);
+    made_.Value("memory/lpage/nodeList/vmPools", pool, kNode,
+                names.emplace_back(Numbered("huge", i)));
   }
-  builder_.AddList(*FindNode(node::memory_lpage_nodeList_vmPools), KeysOf(0), list);
-  add(node::memory_pshare_stats, {}, KSI_PshareStats{});
+  made_.List("memory/lpage/nodeList/vmPools", names, kNode);
+  made_.Value("memory/pshare/stats", KSI_PshareStats{});
 
   KSI_Comprehensive memory = {};
   memory.total = memory.managedByMemMap = kTotal;
@@ -242,11 +220,10 @@ void LeakHost::AddHost() {
   memory.knvClientConsumed = Now(caches_);
   memory.otherConsumed = consumed_;
   memory.free = kTotal - memory.dataAndHeap - memory.knvClientConsumed - memory.otherConsumed;
-  add(node::memory_comprehensive, {}, memory);
-  add(node::sched_globalStats_memory_tally, {}, KSI_GlobalTally{});
+  made_.Value("memory/comprehensive", memory);
+  made_.Value("sched/globalStats/memory/tally", KSI_GlobalTally{});
   for (const std::string_view state : kMemoryStates) {
-    add(node::sched_globalStats_memory_stateTransitions, {{{KeyKind::kText, 0, state}}, 1},
-        KSI_StateTransitions{});
+    made_.Value("sched/globalStats/memory/stateTransitions", KSI_StateTransitions{}, state);
   }
 }
 

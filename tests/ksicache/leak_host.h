@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "knvlibs/recording/moment.h"
+#include "tests/harness/made_host.h"
 #include "tools/ksicache/moment_builder.h"
 
 namespace ksi {
@@ -48,6 +49,8 @@ class LeakHost {
 
   // A recording of so many moments over two days.
   LeakHost(uint32_t seed, size_t count);
+  LeakHost(const LeakHost&) = delete;
+  LeakHost& operator=(const LeakHost&) = delete;
 
   // Lets something leak, by some times its noise.
   void Leak(Kind kind);
@@ -91,6 +94,7 @@ class LeakHost {
   Figure caches_;
   uint64_t consumed_ = 0;  // of the moment at hand, by all
   ksicache::MomentBuilder builder_;
+  tally::testing::MadeHost made_{builder_};
 };
 
 }  // namespace ksi

@@ -108,12 +108,13 @@ Value RowSink::NumberOf(size_t place, uint64_t number) {
                              : static_cast<uint32_t>(number);
   }
   const auto type = figure.isSigned ? ValueType::signedNumber : ValueType::unsignedNumber;
-  __extension__ using Wide = __int128;
-  const Wide exact = figure.isSigned ? Wide{static_cast<int64_t>(number)} : Wide{number};
-  const Wide inUnit = shift < 0 ? exact >> -shift : exact << shift;
-  const auto narrow = static_cast<uint64_t>(inUnit);
-  const Wide again = figure.isSigned ? Wide{static_cast<int64_t>(narrow)} : Wide{narrow};
-  if (again == inUnit) return {type, narrow, {}};
+  const auto right = [&figure = figure](uint64_t value, int bits) {
+    return figure.isSigned ? static_cast<uint64_t>(static_cast<int64_t>(value) >> bits)
+                           : value >> bits;
+  };
+  if (shift <= 0) return {type, right(number, -shift), {}};
+  const uint64_t inUnit = number << shift;
+  if (right(inUnit, shift) == number) return {type, inUnit, {}};
   complaint_ = columns_[place].name +
                (" has a figure that is too large in " + std::string(columns_[place].unit));
   return {ValueType::none, 0, {}};

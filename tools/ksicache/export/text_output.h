@@ -48,11 +48,9 @@ class TextOutput {
 
   template <class Number>
   void PutInteger(Number number) {
-    const size_t size = text_.size();
-    text_.resize(size + kLongestNumber);
-    char* const begin = text_.data() + size;
-    const auto [end, error] = std::to_chars(begin, begin + kLongestNumber, number);
-    text_.resize(size + static_cast<size_t>(end - begin));
+    char digits[kLongestNumber];
+    const auto [end, error] = std::to_chars(digits, digits + kLongestNumber, number);
+    text_.append(digits, end);
   }
 
   void Flush();
