@@ -39,7 +39,7 @@ Rows::Rows(const tally::Report& report, const Origin& origin,
            std::optional<tally::DisplayUnit> unit, Names kept)
     : report_(&report) {
   Keeper keeper(*this, kept);
-  RowSink sink(keeper, unit);
+  RowSink sink(keeper, unit, {kept.begin(), kept.end()});
   sink.Expect(report, origin);
   RunReport(report, sink);
 }
