@@ -145,9 +145,12 @@ Status ChunkReader::ContentOf(Part& part, size_t node, ByteView& content) {
   if (place.size == 0) return kOk;
   Frame& frame = part.frames[place.frame];
   if (frame.content.empty()) {
-    const Status status = Unpack(frame.packed, frame.size, frame.content);
+    // What is damaged is so for each of its nodes.
+    Bytes unpacked;
+    const Status status = Unpack(frame.packed, frame.size, unpacked);
     if (status != kOk) return status;
-    if (frame.content.size() != frame.size) return kDamaged;
+    if (unpacked.size() != frame.size) return kDamaged;
+    frame.content = std::move(unpacked);
   }
   content = ByteView(frame.content).subspan(place.from, place.size);
   return kOk;

@@ -4,6 +4,8 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <optional>
+#include <vector>
 
 #include <knvlibs/ksi_status.h>
 #include "tests/knvlibs/recording/random_host.h"
@@ -147,6 +149,43 @@ TEST(ChunkReaderTest, APartThatIsDamagedIsRefused) {
       EXPECT_EQ(reader.Facts(), FactsOf(4)) << bit;
     }
   }
+}
+
+// The records of a node; none if it cannot be read.
+std::optional<std::vector<Bytes>> RecordsOf(ChunkReader& chunk, size_t node) {
+  const NodeReader* reader = nullptr;
+  if (chunk.ReadNode(node, &reader) != kOk) return std::nullopt;
+  std::vector<Bytes> records;
+  for (const uint32_t number : reader->Present()) {
+    const ByteView record = reader->At(number).record;
+    records.emplace_back(record.begin(), record.end());
+  }
+  return records;
+}
+
+// Nodes lie together in frames.
+TEST(ChunkReaderTest, WhereOneNodeIsDamagedTheOthersAreRefusedOrAsTheyWere) {
+  RandomHost host(1);
+  ChunkWriter writer(Host());
+  for (size_t i = 0; i < 5; ++i) writer.Add(FactsOf(i), host.Next());
+  const Bytes part = writer.PartFrom(0);
+  ChunkReader whole;
+  ASSERT_EQ(whole.Take(part), kOk);
+  size_t refused = 0;
+  for (size_t at = 0; at < part.size(); ++at) {
+    Bytes damaged = part;
+    damaged[at] ^= std::byte{0x10};
+    ChunkReader reader;
+    if (reader.Take(damaged) != kOk) continue;
+    for (size_t node = 0; node < Host().nodes.size(); ++node) {
+      const auto records = RecordsOf(reader, node);
+      refused += records ? 0 : 1;
+      if (records.has_value()) {
+        ASSERT_EQ(records, RecordsOf(whole, node)) << at;
+      }
+    }
+  }
+  EXPECT_GT(refused, part.size() / 2) << "most of a part is frames with several nodes";
 }
 
 TEST(ChunkReaderTest, PartsAreTakenInTheirOrderOnly) {
