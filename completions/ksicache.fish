@@ -111,7 +111,7 @@ end
 function __ksicache_wants_file
     set -l words (__ksicache_words)
     switch "$words[1]"
-        case capture record dump
+        case capture record dump page
             not set -q words[2]
         case info check moments join
             true
@@ -135,6 +135,7 @@ complete -c ksicache -n $no_command -a info -d 'Say which host a file is of'
 complete -c ksicache -n $no_command -a dump -d 'Show what a file holds'
 complete -c ksicache -n $no_command -a diff -d 'Say what changed, and who grew'
 complete -c ksicache -n $no_command -a export -d 'Write the rows of reports'
+complete -c ksicache -n $no_command -a page -d 'Make a page for a browser'
 complete -c ksicache -n $no_command -a load -d 'Make a file from JSON'
 complete -c ksicache -n $no_command -a check -d 'Say what is wrong with a file'
 complete -c ksicache -n $no_command -s h -l help -d 'Print a summary'
@@ -142,8 +143,8 @@ complete -c ksicache -n $no_command -l version -d 'Print the version'
 complete -c ksicache -n __ksicache_wants_file -F
 complete -c ksicache -n __ksicache_wants_node -a '(__ksicache_nodes)'
 complete -c ksicache -n __ksicache_wants_reports -a '(__ksicache_reports)'
-complete -c ksicache -n '__ksicache_command capture load extract join export' -l force -d 'Replace the file'
-complete -c ksicache -n '__ksicache_command capture record load extract join export' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
+complete -c ksicache -n '__ksicache_command capture load extract join export page' -l force -d 'Replace the file'
+complete -c ksicache -n '__ksicache_command capture record load extract join export page' -l mode -x -a '0600 0640 0644' -d 'Give the file these rights'
 complete -c ksicache -n '__ksicache_command capture record' -l root -x -a '(__fish_complete_directories)' -d 'Take the host whose files are there'
 complete -c ksicache -n '__ksicache_command record' -l every -x -a '1s 5s 10s 30s 1m' -d 'Take a moment so often'
 complete -c ksicache -n '__ksicache_command record' -l keep -x -a '1d 7d 30d' -d 'Keep moments so long'
@@ -165,4 +166,5 @@ complete -c ksicache -n '__ksicache_command export' -l every -x -a '1m 5m 1h 1d'
 complete -c ksicache -n '__ksicache_command export' -l files-from -r -F -d 'Take also the files that this one names'
 complete -c ksicache -n '__ksicache_command export' -l append -d 'Add to a database'
 complete -c ksicache -n '__ksicache_command export' -l cluster -x -d 'Have tables over all servers of this cluster'
-complete -c ksicache -n '__ksicache_command export' -s o -l output -r -F -d 'Make a file'
+complete -c ksicache -n '__ksicache_command page' -l title -x -d 'Head the page with it'
+complete -c ksicache -n '__ksicache_command export page' -s o -l output -r -F -d 'Make a file'

@@ -359,7 +359,7 @@ declare -gA _ksicache_values=(
 
 _ksicache() {
   local _tally_line word command='' count=0 skip='' head='' i
-  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|files-from|report|by|top|since|fail-above'
+  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|files-from|report|by|top|since|fail-above|title'
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
@@ -405,14 +405,15 @@ _ksicache() {
           '--format --unit -u --columns -s --every --files-from --output -o --append --force --mode --cluster'
         ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
+      page) _tally_reply '' "$word" '--output -o --title --force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac
   else
     case $command$count in
       0)
-        _tally_reply '' "$word" 'capture record moments extract join info dump diff export load check'
+        _tally_reply '' "$word" 'capture record moments extract join info dump diff export page load check'
         ;;
-      capture0 | record0 | moments* | extract[01] | join* | info* | dump0 | diff[01] | check* | load[01])
+      capture0 | record0 | moments* | extract[01] | join* | info* | dump0 | diff[01] | page0 | check* | load[01])
         _tally_reply_files '' "$word" -f
         ;;
       dump*) _tally_reply '' "$word" "$_ksicache_nodes" ;;

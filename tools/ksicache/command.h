@@ -55,6 +55,7 @@ inline constexpr Option kEvery = {"every", "TIME",
                                   "take a moment each TIME; record alone does each 5s"};
 inline constexpr Option kUnit = {"unit", "UNIT", "show memory in mb, kb, pg (4 KB pages) or b",
                                  'u'};
+inline constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
 
 }  // namespace ksicache
 

@@ -15,12 +15,13 @@ extern const Command kInfo;
 extern const Command kDump;
 extern const Command kDiff;
 extern const Command kExport;
+extern const Command kPage;
 extern const Command kLoad;
 extern const Command kCheck;
 
 inline constexpr const Command* kCommands[] = {&kCapture, &kRecord, &kMoments, &kExtract,
                                                &kJoin,    &kInfo,   &kDump,    &kDiff,
-                                               &kExport,  &kLoad,   &kCheck};
+                                               &kExport,  &kPage,   &kLoad,    &kCheck};
 
 }  // namespace ksicache
 

@@ -28,7 +28,6 @@ namespace ksicache {
 namespace {
 
 constexpr Option kFormat = {"format", "FORMAT", "write another format than csv"};
-constexpr Option kOutput = {"output", "OUT", "make the file OUT", 'o'};
 constexpr Option kAppend = {"append", nullptr, "add to the database OUT what it has not"};
 constexpr Option kColumns = {"columns", "NAMES",
                              "only these, such as used:free, and what rows are of", 's'};

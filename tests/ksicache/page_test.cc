@@ -1,0 +1,109 @@
+// ksicache page, as far as a page can be told without a browser; tests/page has the rest.
+#include <sys/stat.h>
+
+#include <string>
+#include <string_view>
+
+#include "tests/ksicache/export_fixture.h"
+
+namespace ksi {
+namespace {
+
+class PageTest : public ExportTest {
+ protected:
+  static void ExpectHas(const std::string& page, std::string_view text) {
+    EXPECT_NE(page.find(text), std::string::npos) << text;
+  }
+  static size_t CountOf(const std::string& page, std::string_view text) {
+    size_t count = 0;
+    for (size_t at = 0; (at = page.find(text, at)) != std::string::npos; at += text.size()) ++count;
+    return count;
+  }
+};
+
+TEST_F(PageTest, SaysWithoutScriptsWhereTheMemoryIs) {
+  const std::string page = Output({"page", kExample});
+  EXPECT_EQ(page.find("<!DOCTYPE html>"), 0);
+  ExpectHas(page, "<title>hypervisor.example.org</title>");
+  ExpectHas(page, "<h1>hypervisor.example.org</h1>");
+  ExpectHas(page, "<p>hypervisor.example.org, 2026-11-21T10:00:00Z</p>");
+  ExpectHas(page, "<th scope=\"row\">Free</th><td>134856</td><td>51.4</td>");
+  ExpectHas(page, "<th scope=\"row\">Total</th><td>262144</td><td>100.0</td>");
+  ExpectHas(page, "<caption>Machines: the largest of 12</caption>");
+  ExpectHas(page,
+            "<th scope=\"row\">build-linux</th><td>14352</td><td>737</td><td>1474</td>"
+            "<td>1228</td><td>1376</td>");
+}
+
+TEST_F(PageTest, MayRunItsOwnScriptsAndNothingElse) {
+  const std::string page = Output({"page", kExample});
+  ExpectHas(page, "content=\"default-src 'none'; script-src 'sha256-");
+  EXPECT_EQ(CountOf(page, "<script>"), 2);
+  EXPECT_EQ(CountOf(page, "<script type=\"application/octet-stream\""), 4);
+  EXPECT_EQ(CountOf(page, "{{"), 0);
+  ExpectHas(page, "Redistributions of source code must retain the above copyright");
+}
+
+TEST_F(PageTest, IsOfAMomentOfASpanOrOfAll) {
+  const auto head = [](const std::string& page) {
+    const size_t begin = page.find("<p>") + 3;
+    return page.substr(begin, page.find("</p>") - begin);
+  };
+  EXPECT_EQ(head(Output({"page", kIncident + "@10:05Z"})),
+            "hypervisor.example.org, 2026-11-21T10:05:00Z");
+  EXPECT_EQ(head(Output({"page", kIncident + "@10:03Z..10:04Z"})),
+            "hypervisor.example.org, 2026-11-21T10:03:00Z to 2026-11-21T10:04:00Z, 2 moments; "
+            "scripts show all of them");
+  EXPECT_EQ(head(Output({"page", kIncident})),
+            "hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:06:00Z, 5 moments; "
+            "scripts show all of them");
+}
+
+TEST_F(PageTest, IsAFileOfItsOwn) {
+  const std::string out = Path("page.html");
+  EXPECT_EQ(Output({"page", kExample, "-o", out}), "");
+  struct stat status = {};
+  ASSERT_EQ(stat(out.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777, 0600U);
+  EXPECT_EQ(FileContent(out), Output({"page", kExample, "--output", "-"}));
+  ExpectFailure({"page", kExample, "-o", out}, out + ": exists already (--force replaces it)");
+  EXPECT_EQ(Output({"page", kExample, "-o", out, "--force", "--mode", "0644", "--title", "T"}), "");
+  ASSERT_EQ(stat(out.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777, 0644U);
+  ExpectHas(FileContent(out), "<h1>T</h1>\n<p>hypervisor.example.org, ");
+}
+
+TEST_F(PageTest, TakesNoTextForMarkup) {
+  const std::string file =
+      ExampleWith("host.ksi", {{"\"build-linux\"", R"("</td><script>'\u202e&\u0007")"}});
+  const std::string page = Output({"page", file, "--title", "<b>&\"{{head}}"});
+  ExpectHas(page, "<title>&lt;b&gt;&amp;&quot;{{head}}</title>");
+  ExpectHas(page, "&lt;/td&gt;&lt;script&gt;&#39;\\xe2\\x80\\xae&amp;\\x07</th>");
+  EXPECT_EQ(CountOf(page, "<script>"), 2);
+}
+
+TEST_F(PageTest, SaysWhatCouldNotBeRead) {
+  WriteContent(Path("empty.json"), JsonWith(""));
+  EXPECT_EQ(Output({"load", Path("empty.json"), Path("empty.ksi")}), "");
+  const harness::Result result = Run({"page", Path("empty.ksi")});
+  EXPECT_EQ(result.status, 1);
+  ExpectHas(result.err, "ksicache: " + Path("empty.ksi") + ": comp-stats: 0xbad0003 Not found\n");
+  ExpectHas(result.out, "How the memory divides could not be read.");
+  ExpectHas(result.out, "<li>comp-stats: 0xbad0003 Not found</li>");
+}
+
+TEST_F(PageTest, FailsWithoutAMoment) {
+  ExpectFailure({"page", Path("none.ksi")}, Path("none.ksi") + ": No such file or directory");
+  ExpectFailure({"page", kIncident + "@11:00Z..12:00Z"},
+                kIncident +
+                    "@11:00Z..12:00Z: there is no moment in that time: moments are of "
+                    "2026-11-21T10:02:00Z to 2026-11-21T10:06:00Z");
+  EXPECT_EQ(Run({"page"}).status, 2);
+  const std::string own = ExampleWith("own.ksi", {});
+  const harness::Result result = Run({"page", own, "-o", own, "--force"});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_NE(FileContent(own).find("SQLite format"), std::string::npos);
+}
+
+}  // namespace
+}  // namespace ksi

@@ -1,0 +1,61 @@
+// page: a host's memory, at one moment or over time, as a page for a browser.
+#include <span>
+#include <string>
+
+#include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/new_file.h"
+#include "tools/ksicache/opened_file.h"
+#include "tools/ksicache/output.h"
+#include "tools/ksicache/page/document.h"
+#include "tools/ksicache/page/page_data.h"
+
+namespace ksicache {
+namespace {
+
+constexpr Option kTitle = {"title", "TEXT", "head the page with TEXT instead of the host's name"};
+constexpr const Option* kOptions[] = {&kOutput, &kTitle, &kForce, &kMode};
+
+std::string TargetOf(const CommandLine& line) {
+  const std::string* name = line.ValueOf(kOutput);
+  if (name == nullptr || *name == "-") CheckOptionsFor("-", line);
+  return name == nullptr ? "-" : *name;
+}
+
+int Page(const CommandLine& line) {
+  const std::string& name = line.arguments[0];
+  const std::string start = name + ": ";
+  NewFile file(TargetOf(line), line.Has(kForce), ModeOf(line));
+  file.RefuseInput(FileNameOf(name));
+  PageData data(IsRecording(name) ? name + "@.." : name);
+  try {
+    ReadPage(data);
+  } catch (const DataError& error) {
+    throw Error(start + error.what());
+  }
+  for (const std::string& problem : data.problems.All()) PrintError(start + problem);
+  const std::string* title = line.ValueOf(kTitle);
+  data.title = title == nullptr ? data.source.survey.host : *title;
+  const std::string html = ToHtml(data);
+  file.Commit(std::as_bytes(std::span(html)));
+  return data.problems.All().empty() ? 0 : 1;
+}
+
+}  // namespace
+
+const Command kPage = {
+    .name = "page",
+    .arguments = "FILE[@WHEN|@FROM..TO]",
+    .summary = "make a page of FILE for a browser",
+    .help = R"(Makes one HTML file that shows where the memory of a host was, what happened
+over time and what changed, and all reports as tables: of a capture, of one
+moment of a recording, of those from FROM to TO, or of all it has. The page
+needs no network, and any browser of the last years shows it.
+)",
+    .options = kOptions,
+    .fewest = 1,
+    .most = 1,
+    .run = Page,
+};
+
+}  // namespace ksicache

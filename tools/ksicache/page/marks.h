@@ -1,0 +1,37 @@
+// What there is to say of a recording's moments beside their figures.
+#ifndef TOOLS_KSICACHE_PAGE_MARKS_H_
+#define TOOLS_KSICACHE_PAGE_MARKS_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "tools/ksicache/page/survey.h"
+
+namespace ksicache {
+
+// Something that happened between two moments.
+struct Mark {
+  const char* kind;  // "reboot", "clock" or "gap"
+  size_t moment;     // the place of the moment after it
+  int64_t time;      // how long the gap is, how far the clock was set; us
+};
+
+struct Marks {
+  // As many are told of a page.
+  static constexpr size_t kMost = 500;
+
+  std::vector<Mark> all;
+  size_t leftOut = 0;
+  uint64_t refused = 0;  // reads of one moment for want of rights, at most
+  uint64_t failed = 0;   // reads of one moment for other reasons, at most
+  size_t lossy = 0;      // moments of which something was left out
+};
+
+// Of a capture there is none. Fails with a DataError.
+Marks MarksOf(const std::string& name, const Survey& survey);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_PAGE_MARKS_H_

@@ -1,0 +1,82 @@
+// What a page draws of which columns: the one place of the page that knows columns by name.
+//
+// A host's memory divides as comp-stats tells; heaps lie in the kernel's part, machines and
+// processes, which hang in the tree of groups, in that of the clients. Whatever the parts leave of
+// the whole has a name, too (web/balance.js).
+#ifndef TOOLS_KSICACHE_PAGE_ROLES_H_
+#define TOOLS_KSICACHE_PAGE_ROLES_H_
+
+#include <string>
+
+namespace ksicache::roles {
+
+inline constexpr const char* kHostReport = "comp-stats";
+inline constexpr const char* kTotal = "total";
+inline constexpr const char* kManaged = "managedByMemMap";  // the others are taken at start
+inline constexpr const char* kState = "memState";
+inline constexpr const char* kFree = "free";
+
+// A part of the host's memory. `key` is what the page's style and scripts call it.
+struct Part {
+  const char* key;
+  const char* title;
+  const char* column;
+};
+
+// Of the memory that is managed, from the bottom of the stack up.
+inline constexpr Part kParts[] = {
+    {"kernel", "Kernel data and heaps", "dataAndHeap"},
+    {"caches", "Caches and clients of the kernel", "knvClientConsumed"},
+    {"clients", "Machines and processes", "otherConsumed"},
+    {"free", "Free", kFree},
+};
+
+// Of the memory that is taken at start.
+inline constexpr Part kStartParts[] = {
+    {"start", "Kernel code", "kernelCode"},
+    {"start", "Overhead of the allocator", "buddyOvhd"},
+    {"start", "Low memory that is kept", "rsvdLow"},
+};
+
+// The rows of a report as things with a size.
+struct Things {
+  const char* key;
+  const char* title;
+  const char* report;
+  const char* name;
+  const char* id;      // the group that it is, or is in; null: in none
+  const char* parent;  // the group above that one; null: not told
+  const char* sizes[2];
+};
+
+inline constexpr Things kThings[] = {
+    {"machines", "Machines", "vm-stats", "name", "schedGrp", "parSchedGroup", {"consumed", "ovhd"}},
+    {"groups", "Groups", "group-stats", "name", "gid", "parGid", {"consumed"}},
+    {"processes", "Processes", "uw-stats", "name", "schedGrp", "parSchedGroup", {"consumed"}},
+    {"heaps", "Heaps", "heap-stats", "name", nullptr, nullptr, {"size"}},
+};
+
+// A figure of each row of a report over time.
+struct Line {
+  const char* title;
+  const char* report;
+  const char* column;
+};
+
+inline constexpr Line kLines[] = {
+    {"Machines: consumed", "vm-stats", "consumed"},
+    {"Machines: ballooned", "vm-stats", "ballooned"},
+    {"Machines: swapped", "vm-stats", "swapped"},
+    {"Machines: compressed", "vm-stats", "zipped"},
+    {"Machines: saved by sharing", "vm-stats", "sharedSaved"},
+    {"Groups: consumed", "group-stats", "consumed"},
+    {"Processes: consumed", "uw-stats", "consumed"},
+    {"Heaps: size", "heap-stats", "size"},
+};
+
+// All of it for the page's scripts.
+std::string ToJson();
+
+}  // namespace ksicache::roles
+
+#endif  // TOOLS_KSICACHE_PAGE_ROLES_H_

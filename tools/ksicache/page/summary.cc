@@ -1,0 +1,198 @@
+#include "tools/ksicache/page/summary.h"
+
+#include <algorithm>
+#include <cinttypes>
+#include <cstdio>
+#include <optional>
+#include <vector>
+
+#include "knvlibs/times.h"
+#include "reports/reports.h"
+#include "tools/ksicache/page/roles.h"
+#include "tools/ksicache/printable.h"
+
+namespace ksicache {
+namespace {
+
+constexpr size_t kLargest = 10;
+constexpr const char* kNoValue = "–";
+
+// The rows of a report at the last moment, by the names of the columns.
+class LastRows {
+ public:
+  LastRows(const PageData& data, std::string_view report) : data_(data) {
+    const auto reports = tally::Reports();
+    const auto found = std::ranges::find(reports, report, &tally::Report::name);
+    stream_ = &data.tables.streams[static_cast<size_t>(found - reports.begin())];
+  }
+
+  size_t Count() const { return stream_->Rows(); }
+
+  std::string TextAt(size_t row, std::string_view name) const {
+    const PageValue* value = Find(row, name);
+    return value == nullptr ? "" : data_.texts.All()[value->number];
+  }
+
+  // Memory, in bytes; none if it has no value.
+  std::optional<uint64_t> BytesAt(size_t row, std::string_view name) const {
+    const PageValue* value = Find(row, name);
+    if (value == nullptr || value->type != ValueType::unsignedNumber) return std::nullopt;
+    const bool isBytes = UnitOf(name) == tally::UnitTitle(tally::DisplayUnit::b);
+    return isBytes ? value->number : value->number << 10;
+  }
+
+ private:
+  size_t PlaceOf(std::string_view name) const {
+    const auto& columns = stream_->Columns();
+    return static_cast<size_t>(
+        std::ranges::find(columns, name,
+                          [](const RowColumn& each) { return std::string_view(each.name); }) -
+        columns.begin());
+  }
+  std::string_view UnitOf(std::string_view name) const {
+    return stream_->Columns()[PlaceOf(name)].unit;
+  }
+  const PageValue* Find(size_t row, std::string_view name) const {
+    const size_t place = PlaceOf(name);
+    return place == stream_->Columns().size() ? nullptr : &stream_->RowAt(row)[place];
+  }
+
+  const PageData& data_;
+  const TableStream* stream_;
+};
+
+std::string Tagged(const char* tag, const std::string& html) {
+  return std::string("<") + tag + ">" + html + "</" + tag + ">";
+}
+
+// "1234 MB"
+std::string MemoryText(std::optional<uint64_t> bytes) {
+  return bytes ? std::to_string(*bytes >> 20) : kNoValue;
+}
+
+std::string ShareText(std::optional<uint64_t> part, std::optional<uint64_t> whole) {
+  if (!part || !whole || *whole == 0) return kNoValue;
+  char text[32];
+  const double percent = 100 * static_cast<double>(*part) / static_cast<double>(*whole);
+  const int size = std::snprintf(text, sizeof text, "%.1f", percent);
+  return {text, static_cast<size_t>(size)};
+}
+
+std::string NumberCells(const std::vector<std::string>& texts) {
+  std::string cells;
+  for (const std::string& text : texts) cells += Tagged("td", text);
+  return cells;
+}
+
+std::string HeadRow(const std::vector<std::string>& names) {
+  std::string cells;
+  for (const std::string& name : names) cells += "<th scope=\"col\">" + name + "</th>";
+  return Tagged("tr", cells);
+}
+
+std::string RowOf(const std::string& name, const std::vector<std::string>& numbers) {
+  return Tagged("tr", "<th scope=\"row\">" + HtmlText(name) + "</th>" + NumberCells(numbers));
+}
+
+std::string Table(const std::string& caption, const std::string& rows) {
+  return R"(<div class="scroller">)" + Tagged("table", Tagged("caption", caption) + rows) +
+         "</div>\n";
+}
+
+std::string BalanceToHtml(const PageData& data) {
+  const LastRows host(data, roles::kHostReport);
+  if (host.Count() == 0) return Tagged("p", "How the memory divides could not be read.");
+  const std::optional<uint64_t> total = host.BytesAt(0, roles::kTotal);
+  std::string rows = HeadRow({"Part", "MB", "%"});
+  for (const roles::Part& part : roles::kParts) {
+    const std::optional<uint64_t> bytes = host.BytesAt(0, part.column);
+    rows += RowOf(part.title, {MemoryText(bytes), ShareText(bytes, total)});
+  }
+  rows += RowOf("Total", {MemoryText(total), ShareText(total, total)});
+  return Table("Where the memory is", rows);
+}
+
+// The columns of lines of a report, as they are called there.
+std::vector<const char*> ColumnsOf(std::string_view report) {
+  std::vector<const char*> columns;
+  for (const roles::Line& line : roles::kLines) {
+    if (line.report == report) columns.push_back(line.column);
+  }
+  return columns;
+}
+
+std::string LargestToHtml(const PageData& data, const roles::Things& things) {
+  const LastRows rows(data, things.report);
+  if (rows.Count() == 0) return {};
+  std::vector<size_t> order(rows.Count());
+  for (size_t i = 0; i < order.size(); ++i) order[i] = i;
+  const auto sizeOf = [&](size_t row) { return rows.BytesAt(row, things.sizes[0]).value_or(0); };
+  std::ranges::stable_sort(order, std::ranges::greater(), sizeOf);
+  order.resize(std::min(order.size(), kLargest));
+
+  const std::vector<const char*> columns = ColumnsOf(things.report);
+  std::vector<std::string> names = {things.name};
+  names.reserve(1 + columns.size());
+  for (const char* column : columns) names.push_back(column + std::string(" (MB)"));
+  std::string body = HeadRow(names);
+  for (const size_t row : order) {
+    std::vector<std::string> numbers;
+    numbers.reserve(columns.size());
+    for (const char* column : columns) numbers.push_back(MemoryText(rows.BytesAt(row, column)));
+    body += RowOf(rows.TextAt(row, things.name), numbers);
+  }
+  return Table(things.title + std::string(": the largest of ") + std::to_string(rows.Count()),
+               body);
+}
+
+std::string ProblemsToHtml(const std::vector<std::string>& problems) {
+  if (problems.empty()) return {};
+  std::string items;
+  for (const std::string& problem : problems) items += Tagged("li", HtmlText(problem));
+  return Tagged("h3", "What could not be read") + Tagged("ul", items) + "\n";
+}
+
+}  // namespace
+
+std::string HtmlText(std::string_view text) {
+  std::string html;
+  for (const char c : Printable(text)) {
+    switch (c) {
+      case '&':
+        html += "&amp;";
+        break;
+      case '<':
+        html += "&lt;";
+        break;
+      case '>':
+        html += "&gt;";
+        break;
+      case '"':
+        html += "&quot;";
+        break;
+      case '\'':
+        html += "&#39;";
+        break;
+      default:
+        html += c;
+    }
+  }
+  return html;
+}
+
+std::string SummaryToHtml(const PageData& data) {
+  const Survey& survey = data.source.survey;
+  const std::string first = ksi::TextOfTime(survey.moments.front().taken);
+  const std::string last = ksi::TextOfTime(survey.moments.back().taken);
+  const size_t count = survey.moments.size();
+  std::string html = Tagged("h1", HtmlText(data.title)) + "\n";
+  html += Tagged("p", HtmlText(survey.host) + ", " +
+                          (count == 1 ? last
+                                      : first + " to " + last + ", " + std::to_string(count) +
+                                            " moments; scripts show all of them"));
+  html += Tagged("h2", "At " + last) + "\n" + BalanceToHtml(data);
+  for (const roles::Things& things : roles::kThings) html += LargestToHtml(data, things);
+  return html + ProblemsToHtml(data.problems.All());
+}
+
+}  // namespace ksicache

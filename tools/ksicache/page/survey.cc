@@ -1,0 +1,121 @@
+#include "tools/ksicache/page/survey.h"
+
+#include <algorithm>
+#include <set>
+#include <string_view>
+#include <utility>
+
+#include "reports/reports.h"
+#include "tools/ksicache/error.h"
+#include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/page/roles.h"
+#include "tools/ksicache/report_run.h"
+
+namespace ksicache {
+namespace {
+
+constexpr uint64_t kUnknown = UINT64_MAX;
+
+// Takes the free memory from the host's row.
+class FreeMemory : public RowFormat {
+ public:
+  uint64_t Take() { return std::exchange(free_, kUnknown); }
+
+  void Begin(const RowTable& table) override {
+    place_ = 0;
+    while (table.columns[place_].name != std::string_view(roles::kFree)) ++place_;
+  }
+  void Row(std::span<const Value> values) override {
+    if (values[place_].type == ValueType::unsignedNumber) free_ = values[place_].number;
+  }
+  void Finish() override {}
+
+ private:
+  size_t place_ = 0;
+  uint64_t free_ = kUnknown;
+};
+
+// The first place of it, as StretchOf has it.
+size_t StretchBegin(size_t stretch, size_t count, size_t size) { return stretch * size / count; }
+
+// Calls with the first and the last place of each stretch.
+template <class Visit>
+void ForEachStretch(const Survey& survey, size_t count, Visit&& visit) {
+  const size_t size = survey.moments.size();
+  count = std::min(count, size);
+  for (size_t i = 0; i < count; ++i) {
+    visit(survey.moments.begin() + static_cast<ptrdiff_t>(StretchBegin(i, count, size)),
+          survey.moments.begin() + static_cast<ptrdiff_t>(StretchBegin(i + 1, count, size)));
+  }
+}
+
+bool HasLess(const SurveyedMoment& a, const SurveyedMoment& b) { return a.free < b.free; }
+
+// A moment of which nothing is known is none with much.
+bool HasLessKnown(const SurveyedMoment& a, const SurveyedMoment& b) {
+  return b.free != kUnknown && (a.free == kUnknown || a.free < b.free);
+}
+
+}  // namespace
+
+std::optional<size_t> Survey::Find(int64_t taken, size_t from) const {
+  for (size_t i = from; i < moments.size(); ++i) {
+    if (moments[i].taken == taken) return i;
+  }
+  return std::nullopt;
+}
+
+Survey MakeSurvey(const std::string& name, std::string& problem) {
+  Survey survey;
+  FreeMemory free;
+  RowSink sink(free, tally::DisplayUnit::kb);
+  const tally::Report& report = *tally::FindReport(roles::kHostReport);
+  try {
+    ForEachMoment(name, [&](const Origin& origin) {
+      survey.host = origin.host;
+      sink.Expect(report, origin);
+      try {
+        RunReport(report, sink);
+      } catch (const DataError&) {
+        // It is said when the moment is read in full.
+      }
+      survey.moments.push_back({origin.taken, free.Take()});
+    });
+  } catch (const DataError& error) {
+    if (survey.moments.empty()) throw;
+    problem = error.what();
+  }
+  return survey;
+}
+
+size_t StretchOf(size_t place, size_t count, size_t size) {
+  return ((place + 1) * count - 1) / size;
+}
+
+std::vector<size_t> ChooseMoments(const Survey& survey, const std::vector<size_t>& wanted,
+                                  size_t most) {
+  const size_t size = survey.moments.size();
+  std::set<size_t> chosen = {0, size - 1};
+  if (most >= size) most = 2 * size;  // each of them gets a stretch of its own
+  for (size_t i = 0; i < wanted.size() && chosen.size() < most / 2; ++i) chosen.insert(wanted[i]);
+  const size_t room = most > chosen.size() ? most - chosen.size() : 0;
+  ForEachStretch(survey, room, [&](auto begin, auto end) {
+    chosen.insert(
+        static_cast<size_t>(std::min_element(begin, end, HasLess) - survey.moments.begin()));
+  });
+  return {chosen.begin(), chosen.end()};
+}
+
+std::vector<size_t> ChoosePoints(const Survey& survey, size_t stretches) {
+  std::set<size_t> chosen = {0, survey.moments.size() - 1};
+  const auto add = [&](auto moment) {
+    chosen.insert(static_cast<size_t>(moment - survey.moments.begin()));
+  };
+  ForEachStretch(survey, stretches, [&](auto begin, auto end) {
+    add(std::min_element(begin, end, HasLess));
+    add(std::max_element(begin, end, HasLessKnown));
+  });
+  return {chosen.begin(), chosen.end()};
+}
+
+}  // namespace ksicache

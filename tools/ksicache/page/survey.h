@@ -1,0 +1,46 @@
+// What a page knows of all moments before it reads any of them in full.
+#ifndef TOOLS_KSICACHE_PAGE_SURVEY_H_
+#define TOOLS_KSICACHE_PAGE_SURVEY_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace ksicache {
+
+struct SurveyedMoment {
+  int64_t taken;  // us since 1970
+  uint64_t free;  // KB; all ones if it is not known
+};
+
+struct Survey {
+  std::string host;  // of the last moment
+  std::vector<SurveyedMoment> moments;
+
+  // The place of the moment that was taken then, at `from` or behind it: a recording that is still
+  // written may have other moments by the time it is read again.
+  std::optional<size_t> Find(int64_t taken, size_t from) const;
+};
+
+// Fails with a DataError when there is no moment at all; a failure after the first one is given
+// back in `problem`.
+Survey MakeSurvey(const std::string& name, std::string& problem);
+
+// Which of `count` stretches, as even as can be, of `size` moments the moment at `place` is in.
+size_t StretchOf(size_t place, size_t count, size_t size);
+
+// The moments to show in full, at most so many, in their order: the first and the last, the one
+// with the least free memory of each of as many stretches as there is room for, and those of
+// `wanted` before these.
+std::vector<size_t> ChooseMoments(const Survey& survey, const std::vector<size_t>& wanted,
+                                  size_t most);
+
+// The moments to draw the balance of the host from: of each of `stretches` the one with the least
+// and the one with the most free memory, the first and the last.
+std::vector<size_t> ChoosePoints(const Survey& survey, size_t stretches);
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_PAGE_SURVEY_H_

@@ -1,0 +1,101 @@
+#include "tools/ksicache/page/table_stream.h"
+
+#include <utility>
+
+#include "tools/ksicache/page/packing.h"
+
+namespace ksicache {
+namespace {
+
+constexpr uint64_t kSame = 0;
+constexpr uint64_t kNone = 1;
+constexpr uint64_t kWhole = 2;
+
+bool IsNumber(const PageValue& value) {
+  return value.type == ValueType::signedNumber || value.type == ValueType::unsignedNumber;
+}
+
+void PutWhole(std::string& bytes, uint64_t number) {
+  PutNumber(bytes, kWhole);
+  for (int i = 0; i < 8; ++i) bytes += static_cast<char>(number >> (8 * i));
+}
+
+void PutValue(std::string& bytes, const PageValue& value, const PageValue& base) {
+  if (value.type == ValueType::none) return PutNumber(bytes, kNone);
+  if (!IsNumber(value)) {
+    return PutNumber(bytes, value == base ? kSame : kWhole + 1 + value.number);
+  }
+  const uint64_t before = IsNumber(base) ? base.number : 0;
+  const uint64_t folded = Folded(static_cast<int64_t>(value.number - before));
+  if (folded == 0) return PutNumber(bytes, kSame);
+  if (folded > UINT64_MAX - kWhole) return PutWhole(bytes, value.number);
+  PutNumber(bytes, kWhole + folded);
+}
+
+}  // namespace
+
+uint32_t PageTexts::NumberOf(std::string_view text) {
+  const auto [found, isNew] =
+      numbers_.try_emplace(std::string(text), static_cast<uint32_t>(all_.size()));
+  if (isNew) all_.emplace_back(text);
+  return found->second;
+}
+
+uint32_t RowIdentities::NumberOf(std::span<const RowColumn> columns, std::span<const PageValue> row,
+                                 uint32_t most) {
+  std::string key;
+  for (size_t i = 0; i < columns.size(); ++i) {
+    if (!columns[i].isKey) continue;
+    key += static_cast<char>(row[i].type);
+    PutNumber(key, row[i].number);
+  }
+  PutNumber(key, seen_[key]++);
+  const auto found = numbers_.find(key);
+  if (found != numbers_.end()) return found->second;
+  const auto number = static_cast<uint32_t>(numbers_.size());
+  if (number < most) numbers_.emplace(std::move(key), number);
+  return number;
+}
+
+void TableStream::Begin(std::span<const RowColumn> columns) {
+  cells_.clear();
+  if (!columns_.empty()) return;
+  columns_.assign(columns.begin(), columns.end());
+  isSigned_.resize(columns.size());
+}
+
+void TableStream::Row(std::span<const Value> values) {
+  for (size_t i = 0; i < values.size(); ++i) {
+    const Value& value = values[i];
+    const bool isText = value.type == ValueType::text;
+    cells_.push_back({value.type, isText ? texts_.NumberOf(value.text) : value.number});
+    if (value.type == ValueType::signedNumber) isSigned_[i] = true;
+  }
+}
+
+void TableStream::End(bool isWhole, std::string& bytes) {
+  if (!isWhole && Rows() == 0) return PutNumber(bytes, 0);
+  PutNumber(bytes, 1 + Rows());
+  identities_.Restart();
+  ids_.clear();
+  for (size_t row = 0; row < Rows(); ++row) {
+    ids_.push_back(identities_.NumberOf(columns_, RowAt(row)));
+    const int64_t expected = row == 0 ? 0 : int64_t{ids_[row - 1]} + 1;
+    PutNumber(bytes, Folded(ids_[row] - expected));
+  }
+  before_.resize(identities_.Count() * columns_.size());
+  for (size_t column = 0; column < columns_.size(); ++column) PutColumn(column, bytes);
+}
+
+void TableStream::PutColumn(size_t column, std::string& bytes) {
+  PageValue above;
+  for (size_t row = 0; row < Rows(); ++row) {
+    PageValue& before = Before(row, column);
+    const PageValue& value = cells_[row * columns_.size() + column];
+    PutValue(bytes, value, before.type == ValueType::none ? above : before);
+    above = value;
+    before = value;
+  }
+}
+
+}  // namespace ksicache

@@ -1,0 +1,32 @@
+// Elements of the page. Whatever a capture says becomes text, never markup.
+
+const SVG = 'http://www.w3.org/2000/svg';
+
+function fill(element, attributes, children) {
+  for (const [name, value] of Object.entries(attributes)) {
+    if (name.startsWith('on')) {
+      element.addEventListener(name.slice(2), value);
+    } else if (value === true) {
+      element.setAttribute(name, '');
+    } else if (value !== false && value !== null && value !== undefined) {
+      element.setAttribute(name, value);
+    }
+  }
+  element.append(...children.filter((child) => child !== null));
+  return element;
+}
+
+export function element(tag, attributes = {}, ...children) {
+  return fill(document.createElement(tag), attributes, children);
+}
+
+export function svg(tag, attributes = {}, ...children) {
+  return fill(document.createElementNS(SVG, tag), attributes, children);
+}
+
+// A list to choose from: `options` are [value, text].
+export function choice(label, options, value, onchange) {
+  const select = element('select', {onchange: () => onchange(select.value)},
+    ...options.map(([each, text]) => element('option', {value: each, selected: each === value}, text)));
+  return element('label', {}, `${label} `, select);
+}

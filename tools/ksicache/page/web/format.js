@@ -1,0 +1,134 @@
+// Figures, names and times as they are shown.
+import {Kind} from './tables.js';
+
+export const NO_VALUE = '–';
+
+// The units of memory by the words of -u, with their titles and the bits of a byte's count that
+// they drop.
+export const UNITS = {
+  mb: {title: 'MB', shift: 20},
+  kb: {title: 'KB', shift: 10},
+  pg: {title: 'Page (4K)', shift: 12},
+  b: {title: 'Bytes', shift: 0},
+};
+
+function shiftOf(title) {
+  return Object.values(UNITS).find((unit) => unit.title === title).shift;
+}
+
+export function isMemory(column) {
+  return Object.values(UNITS).some((unit) => unit.title === column.unit);
+}
+
+// A figure of memory in another unit, as `ksicache export` has it: fractions are dropped, and what
+// is too large for 64 bits has no value.
+export function converted(value, column, unit) {
+  const shift = shiftOf(column.unit) - UNITS[unit].shift;
+  if (shift === 0) return value;
+  const whole = BigInt(value);
+  const result = shift < 0 ? whole >> BigInt(-shift) : whole << BigInt(shift);
+  const held = column.isSigned ? BigInt.asIntN(64, result) : BigInt.asUintN(64, result);
+  return held === result ? result : null;
+}
+
+// Memory in bytes, to draw; null if it has no value.
+export function bytesOf(value, column) {
+  return typeof value === 'number' || typeof value === 'bigint'
+    ? Number(value) * 2 ** shiftOf(column.unit) : null;
+}
+
+// What hides, or turns the direction of what is around it, is written out.
+const HIDDEN = /[\u0000-\u001f\u007f-\u00a0\u00ad\u034f\u061c\u115f\u1160\u17b4\u17b5\u180b-\u180f\u200b-\u200f\u2028-\u202f\u205f-\u206f\u3000\u3164\ufe00-\ufe0f\ufeff\uffa0\ufff0-\uffff]|[\ud800-\udbff](?![\udc00-\udfff])|(?<![\ud800-\udbff])[\udc00-\udfff]|[\u{e0000}-\u{e0fff}]/gu;
+
+function escape(character) {
+  return `\\u{${character.codePointAt(0).toString(16)}}`;
+}
+
+// A text of a capture as it is shown.
+export function shownText(text) {
+  return text.replace(HIDDEN, escape);
+}
+
+// A value in the unit that is chosen, as text.
+export function shownValue(value, column, unit) {
+  if (value === null) return NO_VALUE;
+  if (column.kind === Kind.text) return shownText(value);
+  if (column.kind === Kind.flag) return value ? 'y' : 'n';
+  const shown = unit !== null && isMemory(column) ? converted(value, column, unit) : value;
+  return shown === null ? NO_VALUE : String(shown);
+}
+
+const NAMES = ['bytes', 'KB', 'MB', 'GB', 'TB', 'PB'];
+
+// Memory for people: three digits and a unit.
+export function memoryText(bytes) {
+  if (bytes === null) return NO_VALUE;
+  if (bytes === 0) return '0';
+  let size = Math.abs(bytes);
+  let name = 0;
+  while (size >= 999.5 && name + 1 < NAMES.length) {
+    size /= 1024;
+    ++name;
+  }
+  const digits = name === 0 || size >= 99.95 ? 0 : size >= 9.995 ? 1 : 2;
+  return `${bytes < 0 ? '−' : ''}${size.toFixed(digits)} ${NAMES[name]}`;
+}
+
+// The same without digits that say nothing.
+export function tickText(bytes) {
+  return memoryText(bytes).replace(/\.0+ /, ' ');
+}
+
+export function growthText(bytes) {
+  return bytes > 0 ? `+${memoryText(bytes)}` : memoryText(bytes);
+}
+
+export function percentText(part, whole) {
+  return whole > 0 ? `${(100 * part / whole).toFixed(1)} %` : NO_VALUE;
+}
+
+function formatter(options) {
+  return new Intl.DateTimeFormat('sv-SE', {
+    year: 'numeric', month: '2-digit', day: '2-digit', hour: '2-digit', minute: '2-digit',
+    second: '2-digit', ...options,
+  });
+}
+const LOCAL = formatter({});
+const UTC = formatter({timeZone: 'UTC'});
+
+export const ZONE = Intl.DateTimeFormat().resolvedOptions().timeZone;
+const isUtc = ['UTC', 'Etc/UTC', 'GMT', 'Etc/GMT'].includes(ZONE);
+
+function clock(text) {
+  return text.slice(11);
+}
+
+// A time, us since 1970, for the reader and in UTC, which reports and the command line have:
+// "2026-11-21 11:05:00 (10:05:00 UTC)"
+export function timeText(time) {
+  const date = new Date(time / 1000);
+  const local = LOCAL.format(date);
+  const utc = UTC.format(date);
+  if (isUtc) return `${utc} UTC`;
+  return `${local} (${local.slice(0, 10) === utc.slice(0, 10) ? clock(utc) : utc} UTC)`;
+}
+
+export function clockText(time) {
+  return clock((isUtc ? UTC : LOCAL).format(new Date(time / 1000)));
+}
+
+// How long, us: "1 d 2 h", "5 min", "30 s"
+export function spanText(time) {
+  const seconds = Math.round(Math.abs(time) / 1e6);
+  const units = [['d', 86400], ['h', 3600], ['min', 60], ['s', 1]];
+  const first = units.findIndex(([, size]) => seconds >= size);
+  if (first < 0) return '0 s';
+  let rest = seconds;
+  const words = [];
+  for (const [name, size] of units.slice(first, first + 2)) {
+    const count = Math.floor(rest / size);
+    if (count > 0) words.push(`${count} ${name}`);
+    rest -= count * size;
+  }
+  return words.join(' ');
+}

@@ -1,0 +1,121 @@
+// A table that is sorted by its heads, filtered by a word and copied as CSV.
+import {element} from './dom.js';
+
+const SHOWN = 100; // rows, until more are asked for
+
+// `columns`: {name, title, isNumber, compare(a, b), text(row), csv(row), class}; rows are whatever
+// these take.
+export class Grid {
+  constructor(label) {
+    this.label = label;
+    this.filter = '';
+    this.sorted = null; // the name of a column
+    this.isDown = true;
+    this.most = SHOWN;
+    this.head = element('tr');
+    this.body = element('tbody');
+    this.caption = element('p', {class: 'note', role: 'status'});
+    this.more = element('button', {type: 'button', class: 'more', onclick: () => this.showAll()});
+    this.input = element('input', {type: 'search', 'aria-label': `Filter ${label}`, placeholder: 'Filter', oninput: () => this.search()});
+    this.copied = element('span', {class: 'note', role: 'status'});
+    this.tools = element('div', {class: 'tools'}, this.input,
+      element('button', {type: 'button', onclick: () => this.copy()}, 'Copy as CSV'), this.copied);
+    this.scroller = element('div', {class: 'scroller', tabindex: 0, role: 'region', 'aria-label': label},
+      element('table', {class: 'grid', 'aria-label': label}, element('thead', {}, this.head), this.body));
+    this.view = element('div', {}, this.tools, this.caption, this.scroller, this.more);
+  }
+
+  // Shows other rows, or others of their columns.
+  show(columns, rows, caption) {
+    this.columns = columns;
+    this.rows = rows;
+    this.text = caption;
+    if (!columns.some((column) => column.name === this.sorted)) this.sorted = null;
+    this.drawHead();
+    this.draw();
+  }
+
+  sortBy(name, isDown) {
+    this.sorted = name;
+    this.isDown = isDown;
+  }
+
+  search() {
+    this.filter = this.input.value.toLowerCase();
+    this.draw();
+  }
+
+  showAll() {
+    this.most = Infinity;
+    this.draw();
+    this.scroller.focus();
+  }
+
+  drawHead() {
+    this.head.replaceChildren(...this.columns.map((column) => {
+      const isSorted = column.name === this.sorted;
+      const arrow = isSorted ? (this.isDown ? ' ▾' : ' ▴') : '';
+      return element('th', {
+        scope: 'col', class: column.isNumber ? 'number' : null,
+        'aria-sort': isSorted ? (this.isDown ? 'descending' : 'ascending') : null,
+      }, element('button', {type: 'button', title: column.title, onclick: () => this.turn(column)}, `${column.name}${arrow}`));
+    }));
+  }
+
+  // Sorts by a column, numbers with the greatest first, or the other way round.
+  turn(column) {
+    this.sortBy(column.name, this.sorted === column.name ? !this.isDown : column.isNumber);
+    this.drawHead();
+    this.draw();
+    this.head.children[this.columns.indexOf(column)].firstChild.focus();
+  }
+
+  // The rows as they are shown.
+  chosen() {
+    const {filter, columns} = this;
+    const rows = filter === '' ? [...this.rows]
+      : this.rows.filter((row) => columns.some((column) => column.text(row).toLowerCase().includes(filter)));
+    const column = columns.find((each) => each.name === this.sorted);
+    if (column === undefined) return rows;
+    const sign = this.isDown ? -1 : 1;
+    return rows.sort((a, b) => column.compare(a, b, sign));
+  }
+
+  draw() {
+    const rows = this.chosen();
+    const shown = rows.slice(0, this.most);
+    this.body.replaceChildren(...shown.map((row) => element('tr', {}, ...this.columns.map((column, i) =>
+      element(i === 0 ? 'th' : 'td', {scope: i === 0 ? 'row' : null, class: column.isNumber ? 'number' : null}, column.text(row))))));
+    this.caption.textContent = `${this.text}: ${rows.length === this.rows.length ? '' : `${rows.length} of `}${this.rows.length} rows`;
+    this.more.hidden = shown.length === rows.length;
+    this.more.textContent = `Show all ${rows.length} rows`;
+    this.copied.textContent = '';
+  }
+
+  // What is shown, all rows of it, as RFC 4180 has it.
+  csv() {
+    const quoted = (text) => (/[",\r\n]/.test(text) || text === '' ? `"${text.replaceAll('"', '""')}"` : text);
+    const lines = [this.columns.map((column) => quoted(column.name)),
+      ...this.chosen().map((row) => this.columns.map((column) => {
+        const text = column.csv(row);
+        return text === null ? '' : quoted(text);
+      }))];
+    return `${lines.map((line) => line.join(',')).join('\n')}\n`;
+  }
+
+  async copy() {
+    try {
+      await navigator.clipboard.writeText(this.csv());
+      this.copied.textContent = `${this.chosen().length} rows copied`;
+    } catch {
+      this.copied.textContent = 'This browser does not let the page copy';
+    }
+  }
+}
+
+// Compares values of one column: those without one stand last, whichever way it is sorted.
+export function compareValues(a, b, sign) {
+  if (a === null || b === null) return (a === null) - (b === null);
+  if (typeof a === 'string') return sign * a.localeCompare(b, 'en', {numeric: true});
+  return sign * (a < b ? -1 : a > b ? 1 : 0);
+}

@@ -1,0 +1,94 @@
+// Every report of the chosen moment as a table.
+import {choice, element} from './dom.js';
+import {NO_VALUE, UNITS, isMemory, shownValue, timeText} from './format.js';
+import {Grid, compareValues} from './grid.js';
+import {Kind} from './tables.js';
+
+const OWN_UNIT = '';
+
+function isNumber(column) {
+  return column.kind !== Kind.text && column.kind !== Kind.flag;
+}
+
+export class Reports {
+  constructor(data, state) {
+    this.data = data;
+    this.state = state;
+    this.place = 0;
+    this.unit = OWN_UNIT;
+    this.hidden = new Set(); // "report column"
+    this.grid = new Grid('rows of the report');
+    this.columns = element('div', {class: 'columns'});
+    const {reports} = data.head;
+    const units = Object.entries(UNITS).map(([word, {title}]) => [word, title]);
+    this.view = element('section', {class: 'reports', 'aria-labelledby': 'reports'},
+      element('h2', {id: 'reports'}, 'All reports'),
+      element('div', {class: 'tools'},
+        choice('Report', reports.map((report, i) => [String(i), report.name]), '0', (value) => this.choose(Number(value))),
+        choice('Memory in', [[OWN_UNIT, 'its own unit'], ...units], OWN_UNIT, (unit) => {
+          this.unit = unit;
+          this.show();
+        })),
+      element('details', {}, element('summary', {}, 'Columns'), this.columns), this.grid.view);
+    state.watch(['at'], () => this.show());
+    this.drawColumns();
+  }
+
+  choose(place) {
+    this.place = place;
+    this.grid.sortBy(null, true);
+    this.grid.scroller.scrollTo(0, 0);
+    this.drawColumns();
+    this.show();
+  }
+
+  report() {
+    return this.data.head.reports[this.place];
+  }
+
+  isHidden(column) {
+    return this.hidden.has(`${this.report().name} ${column.name}`);
+  }
+
+  turn(column, isShown) {
+    const name = `${this.report().name} ${column.name}`;
+    if (isShown) this.hidden.delete(name);
+    else this.hidden.add(name);
+    this.show();
+  }
+
+  drawColumns() {
+    this.columns.replaceChildren(...this.report().columns.map((column) => element('label', {},
+      element('input', {type: 'checkbox', checked: !this.isHidden(column), onchange: (event) => this.turn(column, event.target.checked)}),
+      element('b', {}, column.name), ` ${column.description.trim()}`)));
+  }
+
+  columnOf(column, place) {
+    const unit = this.unit === OWN_UNIT ? null : this.unit;
+    const title = isMemory(column) && unit !== null ? UNITS[unit].title : column.unit;
+    return {
+      name: column.name,
+      title: `${column.description.trim()}${title === '' ? '' : ` (${title})`}`,
+      isNumber: isNumber(column),
+      text: (row) => shownValue(row.values[place], column, unit),
+      csv: (row) => {
+        const value = row.values[place];
+        if (column.kind === Kind.text) return value;
+        if (column.kind === Kind.flag) return value === null ? null : String(value);
+        const text = shownValue(value, column, unit);
+        return text === NO_VALUE ? null : text;
+      },
+      compare: (a, b, sign) => compareValues(a.values[place], b.values[place], sign),
+    };
+  }
+
+  show() {
+    const at = this.state.get('at');
+    const report = this.report();
+    const rows = this.data.moments[at][this.place];
+    const columns = report.columns.map((column, place) => ({column, place})).filter(({column}) => !this.isHidden(column));
+    const time = timeText(this.data.head.full[at]);
+    const caption = rows === null ? `${report.name} at ${time} could not be read` : `${report.name} at ${time}`;
+    this.grid.show(columns.map(({column, place}) => this.columnOf(column, place)), rows ?? [], caption);
+  }
+}

@@ -1,0 +1,179 @@
+// Where the memory is: the parts of the host at the chosen moment, each as large as its memory.
+import {balanceOf} from './balance.js';
+import {element} from './dom.js';
+import {memoryText, percentText} from './format.js';
+
+const HEAD = 19; // the height of the name of a part that has others in it
+const LEVELS = 3; // that are drawn below the one that is looked into
+const SMALLEST = 3; // of a side; what is smaller cannot be seen
+// Tiles that are wide enough for a name, and for a figure with it.
+const NAMED = 32;
+const SIZED = 58;
+
+function squarified(part, width, height) {
+  const root = d3.hierarchy(part, (each) => each.children);
+  root.eachBefore((node) => {
+    node.scale = node.parent === null ? 1 : node.parent.scale * node.parent.data.share;
+  });
+  // What is in a part adds up to it, and so only what has nothing in it has a size of its own.
+  root.sum((each) => 0);
+  root.eachAfter((node) => {
+    node.value = node.children === undefined
+      ? node.data.bytes * node.scale : d3.sum(node.children, (child) => child.value);
+  });
+  return d3.treemap().size([width, height]).round(true).paddingInner(1)
+    .paddingOuter((node) => (node.depth === 0 ? 0 : 2))
+    .paddingTop((node) => (node.depth === 0 ? 0 : HEAD))(root);
+}
+
+export class Treemap {
+  constructor(data, state) {
+    this.data = data;
+    this.state = state;
+    this.path = [];
+    this.box = element('div', {class: 'treemap', role: 'group', 'aria-label': 'Parts of the memory', onkeydown: (event) => this.key(event)});
+    this.crumbs = element('nav', {class: 'crumbs', 'aria-label': 'Part that is shown'});
+    this.detail = element('p', {class: 'detail', 'aria-live': 'polite'});
+    this.view = element('section', {class: 'where', 'aria-labelledby': 'where'},
+      element('h2', {id: 'where'}, 'Where the memory is'), this.crumbs, this.box, this.detail);
+    state.watch(['at'], () => this.show());
+    new ResizeObserver(() => this.draw()).observe(this.box);
+  }
+
+  // The parts from the host down to the one that is looked into, by their names: at another moment
+  // it is another part of that name.
+  chain() {
+    const chain = [this.root];
+    for (const name of this.path) {
+      const next = chain.at(-1).children.find((child) => child.name === name && child.children.length > 0);
+      if (next === undefined) break;
+      chain.push(next);
+    }
+    return chain;
+  }
+
+  show() {
+    this.root = balanceOf(this.data, this.state.get('at'));
+    this.draw();
+  }
+
+  draw() {
+    if (this.root === undefined) return;
+    this.box.replaceChildren();
+    if (this.root === null) {
+      this.detail.textContent = 'How the memory divides could not be read at this moment.';
+      return;
+    }
+    const chain = this.chain();
+    this.drawCrumbs(chain);
+    const {clientWidth: width, clientHeight: height} = this.box;
+    if (width === 0) return;
+    this.tree = squarified(chain.at(-1), width, height);
+    this.tiles = [];
+    this.nodes = new Map();
+    this.tree.each((node) => this.drawTile(node));
+    if (this.tiles.length > 0) this.tiles[0].tabIndex = 0;
+    this.describe(chain.at(-1), chain);
+  }
+
+  drawCrumbs(chain) {
+    const links = chain.map((part, depth) => {
+      const isLast = depth === chain.length - 1;
+      const text = `${part.name} ${memoryText(part.bytes)}`;
+      return element('li', {}, isLast ? element('span', {'aria-current': 'true'}, text)
+        : element('button', {type: 'button', onclick: () => this.lookInto(this.path.slice(0, depth))}, text));
+    });
+    this.crumbs.replaceChildren(element('ol', {}, ...links));
+  }
+
+  drawTile(node) {
+    const width = node.x1 - node.x0;
+    const height = node.y1 - node.y0;
+    if (node.depth === 0 || node.depth > LEVELS || width < SMALLEST || height < SMALLEST) return;
+    const {data: part} = node;
+    const isOpen = part.children.length > 0 && node.depth < LEVELS && height > HEAD + 4 && width > 30;
+    const names = node.ancestors().reverse().slice(1).map((each) => each.data.name);
+    const tile = element('button', {
+      type: 'button', class: `tile ${part.key}${isOpen ? ' open' : ''}`, tabindex: -1,
+      'aria-label': `${part.name} ${memoryText(part.bytes)}`,
+      onclick: () => this.open(node, names),
+      onfocus: () => this.focus(tile, part, node),
+      onpointerenter: () => this.describe(part, this.partsTo(node)),
+    });
+    if (width > NAMED && height > 13) {
+      tile.append(element('span', {class: 'name'}, part.name), ' ');
+      if (width > SIZED && (height > 32 || isOpen)) tile.append(element('span', {class: 'size'}, memoryText(part.bytes)));
+    }
+    // Of the whole, so that paper of another width shows it, too.
+    const {x1, y1} = this.tree;
+    const percent = (length, whole) => `${100 * length / whole}%`;
+    Object.assign(tile.style, {
+      left: percent(node.x0, x1), top: percent(node.y0, y1), width: percent(width, x1), height: percent(height, y1),
+    });
+    this.tiles.push(tile);
+    this.nodes.set(tile, node);
+    this.box.append(tile);
+  }
+
+  partsTo(node) {
+    return [...this.chain().slice(0, -1), ...node.ancestors().reverse().map((each) => each.data)];
+  }
+
+  // Looks into the part, or into the one that it is in.
+  open(node, names) {
+    const inside = node.data.children.length > 0 ? names : names.slice(0, -1);
+    if (inside.length > 0) this.lookInto([...this.path, ...inside]);
+  }
+
+  lookInto(path) {
+    this.path = path;
+    this.draw();
+    this.tiles[0]?.focus();
+  }
+
+  focus(tile, part, node) {
+    for (const each of this.tiles) each.tabIndex = each === tile ? 0 : -1;
+    this.describe(part, this.partsTo(node));
+  }
+
+  // The figure, its share of the host and where it comes from.
+  describe(part, chain) {
+    const words = [`${memoryText(part.bytes)}, ${percentText(part.bytes, this.root.bytes)} of the host`, part.source];
+    if (part.told !== undefined) words.push(`the group itself has ${memoryText(part.told.bytes)} (${part.told.source})`);
+    if (part.share < 1) {
+      words.push(`what is in it adds up to ${memoryText(part.bytes / part.share)}, as some memory is counted with several, and is drawn at ${percentText(part.share, 1)} of its size`);
+    }
+    if (part.note !== '') words.push(part.note);
+    this.detail.replaceChildren(
+      element('strong', {}, chain.slice(1).map((each) => each.name).join(' › ') || part.name), ` ${words.join(' · ')}`);
+  }
+
+  key(event) {
+    if (event.key === 'Escape' || event.key === 'Backspace') {
+      if (this.path.length > 0) this.lookInto(this.path.slice(0, -1));
+    } else if (event.key.startsWith('Arrow')) {
+      this.neighbour(event.target, event.key)?.focus();
+    } else {
+      return;
+    }
+    event.preventDefault();
+  }
+
+  // The nearest tile in the direction of an arrow.
+  neighbour(tile, key) {
+    const from = this.nodes.get(tile);
+    if (from === undefined) return null;
+    const [dx, dy] = {ArrowLeft: [-1, 0], ArrowRight: [1, 0], ArrowUp: [0, -1], ArrowDown: [0, 1]}[key];
+    let best = null;
+    let least = Infinity;
+    for (const [each, {x0, y0}] of this.nodes) {
+      const ahead = dx * (x0 - from.x0) + dy * (y0 - from.y0);
+      const aside = Math.abs(dy * (x0 - from.x0)) + Math.abs(dx * (y0 - from.y0));
+      if (ahead > 0 && ahead + 3 * aside < least) {
+        least = ahead + 3 * aside;
+        best = each;
+      }
+    }
+    return best;
+  }
+}
