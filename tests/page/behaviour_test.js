@@ -1,0 +1,134 @@
+// Clicks do what they say, and all that is shown goes by the chosen moment.
+import assert from 'node:assert/strict';
+import {join} from 'node:path';
+import {test} from 'node:test';
+import {build, closePage, makePage, openPage} from './browser.js';
+
+const RECORDING = join(build, 'incident.rec');
+const SIZES = {bytes: 1, KB: 2 ** 10, MB: 2 ** 20, GB: 2 ** 30, TB: 2 ** 40};
+
+// "Free 132 GB" in bytes, to three digits.
+function bytesOf(label) {
+  const [, number, unit] = /([\d.]+) (bytes|KB|MB|GB|TB)$/.exec(label);
+  return Number(number) * SIZES[unit];
+}
+
+// The tiles with their sizes and what they say.
+async function tilesOf(page) {
+  const tiles = await page.locator('.tile').evaluateAll((all) => all.map((tile) => {
+    const {left, top, right, bottom} = tile.getBoundingClientRect();
+    return {label: tile.getAttribute('aria-label'), isOpen: tile.classList.contains('open'), left, top, right, bottom};
+  }));
+  return tiles.map((tile) => ({...tile, bytes: bytesOf(tile.label), area: (tile.right - tile.left) * (tile.bottom - tile.top)}));
+}
+
+function contains(outer, inner) {
+  return outer !== inner && outer.left <= inner.left && outer.top <= inner.top && outer.right >= inner.right && outer.bottom >= inner.bottom;
+}
+
+test('the areas add up to the memory of the host', async () => {
+  const page = await openPage(makePage(RECORDING));
+  for (const moment of ['0', '3', '4']) {
+    await page.fill('#slider-at', moment);
+    const tiles = await tilesOf(page);
+    const top = tiles.filter((tile) => !tiles.some((other) => contains(other, tile)));
+    const bytes = top.reduce((sum, tile) => sum + tile.bytes, 0);
+    assert.ok(Math.abs(bytes - 256 * SIZES.GB) < SIZES.GB, `${bytes} of the host`);
+    const area = top.reduce((sum, tile) => sum + tile.area, 0);
+    for (const tile of top) {
+      assert.ok(Math.abs(tile.area / area - tile.bytes / bytes) < 0.01, `${tile.label} has ${tile.area} of ${area}`);
+    }
+  }
+  await closePage(page);
+});
+
+test('a click looks into a part, and a crumb out of it', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const box = await page.locator('.treemap').boundingBox();
+  await page.getByRole('button', {name: /^machines /}).click({position: {x: 12, y: 8}});
+  assert.match(await page.locator('.crumbs').textContent(), /256 GBMachines and processes 104 GBmachines 102 GB$/);
+  const inside = await tilesOf(page);
+  const area = inside.filter((tile) => !inside.some((other) => contains(other, tile))).reduce((sum, tile) => sum + tile.area, 0);
+  assert.ok(area > 0.95 * box.width * box.height);
+  await page.locator('.crumbs button').first().click();
+  assert.equal(await page.locator('.crumbs').textContent(), 'hypervisor.example.org 256 GB');
+  await closePage(page);
+});
+
+test('a part says what it is at the pointer', async () => {
+  const page = await openPage(makePage(RECORDING));
+  await page.locator('.tile', {hasText: 'db-orders'}).hover();
+  assert.match(await page.locator('.where .detail').textContent(), /machines › db-orders 29\.5 GB, 11\.5 % of the host · vm-stats consumed \+ ovhd/);
+  await closePage(page);
+});
+
+test('a moment chosen in the chart moves all else', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const chart = await page.locator('.when .chart').boundingBox();
+  const x = (share) => chart.x + 52 + share * (chart.width - 52 - 26);
+  await page.mouse.click(x(0.75), chart.y + 80);
+  assert.match(await page.locator('.slider output').first().textContent(), /10:05:00 UTC/);
+  assert.match(await page.locator('.tile', {hasText: 'storage-daemon'}).textContent(), /141 GB/);
+  assert.match(await page.locator('.reports p.note').textContent(), /group-stats at 2026-11-21 11:05:00/);
+  assert.deepEqual(await page.locator('.changes .grid tbody tr').allTextContents(), [
+    'Processesstorage-daemon190 MB141 GB+141 GB', 'Machinesbuild-linux14.2 GB6.66 GB−7.56 GB',
+    'Machinesmail6.66 GB3.82 GB−2.84 GB']);
+  await closePage(page);
+});
+
+test('a span dragged in the chart is compared', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const chart = await page.locator('.when .chart').boundingBox();
+  const x = (share) => chart.x + 52 + share * (chart.width - 52 - 26);
+  await page.mouse.move(x(0.5), chart.y + 80);
+  await page.mouse.down();
+  await page.mouse.move(x(0.6), chart.y + 80);
+  await page.mouse.move(x(0.76), chart.y + 80);
+  await page.mouse.up();
+  const times = await page.locator('.slider output').allTextContents();
+  assert.match(times[0], /10:05:00 UTC/);
+  assert.match(times[1], /10:04:00 UTC/);
+  assert.match(await page.locator('.changes caption').textContent(), /11:04:00 .* to .*11:05:00/);
+  await closePage(page);
+});
+
+test('a table is sorted, filtered, narrowed and copied', async () => {
+  const page = await openPage(makePage(RECORDING), {permissions: ['clipboard-read', 'clipboard-write']});
+  const reports = page.locator('.reports');
+  await reports.locator('label:has-text("Report") select').selectOption({label: 'vm-stats'});
+  await reports.locator('thead button', {hasText: /^consumed/}).click();
+  assert.equal(await reports.locator('tbody th').first().textContent(), 'db-orders');
+  await reports.locator('thead button', {hasText: /^consumed/}).click();
+  assert.equal(await reports.locator('tbody th').first().textContent(), 'gateway');
+  await reports.locator('input[type=search]').fill('web');
+  assert.deepEqual(await reports.locator('tbody th').allTextContents(), ['web-03', 'web-01', 'web-02']);
+  await reports.locator('summary').click();
+  for (const box of await reports.locator('.columns label').all()) {
+    if (!['name', 'consumed'].includes(await box.locator('b').textContent())) await box.locator('input').uncheck();
+  }
+  assert.deepEqual(await reports.locator('thead th').allTextContents(), ['name', 'consumed ▴']);
+  await reports.locator('button', {hasText: 'Copy as CSV'}).click();
+  await reports.locator('[role=status]', {hasText: '3 rows copied'}).waitFor();
+  assert.equal(await page.evaluate(() => navigator.clipboard.readText()), 'name,consumed\nweb-03,3724544\nweb-01,6073352\nweb-02,6073352\n');
+  await closePage(page);
+});
+
+test('lines of what is chosen', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const lines = page.locator('section', {has: page.locator('#lines-title')});
+  await lines.locator('select').selectOption({label: 'Processes: consumed'});
+  assert.equal(await lines.locator('.lines label').nth(1).textContent(), 'storage-daemon');
+  await page.click('text=Least free memory');
+  assert.match(await lines.locator('.detail').textContent(), /storage-daemon 141 GB/);
+  const before = await lines.locator('path.line').count();
+  await lines.locator('.lines input').first().check();
+  assert.equal(await lines.locator('path.line').count(), before + 1);
+  await closePage(page);
+});
+
+test('a single moment has no history', async () => {
+  const page = await openPage(makePage(join(build, 'hypervisor.ksi'), '--title', 'A ticket'));
+  assert.equal(await page.locator('h1').textContent(), 'A ticket');
+  assert.deepEqual(await page.locator('h2').allTextContents(), ['Where the memory is', 'All reports']);
+  await closePage(page);
+});

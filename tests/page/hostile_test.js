@@ -1,0 +1,112 @@
+// Nothing that a capture says becomes markup or script, however its names are made.
+import assert from 'node:assert/strict';
+import {readFileSync, writeFileSync} from 'node:fs';
+import {join} from 'node:path';
+import {test} from 'node:test';
+import {closePage, ksicache, makePage, openPage, scratch} from './browser.js';
+
+// One reading a line; its numbers of 64 bits are none of JavaScript's.
+const EXAMPLE = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8').split('\n');
+const NAME = /("node":"sched\/groups\/group(Name|Tag)".*"value":)\{[^}]*\}/;
+
+const NAMES = [
+  '</script><script>alert(1)</script>', '<img src=x onerror=alert(1)>', '"><svg onload=alert(1)>', '<!--', '-->', ']]>',
+  "'); alert(1); ('", '{{head}}', '${1}', '&lt;b&gt;', '\u202egnp.exe', 'a\u0000b', '\u001b[31m', 'line\nbreak', '\u2066x\u2069',
+  '\u200b', '   ', '__proto__', 'constructor', '=1+1', '"quoted", with comma', 'javascript:alert(1)', '\ud83d\ude00', '漢字', 'e\u0301'.repeat(20),
+];
+
+// The same numbers every time.
+function random(seed) {
+  let state = seed;
+  return (most) => {
+    state = (state * 1103515245 + 12345) % 2147483648;
+    return Math.floor(state / 65536) % most;
+  };
+}
+
+const PIECES = ['<', '>', '&', '"', "'", '/', 'script', 'style', '</', '<!--', '-->', '=', '`', '\\', '\u0000', '\u202e', '\u2028', '\ufeff', '\u00a0', '\t', '\ud800', '\udfff', '\u{e0001}', 'x', '7'];
+
+function fuzzedName(next) {
+  return Array.from({length: 1 + next(12)}, () => PIECES[next(PIECES.length)]).join('');
+}
+
+// Names as bytes, which need not be UTF-8.
+function bytesOf(name) {
+  return typeof name === 'string' ? Buffer.from(name, 'utf8') : name;
+}
+
+// The example host with other names of its groups, and of itself.
+function hostWith(names, host) {
+  let next = 0;
+  const lines = EXAMPLE.map((line) => line
+    .replace('"hypervisor.example.org"', () => JSON.stringify(host))
+    .replace(NAME, (_, start, what) => {
+      const size = what === 'Name' ? 64 : 8;
+      const field = Buffer.alloc(size);
+      bytesOf(names[next++ % names.length]).copy(field, 0, 0, size - 1);
+      return `${start}{"text":{"hex":"${field.toString('hex')}"}}`;
+    }));
+  const json = join(scratch, 'hostile.json');
+  writeFileSync(json, lines.join('\n'));
+  const file = join(scratch, 'hostile.ksi');
+  ksicache('load', json, file, '--force');
+  return file;
+}
+
+// What the page consists of, without its texts.
+async function elementsOf(page) {
+  return page.evaluate(() => ({
+    scripts: document.scripts.length,
+    strange: document.querySelectorAll('img, iframe, object, embed, form, a, link, base, video, audio, style ~ style, svg svg').length,
+    handlers: [...document.querySelectorAll('*')].filter((each) => [...each.attributes].some(({name}) => name.startsWith('on'))).length,
+    controls: /[\u0000-\u0008\u000e-\u001f\u200b-\u200f\u202a-\u202e\u2066-\u2069]/.test(document.getElementById('page').innerText),
+  }));
+}
+
+const SOUND = {scripts: 6, strange: 0, handlers: 0, controls: false};
+
+async function look(names, host, title) {
+  const file = hostWith(names, host);
+  const name = makePage(file, '--title', title);
+  const still = await openPage(name, {javaScriptEnabled: false});
+  await closePage(still);
+  const page = await openPage(name);
+  assert.deepEqual(await elementsOf(page), SOUND);
+  // All names in all places that they can be in.
+  for (const report of ['group-stats', 'vm-stats', 'lpool-stats', 'asyncremap-stats']) {
+    await page.selectOption('.reports label:has-text("Report") select', {label: report});
+    assert.deepEqual(await elementsOf(page), SOUND);
+  }
+  await page.locator('.tile', {hasText: 'Free'}).hover();
+  assert.deepEqual(await elementsOf(page), SOUND);
+  return page;
+}
+
+test('names that would be markup, script or other text', async () => {
+  const long = 'L<'.repeat(2000);
+  for (const title of [NAMES[0], long]) {
+    const page = await look(NAMES, `${NAMES[0]}${long}`.slice(0, 4000), title);
+    const overflow = await page.evaluate(() => document.documentElement.scrollWidth - document.documentElement.clientWidth);
+    assert.equal(overflow, 0);
+    await closePage(page);
+  }
+});
+
+test('names are shown as they are, and what hides is written out', async () => {
+  const page = await look(NAMES, 'host', 'title');
+  await page.selectOption('.reports label:has-text("Report") select', {label: 'group-stats'});
+  const cells = await page.locator('.reports').evaluate((reports) => reports.textContent);
+  assert.match(cells, /<\/script><script>alert\(1\)<\/script>/);
+  assert.match(cells, /\\u\{202e\}gnp\.exe/);
+  assert.match(cells, /\\u\{1b\}\[31m/);
+  await closePage(page);
+});
+
+test('names of any bytes', async () => {
+  const next = random(1);
+  for (let round = 0; round < 8; ++round) {
+    const names = Array.from({length: 120}, () => (next(4) === 0
+      ? Buffer.from(Array.from({length: 1 + next(40)}, () => 1 + next(255))) : fuzzedName(next)));
+    await closePage(await look(names, 'host', `title ${fuzzedName(next).replaceAll('\u0000', '')}`));
+  }
+});
