@@ -5,8 +5,8 @@
 cmake_minimum_required(VERSION 3.25)
 
 # Each stands behind those that it imports.
-set(modules bytes data tables lines format dom state balance treemap timeline line_chart grid changes
-  reports main)
+set(modules bytes data tables lines memory comparison format dom state balance treemap timeline
+  line_chart grid changes reports header main)
 
 # The hash of a text as a Content-Security-Policy has it.
 function(hash_of text result)

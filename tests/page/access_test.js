@@ -65,6 +65,7 @@ test('the treemap by the keyboard', async () => {
 
 test('a moment by the keyboard', async () => {
   const page = await openPage(makePage(RECORDING));
+  await page.click('text=Last moment');
   await page.focus('#slider-at');
   await page.keyboard.press('ArrowLeft');
   assert.match(await page.locator('.slider output').first().textContent(), /^2026-11-21 11:05:00 \(10:05:00 UTC\)$/);

@@ -46,6 +46,7 @@ void MomentWalk::Walk(const Part& part) {
     moment.number = part.number + static_cast<int64_t>(i);
     moment.facts = facts[i];
     moment.host = host_;
+    moment.boot = boot_;
     moment.bytes = bytes / static_cast<double>(facts.size());
     Add(std::move(moment));
   }

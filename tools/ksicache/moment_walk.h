@@ -19,6 +19,7 @@ struct WalkedMoment {
   int64_t number = 0;
   ksi::MomentFacts facts;
   std::string host;
+  std::string boot;  // empty: not known
   double bytes = 0;  // its share of the blocks that its part takes
   // us since the one before it, by the clock that nobody sets; 0: not known.
   int64_t passed = 0;

@@ -27,15 +27,15 @@ int Page(const CommandLine& line) {
   const std::string start = name + ": ";
   NewFile file(TargetOf(line), line.Has(kForce), ModeOf(line));
   file.RefuseInput(FileNameOf(name));
-  PageData data(IsRecording(name) ? name + "@.." : name);
+  PageData data;
   try {
-    ReadPage(data);
+    ReadPage(IsRecording(name) ? name + "@.." : name, data);
   } catch (const DataError& error) {
     throw Error(start + error.what());
   }
   for (const std::string& problem : data.problems.All()) PrintError(start + problem);
   const std::string* title = line.ValueOf(kTitle);
-  data.title = title == nullptr ? data.source.survey.host : *title;
+  data.title = title == nullptr ? data.survey.host : *title;
   const std::string html = ToHtml(data);
   file.Commit(std::as_bytes(std::span(html)));
   return data.problems.All().empty() ? 0 : 1;

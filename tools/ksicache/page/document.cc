@@ -27,8 +27,8 @@ std::string ToHtml(const PageData& data) {
   fill("{{title}}", title);
   fill("{{summary}}", SummaryToHtml(data));
   fill("{{head}}", Base64(Packed(HeadToJson(data))));
-  fill("{{points}}", Base64(data.points.bytes));
-  fill("{{tables}}", Base64(data.tables.bytes));
+  fill("{{points}}", Base64(data.tables.points.bytes));
+  fill("{{tables}}", Base64(data.tables.full.bytes));
   fill("{{lines}}", Base64(data.lines.bytes));
   return html.append(rest);
 }

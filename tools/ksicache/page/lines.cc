@@ -61,7 +61,7 @@ void Halve(Line& line) {
   line.resize((line.size() + 1) / 2);
 }
 
-void PutLine(const Line& line, int bits, std::string& bytes) {
+void PutLine(const Line& line, size_t stretches, int bits, std::string& bytes) {
   PutNumber(bytes, static_cast<uint64_t>(bits));
   int64_t before = 0;
   for (const Extent& extent : line) {
@@ -69,6 +69,7 @@ void PutLine(const Line& line, int bits, std::string& bytes) {
     PutNumber(bytes, extent.IsEmpty() ? 0 : 1 + Folded(least - before));
     if (!extent.IsEmpty()) before = least;
   }
+  bytes.append(stretches - line.size(), '\0');
   for (const Extent& extent : line) {
     if (extent.IsEmpty()) continue;
     const int64_t greatest = CutUpward(extent.greatest, bits);
@@ -76,11 +77,8 @@ void PutLine(const Line& line, int bits, std::string& bytes) {
   }
 }
 
-ReportLines::ReportLines(PageTexts& texts, std::vector<const char*> columns, size_t stretches)
-    : texts_(texts),
-      names_(std::move(columns)),
-      stretches_(stretches),
-      sums_(names_.size(), Line(stretches)) {}
+ReportLines::ReportLines(PageTexts& texts, std::vector<const char*> columns)
+    : texts_(texts), names_(std::move(columns)), sums_(names_.size()) {}
 
 void ReportLines::Begin(std::span<const RowColumn> columns, size_t stretch) {
   stretch_ = stretch;
@@ -99,9 +97,14 @@ void ReportLines::Row(std::span<const Value> values) {
   const std::optional<size_t> thing = ThingOf(values);
   for (size_t i = 0; i < places_.size(); ++i) {
     const std::optional<int64_t> figure = FigureOf(values[places_[i]]);
-    if (figure && thing) LineOf(*thing, i)[stretch_].Add(*figure);
+    if (figure && thing) AddTo(lines_[*thing * names_.size() + i], *figure);
     sum_[i] = figure && sum_[i] ? Drawable(*sum_[i] + *figure) : std::nullopt;
   }
+}
+
+void ReportLines::AddTo(Line& line, int64_t figure) const {
+  if (line.size() <= stretch_) line.resize(stretch_ + 1);
+  line[stretch_].Add(figure);
 }
 
 // None for one that has no lines.
@@ -121,26 +124,27 @@ std::optional<size_t> ReportLines::ThingOf(std::span<const Value> values) {
   }
   if (thing == keys_.size()) {
     keys_.push_back(std::move(keys));
-    lines_.resize(lines_.size() + names_.size(), Line(stretches_));
+    lines_.resize(lines_.size() + names_.size());
   }
   return thing;
 }
 
 void ReportLines::End() {
   for (size_t i = 0; i < sum_.size(); ++i) {
-    if (sum_[i]) sums_[i][stretch_].Add(*sum_[i]);
+    if (sum_[i]) AddTo(sums_[i], *sum_[i]);
   }
 }
 
 void ReportLines::Thin() {
   std::ranges::for_each(sums_, Halve);
   std::ranges::for_each(lines_, Halve);
-  stretches_ = (stretches_ + 1) / 2;
 }
 
-void ReportLines::Put(bool isCut, std::string& bytes) const {
+void ReportLines::Put(size_t stretches, bool isCut, std::string& bytes) const {
   for (size_t column = 0; column < names_.size(); ++column) {
-    const auto put = [&](const Line& line) { PutLine(line, isCut ? BitsToCut(line) : 0, bytes); };
+    const auto put = [&](const Line& line) {
+      PutLine(line, stretches, isCut ? BitsToCut(line) : 0, bytes);
+    };
     put(sums_[column]);
     for (size_t at = column; at < lines_.size(); at += names_.size()) put(lines_[at]);
   }

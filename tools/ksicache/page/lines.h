@@ -37,8 +37,9 @@ using Line = std::vector<Extent>;
 // Makes one of each two stretches.
 void Halve(Line& line);
 
-// Puts a line behind `bytes`, with so many bits cut off.
-void PutLine(const Line& line, int bits, std::string& bytes);
+// Puts a line behind `bytes`, with so many bits cut off. It may have fewer stretches than it has
+// to: there is nothing in the others.
+void PutLine(const Line& line, size_t stretches, int bits, std::string& bytes);
 
 // The lines of one report.
 class ReportLines {
@@ -47,9 +48,10 @@ class ReportLines {
   static constexpr uint32_t kMostThings = 2000;
 
   // `columns`: names of figures.
-  ReportLines(PageTexts& texts, std::vector<const char*> columns, size_t stretches);
+  ReportLines(PageTexts& texts, std::vector<const char*> columns);
 
-  // The rows of one moment, of this stretch; the same as of TableStream.
+  // The rows of one moment, of this stretch, which is none before that of the last one; the same as
+  // of TableStream.
   void Begin(std::span<const RowColumn> columns, size_t stretch);
   void Row(std::span<const Value> values);
   // The sums of the moment's rows are known now.
@@ -60,7 +62,7 @@ class ReportLines {
   // Puts the lines behind `bytes`: for each column that of all rows together, which has a figure
   // only where all rows have one, and those of the things. With `isCut` they are as exact as a
   // screen.
-  void Put(bool isCut, std::string& bytes) const;
+  void Put(size_t stretches, bool isCut, std::string& bytes) const;
 
   // The key values of the things, in their order.
   std::string ThingsToJson() const;
@@ -69,12 +71,11 @@ class ReportLines {
   bool LeavesOut() const { return leavesOut_; }
 
  private:
-  Line& LineOf(size_t thing, size_t column) { return lines_[thing * names_.size() + column]; }
+  void AddTo(Line& line, int64_t figure) const;
   std::optional<size_t> ThingOf(std::span<const Value> values);
 
   PageTexts& texts_;
   std::vector<const char*> names_;
-  size_t stretches_;
   size_t stretch_ = 0;
 
   std::vector<RowColumn> columns_;

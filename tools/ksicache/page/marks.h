@@ -7,15 +7,16 @@
 #include <string>
 #include <vector>
 
+#include "tools/ksicache/page/problems.h"
 #include "tools/ksicache/page/survey.h"
 
 namespace ksicache {
 
 // Something that happened between two moments.
 struct Mark {
-  const char* kind;  // "reboot", "clock" or "gap"
+  const char* kind;  // "reboot", "clock", "gap" or "skipped"
   size_t moment;     // the place of the moment after it
-  int64_t time;      // how long the gap is, how far the clock was set; us
+  int64_t time;      // how much later that is, how far the clock was set; us
 };
 
 struct Marks {
@@ -29,8 +30,8 @@ struct Marks {
   size_t lossy = 0;      // moments of which something was left out
 };
 
-// Of a capture there is none. Fails with a DataError.
-Marks MarksOf(const std::string& name, const Survey& survey);
+// Of a capture there are none. Tells the survey which of its moments are of one boot.
+Marks MarksOf(const std::string& name, Survey& survey, Problems& problems);
 
 }  // namespace ksicache
 

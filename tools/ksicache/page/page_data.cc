@@ -4,6 +4,7 @@
 
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/page/memory_rows.h"
 #include "tools/ksicache/page/page_json.h"
 #include "tools/ksicache/page/roles.h"
 
@@ -25,19 +26,22 @@ std::vector<size_t> Marked(const Marks& marks) {
 }
 
 // As many moments in full as there is room for.
-void ReadTablesOf(PageData& data) {
-  const Survey& survey = data.source.survey;
-  for (size_t most = std::min(kMostMoments, survey.moments.size());;) {
-    const std::vector<size_t> wanted = ChooseMoments(survey, Marked(data.marks), most);
-    data.tables = ReadTables(data.source, wanted, kFewestMoments, kRoomOfTables, data.texts);
-    if (data.tables.moments.size() >= wanted.size()) return;
-    if (most <= kFewestMoments) return;
+void ReadTablesOf(const std::string& name, PageData& data) {
+  const Survey& survey = data.survey;
+  WantedMoments wanted = {{}, ChoosePoints(survey, kStretchesOfPoints)};
+  size_t most = std::min(kMostMoments, survey.moments.size());
+  for (bool isLast = false; !isLast;) {
+    wanted.full = ChooseMoments(survey, Marked(data.marks), most);
+    data.tables =
+        ReadTables(name, survey, wanted, kFewestMoments, kRoomOfTables, data.texts, data.problems);
+    const size_t held = data.tables.full.moments.size();
+    isLast = !data.tables.isTooMuch || held == wanted.full.size() || most == kFewestMoments;
     // The first moment is larger than what later ones add to it.
-    most = std::max(kFewestMoments, data.tables.moments.size() * 9 / 10);
+    most = std::max(kFewestMoments, held * 9 / 10);
   }
 }
 
-std::string ToJson(const RowColumn& column, bool isSigned) {
+std::string ToJson(const RowColumn& column) {
   return JsonWriter()
       .Text("name", column.name)
       .Text("description", column.description)
@@ -45,24 +49,37 @@ std::string ToJson(const RowColumn& column, bool isSigned) {
       .Text("unit", column.unit)
       .Flag("isKey", column.isKey)
       .Flag("isCounter", column.isCounter)
-      .Flag("isSigned", isSigned)
+      .Flag("isSigned", column.isSigned)
       .Object();
 }
 
-std::string ToJson(const tally::Report& report, const TableStream& stream) {
+std::string ToJson(const char* name, const TableStream& stream) {
   JsonWriter columns;
-  for (size_t i = 0; i < stream.Columns().size(); ++i) {
-    columns.Json("", ToJson(stream.Columns()[i], stream.IsSigned(i)));
-  }
-  return JsonWriter().Text("name", report.name).Json("columns", columns.Array()).Object();
+  for (const RowColumn& column : stream.Columns()) columns.Json("", ToJson(column));
+  return JsonWriter().Text("name", name).Json("columns", columns.Array()).Object();
 }
 
 std::string ReportsToJson(const MomentTables& tables) {
   JsonWriter reports;
-  for (size_t i = 0; i < tables.streams.size(); ++i) {
-    reports.Json("", ToJson(*tally::Reports()[i], tables.streams[i]));
+  for (size_t i = 0; i < tally::Reports().size(); ++i) {
+    reports.Json("", ToJson(tally::Reports()[i]->name, tables.streams[i]));
   }
   return reports.Array();
+}
+
+// How long the memory was in which state, as moments: from best to worst.
+std::string StatesToJson(const Survey& survey) {
+  std::vector<int64_t> counts(roles::States().size() + 1);
+  for (const SurveyedMoment& moment : survey.moments) ++counts[moment.state];
+  JsonWriter states;
+  for (const int64_t count : counts) states.Number("", count);
+  return states.Array();
+}
+
+std::string BootsToJson(const Survey& survey, const std::vector<size_t>& moments) {
+  JsonWriter boots;
+  for (const size_t moment : moments) boots.Number("", survey.moments[moment].boot);
+  return boots.Array();
 }
 
 std::string TimesToJson(const Survey& survey, const std::vector<size_t>& moments) {
@@ -116,32 +133,38 @@ std::string TextsToJson(const std::vector<std::string>& texts) {
 
 }  // namespace
 
-void ReadPage(PageData& data) {
+void ReadPage(const std::string& name, PageData& data) {
+  LinesReader lines(data.texts, data.problems);
   std::string problem;
-  data.source.survey = MakeSurvey(data.source.name, problem);
+  data.survey = MakeSurvey(
+      name, [&](const Origin& origin) { lines.Read(origin); }, problem);
   data.problems.AddDiagnostics();
   if (!problem.empty()) data.problems.Add(problem);
+  data.lines = lines.Finish(kRoomOfLines);
   try {
-    data.marks = MarksOf(data.source.name, data.source.survey);
+    data.marks = MarksOf(name, data.survey, data.problems);
   } catch (const DataError& error) {
     data.problems.Add(error.what());
   }
-  data.points =
-      ReadPoints(data.source, ChoosePoints(data.source.survey, kStretchesOfPoints), data.texts);
-  ReadTablesOf(data);
-  data.lines = ReadLines(data.source, kRoomOfLines, data.texts);
-  if (data.tables.moments.empty()) throw DataError("nothing of it could be read");
+  ReadTablesOf(name, data);
+  if (data.tables.full.moments.empty()) throw DataError("nothing of it could be read");
 }
 
 std::string HeadToJson(const PageData& data) {
-  const Survey& survey = data.source.survey;
+  const Survey& survey = data.survey;
+  const std::vector<size_t>& full = data.tables.full.moments;
   return JsonWriter()
       .Text("title", data.title)
       .Text("host", survey.host)
       .Number("moments", static_cast<int64_t>(survey.moments.size()))
-      .Json("points", TimesToJson(survey, data.points.moments))
-      .Json("full", TimesToJson(survey, data.tables.moments))
-      .Json("reports", ReportsToJson(data.tables))
+      .Text("kernel", survey.kernel)
+      .Json("states", StatesToJson(survey))
+      .Json("points", TimesToJson(survey, data.tables.points.moments))
+      .Json("full", TimesToJson(survey, full))
+      .Json("boots", BootsToJson(survey, full))
+      .Json("reports", ReportsToJson(data.tables.full))
+      .Json("memory", ToJson("memory", data.tables.full.streams.back()))
+      .Json("parts", PartsToJson())
       .Json("marks", ToJson(data.marks, survey))
       .Json("problems", TextsToJson(data.problems.All()))
       .Json("lines", ToJson(data.lines))

@@ -4,28 +4,28 @@
 
 #include <string>
 
+#include "tools/ksicache/page/lines_reader.h"
 #include "tools/ksicache/page/marks.h"
-#include "tools/ksicache/page/moment_reader.h"
+#include "tools/ksicache/page/problems.h"
+#include "tools/ksicache/page/survey.h"
+#include "tools/ksicache/page/table_stream.h"
+#include "tools/ksicache/page/tables_reader.h"
 
 namespace ksicache {
 
 struct PageData {
-  explicit PageData(const std::string& name) : source{name, {}, problems} {}
-  PageData(const PageData&) = delete;
-  PageData& operator=(const PageData&) = delete;
-
   std::string title;
   Problems problems;
-  PageSource source;
+  Survey survey;
   Marks marks;
   PageTexts texts;
-  MomentTables points;  // of the host's report, the moments that its balance is drawn from
-  MomentTables tables;  // of all reports, the moments that are shown in full
+  PageTables tables;
   PageLines lines;
 };
 
-// Reads what `data` is of. Fails with a DataError when there is nothing to show.
-void ReadPage(PageData& data);
+// Reads what "FILE", "FILE@WHEN" or "FILE@FROM..TO" is, into an empty `data`. Fails with a
+// DataError when there is nothing to show.
+void ReadPage(const std::string& name, PageData& data);
 
 // What the page's scripts read first: all of it but for the packed bytes, as JSON.
 std::string HeadToJson(const PageData& data);

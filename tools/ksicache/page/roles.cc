@@ -6,7 +6,6 @@
 namespace ksicache::roles {
 namespace {
 
-// As reports show the memory states, from best to worst.
 #define TITLE(number, identifier, name, title) title,
 constexpr const char* kStates[] = {KSI_MEMORY_STATES(TITLE)};
 #undef TITLE
@@ -26,18 +25,19 @@ std::string ToJson(const Part& part) {
 }
 
 std::string ToJson(const Things& things) {
-  JsonWriter sizes;
-  for (const char* size : things.sizes) {
-    if (size != nullptr) sizes.Text("", size);
-  }
   return JsonWriter()
-      .Text("key", things.key)
-      .Text("title", things.title)
       .Text("report", things.report)
       .Text("name", things.name)
-      .Text("id", things.id)
-      .Text("parent", things.parent)
-      .Json("sizes", sizes.Array())
+      .Text("size", things.size)
+      .Object();
+}
+
+std::string ToJson(const Groups& groups) {
+  return JsonWriter()
+      .Text("report", groups.report)
+      .Text("name", groups.name)
+      .Text("id", groups.id)
+      .Text("parent", groups.parent)
       .Object();
 }
 
@@ -58,6 +58,8 @@ std::string AllToJson(const Role (&roles)[kCount]) {
 
 }  // namespace
 
+std::span<const char* const> States() { return kStates; }
+
 std::string ToJson() {
   return JsonWriter()
       .Text("report", kHostReport)
@@ -68,6 +70,7 @@ std::string ToJson() {
       .Json("parts", AllToJson(kParts))
       .Json("startParts", AllToJson(kStartParts))
       .Json("things", AllToJson(kThings))
+      .Json("groups", ToJson(kGroups))
       .Json("lines", AllToJson(kLines))
       .Object();
 }

@@ -1,11 +1,12 @@
 // What a page draws of which columns: the one place of the page that knows columns by name.
 //
 // A host's memory divides as comp-stats tells; heaps lie in the kernel's part, machines and
-// processes, which hang in the tree of groups, in that of the clients. Whatever the parts leave of
-// the whole has a name, too (web/balance.js).
+// processes, which hang in the tree of groups, in that of the clients (web/balance.js). Who has
+// memory, and how much, diff/memory.h says.
 #ifndef TOOLS_KSICACHE_PAGE_ROLES_H_
 #define TOOLS_KSICACHE_PAGE_ROLES_H_
 
+#include <span>
 #include <string>
 
 namespace ksicache::roles {
@@ -38,23 +39,30 @@ inline constexpr Part kStartParts[] = {
     {"start", "Low memory that is kept", "rsvdLow"},
 };
 
-// The rows of a report as things with a size.
+// The rows of a report as things with a size, for readers without scripts.
 struct Things {
-  const char* key;
   const char* title;
   const char* report;
   const char* name;
-  const char* id;      // the group that it is, or is in; null: in none
-  const char* parent;  // the group above that one; null: not told
-  const char* sizes[2];
+  const char* size;
 };
 
 inline constexpr Things kThings[] = {
-    {"machines", "Machines", "vm-stats", "name", "schedGrp", "parSchedGroup", {"consumed", "ovhd"}},
-    {"groups", "Groups", "group-stats", "name", "gid", "parGid", {"consumed"}},
-    {"processes", "Processes", "uw-stats", "name", "schedGrp", "parSchedGroup", {"consumed"}},
-    {"heaps", "Heaps", "heap-stats", "name", nullptr, nullptr, {"size"}},
+    {"Machines", "vm-stats", "name", "consumed"},
+    {"Groups", "group-stats", "name", "consumed"},
+    {"Processes", "uw-stats", "name", "consumed"},
+    {"Heaps", "heap-stats", "name", "size"},
 };
+
+// The tree of groups, in which machines and processes hang.
+struct Groups {
+  const char* report;
+  const char* name;
+  const char* id;
+  const char* parent;
+};
+
+inline constexpr Groups kGroups = {"group-stats", "name", "gid", "parGid"};
 
 // A figure of each row of a report over time.
 struct Line {
@@ -63,6 +71,7 @@ struct Line {
   const char* column;
 };
 
+// Those of one report stand together.
 inline constexpr Line kLines[] = {
     {"Machines: consumed", "vm-stats", "consumed"},
     {"Machines: ballooned", "vm-stats", "ballooned"},
@@ -70,9 +79,14 @@ inline constexpr Line kLines[] = {
     {"Machines: compressed", "vm-stats", "zipped"},
     {"Machines: saved by sharing", "vm-stats", "sharedSaved"},
     {"Groups: consumed", "group-stats", "consumed"},
+    {"Groups: kept from running", "group-stats", "throttlePct"},
     {"Processes: consumed", "uw-stats", "consumed"},
     {"Heaps: size", "heap-stats", "size"},
+    {"The host: free", kHostReport, kFree},
 };
+
+// As reports show the memory states, from best to worst.
+std::span<const char* const> States();
 
 // All of it for the page's scripts.
 std::string ToJson();

@@ -23,7 +23,7 @@ class LastRows {
   LastRows(const PageData& data, std::string_view report) : data_(data) {
     const auto reports = tally::Reports();
     const auto found = std::ranges::find(reports, report, &tally::Report::name);
-    stream_ = &data.tables.streams[static_cast<size_t>(found - reports.begin())];
+    stream_ = &data.tables.full.streams[static_cast<size_t>(found - reports.begin())];
   }
 
   size_t Count() const { return stream_->Rows(); }
@@ -126,7 +126,7 @@ std::string LargestToHtml(const PageData& data, const roles::Things& things) {
   if (rows.Count() == 0) return {};
   std::vector<size_t> order(rows.Count());
   for (size_t i = 0; i < order.size(); ++i) order[i] = i;
-  const auto sizeOf = [&](size_t row) { return rows.BytesAt(row, things.sizes[0]).value_or(0); };
+  const auto sizeOf = [&](size_t row) { return rows.BytesAt(row, things.size).value_or(0); };
   std::ranges::stable_sort(order, std::ranges::greater(), sizeOf);
   order.resize(std::min(order.size(), kLargest));
 
@@ -181,7 +181,7 @@ std::string HtmlText(std::string_view text) {
 }
 
 std::string SummaryToHtml(const PageData& data) {
-  const Survey& survey = data.source.survey;
+  const Survey& survey = data.survey;
   const std::string first = ksi::TextOfTime(survey.moments.front().taken);
   const std::string last = ksi::TextOfTime(survey.moments.back().taken);
   const size_t count = survey.moments.size();

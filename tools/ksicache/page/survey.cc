@@ -8,6 +8,7 @@
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/row_sink.h"
+#include "tools/ksicache/moment_report.h"
 #include "tools/ksicache/page/roles.h"
 #include "tools/ksicache/report_run.h"
 
@@ -16,26 +17,64 @@ namespace {
 
 constexpr uint64_t kUnknown = UINT64_MAX;
 
-// Takes the free memory from the host's row.
-class FreeMemory : public RowFormat {
+size_t PlaceOf(std::span<const RowColumn> columns, std::string_view name) {
+  size_t place = 0;
+  while (columns[place].name != name) ++place;
+  return place;
+}
+
+size_t StateOf(const Value& value) {
+  const auto states = roles::States();
+  const auto found = std::ranges::find(states, value.text);
+  return static_cast<size_t>(found - states.begin());
+}
+
+// Takes what a survey has of a moment from the host's row.
+class HostFigures : public RowFormat {
  public:
-  uint64_t Take() { return std::exchange(free_, kUnknown); }
+  SurveyedMoment Take(int64_t taken) {
+    SurveyedMoment moment = std::exchange(moment_, kNothing);
+    moment.taken = taken;
+    return moment;
+  }
 
   void Begin(const RowTable& table) override {
-    place_ = 0;
-    while (table.columns[place_].name != std::string_view(roles::kFree)) ++place_;
+    free_ = PlaceOf(table.columns, roles::kFree);
+    state_ = PlaceOf(table.columns, roles::kState);
   }
   void Row(std::span<const Value> values) override {
-    if (values[place_].type == ValueType::unsignedNumber) free_ = values[place_].number;
+    if (values[free_].type == ValueType::unsignedNumber) moment_.free = values[free_].number;
+    moment_.state = StateOf(values[state_]);
   }
   void Finish() override {}
 
  private:
-  size_t place_ = 0;
-  uint64_t free_ = kUnknown;
+  static inline const SurveyedMoment kNothing = {0, kUnknown, roles::States().size()};
+
+  size_t free_ = 0;
+  size_t state_ = 0;
+  SurveyedMoment moment_ = kNothing;
 };
 
-// The first place of it, as StretchOf has it.
+// Takes what is known of the kernel.
+class Kernel : public RowFormat {
+ public:
+  std::string built;
+
+  void Begin(const RowTable& /*table*/) override {}
+  void Row(std::span<const Value> values) override { built = values[0].text; }
+  void Finish() override {}
+};
+
+std::string KernelOf(const Origin& origin) {
+  Kernel kernel;
+  RowSink sink(kernel, std::nullopt);
+  sink.Expect(kMomentReport, origin);
+  RunReport(kMomentReport, sink);
+  return kernel.built;
+}
+
+// The first of `size` places in one of `count` stretches, as even as can be.
 size_t StretchBegin(size_t stretch, size_t count, size_t size) { return stretch * size / count; }
 
 // Calls with the first and the last place of each stretch.
@@ -65,31 +104,30 @@ std::optional<size_t> Survey::Find(int64_t taken, size_t from) const {
   return std::nullopt;
 }
 
-Survey MakeSurvey(const std::string& name, std::string& problem) {
+Survey MakeSurvey(const std::string& name, const std::function<void(const Origin&)>& also,
+                  std::string& problem) {
   Survey survey;
-  FreeMemory free;
-  RowSink sink(free, tally::DisplayUnit::kb);
+  HostFigures figures;
+  RowSink sink(figures, tally::DisplayUnit::kb);
   const tally::Report& report = *tally::FindReport(roles::kHostReport);
   try {
     ForEachMoment(name, [&](const Origin& origin) {
       survey.host = origin.host;
+      if (survey.kernel.empty()) survey.kernel = KernelOf(origin);
       sink.Expect(report, origin);
       try {
         RunReport(report, sink);
       } catch (const DataError&) {
         // It is said when the moment is read in full.
       }
-      survey.moments.push_back({origin.taken, free.Take()});
+      survey.moments.push_back(figures.Take(origin.taken));
+      also(origin);
     });
   } catch (const DataError& error) {
     if (survey.moments.empty()) throw;
     problem = error.what();
   }
   return survey;
-}
-
-size_t StretchOf(size_t place, size_t count, size_t size) {
-  return ((place + 1) * count - 1) / size;
 }
 
 std::vector<size_t> ChooseMoments(const Survey& survey, const std::vector<size_t>& wanted,

@@ -4,32 +4,38 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "tools/ksicache/report_run.h"
+
 namespace ksicache {
 
 struct SurveyedMoment {
-  int64_t taken;  // us since 1970
-  uint64_t free;  // KB; all ones if it is not known
+  int64_t taken;      // us since 1970
+  uint64_t free;      // KB; all ones if it is not known
+  size_t state;       // of the memory, among roles::States(); as many as these if it is not known
+  uint32_t boot = 0;  // of which start of the host; 0 if it is not known
 };
 
 struct Survey {
-  std::string host;  // of the last moment
+  std::string host;    // of the last moment
+  std::string kernel;  // when the definitions of its kernel were built
   std::vector<SurveyedMoment> moments;
+  bool hasReboots = false;
 
   // The place of the moment that was taken then, at `from` or behind it: a recording that is still
   // written may have other moments by the time it is read again.
   std::optional<size_t> Find(int64_t taken, size_t from) const;
 };
 
-// Fails with a DataError when there is no moment at all; a failure after the first one is given
-// back in `problem`.
-Survey MakeSurvey(const std::string& name, std::string& problem);
-
-// Which of `count` stretches, as even as can be, of `size` moments the moment at `place` is in.
-size_t StretchOf(size_t place, size_t count, size_t size);
+// Goes through all moments and calls `also` with each while the library answers from it. Fails with
+// a DataError when there is no moment at all; a failure after the first one is given back in
+// `problem`.
+Survey MakeSurvey(const std::string& name, const std::function<void(const Origin&)>& also,
+                  std::string& problem);
 
 // The moments to show in full, at most so many, in their order: the first and the last, the one
 // with the least free memory of each of as many stretches as there is room for, and those of

@@ -61,15 +61,12 @@ void TableStream::Begin(std::span<const RowColumn> columns) {
   cells_.clear();
   if (!columns_.empty()) return;
   columns_.assign(columns.begin(), columns.end());
-  isSigned_.resize(columns.size());
 }
 
 void TableStream::Row(std::span<const Value> values) {
-  for (size_t i = 0; i < values.size(); ++i) {
-    const Value& value = values[i];
+  for (const Value& value : values) {
     const bool isText = value.type == ValueType::text;
     cells_.push_back({value.type, isText ? texts_.NumberOf(value.text) : value.number});
-    if (value.type == ValueType::signedNumber) isSigned_[i] = true;
   }
 }
 

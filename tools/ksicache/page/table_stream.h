@@ -74,7 +74,6 @@ class TableStream {
 
   // What the columns are, known from the first moment on; the names live as long as the program.
   const std::vector<RowColumn>& Columns() const { return columns_; }
-  bool IsSigned(size_t column) const { return isSigned_[column]; }
 
   // One moment: Begin, Row for each row, then End, which puts it behind `bytes`; a report that is
   // neither whole nor has rows could not be read.
@@ -96,7 +95,6 @@ class TableStream {
 
   PageTexts& texts_;
   std::vector<RowColumn> columns_;
-  std::vector<bool> isSigned_;
   RowIdentities identities_;
   std::vector<PageValue> cells_;  // of the moment at hand
   std::vector<uint32_t> ids_;

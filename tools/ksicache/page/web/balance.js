@@ -3,7 +3,7 @@
 // A part is {name, key, bytes, source, children, share, note}: `key` is the style that it has,
 // `source` says which report and columns it comes from, `share` by how much its children are drawn
 // smaller than they are because together they would be larger than it.
-import {bytesOf, shownText} from './format.js';
+import {bytesOf, memoryText, shownText} from './format.js';
 
 // Groups in groups that a page follows; those further down belong to the last one.
 const DEEPEST = 64;
@@ -34,6 +34,10 @@ function sumOf(parts) {
   return parts.reduce((sum, each) => sum + each.bytes, 0);
 }
 
+function bySize(parts) {
+  return parts.filter((each) => each.bytes > 0).sort((a, b) => b.bytes - a.bytes);
+}
+
 // Makes the children of a part as large as it is: what they leave has a name, and where they are
 // more, because some memory is counted with several of them, they share it.
 function settle(whole, restName) {
@@ -47,60 +51,67 @@ function settle(whole, restName) {
   return whole;
 }
 
-// The things of a report that have a size; `unknown` counts those that have none.
-function thingsOf(data, moment, role) {
-  const rows = new Rows(data, moment, role.report);
-  const things = {all: [], unknown: 0};
-  for (const row of rows.rows) {
-    const sizes = role.sizes.map((size) => rows.bytes(row, size));
-    if (sizes[0] === null) {
-      ++things.unknown;
-      continue;
-    }
-    const bytes = sizes.reduce((sum, size) => sum + (size ?? 0), 0);
-    const name = shownText(rows.value(row, role.name));
-    const thing = part(name, role.key, bytes, `${role.report} ${role.sizes.join(' + ')}`);
-    thing.id = role.id === null ? null : String(rows.value(row, role.id));
-    thing.parent = role.parent === null ? null : String(rows.value(row, role.parent));
-    things.all.push(thing);
+// The things of one kind, each with what it has of another kind in it: of machines their overhead,
+// of user worlds their page tables. `unknown` counts those without a figure.
+class Things {
+  constructor(data, moment, key, kind, beside) {
+    const info = (name) => data.head.parts.find((each) => each.name === name);
+    this.info = info(kind);
+    this.besideInfo = beside === undefined ? null : info(beside);
+    this.key = key;
+    this.unknown = 0;
+    this.all = [];
+    const {parts} = data.memory[moment];
+    this.beside = new Map((parts[beside] ?? []).map((thing) => [String(thing.number), thing.bytes]));
+    for (const thing of parts[kind] ?? []) this.add(thing);
   }
-  return things;
-}
 
-function bySize(parts) {
-  return parts.filter((each) => each.bytes > 0).sort((a, b) => b.bytes - a.bytes);
+  add(thing) {
+    if (thing.bytes === null) {
+      ++this.unknown;
+      return;
+    }
+    const id = String(thing.number);
+    const more = Number(this.beside.get(id) ?? 0);
+    this.beside.delete(id); // once, should two have one number
+    const source = this.besideInfo === null ? this.info.source : `${this.info.source} + ${this.besideInfo.source}`;
+    const made = part(shownText(thing.name), this.key, Number(thing.bytes) + more, source);
+    made.id = id;
+    if (more > 0) made.note = `${memoryText(more)} of it ${this.besideInfo.name}`;
+    this.all.push(made);
+  }
 }
 
 // Machines and processes in the tree of groups.
 class Groups {
-  constructor(groups) {
-    this.groups = new Map(groups.map((group) => [group.id, {group, below: [], things: []}]));
-    this.top = {group: null, below: [], things: []};
+  constructor(data, moment) {
+    const role = data.head.roles.groups;
+    const rows = new Rows(data, moment, role.report);
+    const told = new Map((data.memory[moment].parts.groups ?? []).map((thing) => [String(thing.number), thing]));
+    this.told = told;
+    this.source = data.head.parts.find((each) => each.name === 'groups').source;
+    this.groups = new Map(rows.rows.map((row) => [String(rows.value(row, role.id)), {
+      name: shownText(rows.value(row, role.name) ?? ''), parent: String(rows.value(row, role.parent)), below: [], things: [],
+    }]));
+    this.top = {below: [], things: []};
     for (const [id, each] of this.groups) {
-      const above = each.group.parent === id ? undefined : this.groups.get(each.group.parent);
+      each.id = id;
+      const above = each.parent === id ? undefined : this.groups.get(each.parent);
       (above ?? this.top).below.push(each);
     }
   }
 
-  // A machine is its group, and all that is below it.
-  addMachine(machine) {
-    const group = this.groups.get(machine.id);
-    if (group === undefined) this.top.things.push(machine);
-    else group.machine = machine;
-  }
-
-  addProcess(process) {
-    const group = this.groups.get(process.id) ?? this.groups.get(process.parent) ?? this.top;
-    group.things.push(process);
+  // What is in the group of its number, or is that group.
+  add(thing) {
+    (this.groups.get(thing.id) ?? this.top).things.push(thing);
   }
 
   // The parts that a group consists of.
   partsOf(each, depth) {
-    if (each.machine !== undefined) return [each.machine];
     const parts = [...each.things];
     for (const below of each.below) {
       const inside = this.partsOf(below, depth + 1);
-      if (depth < DEEPEST) parts.push(...this.grouped(below.group, bySize(inside)));
+      if (depth < DEEPEST) parts.push(...this.grouped(below, inside));
       else parts.push(...inside);
     }
     return bySize(parts);
@@ -110,7 +121,8 @@ class Groups {
   grouped(group, parts) {
     if (parts.length <= 1) return parts;
     const whole = part(group.name, 'groups', sumOf(parts), 'the sum of what is in it', parts);
-    whole.told = group;
+    const own = this.told.get(group.id)?.bytes ?? null;
+    if (own !== null) whole.note = `the group itself has ${memoryText(Number(own))} (${this.source})`;
     return [whole];
   }
 
@@ -121,13 +133,29 @@ class Groups {
   }
 }
 
-function clientsOf(data, moment, roles) {
-  const [machines, groups, processes] = ['machines', 'groups', 'processes'].map((key) =>
-    thingsOf(data, moment, roles.things.find((role) => role.key === key)));
-  const tree = new Groups(groups.all);
-  for (const machine of machines.all) tree.addMachine(machine);
-  for (const process of processes.all) tree.addProcess(process);
-  return {parts: tree.parts(), unknown: machines.unknown + processes.unknown};
+function clientsOf(data, moment) {
+  const machines = new Things(data, moment, 'machines', 'machines', 'overheads of machines');
+  const worlds = new Things(data, moment, 'processes', 'user worlds', 'page tables');
+  const tree = new Groups(data, moment);
+  for (const thing of [...machines.all, ...worlds.all]) tree.add(thing);
+  return {children: tree.parts(), unknown: machines.unknown + worlds.unknown, rest: 'Not told apart'};
+}
+
+function heapsOf(data, moment) {
+  const heaps = new Things(data, moment, 'heaps', 'heaps');
+  return {children: bySize(heaps.all), unknown: heaps.unknown, rest: 'Outside of heaps'};
+}
+
+// What is inside of a part of the host.
+const INSIDE = {kernel: heapsOf, clients: clientsOf};
+
+function managedPart(data, moment, role, bytes) {
+  const whole = part(role.title, role.key, bytes, `${data.head.roles.report} ${role.column}`);
+  const inside = INSIDE[role.key]?.(data, moment);
+  if (inside === undefined) return whole;
+  whole.children = inside.children;
+  if (inside.unknown > 0) whole.note = `${inside.unknown} in it have no figure`;
+  return settle(whole, inside.rest);
 }
 
 function takenAtStart(host, row, roles, total, managed) {
@@ -140,27 +168,9 @@ function takenAtStart(host, row, roles, total, managed) {
   return settle(whole, 'Other');
 }
 
-function managedPart(data, moment, roles, role, bytes) {
-  const whole = part(role.title, role.key, bytes, `${roles.report} ${role.column}`);
-  let unknown = 0;
-  if (role.key === 'kernel') {
-    const heaps = thingsOf(data, moment, roles.things.find((each) => each.key === 'heaps'));
-    whole.children = bySize(heaps.all);
-    unknown = heaps.unknown;
-    settle(whole, 'Outside of heaps');
-  } else if (role.key === 'clients') {
-    const clients = clientsOf(data, moment, roles);
-    whole.children = clients.parts;
-    unknown = clients.unknown;
-    settle(whole, 'Not told apart');
-  }
-  if (unknown > 0) whole.note = `${unknown} in it have no figure`;
-  return whole;
-}
-
 // The tree of the host at a moment; null if its memory is not told.
 export function balanceOf(data, moment) {
-  const roles = data.head.roles;
+  const {roles} = data.head;
   const host = new Rows(data, moment, roles.report);
   const row = host.rows[0];
   const total = row === undefined ? null : host.bytes(row, roles.total);
@@ -169,7 +179,7 @@ export function balanceOf(data, moment) {
   const whole = part(shownText(data.head.host), 'host', total, `${roles.report} ${roles.total}`);
   for (const role of roles.parts) {
     const bytes = host.bytes(row, role.column);
-    if (bytes > 0) whole.children.push(managedPart(data, moment, roles, role, bytes));
+    if (bytes > 0) whole.children.push(managedPart(data, moment, role, bytes));
   }
   if (managed !== null && managed < total) {
     whole.children.push(takenAtStart(host, row, roles, total, managed));

@@ -1,102 +1,135 @@
-// What changed between the two chosen moments: things by their growth.
-import {Rows} from './balance.js';
+// What changed between the two chosen moments, as `ksicache diff` has it.
 import {choice, element} from './dom.js';
-import {growthText, memoryText, percentText, shownText, timeText} from './format.js';
+import {NO_VALUE, UNITS, shownText, timeText} from './format.js';
+import {compared} from './comparison.js';
 import {Grid, compareValues} from './grid.js';
 
-// The things of a report at two moments, by what they are, not by their place.
-function compared(data, role, from, at) {
-  const rows = (moment) => new Rows(data, moment, role.report);
-  const before = rows(from);
-  const after = rows(at);
-  const size = (all, row) => role.sizes.reduce((sum, name) => {
-    const bytes = all.bytes(row, name);
-    return sum === null || bytes === null ? null : sum + bytes;
-  }, 0);
-  const pairs = new Map();
-  const put = (all, which) => all.rows.forEach((row) => {
-    const pair = pairs.get(row.id) ?? {kind: role.title, name: shownText(all.value(row, role.name)), before: null, after: null, was: false, is: false};
-    pair[which] = size(all, row);
-    pair[which === 'before' ? 'was' : 'is'] = true;
-    pairs.set(row.id, pair);
-  });
-  put(before, 'before');
-  put(after, 'after');
-  return [...pairs.values()].map((pair) => ({...pair, growth: growthOf(pair), what: pair.was ? (pair.is ? '' : 'gone') : 'new'}));
+const HOST = [['total', 'Total'], ['free', 'Free'], ['used', 'In use'], ['kernel', 'Kernel'], ['caches', 'Caches'], ['others', 'Others']];
+
+// What an indented figure of the host is part of.
+const INNER = ['kernel', 'caches', 'others'];
+
+function numberText(number) {
+  return number === null ? NO_VALUE : String(number);
 }
 
-function growthOf({before, after, was, is}) {
-  if ((was && before === null) || (is && after === null)) return null;
-  return (after ?? 0) - (before ?? 0);
+function growthText(number) {
+  return number > 0n ? `+${number}` : numberText(number);
 }
 
-// Of the host itself: the parts of its balance.
-function balance(data, from, at) {
-  const {roles} = data.head;
-  const [before, after] = [from, at].map((moment) => new Rows(data, moment, roles.report));
-  if (before.rows.length === 0 || after.rows.length === 0) return [];
-  return roles.parts.map((part) => {
-    const [was, is] = [before.bytes(before.rows[0], part.column), after.bytes(after.rows[0], part.column)];
-    return {title: part.title, before: was, after: is, growth: was === null || is === null ? null : is - was};
-  });
+// The part of the growth of what is in use.
+function partText(part, whole) {
+  if (part === null || whole === null || whole === 0n) return NO_VALUE;
+  const percent = 100 * Number(part) / Number(whole);
+  if (percent !== 0 && Math.abs(percent) < 0.5) return percent < 0 ? '> −1 %' : '< 1 %';
+  return `${percent.toFixed(0)} %`;
 }
 
+function cells(...texts) {
+  return texts.map((text) => element('td', {class: 'number'}, text));
+}
+
+function figureRow(title, figure, whole, attributes = {}) {
+  return element('tr', attributes, element('th', {scope: 'row'}, title),
+    ...cells(numberText(figure.before), numberText(figure.after), growthText(figure.growth), partText(figure.growth, whole)));
+}
+
+function scroller(label, table) {
+  return element('div', {class: 'scroller', tabindex: 0, role: 'region', 'aria-label': label}, table);
+}
+
+// What one column of the table of things shows, sorts by and copies.
 const COLUMNS = [
-  {name: 'kind', title: 'What it is', key: 'kind', isNumber: false},
-  {name: 'name', title: 'Its name', key: 'name', isNumber: false},
+  {name: 'what', title: 'Of which kind it is', key: 'kind'},
+  {name: 'name', title: 'Its name', key: 'name'},
+  {name: 'group', title: "The kernel's number of its group", key: 'number', isNumber: true},
+  {name: 'state', title: 'Whether it is new, gone or has changed', key: 'state'},
   {name: 'before', title: 'Memory at the earlier moment', key: 'before', isNumber: true},
   {name: 'after', title: 'Memory at the later moment', key: 'after', isNumber: true},
   {name: 'growth', title: 'How much more it has', key: 'growth', isNumber: true},
-  {name: '', title: 'Whether it is new or gone', key: 'what', isNumber: false},
 ];
 
-function columnOf({name, title, key, isNumber}) {
-  const text = (row) => (!isNumber ? row[key] : key === 'growth' ? growthText(row[key]) : memoryText(row[key]));
+function sizeOf(number) {
+  return number < 0n ? -number : number;
+}
+
+function columnOf({name, title, key, isNumber = false}) {
   return {
-    name, title, isNumber, text,
+    name, title, isNumber,
+    text: (row) => (key === 'growth' ? growthText(row.growth) : isNumber ? numberText(row[key]) : shownText(row[key])),
     csv: (row) => (row[key] === null ? null : String(row[key])),
-    compare: (a, b, sign) => (key === 'growth' && a.growth !== null && b.growth !== null
-      ? sign * (Math.abs(a.growth) - Math.abs(b.growth)) : compareValues(a[key], b[key], sign)),
+    compare: (a, b, sign) => (key === 'growth' ? compareValues(sizeOf(a.growth), sizeOf(b.growth), sign)
+      : compareValues(a[key], b[key], sign)),
   };
 }
 
 export class Changes {
   constructor(data, state) {
-    this.data = data;
-    this.state = state;
-    this.kind = '';
+    Object.assign(this, {data, state, kind: '', unit: 'mb'});
     this.grid = new Grid('things that changed');
     this.grid.sortBy('growth', true);
     this.host = element('table', {class: 'balance'});
-    const kinds = data.head.roles.things.map((role) => [role.key, role.title]);
+    this.who = element('table', {class: 'balance'});
+    this.note = element('p', {class: 'note'});
     this.view = element('section', {class: 'changes', 'aria-labelledby': 'changes'},
-      element('h2', {id: 'changes'}, 'What changed'), element('div', {class: 'scroller', tabindex: 0, role: 'region', 'aria-label': 'The host'}, this.host),
-      choice('Of', [['', 'machines, processes and heaps'], ...kinds], '', (kind) => {
-        this.kind = kind;
-        this.show();
-      }), this.grid.view,
-      element('p', {class: 'note'}, 'Sorted by the size of the change. Groups contain machines and processes, and are shown by themselves.'));
+      element('h2', {id: 'changes'}, 'What changed'), this.note,
+      element('div', {class: 'pair'}, scroller('The host', this.host), scroller('Who explains it', this.who)),
+      element('div', {class: 'tools'}, this.kinds(), this.units()), this.grid.view);
     state.watch(['at', 'from'], () => this.show());
   }
 
-  show() {
-    const [from, at] = ['from', 'at'].map((name) => this.state.get(name)).sort((a, b) => a - b);
-    const {full, roles} = this.data.head;
-    const times = `${timeText(full[from])} to ${timeText(full[at])}`;
-    this.showHost(balance(this.data, from, at), times);
-    const things = roles.things
-      .filter((role) => (this.kind === '' ? role.key !== 'groups' : role.key === this.kind))
-      .flatMap((role) => compared(this.data, role, from, at))
-      .filter((pair) => pair.growth !== 0);
-    this.grid.show(COLUMNS.map(columnOf), things, times);
+  kinds() {
+    const {parts} = this.data.head;
+    const added = parts.filter((part) => part.isAdded).length;
+    return choice('Of', [['', `all ${added} kinds that are added`], ...parts.map((part) => [part.name, part.name])], '', (kind) => {
+      this.kind = kind;
+      this.showThings();
+    });
   }
 
-  showHost(parts, times) {
-    const total = parts.reduce((sum, part) => sum + Math.max(part.growth ?? 0, 0), 0);
-    const row = ({title, before, after, growth}) => element('tr', {}, element('th', {scope: 'row'}, title),
-      ...[memoryText(before), memoryText(after), growthText(growth), growth > 0 ? percentText(growth, total) : ''].map((text) => element('td', {class: 'number'}, text)));
-    this.host.replaceChildren(element('caption', {}, `The host, ${times}`),
-      element('thead', {}, element('tr', {}, ...['part', 'before', 'after', 'growth', 'of all growth'].map((name, i) => element('th', {scope: 'col', class: i === 0 ? null : 'number'}, name)))),
-      element('tbody', {}, ...parts.map(row)));
+  units() {
+    return choice('Changes in', Object.entries(UNITS).map(([word, {title}]) => [word, title]), this.unit, (unit) => {
+      this.unit = unit;
+      this.show();
+    });
+  }
+
+  show() {
+    const {head, memory} = this.data;
+    const [from, at] = ['from', 'at'].map((name) => this.state.get(name)).sort((a, b) => a - b);
+    const [bootFrom, bootAt] = [head.boots[from], head.boots[at]];
+    const isRebooted = bootFrom !== 0 && bootAt !== 0 && bootFrom !== bootAt;
+    this.times = `${timeText(head.full[from])} to ${timeText(head.full[at])}`;
+    this.result = compared(memory[from], memory[at], head.parts, UNITS[this.unit].shift, !isRebooted);
+    this.note.textContent = `From ${this.times}, in ${UNITS[this.unit].title}.${isRebooted ? ' The host was started anew in between: groups and processes are matched by their names.' : ''}`;
+    this.showHost();
+    this.showThings();
+  }
+
+  showHost() {
+    const {host, parts, nobody} = this.result;
+    const whole = host.used.growth;
+    const isShown = ({before, after, unknown, things, isKnown}) => !isKnown || before !== 0n || after !== 0n || unknown > 0 || things.length > 0;
+    this.fill(this.host, 'the host', HOST.map(([key, title]) =>
+      figureRow(title, host[key], key === 'total' || key === 'free' ? null : whole, {class: INNER.includes(key) ? 'inner' : null})));
+    this.fill(this.who, 'who explains it', [
+      ...parts.filter((part) => part.info.isAdded && isShown(part)).map((part) => this.partRow(part, whole)),
+      element('tr', {}, element('th', {scope: 'row'}, 'nobody'), ...cells('', '', growthText(nobody), partText(nobody, whole)))]);
+  }
+
+  fill(table, title, rows) {
+    table.replaceChildren(element('thead', {}, element('tr', {}, ...[title, 'before', 'after', 'growth', 'part'].map((name, i) =>
+      element('th', {scope: 'col', class: i === 0 ? null : 'number'}, name)))), element('tbody', {}, ...rows));
+  }
+
+  partRow(part, whole) {
+    const title = part.isKnown ? `${part.count} ${part.info.name}` : `${part.info.name}: not known`;
+    const rest = part.unknown === 0 ? '' : `, ${part.unknown} more without a figure, not added`;
+    return figureRow(`${title}${rest}`, part, whole);
+  }
+
+  showThings() {
+    const parts = this.result.parts.filter(({info}) => (this.kind === '' ? info.isAdded : info.name === this.kind));
+    this.grid.show(COLUMNS.map(columnOf), parts.flatMap((part) => part.things), `${this.times}, ${UNITS[this.unit].title}`);
   }
 }

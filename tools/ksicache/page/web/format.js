@@ -79,6 +79,7 @@ export function tickText(bytes) {
   return memoryText(bytes).replace(/\.0+ /, ' ');
 }
 
+// By how much something has more.
 export function growthText(bytes) {
   return bytes > 0 ? `+${memoryText(bytes)}` : memoryText(bytes);
 }

@@ -1,7 +1,8 @@
 // Figures of machines, groups, processes and heaps over time, as bands from the least to the
 // greatest of each stretch of moments.
 import {choice, element, svg} from './dom.js';
-import {bytesOf, memoryText, shownText, tickText, timeText} from './format.js';
+import {bytesOf, isMemory, memoryText, shownText, tickText, timeText} from './format.js';
+import {Kind} from './tables.js';
 import {isBreak, memoryTicks, tickTime} from './timeline.js';
 
 const HEIGHT = 200;
@@ -11,26 +12,61 @@ const DRAWN = 5; // at first
 const COLORS = 8; // that lines can have
 const TOGETHER = 'all together';
 
-// The lines of one figure, the largest first: {name, line} in bytes.
+// The figures of a column as they are drawn: memory in bytes.
+function toDraw(column) {
+  return isMemory(column) ? (figure) => bytesOf(figure, column) : (figure) => figure;
+}
+
+// How the figures of a line are written.
+function textOf(column) {
+  return isMemory(column) ? memoryText : (figure) => `${figure}${column.kind === Kind.percent ? ' %' : ''}`;
+}
+
+// The lines of one figure: {name, line, text}, that of all together first if it is memory.
 function linesOf(data, role) {
   const report = data.head.reports.find((each) => each.name === role.report);
   const column = report.columns.find((each) => each.name === role.column);
-  const found = data.lines.lines.get(`${role.report} ${role.column}`);
   if (column === undefined) return [];
-  const keys = report.columns.filter((each) => each.isKey);
-  const place = keys.findIndex((each) => each.name === data.nameOf.get(role.report));
-  const inBytes = (line) => line.map((extent) => extent && extent.map((each) => bytesOf(each, column)));
-  const things = found.things.map(({keys: values, line}) =>
-    ({name: shownText(data.head.texts[values[place]] ?? ''), line: inBytes(line)}));
-  const peak = ({line}) => d3.max(line, (extent) => extent?.[1] ?? 0) ?? 0;
-  const all = things.filter((thing) => peak(thing) > 0).sort((a, b) => peak(b) - peak(a));
-  return [{name: TOGETHER, line: inBytes(found.together)}, ...all];
+  const found = data.lines.lines.get(`${role.report} ${role.column}`);
+  const place = report.columns.filter((each) => each.isKey).findIndex((each) => each.name === data.nameOf.get(role.report));
+  const [figure, text] = [toDraw(column), textOf(column)];
+  const ofLine = (name, line) => ({name, line: line.map((extent) => extent && extent.map(figure)), text});
+  const things = found.things.map(({keys, line}) => ofLine(shownText(data.head.texts[keys[place]] ?? data.head.host), line));
+  return isMemory(column) && place >= 0 ? [ofLine(TOGETHER, found.together), ...things] : things;
+}
+
+function peak({line}) {
+  return d3.max(line, (extent) => extent?.[1] ?? 0) ?? 0;
+}
+
+// By how much a line goes up and down; where there is none, it is at 0.
+function range({line}) {
+  return peak({line}) - (d3.min(line, (extent) => extent?.[0] ?? 0) ?? 0);
+}
+
+// Whoever has memory by itself, of all kinds, whose memory changed most.
+function movedLines(data) {
+  const {things, groups} = data.head.roles;
+  return things.filter((each) => each.report !== groups.report)
+    .flatMap((each) => linesOf(data, {report: each.report, column: each.size}).filter(({name}) => name !== TOGETHER))
+    .filter((each) => range(each) > 0).sort((a, b) => range(b) - range(a));
+}
+
+const MOVED = {title: 'What changed most'};
+
+// The lines to choose from, and how many more there are.
+function offered(data, role) {
+  const lines = role === MOVED ? movedLines(data) : linesOf(data, role);
+  const together = lines.filter(({name}) => name === TOGETHER);
+  const things = lines.filter((each) => !together.includes(each) && peak(each) > 0);
+  if (role !== MOVED) things.sort((a, b) => peak(b) - peak(a));
+  return {lines: [...together, ...things.slice(0, OFFERED)], more: Math.max(0, things.length - OFFERED)};
 }
 
 export class LineChart {
   constructor(data, state) {
     Object.assign(this, {data, state});
-    const {lines} = data.head.roles;
+    const lines = [MOVED, ...data.head.roles.lines];
     this.svg = svg('svg', {class: 'chart', height: HEIGHT, role: 'img', 'aria-labelledby': 'lines-name'});
     this.list = element('fieldset', {class: 'lines'});
     this.told = element('p', {class: 'detail'});
@@ -46,13 +82,13 @@ export class LineChart {
 
   choose(role) {
     this.role = role;
-    const lines = linesOf(this.data, role);
-    this.count = Math.max(lines.length - 1, 0);
-    this.lines = lines.slice(0, OFFERED + 1);
-    this.lines.forEach((each, i) => {
-      each.isDrawn = i > 0 && i <= DRAWN;
-      each.color = i === 0 ? 'together' : `color${(i - 1) % COLORS}`;
-    });
+    Object.assign(this, offered(this.data, role));
+    let things = 0;
+    for (const each of this.lines) {
+      const isTogether = each.name === TOGETHER;
+      each.isDrawn = !isTogether && things < DRAWN;
+      each.color = isTogether ? 'together' : `color${things++ % COLORS}`;
+    }
     this.drawList();
     this.draw();
   }
@@ -63,10 +99,10 @@ export class LineChart {
         each.isDrawn = event.target.checked;
         this.draw();
       }}), element('span', {class: `swatch ${each.color}`}), element('span', {class: 'name'}, each.name)));
-    const more = this.count - Math.max(this.lines.length - 1, 0);
-    this.list.replaceChildren(element('legend', {}, `${this.role.title}, ${this.role.report} ${this.role.column}`), ...boxes);
-    if (more > 0) this.list.append(element('span', {class: 'note'}, `and ${more} smaller ones`));
-    if (this.count === 0) this.list.append(element('span', {class: 'note'}, 'none of these has had any'));
+    const {title, report, column} = this.role;
+    this.list.replaceChildren(element('legend', {}, report === undefined ? title : `${title}, ${report} ${column}`), ...boxes);
+    if (this.more > 0) this.list.append(element('span', {class: 'note'}, `and ${this.more} smaller ones`));
+    if (boxes.length === 0) this.list.append(element('span', {class: 'note'}, 'none of these has had any'));
   }
 
   draw() {
@@ -80,12 +116,18 @@ export class LineChart {
     const bottom = svg('g', {class: 'axis', transform: `translate(0,${HEIGHT - MARGIN.bottom})`});
     const left = svg('g', {class: 'axis', transform: `translate(${MARGIN.left},0)`});
     d3.axisBottom(this.x).tickFormat(tickTime).ticks(Math.max(2, Math.floor(width / 110))).tickSizeOuter(0)(d3.select(bottom));
-    d3.axisLeft(this.y).tickValues(memoryTicks(most)).tickFormat(tickText).tickSizeOuter(0)(d3.select(left));
+    this.leftAxis(most).tickSizeOuter(0)(d3.select(left));
     this.cursor = svg('g', {class: 'cursor'});
     this.svg.setAttribute('viewBox', `0 0 ${width} ${HEIGHT}`);
     this.svg.replaceChildren(svg('title', {id: 'lines-name'}, `${this.role.title} over time`),
       bottom, left, ...drawn.flatMap((each) => this.paths(each)), this.cursor);
     this.showChosen();
+  }
+
+  leftAxis(most) {
+    const axis = d3.axisLeft(this.y);
+    const text = this.lines[0]?.text ?? memoryText;
+    return text === memoryText ? axis.tickValues(memoryTicks(most)).tickFormat(tickText) : axis.ticks(4).tickFormat(text);
   }
 
   paths({line, color}) {
@@ -124,10 +166,10 @@ export class LineChart {
   tell(time) {
     const {times} = this.data.lines;
     const place = Math.max(0, times.findLastIndex((each) => each[0] <= time));
-    const words = this.lines.filter((each) => each.isDrawn).map(({name, line}) => {
+    const words = this.lines.filter((each) => each.isDrawn).map(({name, line, text}) => {
       const extent = line[place];
       if (extent === null) return `${name} –`;
-      const [least, greatest] = extent.map(memoryText);
+      const [least, greatest] = extent.map(text);
       return `${name} ${least === greatest ? least : `${least} to ${greatest}`}`;
     });
     this.told.replaceChildren(element('strong', {}, timeText(times[place][0])), ` ${words.join(' · ')}`);

@@ -7,7 +7,8 @@ const HEAD = 19; // the height of the name of a part that has others in it
 const LEVELS = 3; // that are drawn below the one that is looked into
 const SMALLEST = 3; // of a side; what is smaller cannot be seen
 // Tiles that are wide enough for a name, and for a figure with it.
-const NAMED = 32;
+const OPEN = 60; // to show what is in them
+const NAMED = 44;
 const SIZED = 58;
 
 function squarified(part, width, height) {
@@ -71,6 +72,7 @@ export class Treemap {
     this.tree = squarified(chain.at(-1), width, height);
     this.tiles = [];
     this.nodes = new Map();
+    this.opened = new Set([this.tree]); // whose parts are drawn, too
     this.tree.each((node) => this.drawTile(node));
     if (this.tiles.length > 0) this.tiles[0].tabIndex = 0;
     this.describe(chain.at(-1), chain);
@@ -89,9 +91,11 @@ export class Treemap {
   drawTile(node) {
     const width = node.x1 - node.x0;
     const height = node.y1 - node.y0;
-    if (node.depth === 0 || node.depth > LEVELS || width < SMALLEST || height < SMALLEST) return;
+    const isInside = node.depth > 0 && this.opened.has(node.parent);
+    if (!isInside || width < SMALLEST || height < SMALLEST) return;
     const {data: part} = node;
-    const isOpen = part.children.length > 0 && node.depth < LEVELS && height > HEAD + 4 && width > 30;
+    const isOpen = part.children.length > 0 && node.depth < LEVELS && height > HEAD + 4 && width > OPEN;
+    if (isOpen) this.opened.add(node);
     const names = node.ancestors().reverse().slice(1).map((each) => each.data.name);
     const tile = element('button', {
       type: 'button', class: `tile ${part.key}${isOpen ? ' open' : ''}`, tabindex: -1,
@@ -100,7 +104,11 @@ export class Treemap {
       onfocus: () => this.focus(tile, part, node),
       onpointerenter: () => this.describe(part, this.partsTo(node)),
     });
-    if (width > NAMED && height > 13) {
+    const isTall = !isOpen && width <= SIZED && height > 3 * width;
+    if (isTall && width >= 15 && height > SIZED) {
+      tile.classList.add('tall');
+      tile.append(element('span', {class: 'name'}, `${part.name} ${memoryText(part.bytes)}`));
+    } else if (width > NAMED && height > 13) {
       tile.append(element('span', {class: 'name'}, part.name), ' ');
       if (width > SIZED && (height > 32 || isOpen)) tile.append(element('span', {class: 'size'}, memoryText(part.bytes)));
     }
@@ -139,7 +147,6 @@ export class Treemap {
   // The figure, its share of the host and where it comes from.
   describe(part, chain) {
     const words = [`${memoryText(part.bytes)}, ${percentText(part.bytes, this.root.bytes)} of the host`, part.source];
-    if (part.told !== undefined) words.push(`the group itself has ${memoryText(part.told.bytes)} (${part.told.source})`);
     if (part.share < 1) {
       words.push(`what is in it adds up to ${memoryText(part.bytes / part.share)}, as some memory is counted with several, and is drawn at ${percentText(part.share, 1)} of its size`);
     }

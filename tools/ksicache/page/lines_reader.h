@@ -1,0 +1,52 @@
+// Reads the lines of a page (roles::kLines), one moment after the other.
+#ifndef TOOLS_KSICACHE_PAGE_LINES_READER_H_
+#define TOOLS_KSICACHE_PAGE_LINES_READER_H_
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+#include "tools/ksicache/page/lines.h"
+#include "tools/ksicache/page/problems.h"
+#include "tools/ksicache/page/table_stream.h"
+#include "tools/ksicache/report_run.h"
+
+namespace ksicache {
+
+// Each report that has lines, and the lines of its columns.
+struct PageLines {
+  struct OfReport {
+    std::string report;
+    std::vector<const char*> columns;
+    ReportLines lines;
+  };
+  Line times;  // when the moments of each stretch were taken
+  bool isCut = false;
+  std::vector<OfReport> reports;
+  std::string bytes;  // deflated: the times and the lines of each report
+};
+
+// However many moments there are, the lines have up to so many stretches as a screen has points.
+class LinesReader {
+ public:
+  LinesReader(PageTexts& texts, Problems& problems);
+
+  // The moment that the library answers from.
+  void Read(const Origin& origin);
+
+  // All of them, as exact as `room` bytes allow.
+  PageLines Finish(size_t room);
+
+ private:
+  void Thin();
+  void Pack(size_t room);
+
+  Problems& problems_;
+  PageLines lines_;
+  size_t moments_ = 0;   // of the stretch at hand
+  size_t capacity_ = 1;  // of each stretch
+};
+
+}  // namespace ksicache
+
+#endif  // TOOLS_KSICACHE_PAGE_LINES_READER_H_

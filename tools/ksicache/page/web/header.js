@@ -1,0 +1,84 @@
+// The head of the page: whose memory, when, and in short what there is to see.
+import {compared} from './comparison.js';
+import {element} from './dom.js';
+import {ZONE, growthText, memoryText, shownText, spanText, timeText} from './format.js';
+import {markText} from './timeline.js';
+
+const NAMED = 3; // who grew or shrank most
+
+function count(number, one, many) {
+  return `${number} ${number === 1 ? one : many}`;
+}
+
+// The moment with the least free memory; the last one if that is the first.
+export function tightest({head, memory}) {
+  let least = 0;
+  memory.forEach(({host}, moment) => {
+    if (host.free !== null && (memory[least].host.free ?? Infinity) > host.free) least = moment;
+  });
+  return least === 0 ? head.full.length - 1 : least;
+}
+
+// How much of what was recorded the page shows.
+function extentText({moments, full, points, lines}) {
+  const first = points[0];
+  const last = points.at(-1);
+  if (moments === 1) return timeText(first);
+  const span = `${timeText(first)} to ${timeText(last)}, ${count(moments, 'moment', 'moments')} in ${spanText(last - first)}`;
+  if (full.length === moments) return `${span}, all of them in full`;
+  const cut = lines.isCut ? ', to 1/256 of its range' : '';
+  return `${span}. Shown in full: ${full.length} of them, those with the least free memory in each stretch and those after a gap or restart. The balance is drawn from ${points.length} moments, the least and the most free memory of each stretch; a line from the least and the greatest figure of each of ${lines.stretches} stretches${cut}.`;
+}
+
+// How long the memory was in which state.
+function statesText({states, moments, roles}) {
+  const shares = states.map((moment, state) => ({name: roles.states[state] ?? 'not known', share: moment / moments}))
+    .filter(({share}) => share > 0);
+  if (shares.length === 1) return shares[0].name;
+  return shares.map(({name, share}) => `${name} ${(100 * share).toFixed(1)} %`).join(', ');
+}
+
+// Who had grown or shrunk most by the moment with the least free memory.
+function growthsText({head, memory}, moment) {
+  const {parts} = compared(memory[0], memory[moment], head.parts, 0, head.boots[0] === head.boots[moment]);
+  const things = parts.filter(({info}) => info.isAdded).flatMap((part) => part.things);
+  const size = ({growth}) => Math.abs(Number(growth));
+  return things.sort((a, b) => size(b) - size(a)).slice(0, NAMED)
+    .map((thing) => `${shownText(thing.name)} ${growthText(Number(thing.growth))}`).join(', ');
+}
+
+function inShort(data) {
+  const {head, memory} = data;
+  const moment = tightest(data);
+  const {free, total} = memory[moment].host;
+  if (free === null || total === null) return null;
+  const words = [element('strong', {}, `${memoryText(Number(free))} of ${memoryText(Number(total))} free`), ` at ${timeText(head.full[moment])}`];
+  if (moment !== 0) {
+    const isLeast = moment !== head.full.length - 1;
+    const growths = growthsText(data, moment);
+    words.push(isLeast ? ', the least of all. ' : '. ', growths === '' ? '' : `Since ${timeText(head.full[0])}: ${growths}.`);
+  }
+  return element('p', {class: 'short'}, ...words);
+}
+
+function remarks({marks, problems}) {
+  const items = marks.all.map((mark) => `${timeText(mark.at)}: ${markText(mark)}`);
+  if (marks.leftOut > 0) items.push(`and ${marks.leftOut} more of these`);
+  if (marks.refused > 0) items.push(`up to ${marks.refused} reads of a moment were refused for want of rights`);
+  if (marks.failed > 0) items.push(`up to ${marks.failed} reads of a moment failed`);
+  if (marks.lossy > 0) items.push(`of ${count(marks.lossy, 'moment', 'moments')} something was left out`);
+  items.push(...problems.map(shownText));
+  if (items.length === 0) return null;
+  return element('details', {class: 'remarks', open: items.length < 4}, element('summary', {}, count(items.length, 'remark', 'remarks')),
+    element('ul', {}, ...items.map((item) => element('li', {}, item))));
+}
+
+export function header(data) {
+  const {head} = data;
+  return element('header', {},
+    element('h1', {}, shownText(head.title)),
+    element('p', {}, element('b', {}, shownText(head.host)), ` · ${extentText(head)}`),
+    inShort(data),
+    element('p', {class: 'note'}, `Memory state ${statesText(head)}. Kernel's definitions built ${shownText(head.kernel)}. Times are those of ${ZONE}, with UTC, which the reports have, beside them.`),
+    remarks(head));
+}

@@ -1,0 +1,18 @@
+// Who has the host's memory at a moment, out of the rows that tools/ksicache/page/memory_rows.cc
+// puts.
+
+const COLUMNS = ['part', 'identity', 'path', 'name', 'number', 'bytes'];
+
+// {host, parts}: figures of the host by their names; of each of `parts`, by its name, the things
+// {id, identity, path, name, number, bytes} in it, or null if nobody knows what they are.
+export function memoryOf(rows, parts) {
+  const memory = {host: {}, parts: Object.fromEntries(parts.map((part) => [part.name, []]))};
+  for (const row of rows) {
+    const thing = {id: row.id};
+    COLUMNS.forEach((name, place) => { thing[name] = row.values[place]; });
+    if (thing.part < parts.length) memory.parts[parts[thing.part].name].push(thing);
+    else if (thing.part === parts.length) memory.host[thing.name] = thing.bytes;
+    else memory.parts[thing.name] = null;
+  }
+  return memory;
+}
