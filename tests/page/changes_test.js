@@ -1,0 +1,76 @@
+// What changed is what `ksicache diff --json` says of the same two moments, to the last digit.
+import assert from 'node:assert/strict';
+import {join} from 'node:path';
+import {test} from 'node:test';
+import {build, closePage, ksicache, makePage, openPage, scratch} from './browser.js';
+
+const HOST = ['total', 'free', 'used', 'kernel', 'caches', 'others'];
+
+function shown(number) {
+  return number === null ? '–' : String(number);
+}
+
+function growth(number) {
+  return number > 0 ? `+${number}` : shown(number);
+}
+
+async function cellsOf(table) {
+  return table.evaluate((each) => [...each.rows].map((row) => [...row.cells].map((cell) => cell.textContent)));
+}
+
+// The tables of the host as the program's answer has them, without the parts of the whole.
+function expectedHost(diff) {
+  const figures = (name, {before, after, growth: by}) => [name, shown(before), shown(after), growth(by)];
+  const parts = diff.parts.filter((part) => part.added && (!part.known || part.before !== 0 || part.after !== 0 || part.withoutFigure > 0 || part.rows.length > 0));
+  const title = ({known, count, what, withoutFigure}) => `${known ? `${count} ${what}` : `${what}: not known`}${withoutFigure > 0 ? `, ${withoutFigure} more without a figure, not added` : ''}`;
+  return [
+    ...HOST.map((name) => figures(name, diff.host[name])),
+    ...parts.map((part) => figures(title(part), part)),
+    ['nobody', '', '', growth(diff.nobody)],
+  ];
+}
+
+async function expectChanges(page, diff) {
+  const tables = page.locator('.changes table.balance');
+  const rows = [...await cellsOf(tables.first()), ...await cellsOf(tables.last())];
+  const host = rows.filter((row) => !['the host', 'who explains it'].includes(row[0])).map((row) => row.slice(0, 4));
+  host.slice(0, HOST.length).forEach((row, i) => { row[0] = HOST[i]; });
+  assert.deepEqual(host, expectedHost(diff));
+  for (const part of diff.parts) {
+    await page.selectOption('.changes label:has-text("Of") select', part.what);
+    const more = page.locator('.changes .more');
+    if (await more.isVisible()) await more.click();
+    const things = (await cellsOf(page.locator('.changes table.grid'))).slice(1);
+    const expected = part.rows.map((row) => [part.what, row.name, shown(row.group ?? null), row.state, shown(row.before), shown(row.after), growth(row.growth)]);
+    assert.deepEqual(things, expected, part.what);
+  }
+}
+
+async function compare(recording, pairs, units) {
+  const page = await openPage(makePage(recording));
+  const times = ksicache('export', 'moments', `${recording}@..`).trimEnd().split('\n').slice(1).map((line) => line.split(',')[1]);
+  for (const [from, at] of pairs) {
+    await page.fill('#slider-from', String(from));
+    await page.fill('#slider-at', String(at));
+    for (const unit of units) {
+      await page.selectOption('.changes label:has-text("Changes in") select', unit);
+      const diff = ksicache('diff', '--json', '--top', '100000', '-u', unit, `${recording}@${times[from]}`, `${recording}@${times[at]}`);
+      await expectChanges(page, JSON.parse(diff));
+    }
+  }
+  await closePage(page);
+}
+
+test('the incident, in every unit', async () => {
+  await compare(join(build, 'incident.rec'), [[0, 3], [3, 4], [0, 4], [2, 3]], ['mb', 'kb', 'pg', 'b']);
+});
+
+test('the afternoon', async () => {
+  await compare(join(build, 'afternoon.rec'), [[0, 120], [60, 61], [30, 75]], ['mb', 'b']);
+});
+
+test('a live host', async () => {
+  const recording = join(scratch, 'live.rec');
+  ksicache('record', recording, '--every', '1s', '--count', '3');
+  await compare(recording, [[0, 2], [1, 2]], ['kb']);
+});
