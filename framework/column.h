@@ -43,6 +43,10 @@ enum class Kind : uint8_t {
   bytes,
 };
 
+constexpr bool IsMemory(Kind kind) {
+  return kind == Kind::kilobytes || kind == Kind::pages || kind == Kind::bytes;
+}
+
 // What a column shows in the Total row.
 enum class InTotal : uint8_t {
   blank,
@@ -212,8 +216,7 @@ concept IsKept = std::same_as<Result, std::string_view> || std::is_pointer_v<Res
 // How a number is printed: memory in 64 bits, others as wide as they are.
 template <std::integral Number>
 constexpr const char* ConversionOf(Kind kind) {
-  const bool isMemory = kind == Kind::kilobytes || kind == Kind::pages || kind == Kind::bytes;
-  if (isMemory || sizeof(Number) == sizeof(uint64_t))
+  if (IsMemory(kind) || sizeof(Number) == sizeof(uint64_t))
     return std::signed_integral<Number> ? "Ld" : "Lu";
   return std::signed_integral<Number> ? "d" : "u";
 }

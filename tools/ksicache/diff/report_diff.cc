@@ -12,11 +12,8 @@
 namespace ksicache {
 namespace {
 
+using tally::IsMemory;
 using tally::Kind;
-
-bool IsMemory(Kind kind) {
-  return kind == Kind::kilobytes || kind == Kind::pages || kind == Kind::bytes;
-}
 
 // Whether there is none of it where there is nothing.
 bool IsAmount(Kind kind) {

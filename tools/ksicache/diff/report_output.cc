@@ -69,10 +69,7 @@ std::string CountText(const ReportDiff& diff) {
 
 // The unit of memory in the report; empty if it has no memory.
 const char* UnitOf(const ReportDiff& diff) {
-  const auto found = std::ranges::find_if(diff.Columns(), [](const RowColumn& column) {
-    return column.kind == tally::Kind::kilobytes || column.kind == tally::Kind::pages ||
-           column.kind == tally::Kind::bytes;
-  });
+  const auto found = std::ranges::find_if(diff.Columns(), tally::IsMemory, &RowColumn::kind);
   return found == diff.Columns().end() ? "" : found->unit;
 }
 

@@ -15,18 +15,8 @@ bool IsWord(const RowColumn& column) {
 }
 
 const char* UnitOf(Kind kind) {
-  switch (kind) {
-    case Kind::kilobytes:
-    case Kind::pages:
-    case Kind::bytes:
-      return "bytes";
-    case Kind::microseconds:
-      return "seconds";
-    case Kind::percent:
-      return "ratio";
-    default:
-      return "";
-  }
+  if (tally::IsMemory(kind)) return "bytes";
+  return kind == Kind::microseconds ? "seconds" : kind == Kind::percent ? "ratio" : "";
 }
 
 void Remove(std::string_view word, std::string& text) {
