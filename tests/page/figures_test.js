@@ -2,9 +2,9 @@
 import assert from 'node:assert/strict';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, ksicache, makePage, openPage} from './browser.js';
+import {build, closePage, ksicache, makePage, openPage, scratch} from './browser.js';
 
-const RECORDING = join(build, 'incident.rec');
+const INCIDENT = join(build, 'incident.rec');
 const FLAGS = {'': '–', true: 'y', false: 'n'};
 const MOMENTS = ['10:02', '10:03', '10:04', '10:05', '10:06'];
 
@@ -31,32 +31,50 @@ async function shownRows(page) {
 
 function exported(report, moment, unit) {
   const flags = unit === '' ? [] : ['-u', unit];
-  return rowsOf(ksicache('export', report, ...flags, `${RECORDING}@${moment}Z`));
+  return rowsOf(ksicache('export', report, ...flags, moment));
 }
 
-async function compare(page, report, moment, unit) {
-  await page.selectOption('.reports label:has-text("Report") select', {label: report});
+// `moment`: the name of what the page shows at the time.
+async function compare(page, moment, unit) {
+  const reports = await page.locator('.reports label:has-text("Report") option').allTextContents();
+  assert.equal(reports.length, 15);
   await page.selectOption('.reports label:has-text("Memory in") select', unit);
-  assert.deepEqual(await shownRows(page), exported(report, moment, unit), `${report} at ${moment} in ${unit}`);
+  for (const report of reports) {
+    await page.selectOption('.reports label:has-text("Report") select', {label: report});
+    assert.deepEqual(await shownRows(page), exported(report, moment, unit), `${report} of ${moment} in ${unit}`);
+  }
 }
 
 test('every report at every moment, in its own unit', async () => {
-  const page = await openPage(makePage(RECORDING));
-  const reports = await page.locator('.reports label:has-text("Report") option').allTextContents();
-  assert.equal(reports.length, 15);
+  const page = await openPage(makePage(INCIDENT));
   for (const [place, moment] of MOMENTS.entries()) {
     await page.fill('#slider-at', String(place));
-    for (const report of reports) await compare(page, report, moment, '');
+    await compare(page, `${INCIDENT}@${moment}Z`, '');
   }
   await closePage(page);
 });
 
 test('every report in every unit', async () => {
-  const page = await openPage(makePage(RECORDING));
-  const reports = await page.locator('.reports label:has-text("Report") option').allTextContents();
+  const page = await openPage(makePage(INCIDENT));
   await page.fill('#slider-at', '4');
-  for (const unit of ['mb', 'kb', 'pg', 'b']) {
-    for (const report of reports) await compare(page, report, '10:06', unit);
+  for (const unit of ['mb', 'kb', 'pg', 'b']) await compare(page, `${INCIDENT}@10:06Z`, unit);
+  await closePage(page);
+});
+
+test('every report at moments of an afternoon', async () => {
+  const recording = join(build, 'afternoon.rec');
+  const page = await openPage(makePage(recording));
+  for (const [place, moment] of [[0, '13:00'], [60, '15:00'], [120, '17:00']]) {
+    await page.fill('#slider-at', String(place));
+    await compare(page, `${recording}@${moment}Z`, '');
   }
+  await closePage(page);
+});
+
+test('every report of this host', async () => {
+  const capture = join(scratch, 'live.ksi');
+  ksicache('capture', capture);
+  const page = await openPage(makePage(capture));
+  await compare(page, capture, '');
   await closePage(page);
 });

@@ -98,7 +98,7 @@ const LOCAL = formatter({});
 const UTC = formatter({timeZone: 'UTC'});
 
 export const ZONE = Intl.DateTimeFormat().resolvedOptions().timeZone;
-const isUtc = ['UTC', 'Etc/UTC', 'GMT', 'Etc/GMT'].includes(ZONE);
+export const isUtc = ['UTC', 'Etc/UTC', 'GMT', 'Etc/GMT'].includes(ZONE);
 
 function clock(text) {
   return text.slice(11);

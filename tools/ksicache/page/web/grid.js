@@ -1,7 +1,7 @@
 // A table that is sorted by its heads, filtered by a word and copied as CSV.
 import {element} from './dom.js';
 
-const SHOWN = 100; // rows, until more are asked for
+const SHOWN = 60; // rows, until more are asked for
 
 // `columns`: {name, title, isNumber, compare(a, b), text(row), csv(row), class}; rows are whatever
 // these take.

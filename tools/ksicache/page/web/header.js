@@ -1,7 +1,7 @@
 // The head of the page: whose memory, when, and in short what there is to see.
 import {compared} from './comparison.js';
 import {element} from './dom.js';
-import {ZONE, growthText, memoryText, shownText, spanText, timeText} from './format.js';
+import {ZONE, growthText, isUtc, memoryText, shownText, spanText, timeText} from './format.js';
 import {markText} from './timeline.js';
 
 const NAMED = 3; // who grew or shrank most
@@ -39,12 +39,12 @@ function statesText({states, moments, roles}) {
 }
 
 // Who had grown or shrunk most by the moment with the least free memory.
-function growthsText({head, memory}, moment) {
+function growths({head, memory}, moment) {
   const {parts} = compared(memory[0], memory[moment], head.parts, 0, head.boots[0] === head.boots[moment]);
   const things = parts.filter(({info}) => info.isAdded).flatMap((part) => part.things);
   const size = ({growth}) => Math.abs(Number(growth));
   return things.sort((a, b) => size(b) - size(a)).slice(0, NAMED)
-    .map((thing) => `${shownText(thing.name)} ${growthText(Number(thing.growth))}`).join(', ');
+    .map((thing) => `${shownText(thing.name)} ${growthText(Number(thing.growth))}`);
 }
 
 function inShort(data) {
@@ -55,8 +55,9 @@ function inShort(data) {
   const words = [element('strong', {}, `${memoryText(Number(free))} of ${memoryText(Number(total))} free`), ` at ${timeText(head.full[moment])}`];
   if (moment !== 0) {
     const isLeast = moment !== head.full.length - 1;
-    const growths = growthsText(data, moment);
-    words.push(isLeast ? ', the least of all. ' : '. ', growths === '' ? '' : `Since ${timeText(head.full[0])}: ${growths}.`);
+    const grown = growths(data, moment).map((text) => element('span', {class: text.length < 40 ? 'word' : null}, text));
+    words.push(isLeast ? ', the least of all. ' : '. ');
+    if (grown.length > 0) words.push(`Since ${timeText(head.full[0])}: `, ...grown.flatMap((each, i) => (i === 0 ? [each] : [', ', each])), '.');
   }
   return element('p', {class: 'short'}, ...words);
 }
@@ -73,12 +74,16 @@ function remarks({marks, problems}) {
     element('ul', {}, ...items.map((item) => element('li', {}, item))));
 }
 
+function zoneText() {
+  return isUtc ? 'Times are in UTC, as in the reports.' : `Times are those of ${ZONE}, with UTC, which the reports have, beside them.`;
+}
+
 export function header(data) {
   const {head} = data;
   return element('header', {},
     element('h1', {}, shownText(head.title)),
     element('p', {}, element('b', {}, shownText(head.host)), ` · ${extentText(head)}`),
     inShort(data),
-    element('p', {class: 'note'}, `Memory state ${statesText(head)}. Kernel's definitions built ${shownText(head.kernel)}. Times are those of ${ZONE}, with UTC, which the reports have, beside them.`),
+    element('p', {class: 'note'}, `Memory state ${statesText(head)}. Kernel's definitions built ${shownText(head.kernel)}. ${zoneText()}`),
     remarks(head));
 }

@@ -48,6 +48,7 @@ function show(data) {
     element('footer', {class: 'note'}, 'Made by ksicache page. Charts by d3, © Mike Bostock; its license stands in the source of this page.'));
   for (const view of [treemap, changes, reports]) view?.show();
   document.documentElement.dataset.ready = 'yes';
+  performance.mark('shown');
 }
 
 async function main() {

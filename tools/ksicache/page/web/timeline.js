@@ -25,6 +25,12 @@ function freeOf(point) {
   return point.stack.find((part) => part.key === 'free').bytes;
 }
 
+// How bad a memory state is, from 0 to 4; what is not told is none.
+function levelOf(data, state) {
+  const place = data.head.roles.states.indexOf(state);
+  return state === null ? 0 : place < 0 ? 1 : Math.min(place, 4);
+}
+
 // Between which points nothing was recorded.
 export function isBreak(marks, before, after) {
   return marks.some((mark) => mark.kind !== 'clock' && mark.at > before && mark.at <= after);
@@ -43,6 +49,7 @@ export function runsOf(points, marks, isDrawn) {
 const MARKS = {
   reboot: (mark) => `restarted, ${spanText(mark.time)} between the moments`,
   gap: (mark) => `nothing recorded for ${spanText(mark.time)}`,
+  skipped: () => 'moments before it were left out',
   clock: (mark) => `the clock was set ${mark.time > 0 ? 'forward' : 'back'} by ${spanText(mark.time)}`,
 };
 
@@ -68,8 +75,12 @@ export class Timeline {
 
   legend() {
     const parts = (this.points.find((point) => point.stack !== null)?.stack ?? []).slice().reverse();
-    return element('ul', {class: 'legend', 'aria-label': 'Parts'}, ...parts.map((part) =>
-      element('li', {}, element('span', {class: `swatch ${part.key}`}), part.title)));
+    const states = new Set(this.points.map((point) => point.state));
+    const bad = this.data.head.roles.states.filter((state) => states.has(state) && levelOf(this.data, state) > 0);
+    const item = (style, text) => element('li', {}, element('span', {class: `swatch ${style}`}), text);
+    return element('ul', {class: 'legend', 'aria-label': 'Parts, and states of the memory'},
+      ...parts.map((part) => item(part.key, part.title)),
+      ...bad.map((state) => item(`level${levelOf(this.data, state)}`, `State ${state}`)));
   }
 
   sliders() {
@@ -138,14 +149,13 @@ export class Timeline {
 
   // A line above the balance for the memory state, where it is not the best one.
   states() {
-    const order = this.data.head.roles.states;
     const bars = [];
     this.points.forEach((point, i) => {
-      const level = order.indexOf(point.state);
-      if (level === 0 || point.state === null) return;
+      const level = levelOf(this.data, point.state);
+      if (level === 0) return;
       const from = this.at(point.time);
       const to = i + 1 < this.points.length ? this.at(this.points[i + 1].time) : from + 3;
-      bars.push(svg('rect', {class: `state level${Math.min(Math.max(level, 1), 4)}`, x: from, width: Math.max(to - from, 2), y: MARGIN.top - 9, height: 6},
+      bars.push(svg('rect', {class: `state level${level}`, x: from, width: Math.max(to - from, 2), y: MARGIN.top - 9, height: 6},
         svg('title', {}, `memory state ${point.state} at ${timeText(point.time)}`)));
     });
     return bars;
@@ -165,7 +175,7 @@ export class Timeline {
       const from = mark.kind === 'clock' ? x : this.at(mark.at - mark.time);
       return svg('g', {class: `mark ${mark.kind}`},
         svg('rect', {x: Math.max(from, MARGIN.left), y: MARGIN.top, width: Math.max(x - Math.max(from, MARGIN.left), 1), height: HEIGHT - MARGIN.top - MARGIN.bottom}),
-        mark.kind === 'gap' ? null : svg('text', {x: x + 3, y: MARGIN.top + 10}, mark.kind === 'reboot' ? 'restart' : 'clock'),
+        ['gap', 'skipped'].includes(mark.kind) ? null : svg('text', {x: x + 3, y: MARGIN.top + 10}, mark.kind === 'reboot' ? 'restart' : 'clock'),
         svg('title', {}, `${timeText(mark.at)}: ${markText(mark)}`));
     });
   }
