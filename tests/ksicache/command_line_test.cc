@@ -16,7 +16,7 @@ TEST_F(Ksicache, HelpAndVersion) {
 }
 
 constexpr const char* kCommands[] = {"capture", "record", "moments", "extract", "join", "info",
-                                     "dump",    "diff",   "export",  "load",    "check"};
+                                     "dump",    "diff",   "export",  "page",    "load", "check"};
 
 TEST_F(Ksicache, HelpSaysAll) {
   std::string text = Output({"--help"});
