@@ -67,7 +67,7 @@ void LinesReader::Read(const Origin& origin) {
   lines_.times[stretch].Add(origin.taken);
   for (PageLines::OfReport& each : lines_.reports) {
     Rows rows(each.lines, stretch);
-    RowSink sink(rows, std::nullopt);
+    RowSink sink(rows, std::nullopt, {each.columns.begin(), each.columns.end()});
     RunForPage(*tally::FindReport(each.report.c_str()), origin, sink, problems_);
     each.lines.End();
   }

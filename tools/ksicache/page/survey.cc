@@ -108,7 +108,7 @@ Survey MakeSurvey(const std::string& name, const std::function<void(const Origin
                   std::string& problem) {
   Survey survey;
   HostFigures figures;
-  RowSink sink(figures, tally::DisplayUnit::kb);
+  RowSink sink(figures, tally::DisplayUnit::kb, {roles::kFree, roles::kState});
   const tally::Report& report = *tally::FindReport(roles::kHostReport);
   try {
     ForEachMoment(name, [&](const Origin& origin) {
