@@ -15,7 +15,7 @@
 namespace ksi {
 namespace {
 
-constexpr const char* kHead = "taken                     bytes   took ms    cpu ms  remarks\n";
+constexpr const char* kHead = "taken                   bytes  took ms  cpu ms  remarks\n";
 
 class MomentsTest : public RecordingTest {
  protected:
@@ -65,11 +65,11 @@ class MomentsTest : public RecordingTest {
   }
 
   static constexpr const char* kRemarked =
-      "10:00:25  2 skipped before\n"
-      "10:05:35  nothing for 00:05:00 before\n"
-      "09:05:55  clock set back by 01:00:00\n"
-      "10:06:15  clock put forward by 01:00:00\n"
-      "10:06:40  rebooted, nothing for 00:00:15 before\n"
+      "10:00:25  2 skipped\n"
+      "10:05:35  gap 00:05:00\n"
+      "09:05:55  clock -01:00:00\n"
+      "10:06:15  clock +01:00:00\n"
+      "10:06:40  rebooted, gap 00:00:15\n"
       "10:06:55  7 refused, 2 failed, left out: 0xbad0014 ";
 
   const std::string file_ = Path("r.ksi");
@@ -91,13 +91,13 @@ TEST_F(MomentsTest, OfASpanOrATimeAreListedWithWhatTheWholeSaysOfThem) {
   const auto list = [this](const std::string& when) {
     return Remarks(Output({"moments", file_ + "@2026-11-21T" + when}));
   };
-  EXPECT_EQ(list("10:05:35Z"), "10:05:35  nothing for 00:05:00 before\n");
+  EXPECT_EQ(list("10:05:35Z"), "10:05:35  gap 00:05:00\n");
   EXPECT_EQ(list("10:05:34Z"), "10:00:35\n");
   EXPECT_EQ(list("10:06:14Z..2026-11-21T10:06:41Z"),
-            "10:06:15  clock put forward by 01:00:00\n10:06:20\n10:06:25\n"
-            "10:06:40  rebooted, nothing for 00:00:15 before\n");
+            "10:06:15  clock +01:00:00\n10:06:20\n10:06:25\n"
+            "10:06:40  rebooted, gap 00:00:15\n");
   EXPECT_EQ(Remarks(Output({"moments", "--remarks", file_ + "@2026-11-21T10:00Z..-6m"})),
-            "10:00:25  2 skipped before\n");
+            "10:00:25  2 skipped\n");
 }
 
 TEST_F(MomentsTest, ATimeWithoutAnyNamesTheSpan) {

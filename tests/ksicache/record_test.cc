@@ -39,7 +39,8 @@ TEST_F(RecordCommand, OnceAnHourTellsWhatItCost) {
   EXPECT_EQ(result.status, 0) << result.err;
   const auto hour = [&file](const std::string& moments, const std::string& from) {
     return file + ": " + moments + " moments since 2026-11-21T" + from +
-           ":00Z, 0 skipped, 0 dropped; each took [0-9]+ ms, [0-9]+ ms of CPU; [0-9]+ bytes\n";
+           ":00Z, 0 skipped, 0 dropped; each took [0-9]+\\.[0-9] ms, [0-9]+\\.[0-9] ms of CPU; "
+           "[0-9]+ bytes\n";
   };
   EXPECT_TRUE(std::regex_match(
       result.out, std::regex(file + ": recording .* every 1200 s\n" + hour("2", "09:20") +

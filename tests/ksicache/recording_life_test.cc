@@ -14,6 +14,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <functional>
+#include <future>
 #include <random>
 #include <set>
 #include <string>
@@ -204,6 +205,26 @@ TEST_F(RecordingLife, ASecondRecorderIsToldTheFirstsProcess) {
   }
   recorder.Kill();
   RecordOn(kUnbounded, 1);
+}
+
+// Whoever makes the file, the others find it recorded, or go on with it.
+TEST_F(RecordingLife, RecordersThatBeginAtOnceAgreeOnTheFile) {
+  std::filesystem::remove(file_);
+  std::vector<std::future<harness::Result>> recorders;
+  for (int i = 0; i < 6; ++i) {
+    recorders.push_back(std::async(std::launch::async, [this] {
+      return Run({"record", "--root", RecordedHost("systemd-server"), "--every", "1s", "--count",
+                  "1", file_});
+    }));
+  }
+  int recorded = 0;
+  for (std::future<harness::Result>& each : recorders) {
+    const harness::Result result = each.get();
+    const std::string refused = "ksicache: " + file_ + ": is being recorded by ";
+    EXPECT_TRUE(result.err.empty() || result.err.starts_with(refused)) << result.err;
+    recorded += result.status == 0 ? 1 : 0;
+  }
+  EXPECT_GE(recorded, 1);
 }
 
 TEST_F(RecordingLife, TheProgramRecordsGoesOnAndChecks) {

@@ -119,7 +119,7 @@ TEST_F(RecordingWork, FactsAreNoLargerThanFactsAre) {
   AddChunks(kParts, PartOf(frame, frame));
   const std::string damaged = "damaged: the part of 2026-11-21T10:00:00Z is damaged\n";
   ExpectEnds({"check", file_}, Repeat(file_ + "@2026-11-21T10:00:00Z: " + damaged, kParts), "");
-  ExpectEnds({"moments", file_}, "taken                     bytes   took ms    cpu ms  remarks\n",
+  ExpectEnds({"moments", file_}, "taken                   bytes  took ms  cpu ms  remarks\n",
              Repeat("ksicache: " + file_ + ": " + damaged, kParts));
 }
 

@@ -80,10 +80,10 @@ std::string RemarksOn(const WalkedMoment& moment) {
   };
   add(moment.isOtherHost, "of the host " + Cut(moment.host));
   add(moment.isRebooted, "rebooted");
-  add(moment.isAfterGap, "nothing for " + TextOfDuration(moment.passed) + " before");
-  add(moment.step > 0, "clock put forward by " + TextOfDuration(moment.step));
-  add(moment.step < 0, "clock set back by " + TextOfDuration(-moment.step));
-  add(facts.skipped != 0, std::to_string(facts.skipped) + " skipped before");
+  add(moment.isAfterGap, "gap " + TextOfDuration(moment.passed));
+  add(moment.step > 0, "clock +" + TextOfDuration(moment.step));
+  add(moment.step < 0, "clock -" + TextOfDuration(-moment.step));
+  add(facts.skipped != 0, std::to_string(facts.skipped) + " skipped");
   add(facts.refused != 0, std::to_string(facts.refused) + " refused");
   add(facts.failed != 0, std::to_string(facts.failed) + " failed");
   add(facts.loss != ksi::kOk, "left out: " + StatusText(facts.loss));
@@ -92,7 +92,7 @@ std::string RemarksOn(const WalkedMoment& moment) {
 
 void PrintMoment(const WalkedMoment& moment, const std::string& remarks) {
   char text[128];
-  const int size = std::snprintf(text, sizeof text, "%-20s  %9.0f %9.1f %9.1f",
+  const int size = std::snprintf(text, sizeof text, "%-20s %8.0f %8.1f %7.1f",
                                  ksi::TextOfTime(moment.facts.taken).c_str(), moment.bytes,
                                  static_cast<double>(moment.facts.duration) / 1000,
                                  static_cast<double>(moment.facts.cpu) / 1000);
@@ -124,7 +124,7 @@ bool Walk(const std::string& name, const Chosen& chosen,
 
 bool List(const std::string& name, bool onlyRemarks) {
   const Chosen chosen(name);
-  PrintLine("taken                     bytes   took ms    cpu ms  remarks");
+  PrintLine("taken                   bytes  took ms  cpu ms  remarks");
   return Walk(name, chosen, [onlyRemarks](const WalkedMoment& moment) {
     const std::string remarks = RemarksOn(moment);
     if (!onlyRemarks || !remarks.empty()) PrintMoment(moment, remarks);

@@ -105,7 +105,8 @@ class HourlyAccount {
  private:
   void TellHour(const std::string& fileName, int64_t size) const {
     const auto each = [this](uint64_t sum) {
-      return std::to_string(sum / std::max<uint64_t>(1, moments_) / 1000) + " ms";
+      const uint64_t tenths = sum / std::max<uint64_t>(1, moments_) / 100;
+      return std::to_string(tenths / 10) + "." + std::to_string(tenths % 10) + " ms";
     };
     Tell(fileName + ": " + std::to_string(moments_) + " moments since " + ksi::TextOfTime(from_) +
          ", " + std::to_string(skipped_) + " skipped, " + std::to_string(dropped_) +
@@ -416,6 +417,16 @@ void MakeSmaller(const std::string& fileName, int64_t maxSize) {
   }
 }
 
+// What another recorder has made meanwhile is a recording, too.
+void MakeRecording(const std::string& fileName, mode_t mode, const std::string& host) {
+  try {
+    NewFile(fileName, false, mode).Commit(RecordingStore::Empty(host));
+  } catch (const Error&) {
+    struct stat info = {};
+    if (lstat(fileName.c_str(), &info) != 0) throw;
+  }
+}
+
 int Record(const CommandLine& line) {
   const std::string& fileName = line.arguments[0];
   const std::string* root = line.ValueOf(kRoot);
@@ -430,7 +441,7 @@ int Record(const CommandLine& line) {
   const std::string host = HostName(root, isNameRead);
   struct stat info = {};
   if (lstat(fileName.c_str(), &info) != 0) {
-    NewFile(fileName, false, ModeOf(line)).Commit(RecordingStore::Empty(host));
+    MakeRecording(fileName, ModeOf(line), host);
   } else if (S_ISREG(info.st_mode) && info.st_size > plan.maxSize) {
     MakeSmaller(fileName, plan.maxSize);
   }
