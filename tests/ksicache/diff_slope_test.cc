@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
 #include <vector>
 
@@ -51,6 +52,34 @@ TEST(Trend, ASlowLeakBelowNoiseIsSteady) {
   const auto noise = [](double x) { return std::sin(x * x * 12.9898) * 100; };
   EXPECT_TRUE(TrendOf(Series(200, [&](double x) { return x * 1.5 + noise(x); }))->IsSteady());
   EXPECT_FALSE(TrendOf(Series(200, noise))->IsSteady());
+}
+
+// What can be told does not change at some number of points.
+TEST(Trend, FewPointsTellOfALeakBelowNoise) {
+  const auto noise = [](double x) { return std::sin(x * x * 12.9898); };
+  for (int count = 40; count < 200; ++count) {
+    EXPECT_TRUE(
+        TrendOf(Series(count, [&](double x) { return x * 10 / count + noise(x); }))->IsSteady())
+        << count;
+    EXPECT_FALSE(TrendOf(Series(count, noise))->IsSteady()) << count;
+  }
+}
+
+TEST(Ramp, IsWhereASeriesGrows) {
+  const auto rampOf = [](auto&& of) { return RampOf(Series(97, of)); };
+  const Ramp line = rampOf([](double x) { return 3 * x; });
+  EXPECT_EQ(line.begin, 0);
+  EXPECT_EQ(line.end, 96);
+  const Ramp stopped = rampOf([](double x) { return std::min(x, 72.0); });
+  EXPECT_EQ(stopped.begin, 0);
+  EXPECT_EQ(stopped.end, 72);
+  const Ramp both = rampOf([](double x) { return std::clamp(x, 24.0, 60.0); });
+  EXPECT_EQ(both.begin, 24);
+  EXPECT_EQ(both.end, 60);
+  // A saw-tooth on its way up has no part that grows alone.
+  const Ramp saw = rampOf([](double x) { return x / 4 + std::fmod(x, 12); });
+  EXPECT_EQ(saw.begin, 0);
+  EXPECT_EQ(saw.end, 96);
 }
 
 TEST(Trend, WhatGoesUpAndDownIsNot) {

@@ -24,35 +24,49 @@ inline constexpr size_t kStretches = 12;
 
 // A line through the medians of the stretches of a series, each as many points long.
 struct Trend {
-  double growth;  // of the line, from the first point to the last
-  double wander;  // between the medians that lie farthest above and below the line
-  double noise;   // what the wander would be if noise alone moved each point; 0: not known
-  double grown;   // from the first median to the last
-  size_t rises;   // of the medians, above the one before
-  size_t falls;   // and below it
+  double growth;     // of the line, from the first point to the last
+  double wander;     // between the medians that lie farthest above and below the line
+  double scatter;    // the standard deviation that noise alone would give the growth
+  double roughness;  // how much of what is about the line comes anew with each point: 1 of noise,
+                     // about 0 of what is carried on from point to point
+  double grown;      // from the first median to the last
+  size_t rises;      // of the medians, above the one before
+  size_t falls;      // and below it
 
   // Whether it grew all the time. Where the points are moved by noise alone, the growth has to
-  // stand out from that. Where chance carries a figure on from point to point the wander is larger
-  // than the noise, and such a figure hardly ever grows by so many times its wander; no more does
-  // one that goes up and down, or in a step. One that began or ended to grow meanwhile wanders for
-  // that alone; it is told by never having gone back.
+  // stand out from that. Where chance carries a figure on from point to point it moves far beyond
+  // the noise, and such a figure hardly ever grows by so many times its wander; no more does one
+  // that goes up and down, or in a step. One that began or ended to grow meanwhile wanders for that
+  // alone; it is told by never having gone back.
   bool IsSteady() const {
-    constexpr double kTimesNoise = 2;
-    constexpr double kMostNoise = 1.8;
+    constexpr double kLeastRoughness = 0.6;
+    constexpr double kMostWander = 7.3;
+    constexpr double kTimesScatter = 8;
     constexpr double kTimesWander = 8;
     constexpr double kTimesWanderRising = 3;
     constexpr size_t kMostRests = 3;
     if (growth <= 0) return false;
-    const bool isNoise = wander < kMostNoise * noise;
+    const bool isNoise = roughness > kLeastRoughness && wander < kMostWander * scatter;
     const bool isRising = falls == 0 && rises + kMostRests >= kStretches - 1;
     return growth > (isRising ? kTimesWanderRising : kTimesWander) * wander ||
-           (isNoise && growth > kTimesNoise * noise);
+           (isNoise && growth > kTimesScatter * scatter);
   }
 };
 
 // None of too few points.
 // REQUIRES: x does not fall.
 std::optional<Trend> TrendOf(std::span<const Point> points);
+
+// When a series grew that is level before and after.
+struct Ramp {
+  double begin;
+  double end;
+};
+
+// All of the time unless a line that is level before or behind lies much closer to the points than
+// a straight one, and so for more than a few points.
+// REQUIRES: x does not fall, and there are kStretches points.
+Ramp RampOf(std::span<const Point> points);
 
 }  // namespace ksicache
 
