@@ -2,10 +2,12 @@
 #include <nlohmann/json.hpp>
 
 #include <algorithm>
+#include <cstring>
 #include <iostream>
 #include <string>
 #include <vector>
 
+#include <knvlibs/ksi_records.h>
 #include "tests/ksicache/leak_host.h"
 #include "tests/ksicache/recording_fixture.h"
 
@@ -35,6 +37,20 @@ class DiffSince : public RecordingTest {
     const json value = json::parse(out, nullptr, false);
     EXPECT_FALSE(value.is_discarded()) << out;
     return value;
+  }
+
+  // Adds to what a user world has mapped, in KB.
+  static void Grow(MomentReading& reading, uint64_t kilobytes) {
+    KSI_UwTally tally = {};
+    std::memcpy(&tally, reading.answer.record.data(), sizeof tally);
+    tally.mapped += kilobytes;
+    std::memcpy(reading.answer.record.data(), &tally, sizeof tally);
+  }
+
+  static void Rename(MomentReading& reading, const std::string& name) {
+    KSI_GroupName record = {};
+    std::memcpy(record.text, name.data(), name.size());
+    std::memcpy(reading.answer.record.data(), &record, sizeof record);
   }
 
   static bool IsAmongFirst(const json& things, const LeakHost& host, size_t first) {
@@ -87,7 +103,7 @@ TEST_F(DiffSince, Screen) {
   Record(Path("r.rec"), MomentsOf(host));
   const std::string out = Output({"diff", "--since", "7d", Path("r.rec"), "--top", "1"});
   EXPECT_EQ(out, R"(h, 2026-11-21T10:00:00Z to 2026-11-23T09:40:48Z: 1d 23h
-150 of 150 moments read
+150 of 150 moments read; the recording begins there
 
 KB                                          now      growth    an hour   full in
 free                                  178999464           -          -
@@ -101,15 +117,91 @@ heap heap0                               110844        9836        225  367d 20h
 )");
 }
 
-// The afternoon's leak begins after some minutes, and the heap is full before the end.
+// The afternoon's leak begins after some minutes, and has stopped before the end: it will not be
+// full at any time.
 TEST_F(DiffSince, FindsARamp) {
   const std::string out =
       Output({"diff", "--since", "4h", TALLY_EXAMPLES "/afternoon.rec", "-u", "mb"});
-  EXPECT_NE(
-      out.find(
-          "\nheap netPktHeap                             465         407        131    21m 4s\n"),
-      std::string::npos)
-      << out;
+  EXPECT_TRUE(out.ends_with(R"(
+who grows steadily                          now      growth    an hour   full in
+heap netPktHeap                             465         407        131
+    it began at 2026-11-21T13:20:00Z and stopped at 2026-11-21T16:24:00Z
+)")) << out;
+}
+
+// The clock is set back by an hour, which changes neither who is found nor how fast it grows.
+TEST_F(DiffSince, AClockSetBack) {
+  LeakHost host(2, kMoments);
+  host.Leak(LeakHost::Kind::heap);
+  std::vector<Moment> moments = MomentsOf(host);
+  for (Moment& moment : moments) moment.facts.uptime = moment.facts.taken - kStart + kSecond;
+  const json before = SteadyOf(moments);
+  for (size_t i = 100; i < moments.size(); ++i) moments[i].facts.taken -= 3600 * kSecond;
+  const json after = SteadyOf(moments);
+  EXPECT_EQ(after["moments"], kMoments);
+  ASSERT_EQ(after["things"].size(), before["things"].size());
+  for (size_t i = 0; i < after["things"].size(); ++i) {
+    EXPECT_EQ(after["things"][i]["perHour"], before["things"][i]["perHour"]);
+  }
+  // All of them lie in the hour that came twice.
+  for (size_t i = 0; i < moments.size(); ++i) {
+    moments[i].facts.taken = kStart + static_cast<int64_t>(i % 75) * 5 * kSecond;
+    moments[i].facts.uptime = static_cast<int64_t>(i + 1) * 5 * kSecond;
+  }
+  EXPECT_EQ(SteadyOf(moments)["moments"], kMoments);
+  EXPECT_TRUE(Output({"diff", Path("r.rec")})
+                  .starts_with("h, 2026-11-21T10:00:00Z to 2026-11-21T10:06:10Z: 12m 25s\n"));
+  EXPECT_TRUE(
+      Output({"diff", Path("r.rec") + "@10:06:10", Path("r.rec")}).find("later one first") ==
+      std::string::npos);
+}
+
+// A process for each few moments, and one that changes its name while it grows.
+TEST_F(DiffSince, ProcessesThatAreManyOrRenamed) {
+  LeakHost host(2, kMoments);
+  std::vector<Moment> moments = MomentsOf(host);
+  for (size_t i = 0; i < moments.size(); ++i) {
+    for (MomentReading& reading : moments[i].readings) {
+      const std::string& path = RecordedNodes()[reading.question.node].path;
+      const OwnKey& key = reading.question.keys[0];
+      const bool isWorld = path == "sched/memClients/tally/uw";
+      if (isWorld && key == OwnKey(int64_t{1003})) Grow(reading, i * 20000);
+      if (path == "sched/groups/groupName" && key == OwnKey(int64_t{1003})) {
+        Rename(reading, "conns " + std::to_string(i));
+      }
+      // Each of four leaks while it is its turn.
+      for (int64_t turn = 0; turn < 4; ++turn) {
+        if (key != OwnKey(1004 + turn)) continue;
+        const size_t begin = static_cast<size_t>(turn) * moments.size() / 4;
+        if (isWorld && i > begin) Grow(reading, std::min(i - begin, moments.size() / 4) * 20000);
+        if (path == "sched/groups/groupName") Rename(reading, "worker");
+      }
+    }
+  }
+  const json steady = SteadyOf(moments);
+  ASSERT_EQ(steady["things"].size(), 2U) << steady;
+  EXPECT_EQ(steady["things"][0]["name"], "worker");
+  EXPECT_FALSE(steady["things"][0].contains("group"));
+  EXPECT_EQ(steady["things"][1]["name"], "conns 149");
+}
+
+// A heap that cannot be read at the last moment has grown nevertheless, and is told.
+TEST_F(DiffSince, WithoutTheLastFigure) {
+  LeakHost host(2, kMoments);
+  host.Leak(LeakHost::Kind::heap);
+  std::vector<Moment> moments = MomentsOf(host);
+  for (MomentReading& reading : moments.back().readings) {
+    const std::string& path = RecordedNodes()[reading.question.node].path;
+    if (path != "system/heaps/stats" || reading.question.keys[0] != OwnKey("heap0")) continue;
+    reading.answer = {};
+    reading.answer.status = 0xbad0002;
+  }
+  Record(Path("r.rec"), moments);
+  const harness::Result result =
+      Run({"diff", "--since", "7d", Path("r.rec"), "--json", "--fail-above", "5m"});
+  EXPECT_EQ(result.status, 3);
+  EXPECT_EQ(json::parse(result.out)["things"][0]["name"], "heap0");
+  EXPECT_EQ(Run({"diff", "--since", "7d", Path("r.rec"), "--fail-above", "5g"}).status, 1);
 }
 
 // What was before the host was started anew is left out, and names are matched across it.

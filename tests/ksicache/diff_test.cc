@@ -169,7 +169,7 @@ TEST_F(Diff, ReportForPrograms) {
             R"({"before":{"host":"hypervisor.example.org","time":"2026-11-21T10:02:00Z"},)"
             R"("after":{"host":"hypervisor.example.org","time":"2026-11-21T10:05:00Z"},)"
             R"("seconds":180,"rebooted":false,"report":"swap-stats","unit":"KB","by":"swapped",)"
-            R"("unchanged":11,"changed":1,"rows":[)"
+            R"("unchanged":11,"unknown":0,"changed":1,"rows":[)"
             "\n"
             R"({"row":{"name":"build-linux","schedGrp":1060},"state":"changed","columns":)"
             R"({"swapped":{"before":1509948,"after":9437184,"growth":7927236}}})"
@@ -312,7 +312,6 @@ TEST_F(Diff, FailAbove) {
   EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "142G"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "151630057472"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "--fail-above", "151630057471"}), 3);
-  EXPECT_EQ(status({kAfter, kBefore, "--fail-above", "11G"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "swap-stats", "--fail-above", "7g"}), 3);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "swap-stats", "--fail-above", "8g", "-u", "mb"}), 0);
   EXPECT_EQ(status({kBefore, kAfter, "-r", "vm-stats", "--by", "ballooned", "--fail-above", "3g"}),
@@ -320,6 +319,61 @@ TEST_F(Diff, FailAbove) {
   ExpectFailure(
       {"diff", kBefore, kAfter, "-r", "lpage-stats", "--by", "nrBackings", "--fail-above", "1"},
       "--fail-above takes memory, and nrBackings is none: --by names another column", 2);
+}
+
+// What a row has taken is looked at, whatever else of it changed more.
+TEST_F(Diff, FailAboveLooksAtWhatIsConsumed) {
+  const std::string afternoon = TALLY_EXAMPLES "/afternoon.rec";
+  const harness::Result result =
+      Run({"diff", afternoon, "-r", "vm-stats", "--fail-above", "500m", "--top", "1"});
+  EXPECT_EQ(result.status, 3);
+  EXPECT_NE(result.out.find("vm-stats, KB, by consumed\n"), std::string::npos) << result.out;
+  EXPECT_EQ(Run({"diff", afternoon, "-r", "vm-stats", "--fail-above", "2g"}).status, 0);
+  ExpectFailure({"diff", kBefore, kAfter, "-r", "comp-stats", "--fail-above", "1g"},
+                "--fail-above takes memory: --by names the column of comp-stats", 2);
+}
+
+// It is not said that nothing grew where that cannot be told.
+TEST_F(Diff, FailAboveWithoutAnAnswer) {
+  ExpectFailure({"diff", kAfter, kBefore, "--fail-above", "11G"},
+                "--fail-above takes the earlier moment first");
+  const std::string later =
+      Later("later.ksi", {{R"("free":138092636)", R"("free":18446744073709551615)"}});
+  const harness::Result result = Run({"diff", kExample, later, "--fail-above", "1g"});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.err, "ksicache: " + later + ": by how much the host grew is not known\n");
+}
+
+// One machine that cannot be read takes nothing with it, and what grew too much is told.
+TEST_F(Diff, OneMachineThatCannotBeRead) {
+  std::string text = FileContent(TALLY_EXAMPLE_JSON);
+  const std::string node = R"({"node":"sched/groups/stats/memoryStats","keys":[1040],)";
+  const size_t begin = text.find(node) + node.size();
+  ASSERT_GT(begin, node.size());
+  text.replace(begin, text.find("}}", begin) + 2 - begin, R"("status":"0xbad0002"})");
+  const size_t mapped = text.find(R"("mapped":196608)");
+  ASSERT_NE(mapped, std::string::npos);
+  text.replace(mapped, 15, R"("mapped":999999)");
+  WriteContent(Path("later.json"), text);
+  Output({"load", Path("later.json"), Path("later.ksi")});
+  const harness::Result result =
+      Run({"diff", kExample, Path("later.ksi"), "--json", "--fail-above", "500m"});
+  EXPECT_EQ(result.status, 3);
+  const json diff = json::parse(result.out);
+  const json machines = PartCalled(diff, "machines");
+  EXPECT_EQ(machines["count"], 11);
+  EXPECT_EQ(machines["withoutFigure"], 1);
+  EXPECT_EQ(machines["growth"], 0);
+  const json worlds = PartCalled(diff, "user worlds");
+  EXPECT_EQ(worlds["rows"].size(), 1U) << worlds;
+  EXPECT_EQ(worlds["growth"], 999999 - 196608);
+
+  const harness::Result rows =
+      Run({"diff", kExample, Path("later.ksi"), "-r", "vm-stats", "--json"});
+  EXPECT_EQ(rows.status, 1);
+  EXPECT_EQ(json::parse(rows.out)["unchanged"], 11);
+  EXPECT_EQ(json::parse(rows.out)["unknown"], 1);
+  EXPECT_EQ(json::parse(rows.out)["changed"], 0);
 }
 
 // Whatever becomes of a host, what is printed adds up, in any unit: the rows to their part, and the
@@ -369,6 +423,8 @@ TEST_F(Diff, Misused) {
   ExpectFailure({"diff", kExample, "--since", "1h", "-r", "vm-stats"},
                 "--since looks at all memory, and takes no --report", 2);
   ExpectFailure({"diff", kExample, "--since", "1h"}, kExample + ": --since takes a recording");
+  ExpectFailure({"diff", Path("none.rec"), "--since", "1h"},
+                Path("none.rec") + ": No such file or directory");
   ExpectFailure({"diff", kIncident, "--since", "1h"},
                 kIncident + ": it has 5 moments in that time, and a trend takes 12");
   ExpectFailure({"diff", kIncident + "@09:00Z"},

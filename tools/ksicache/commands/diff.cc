@@ -54,17 +54,27 @@ const tally::Report& ReportOf(const CommandLine& line) {
   return *report;
 }
 
-// 3 if something grew by more than may be.
-int StatusOf(const CommandLine& line, int64_t growth) {
+// 3 if something grew by more than may be, whatever else could not be read.
+int StatusOf(const CommandLine& line, int64_t growth, bool isWhole) {
   constexpr int kTooMuch = 3;
-  return line.Has(kFailAbove) && growth > SizeOf(line, kFailAbove, 0) ? kTooMuch : 0;
+  if (line.Has(kFailAbove) && growth > SizeOf(line, kFailAbove, 0)) return kTooMuch;
+  return isWhole ? 0 : 1;
+}
+
+// Whoever asks what grew by too much has to name the earlier moment first.
+Sides SidesOf(const CommandLine& line) {
+  Sides sides = SidesOf(NamesOf(line.arguments), line.Has(kAcrossHosts));
+  if (line.Has(kFailAbove) && sides.Seconds() < 0) {
+    throw Error("--fail-above takes the earlier moment first");
+  }
+  return sides;
 }
 
 // Two moments of a host's memory.
 int DiffHost(const CommandLine& line) {
   const tally::DisplayUnit unit = UnitOf(line).value_or(tally::DisplayUnit::kb);
   const auto top = static_cast<size_t>(CountOf(line, kTop, kFewThings));
-  const Sides sides = SidesOf(NamesOf(line.arguments), line.Has(kAcrossHosts));
+  const Sides sides = SidesOf(line);
   Memory memory[2];
   Complaints complaints;
   ReadBoth(sides, [&](const Origin& origin, bool isAfter) {
@@ -76,7 +86,10 @@ int DiffHost(const CommandLine& line) {
   const Balance balance = Compare(memory[0], memory[1], unit, sides.HaveSameNumbers());
   line.Has(kJson) ? PrintBalanceJson(sides, balance, unit, top)
                   : PrintBalance(sides, balance, unit, top);
-  return complaints.IsEmpty() ? StatusOf(line, balance.largest) : 1;
+  if (line.Has(kFailAbove) && complaints.IsEmpty() && !balance.used.Amount()) {
+    complaints.Say("by how much the host grew is not known");
+  }
+  return StatusOf(line, balance.largest, complaints.IsEmpty());
 }
 
 // All moments of a recording for a time.
@@ -88,7 +101,19 @@ int DiffSince(const CommandLine& line) {
   line.Has(kJson) ? PrintSteadyJson(growths, unit, top) : PrintSteady(growths, unit, top);
   constexpr double kMost = 9e18;
   const auto largest = static_cast<int64_t>(std::min(growths.Largest(), kMost));
-  return isWhole ? StatusOf(line, largest) : 1;
+  return StatusOf(line, largest, isWhole);
+}
+
+// Whether it can be told if a row grew by more than may be.
+void CheckCanFail(const ReportDiff& diff) {
+  if (diff.Columns().empty()) return;
+  if (!diff.Measure()) {
+    throw UsageError(std::string("--fail-above takes memory: --by names the column of ") +
+                     diff.After().GetReport().name);
+  }
+  if (diff.LargestBytes()) return;
+  throw UsageError(std::string("--fail-above takes memory, and ") +
+                   diff.Columns()[*diff.Measure()].name + " is none: --by names another column");
 }
 
 // Two moments of one report.
@@ -96,7 +121,7 @@ int DiffReport(const CommandLine& line) {
   const tally::Report& report = ReportOf(line);
   const std::optional<tally::DisplayUnit> unit = UnitOf(line);
   const auto top = static_cast<size_t>(CountOf(line, kTop, INT64_MAX));
-  const Sides sides = SidesOf(NamesOf(line.arguments), line.Has(kAcrossHosts));
+  const Sides sides = SidesOf(line);
   std::optional<Rows> rows[2];
   std::optional<GroupPaths> paths[2];
   Complaints complaints;
@@ -104,16 +129,14 @@ int DiffReport(const CommandLine& line) {
     complaints.BeginFile(isAfter ? sides.names.after : sides.names.before);
     rows[isAfter].emplace(report, origin, unit);
     complaints.SayDiagnostics();
+    if (!rows[isAfter]->IsWhole()) complaints.Say(rows[isAfter]->Complaint());
     if (!sides.HaveSameNumbers()) paths[isAfter].emplace(origin);
   });
   const ReportDiff diff(*rows[0], *rows[1], paths[0] ? &*paths[0] : nullptr,
                         paths[1] ? &*paths[1] : nullptr, sides.Seconds(), line.ValueOf(kBy));
-  if (line.Has(kFailAbove) && diff.By() && !diff.LargestBytes()) {
-    throw UsageError(std::string("--fail-above takes memory, and ") +
-                     diff.Columns()[*diff.By()].name + " is none: --by names another column");
-  }
+  if (line.Has(kFailAbove)) CheckCanFail(diff);
   line.Has(kJson) ? PrintReportDiffJson(sides, diff, top) : PrintReportDiff(sides, diff, top);
-  return complaints.IsEmpty() ? StatusOf(line, diff.LargestBytes().value_or(0)) : 1;
+  return StatusOf(line, diff.LargestBytes().value_or(0), complaints.IsEmpty());
 }
 
 int Diff(const CommandLine& line) {

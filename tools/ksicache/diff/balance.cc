@@ -63,6 +63,9 @@ class Comparison {
 
   void Keep(const Growth& bytes) { largest_ = std::max(largest_, bytes.Amount().value_or(0)); }
 
+  // Whether anything is known of them.
+  static bool IsTold(const Things& things) { return things.isWhole || !things.amounts.empty(); }
+
   static std::vector<std::string> Identities(const std::vector<Amount>& amounts) {
     std::vector<std::string> identities;
     identities.reserve(amounts.size());
@@ -71,17 +74,21 @@ class Comparison {
   }
 
   PartGrowth PartOf(const PartInfo& info) {
-    const auto& before = before_.Of(info.part);
-    const auto& after = after_.Of(info.part);
-    PartGrowth part = {&info, before && after, 0, 0, 0, {}, {}};
+    const Things& before = before_.Of(info.part);
+    const Things& after = after_.Of(info.part);
+    PartGrowth part = {&info, IsTold(before) && IsTold(after), 0, 0, 0, {}, {}};
     if (!part.isKnown) return part;
-    part.before = before->size();
-    part.after = after->size();
+    part.before = before.amounts.size();
+    part.after = after.amounts.size();
+    // What a thing has that is not there: it may be missing.
+    const Figure ofNone = before.isWhole && after.isWhole ? Figure(0) : std::nullopt;
     Growth sum = {0, 0};
-    for (const Match& match : MatchAll(Identities(*before), Identities(*after), mayRepeat_)) {
-      const Amount& thing = match.IsGone() ? (*before)[match.before] : (*after)[match.after];
-      const Growth bytes = {match.IsNew() ? 0 : (*before)[match.before].bytes,
-                            match.IsGone() ? 0 : (*after)[match.after].bytes};
+    for (const Match& match :
+         MatchAll(Identities(before.amounts), Identities(after.amounts), mayRepeat_)) {
+      const Amount& thing =
+          match.IsGone() ? before.amounts[match.before] : after.amounts[match.after];
+      const Growth bytes = {match.IsNew() ? ofNone : before.amounts[match.before].bytes,
+                            match.IsGone() ? ofNone : after.amounts[match.after].bytes};
       if (!bytes.Amount()) {
         ++part.unknown;
         continue;

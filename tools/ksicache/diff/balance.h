@@ -35,10 +35,10 @@ struct ThingGrowth {
 // sums.
 struct PartGrowth {
   const PartInfo* info;
-  bool isKnown;  // it could be told at both moments who they are
+  bool isKnown;  // it could be told at both moments who they are, of some at least
   size_t before = 0;
   size_t after = 0;    // how many there are
-  size_t unknown = 0;  // of them left out
+  size_t unknown = 0;  // left out
   Growth sum;
   std::vector<ThingGrowth> things;  // that changed, those that did most first
 };

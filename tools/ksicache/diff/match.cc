@@ -4,6 +4,7 @@
 #include <string_view>
 
 #include "reports/reports.h"
+#include "tools/ksicache/error.h"
 
 namespace ksicache {
 namespace {
@@ -48,6 +49,7 @@ PlacesOf Find(const std::vector<std::string>& identities) {
 
 GroupPaths::GroupPaths(const Origin& origin) {
   const Rows groups(tally::groupStats, origin, std::nullopt, {"gid", "name", "parGid"});
+  if (!groups.IsWhole()) throw DataError(groups.Complaint());
   const size_t gid = PlaceOf(groups, "gid");
   const size_t name = PlaceOf(groups, "name");
   const size_t parent = PlaceOf(groups, "parGid");

@@ -2,6 +2,7 @@
 
 #include <span>
 #include <string_view>
+#include <unordered_map>
 #include <unordered_set>
 #include <utility>
 
@@ -22,6 +23,12 @@ std::optional<int64_t> Difference(std::optional<int64_t> a, std::optional<int64_
   return difference;
 }
 
+std::optional<int64_t> Sum(std::optional<int64_t> a, std::optional<int64_t> b) {
+  int64_t sum = 0;
+  if (!a || !b || __builtin_add_overflow(*a, *b, &sum)) return std::nullopt;
+  return sum;
+}
+
 std::optional<int64_t> Times(std::optional<int64_t> number, int64_t size) {
   int64_t product = 0;
   if (!number || __builtin_mul_overflow(*number, size, &product)) return std::nullopt;
@@ -31,7 +38,12 @@ std::optional<int64_t> Times(std::optional<int64_t> number, int64_t size) {
 class Reader {
  public:
   Reader(const Origin& origin, const MemoryOptions& options) : origin_(origin), options_(options) {
-    if (options.byPath) Try([&] { paths_.emplace(origin_); });
+    if (!options.byPath) return;
+    try {
+      paths_.emplace(origin_);
+    } catch (const DataError& error) {
+      memory_.complaints.emplace_back(error.what());
+    }
   }
 
   Memory Run() {
@@ -41,6 +53,7 @@ class Reader {
     ReadGroups();
     ReadHeaps();
     if (options_.isAll) {
+      SumNames();
       ReadLargePages();
       ReadSharing();
     }
@@ -62,48 +75,38 @@ class Reader {
     std::span<const Value> values_;
   };
 
-  template <class Do>
-  void Try(Do&& act) {
-    try {
-      act();
-    } catch (const DataError& error) {
-      memory_.complaints.emplace_back(error.what());
-    }
-  }
-
-  // Calls `visit` with each row of a report; false if the report tells of none.
+  // Calls `visit` with each row of a report; false if there may be others.
   template <class Visit>
   bool ForEachRow(const tally::Report& report, Rows::Names names, Visit&& visit) {
-    bool isTold = false;
-    Try([&] {
-      const Rows rows(report, origin_, tally::DisplayUnit::b, names);
-      if (rows.Columns().empty()) return;
-      std::vector<size_t> places;
-      for (const std::string_view name : names) {
-        size_t place = 0;
-        while (rows.Columns()[place].name != name) ++place;
-        places.push_back(place);
-      }
-      for (size_t i = 0; i < rows.Count(); ++i) visit(Row(places, rows.At(i)));
-      isTold = true;
-    });
-    return isTold;
+    const Rows rows(report, origin_, tally::DisplayUnit::b, names);
+    std::vector<size_t> places;
+    for (const std::string_view name : names) {
+      size_t place = 0;
+      while (rows.Columns()[place].name != name) ++place;
+      places.push_back(place);
+    }
+    for (size_t i = 0; i < rows.Count(); ++i) visit(Row(places, rows.At(i)));
+    if (!rows.IsWhole()) memory_.complaints.push_back(rows.Complaint());
+    return rows.IsWhole();
   }
 
-  std::vector<Amount>& New(Part part) { return memory_.parts[static_cast<size_t>(part)].emplace(); }
+  Things& Of(Part part) { return memory_.parts[static_cast<size_t>(part)]; }
+  std::vector<Amount>& New(Part part) { return Of(part).amounts; }
 
-  // Nobody knows who they are.
-  void Forget(std::initializer_list<Part> parts) {
-    for (const Part part : parts) memory_.parts[static_cast<size_t>(part)].reset();
+  void SetWhole(bool isWhole, std::initializer_list<Part> parts) {
+    for (const Part part : parts) Of(part).isWhole = isWhole;
   }
 
   Amount OfGroup(const Row& row, std::optional<int64_t> bytes,
                  std::optional<int64_t> limit = std::nullopt) const {
     const int64_t number = row.Number(0).value_or(-1);
     const std::string name(row.Text(1));
-    const std::string identity =
-        paths_ ? paths_->Of(number).value_or(name) : std::to_string(number) + " " + name;
-    return {identity, name, number, bytes, limit};
+    return {IdentityOf(number, name), name, number, bytes, limit};
+  }
+
+  std::string IdentityOf(int64_t number, const std::string& name) const {
+    if (paths_) return paths_->Of(number).value_or(name);
+    return options_.isAll ? std::to_string(number) : std::to_string(number) + " " + name;
   }
 
   void ReadHost() {
@@ -119,7 +122,7 @@ class Reader {
     std::vector<Amount>& machines = New(Part::machines);
     std::vector<Amount>& overheads = New(Part::overheads);
     std::vector<Amount>& sharing = New(Part::machineSharing);
-    const bool isTold = ForEachRow(
+    const bool isWhole = ForEachRow(
         tally::vmStats, {"schedGrp", "name", "consumed", "ovhd", "sharedSaved", "memSizeLimit"},
         [&](const Row& row) {
           machines.push_back(OfGroup(row, row.Number(2), row.Number(5)));
@@ -127,20 +130,39 @@ class Reader {
           sharing.push_back(OfGroup(row, row.Number(4)));
           machines_.insert(machines.back().number);
         });
-    if (!isTold) Forget({Part::machines, Part::overheads, Part::machineSharing});
+    SetWhole(isWhole, {Part::machines, Part::overheads, Part::machineSharing});
   }
 
   // A user world that belongs to a machine is in the machine's overhead.
   void ReadUserWorlds() {
     std::vector<Amount>& worlds = New(Part::userWorlds);
-    const bool isTold =
+    const bool isWhole =
         ForEachRow(tally::uwStats, {"schedGrp", "name", "consumed", "max"}, [&](const Row& row) {
           Amount world = OfGroup(row, row.Number(2), row.Number(3));
           if (machines_.contains(world.number)) return;
           worlds_.insert(world.number);
           worlds.push_back(std::move(world));
         });
-    if (!isTold) Forget({Part::userWorlds});
+    // One of a machine that is missing would pass for one of nobody.
+    SetWhole(isWhole && Of(Part::machines).isWhole, {Part::userWorlds});
+  }
+
+  // What starts one process after the other, or is started anew again and again, grows in none.
+  void SumNames() {
+    std::unordered_map<std::string, Amount> sums;
+    for (const Amount& world : Of(Part::userWorlds).amounts) {
+      const auto [found, isFirst] = sums.try_emplace(world.name, world);
+      Amount& sum = found->second;
+      if (isFirst) continue;
+      sum.number = -1;
+      sum.bytes = Sum(sum.bytes, world.bytes);
+    }
+    for (auto& [name, sum] : sums) {
+      sum.identity = name;
+      sum.limit.reset();
+      New(Part::worldsOfName).push_back(std::move(sum));
+    }
+    SetWhole(Of(Part::userWorlds).isWhole, {Part::worldsOfName});
   }
 
   // Groups stand behind those that they are in.
@@ -148,7 +170,7 @@ class Reader {
     std::vector<Amount>& groups = New(Part::groups);
     std::vector<Amount>& tables = New(Part::pageTables);
     bool isRoot = true;
-    const bool isTold =
+    const bool isWhole =
         ForEachRow(tally::groupStats, {"gid", "name", "parGid", "consumed", "ovhd", "max"},
                    [&](const Row& row) {
                      const int64_t number = row.Number(0).value_or(-1);
@@ -159,24 +181,24 @@ class Reader {
                      if (machines_.contains(number)) return;
                      groups.push_back(OfGroup(row, row.Number(3), row.Number(5)));
                    });
-    if (!isTold) Forget({Part::groups, Part::pageTables});
+    SetWhole(isWhole && Of(Part::userWorlds).isWhole, {Part::groups, Part::pageTables});
   }
 
   void ReadHeaps() {
     std::vector<Amount>& heaps = New(Part::heaps);
     std::vector<Amount>& used = New(Part::heapUse);
-    const bool isTold =
+    const bool isWhole =
         ForEachRow(tally::heapStats, {"name", "size", "used", "max"}, [&](const Row& row) {
           const std::string name(row.Text(0));
           heaps.push_back({name, name, -1, row.Number(1), row.Number(3)});
           used.push_back({name, name, -1, row.Number(2), row.Number(3)});
         });
-    if (!isTold) Forget({Part::heaps, Part::heapUse});
+    SetWhole(isWhole, {Part::heaps, Part::heapUse});
   }
 
   void ReadLargePages() {
     std::vector<Amount>& pools = New(Part::largePages);
-    const bool isTold = ForEachRow(
+    const bool isWhole = ForEachRow(
         tally::lpoolStats, {"name", "nodeID", "nrLPages", "nrFreeSPages"}, [&](const Row& row) {
           const std::string name =
               std::string(row.Text(0)) + " of node " + std::to_string(row.Number(1).value_or(-1));
@@ -184,15 +206,15 @@ class Reader {
               Difference(Times(row.Number(2), kLargePage), Times(row.Number(3), kPage));
           pools.push_back({name, name, -1, bytes, Times(row.Number(2), kLargePage)});
         });
-    if (!isTold) Forget({Part::largePages});
+    SetWhole(isWhole, {Part::largePages});
   }
 
   void ReadSharing() {
     std::vector<Amount>& sharing = New(Part::hostSharing);
-    const bool isTold = ForEachRow(tally::pshareStats, {"reclaimed"}, [&](const Row& row) {
+    const bool isWhole = ForEachRow(tally::pshareStats, {"reclaimed"}, [&](const Row& row) {
       sharing.push_back({"host", "host", -1, row.Number(0), std::nullopt});
     });
-    if (!isTold) Forget({Part::hostSharing});
+    SetWhole(isWhole, {Part::hostSharing});
   }
 
   const Origin& origin_;

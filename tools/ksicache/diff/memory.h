@@ -25,6 +25,7 @@ enum class Part : uint8_t {
   largePages,
   machineSharing,
   hostSharing,
+  worldsOfName,
 };
 
 struct PartInfo {
@@ -48,6 +49,7 @@ inline constexpr PartInfo kParts[] = {
      false},
     {Part::machineSharing, "page sharing", "sharing lost by ", "vm-stats sharedSaved", false, true},
     {Part::hostSharing, "page sharing", "sharing lost by ", "pshare-stats reclaimed", false, true},
+    {Part::worldsOfName, "user worlds", "user worlds ", "uw-stats consumed", false, false},
 };
 
 constexpr const PartInfo& InfoOf(Part part) { return kParts[static_cast<size_t>(part)]; }
@@ -56,7 +58,7 @@ constexpr const PartInfo& InfoOf(Part part) { return kParts[static_cast<size_t>(
 struct Amount {
   std::string identity;  // in its part
   std::string name;
-  int64_t number = -1;  // the kernel's, of a group; -1: it has none
+  int64_t number = -1;  // the kernel's, of a group; -1: it has none, or there are several
   std::optional<int64_t> bytes;
   std::optional<int64_t> limit;  // that it cannot grow beyond
 };
@@ -70,22 +72,26 @@ struct HostMemory {
   std::optional<int64_t> others;
 };
 
+// The things of a part. Of those that are missing from one that is not whole nothing is known.
+struct Things {
+  std::vector<Amount> amounts;
+  bool isWhole = true;
+};
+
 struct Memory {
   HostMemory host;
-  // None: it could not be told who they are.
-  std::array<std::optional<std::vector<Amount>>, std::size(kParts)> parts;
+  std::array<Things, std::size(kParts)> parts;
   std::vector<std::string> complaints;  // why reports have failed
 
-  const std::optional<std::vector<Amount>>& Of(Part part) const {
-    return parts[static_cast<size_t>(part)];
-  }
+  const Things& Of(Part part) const { return parts[static_cast<size_t>(part)]; }
 };
 
 struct MemoryOptions {
   // The numbers of groups and processes are not to be part of identities, but the names on the way
   // to them.
   bool byPath = false;
-  // Large pages and page sharing, too, which are no part of a balance.
+  // Large pages, page sharing, and all user worlds of a name together, too, which are no part of a
+  // balance. Numbers alone are identities then: a name may change meanwhile.
   bool isAll = false;
 };
 

@@ -13,14 +13,21 @@
 namespace ksicache {
 namespace {
 
-// The boot that a moment is of; empty if it does not tell.
-std::string BootOf(const std::string& name) {
+// The boot that a moment is of, and how long the host had run then, in us; empty and 0 if it does
+// not tell.
+struct Run {
+  std::string boot;
+  int64_t uptime = 0;
+};
+
+Run RunOf(const std::string& name) {
   if (name.empty()) return {};
   ksi::OpenedCache opened;
   ksi::ChunkReader moment;
   std::string why;
   const ksi::Status status = ksi::ReadCache(name, &opened, &moment, &why);
-  return status == ksi::kOk && opened.recording != nullptr ? moment.Host().boot : std::string();
+  if (status != ksi::kOk || opened.recording == nullptr) return {};
+  return {moment.Host().boot, moment.Facts().uptime};
 }
 
 Origin OriginOf(const std::string& name) {
@@ -58,7 +65,8 @@ MomentNames NamesOf(const std::vector<std::string>& arguments) {
 }
 
 double Sides::Seconds() const {
-  return static_cast<double>(after.taken - before.taken) / static_cast<double>(ksi::kSecond);
+  return static_cast<double>(ran.value_or(after.taken - before.taken)) /
+         static_cast<double>(ksi::kSecond);
 }
 
 std::string Sides::Title() const {
@@ -66,18 +74,23 @@ std::string Sides::Title() const {
   if (after.host != before.host) title += after.host + ", ";
   title += after.time + ": " + DurationText(Seconds());
   if (Seconds() < 0) title += ", the later one first";
+  if (Seconds() > 0 && after.taken < before.taken) title += ", the clock was set back";
   return title;
 }
 
 Sides SidesOf(const MomentNames& names, bool mayDiffer) {
-  Sides sides = {names, With(names.before, OriginOf), With(names.after, OriginOf)};
+  Sides sides = {
+      .names = names, .before = With(names.before, OriginOf), .after = With(names.after, OriginOf)};
   if (!mayDiffer && sides.before.host != sides.after.host) {
     throw Error("they are of two hosts, " + sides.before.host + " and " + sides.after.host +
                 ": --across-hosts compares them");
   }
-  const std::string boot = BootOf(names.before);
-  const std::string bootAfter = BootOf(names.after);
-  sides.isRebooted = !boot.empty() && !bootAfter.empty() && boot != bootAfter;
+  const Run from = RunOf(names.before);
+  const Run to = RunOf(names.after);
+  sides.isRebooted = !from.boot.empty() && !to.boot.empty() && from.boot != to.boot;
+  const bool isOneFile = FileNameOf(names.before) == FileNameOf(names.after);
+  const bool isOneBoot = from.boot == to.boot && (isOneFile || !from.boot.empty());
+  if (isOneBoot && from.uptime != 0 && to.uptime != 0) sides.ran = to.uptime - from.uptime;
   return sides;
 }
 

@@ -1,7 +1,9 @@
 #ifndef TOOLS_KSICACHE_DIFF_MOMENTS_H_
 #define TOOLS_KSICACHE_DIFF_MOMENTS_H_
 
+#include <cstdint>
 #include <functional>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -30,9 +32,12 @@ struct Sides {
   Origin before;
   Origin after;
   bool isRebooted = false;  // the host was started anew in between, as far as recordings tell
+  // By how much longer the host ran at the moment after, in us; none if recordings do not tell.
+  std::optional<int64_t> ran = std::nullopt;
 
   // Whether the kernel's numbers name the same groups and processes in both.
   bool HaveSameNumbers() const { return !isRebooted && before.host == after.host; }
+  // How long after the one the other is, whatever the clock was set to.
   double Seconds() const;
   // "a17, 2026-11-21T10:00:00Z to 2026-11-21T10:05:00Z: 5m 0s"
   std::string Title() const;

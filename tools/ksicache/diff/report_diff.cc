@@ -6,6 +6,7 @@
 
 #include "framework/display_unit.h"
 #include "framework/name_list.h"
+#include "reports/reports.h"
 #include "tools/ksicache/diff/unit.h"
 #include "tools/ksicache/error.h"
 
@@ -38,6 +39,24 @@ int RankOf(const RowColumn& column) {
   return IsMemory(column.kind) ? 3 : 2;
 }
 
+// What the things of a report have taken, which says who grew.
+struct Use {
+  const tally::Report* report;
+  const char* column;
+};
+constexpr Use kUses[] = {
+    {&tally::groupStats, "consumed"},  {&tally::vmStats, "consumed"},
+    {&tally::uwStats, "consumed"},     {&tally::swapStats, "swapped"},
+    {&tally::zipStats, "usedCache"},   {&tally::heapStats, "size"},
+    {&tally::guestStats, "memNeeded"},
+};
+
+// Empty if it tells of nothing of the kind.
+std::string_view UseOf(const tally::Report& report) {
+  const auto* found = std::ranges::find(kUses, &report, &Use::report);
+  return found == std::end(kUses) ? std::string_view() : found->column;
+}
+
 int64_t SizeOf(int64_t growth) { return growth == INT64_MIN ? INT64_MAX : std::abs(growth); }
 
 }  // namespace
@@ -45,23 +64,25 @@ int64_t SizeOf(int64_t growth) { return growth == INT64_MIN ? INT64_MAX : std::a
 ReportDiff::ReportDiff(const Rows& before, const Rows& after, const GroupPaths* pathsBefore,
                        const GroupPaths* pathsAfter, double seconds, const std::string* by)
     : before_(before), after_(after) {
-  const std::optional<size_t> wanted = ColumnCalled(by);
+  measure_ = ColumnCalled(by != nullptr ? *by : UseOf(after.GetReport()));
+  if (by != nullptr && !measure_) {
+    throw UsageError(std::string(after.GetReport().name) + " has no column " + *by +
+                     " that could grow");
+  }
   for (const Match& match : MatchAll(IdentitiesOf(before, pathsBefore),
                                      IdentitiesOf(after, pathsAfter), pathsBefore == nullptr)) {
     Compare(match, seconds);
   }
-  by_ = wanted ? wanted : Best();
+  by_ = by != nullptr || HasChanged(measure_) ? measure_ : Best();
   std::ranges::stable_sort(changed_, std::ranges::greater(),
-                           [this](const RowChange& row) { return SizeOf(GrowthOf(row)); });
+                           [this](const RowChange& row) { return SizeOf(GrowthOf(row, by_)); });
 }
 
-std::optional<size_t> ReportDiff::ColumnCalled(const std::string* by) const {
-  if (by == nullptr) return std::nullopt;
+std::optional<size_t> ReportDiff::ColumnCalled(std::string_view name) const {
   for (size_t i = 0; i < Columns().size(); ++i) {
-    if (tally::SameName(*by, Columns()[i].name) && CanGrow(Columns()[i].kind)) return i;
+    if (tally::SameName(name, Columns()[i].name) && CanGrow(Columns()[i].kind)) return i;
   }
-  throw UsageError(std::string(after_.GetReport().name) + " has no column " + *by +
-                   " that could grow");
+  return std::nullopt;
 }
 
 Change ReportDiff::ChangeOf(size_t column, const Match& match, double seconds) const {
@@ -89,6 +110,10 @@ Change ReportDiff::ChangeOf(size_t column, const Match& match, double seconds) c
 }
 
 void ReportDiff::Compare(const Match& match, double seconds) {
+  if ((match.IsNew() && !before_.IsWhole()) || (match.IsGone() && !after_.IsWhole())) {
+    ++unknown_;
+    return;
+  }
   RowChange row = {match, {}};
   const bool isThroughout = !match.IsNew() && !match.IsGone();
   for (size_t i = 0; i < Columns().size(); ++i) {
@@ -123,17 +148,21 @@ std::optional<size_t> ReportDiff::Best() const {
   return best;
 }
 
-int64_t ReportDiff::GrowthOf(const RowChange& row) const {
-  if (!by_) return 0;
-  const auto found = std::ranges::find(row.changes, *by_, &Change::column);
+int64_t ReportDiff::GrowthOf(const RowChange& row, std::optional<size_t> column) {
+  const auto found = std::ranges::find(row.changes, column, &Change::column);
   return found == row.changes.end() ? 0 : found->growth.value_or(0);
 }
 
+bool ReportDiff::HasChanged(std::optional<size_t> column) const {
+  return std::ranges::any_of(changed_,
+                             [&](const RowChange& row) { return GrowthOf(row, column) != 0; });
+}
+
 std::optional<int64_t> ReportDiff::LargestBytes() const {
-  if (!by_ || !IsMemory(Columns()[*by_].kind)) return std::nullopt;
+  if (!measure_ || !IsMemory(Columns()[*measure_].kind)) return std::nullopt;
   int64_t largest = 0;
-  for (const RowChange& row : changed_) largest = std::max(largest, GrowthOf(row));
-  const std::string_view unit = Columns()[*by_].unit;
+  for (const RowChange& row : changed_) largest = std::max(largest, GrowthOf(row, measure_));
+  const std::string_view unit = Columns()[*measure_].unit;
   const auto* found = std::ranges::find(tally::kUnitNames, unit, &tally::UnitName::title);
   int64_t bytes = 0;
   const bool isTooLarge = __builtin_mul_overflow(largest, BytesIn(found->unit), &bytes);

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "tools/ksicache/diff/match.h"
@@ -32,8 +33,9 @@ struct RowChange {
 class ReportDiff {
  public:
   // `paths`: of each moment, if the host was started anew in between; else null.
-  // `by`: the column to rank by; null: the one that changed most, of the memory, else of what is
-  // counted now. Fails with a UsageError if there is none of that name.
+  // `by`: the column to rank by; null: that of what the report's things have taken, or if it did
+  // not change the one that changed most, of the memory, else of what is counted now. Fails with a
+  // UsageError if there is none of that name.
   ReportDiff(const Rows& before, const Rows& after, const GroupPaths* pathsBefore,
              const GroupPaths* pathsAfter, double seconds, const std::string* by);
 
@@ -46,8 +48,14 @@ class ReportDiff {
   // Rows that changed, those that grew or shrank most in the column first.
   const std::vector<RowChange>& Changed() const { return changed_; }
   size_t Unchanged() const { return unchanged_; }
+  // Those that one moment has and that may be missing at the other, of which not all could be read.
+  size_t Unknown() const { return unknown_; }
   // The column that ranks; none if nothing changed that could.
   std::optional<size_t> By() const { return by_; }
+
+  // The column that says who grew, whatever changed: that asked for, or of what the report's things
+  // have taken.
+  std::optional<size_t> Measure() const { return measure_; }
 
   // The most bytes that a row grew by in that column; none if it is not one of memory.
   std::optional<int64_t> LargestBytes() const;
@@ -58,15 +66,18 @@ class ReportDiff {
  private:
   Change ChangeOf(size_t column, const Match& match, double seconds) const;
   void Compare(const Match& match, double seconds);
-  std::optional<size_t> ColumnCalled(const std::string* by) const;
+  std::optional<size_t> ColumnCalled(std::string_view name) const;
   std::optional<size_t> Best() const;
-  int64_t GrowthOf(const RowChange& row) const;
+  static int64_t GrowthOf(const RowChange& row, std::optional<size_t> column);
+  bool HasChanged(std::optional<size_t> column) const;
 
   const Rows& before_;
   const Rows& after_;
   std::vector<RowChange> changed_;
   size_t unchanged_ = 0;
+  size_t unknown_ = 0;
   std::optional<size_t> by_;
+  std::optional<size_t> measure_;
 };
 
 }  // namespace ksicache

@@ -64,7 +64,8 @@ std::string CountText(const ReportDiff& diff) {
   return std::to_string(rows.size()) + (rows.size() == 1 ? " row" : " rows") + " changed, " +
          std::to_string(std::ranges::count_if(rows, isNew)) + " of them new and " +
          std::to_string(std::ranges::count_if(rows, isGone)) + " gone; " +
-         std::to_string(diff.Unchanged()) + " did not";
+         std::to_string(diff.Unchanged()) + " did not" +
+         (diff.Unknown() == 0 ? "" : ", of " + std::to_string(diff.Unknown()) + " nobody knows");
 }
 
 // The unit of memory in the report; empty if it has no memory.
@@ -163,6 +164,8 @@ void PrintReportDiffJson(const Sides& sides, const ReportDiff& diff, size_t top)
   }
   json.Name("unchanged");
   json.PutNumber(static_cast<int64_t>(diff.Unchanged()));
+  json.Name("unknown");
+  json.PutNumber(static_cast<int64_t>(diff.Unknown()));
   json.Name("changed");
   json.PutNumber(static_cast<int64_t>(diff.Changed().size()));
   json.Name("rows");

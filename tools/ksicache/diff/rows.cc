@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "tools/ksicache/error.h"
 #include "tools/ksicache/export/row_sink.h"
 
 namespace ksicache {
@@ -41,7 +42,11 @@ Rows::Rows(const tally::Report& report, const Origin& origin,
   Keeper keeper(*this, kept);
   RowSink sink(keeper, unit, {kept.begin(), kept.end()});
   sink.Expect(report, origin);
-  RunReport(report, sink);
+  try {
+    RunReport(report, sink);
+  } catch (const DataError& error) {
+    complaint_ = error.what();
+  }
 }
 
 std::optional<int64_t> NumberOf(const Value& value) {

@@ -23,13 +23,16 @@ class Rows {
   using Names = std::initializer_list<std::string_view>;
 
   // Runs the report on what the library answers from, and keeps the columns of these names, or all.
-  // Memory is in `unit`; none: in that of the report. Fails as RunReport.
+  // Memory is in `unit`; none: in that of the report.
   Rows(const tally::Report& report, const Origin& origin, std::optional<tally::DisplayUnit> unit,
        Names kept = {});
 
   const tally::Report& GetReport() const { return *report_; }
 
-  // None if the report told nothing but diagnostics.
+  // Whether no row is missing; else why.
+  bool IsWhole() const { return complaint_.empty(); }
+  const std::string& Complaint() const { return complaint_; }
+
   const std::vector<RowColumn>& Columns() const { return columns_; }
 
   size_t Count() const { return columns_.empty() ? 0 : values_.size() / columns_.size(); }
@@ -46,6 +49,7 @@ class Rows {
   std::vector<RowColumn> columns_;
   std::vector<Value> values_;
   std::deque<std::string> texts_;  // of the values, and the units of the columns
+  std::string complaint_;
 };
 
 // A value as a number; none if it is a text or has no value, or one that no int64_t holds.

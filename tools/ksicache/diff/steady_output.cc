@@ -6,6 +6,7 @@
 #include <span>
 #include <string>
 
+#include "knvlibs/times.h"
 #include "tools/ksicache/diff/json_text.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/diff/unit.h"
@@ -42,16 +43,18 @@ class Screen {
   Screen(tally::DisplayUnit unit, size_t top) : unit_(unit), top_(top) {}
 
   void Print(const SteadyGrowths& growths) const {
-    const double seconds = static_cast<double>(growths.last.taken - growths.first.taken) / 1e6;
     PrintLine(growths.last.host + ", " + growths.first.time + " to " + growths.last.time + ": " +
-              DurationText(seconds));
+              DurationText(growths.seconds));
     PrintLine(std::to_string(growths.samples) + " of " + std::to_string(growths.moments) +
-              " moments read" + (growths.isSinceBoot ? ", since the host was started" : ""));
+              " moments read" + (growths.isSinceBoot ? ", since the host was started" : "") +
+              (growths.isShort ? "; the recording begins there" : ""));
     PrintLine("");
     Header(tally::UnitTitle(unit_));
     for (const SteadyGrowth& growth : growths.host) PrintGrowth(growth, growth.name);
     PrintLine("");
-    PrintAll("who grows steadily", "nobody grows steadily", growths.things);
+    PrintAll("who grows steadily",
+             growths.groups.empty() ? "nobody grows steadily" : "nobody alone grows steadily",
+             growths.things);
     if (growths.groups.empty()) return;
     PrintLine("");
     PrintAll("groups, which contain the above", "", growths.groups);
@@ -69,6 +72,17 @@ class Screen {
                        OnTheRight(NumberText(In(unit_, growth.growth)), 12) +
                        OnTheRight(NumberText(In(unit_, PerHour(growth))), 11);
     if (!full.empty()) line += OnTheRight(full, 10);
+    PrintLine(line);
+    PrintTimes(growth);
+  }
+
+  // When it grew, if not all the time.
+  static void PrintTimes(const SteadyGrowth& growth) {
+    if (!growth.begun && !growth.stopped) return;
+    std::string line = "    it";
+    if (growth.begun) line += " began at " + ksi::TextOfTime(*growth.begun);
+    if (growth.begun && growth.stopped) line += " and";
+    if (growth.stopped) line += " stopped at " + ksi::TextOfTime(*growth.stopped);
     PrintLine(line);
   }
 
@@ -89,6 +103,11 @@ class Screen {
   tally::DisplayUnit unit_;
   size_t top_;
 };
+
+void PutTime(const char* name, std::optional<int64_t> time, JsonText& json) {
+  json.Name(name);
+  time ? json.PutText(ksi::TextOfTime(*time)) : json.PutNone();
+}
 
 void PutGrowth(const SteadyGrowth& growth, tally::DisplayUnit unit, JsonText& json) {
   json.NewLine();
@@ -113,6 +132,8 @@ void PutGrowth(const SteadyGrowth& growth, tally::DisplayUnit unit, JsonText& js
   json.PutNumber(In(unit, PerHour(growth)));
   json.Name("fullInSeconds");
   json.PutReal(growth.fullIn);
+  PutTime("begun", growth.begun, json);
+  PutTime("stopped", growth.stopped, json);
   json.End('}');
 }
 
