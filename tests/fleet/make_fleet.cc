@@ -1,11 +1,13 @@
 // make_fleet DIRECTORY HOSTS: what was recorded of a fleet in a day, the same for the same words.
 //
-// A host has a file, host-NNNN.rec, with moments of yesterday 10:00, of 22:00 and of today 10:00;
-// every tenth has a capture of each instead, host-NNNN.H.ksi. It has 12 to 27 machines, whose
+// A host has a file, host-NNNN.rec, with moments of yesterday 10:00, of 22:00 and of today 10:00, a
+// second later for each host; every tenth has a capture of each instead, host-NNNN.H.ksi, and every
+// fiftieth is there since today. It has 12 to 27 machines, whose
 // memory in use goes up and down by a few percent, and 8 heaps that do likewise. But
 //
 //   of every 143rd host the free memory is less than its minimum today;
-//   a machine of every 97th host, ten at most, grows by 8 GB and more, each by another amount;
+//   a machine of every 97th host, ten at most, grows by 8 GB and more, each by another amount, and
+//   another host has one today that was not there before;
 //   the heap "netBuf" grows on all hosts of the second of three kernels, and on some of the others,
 //   the heap "fsCache" on all but one of each kernel.
 //
@@ -50,7 +52,10 @@ constexpr size_t kLast = kHours.size() - 1;
 constexpr size_t kGrownMachines = 10;
 constexpr uint64_t kGrownMachine = 2;  // of its host's machines
 constexpr int64_t kEveryGrown = 97;
+constexpr int64_t kComeMachine = 11;  // the host of the one that came
+constexpr uint64_t kCome = 20 * kGigabyte + 7;
 constexpr int64_t kEveryBelow = 143;
+constexpr int64_t kEveryNew = 50;
 constexpr int64_t kEveryCapture = 10;
 
 uint64_t MachinesOf(int64_t host) { return 12 + static_cast<uint64_t>(host) % 16; }
@@ -73,6 +78,8 @@ uint64_t GrowthOf(int64_t host) {
   return (8 + place) * kGigabyte + place;
 }
 
+bool IsNew(int64_t host) { return host % kEveryNew == 7; }
+
 bool IsBelow(int64_t host) { return host % kEveryBelow == 5; }
 
 bool Leaks(int64_t host, size_t heap) {
@@ -91,12 +98,16 @@ class Fleet {
     AddGroup(0, -1, "host", KSI_GROUP_PREDEFINED);
     std::vector<int64_t> groups;
     for (uint64_t i = 0; i < MachinesOf(host_); ++i) groups.push_back(100 + 2 * int64_t(i));
+    const size_t before = groups.size();
+    if (host_ == kComeMachine && moment == kLast) groups.push_back(100 + 2 * int64_t(before));
     made_.List("sched/groups/members/groups", groups, int64_t{0});
     uint64_t inUse = 0;
-    for (uint64_t i = 0; i < groups.size(); ++i) inUse += AddMachine(i, groups[i], moment);
+    for (uint64_t i = 0; i < before; ++i) inUse += AddMachine(i, groups[i], moment);
     AddBalance(inUse, moment);
     made_.List("system/heaps", kHeaps);
     for (size_t i = 0; i < kHeaps.size(); ++i) AddHeap(i, moment);
+    // Nothing else changes by it.
+    if (groups.size() > before) AddMachine(before, groups.back(), moment);
   }
 
  private:
@@ -135,6 +146,7 @@ class Fleet {
     if (number == kGrownMachine && GrowthOf(host_) != 0) {
       vmm.mapped = base + (moment == kLast ? GrowthOf(host_) : 0);
     }
+    if (number == MachinesOf(host_)) vmm.mapped = kCome;
     vmm.touched = vmm.mapped / 3;
     made_.Value("sched/memClients/tally/vmm", vmm, int64_t{client});
     made_.Value("sched/memClients/swapInfo", KSI_SwapInfo{}, int64_t{client});
@@ -184,19 +196,22 @@ class Fleet {
   MadeHost made_;
 };
 
-int64_t TimeOf(size_t moment) {
-  return *ksi::TimeOfText("2026-11-20T00:00:00Z") + kHours[moment] * ksi::kHour;
+int64_t TimeOf(int64_t host, size_t moment) {
+  return *ksi::TimeOfText("2026-11-20T00:00:00Z") + kHours[moment] * ksi::kHour +
+         host * ksi::kSecond;
 }
 
+size_t FirstOf(int64_t host) { return IsNew(host) ? kLast : 0; }
+
 void MakeCaptures(const std::string& directory, int64_t host) {
-  for (size_t moment = 0; moment < kHours.size(); ++moment) {
+  for (size_t moment = FirstOf(host); moment < kHours.size(); ++moment) {
     ksicache::CacheWriter writer(
         directory + "/" + NameOf(host) + "." + std::to_string(moment) + ".ksi", true);
     Fleet(host, writer).Add(moment);
     writer.Commit({.signature = std::string(ksi::kDefinitions.signature),
                    .built = kKernels[KernelOf(host)],
                    .host = NameOf(host),
-                   .taken = ksi::TextOfTime(TimeOf(moment))});
+                   .taken = ksi::TextOfTime(TimeOf(host, moment))});
   }
 }
 
@@ -209,11 +224,11 @@ void MakeRecording(const std::string& directory, int64_t host) {
   const ksi::HostIdentity identity = {std::string(ksi::kDefinitions.signature),
                                       kKernels[KernelOf(host)], NameOf(host), "boot",
                                       ksi::RecordedNodes()};
-  for (size_t moment = 0; moment < kHours.size(); ++moment) {
+  for (size_t moment = FirstOf(host); moment < kHours.size(); ++moment) {
     ksicache::MomentBuilder builder;
     Fleet(host, builder).Add(moment);
     ksi::MomentFacts facts;
-    facts.taken = facts.uptime = TimeOf(moment);
+    facts.taken = facts.uptime = TimeOf(host, moment);
     recorder.Add(identity, facts, builder.Take());
   }
   recorder.Pack();
@@ -228,11 +243,15 @@ void Tell(int64_t hosts) {
     std::printf("grown %s %s %lu\n", NameOf(host).c_str(), MachineName(host, kGrownMachine).c_str(),
                 GrowthOf(host));
   }
+  if (hosts > kComeMachine) {
+    std::printf("grown %s %s %lu\n", NameOf(kComeMachine).c_str(),
+                MachineName(kComeMachine, MachinesOf(kComeMachine)).c_str(), kCome);
+  }
   for (size_t heap = 0; heap < kHeaps.size(); ++heap) {
     for (size_t kernel = 0; kernel < kKernels.size(); ++kernel) {
       bool leaksOnAll = true;
       for (int64_t host = 0; host < hosts; ++host) {
-        leaksOnAll = leaksOnAll && (KernelOf(host) != kernel || Leaks(host, heap));
+        leaksOnAll = leaksOnAll && (KernelOf(host) != kernel || IsNew(host) || Leaks(host, heap));
       }
       if (leaksOnAll) std::printf("leaks %s %s\n", kHeaps[heap], kKernels[kernel]);
     }
