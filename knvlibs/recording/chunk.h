@@ -63,6 +63,11 @@ namespace ksi::chunk {
 // The most moments of a part, and of a chunk.
 constexpr size_t kMostMoments = 4096;
 
+// The most readings that a chunk numbers, and entries that its lists have together at a moment:
+// those of the largest hosts, many times over.
+constexpr size_t kMostReadings = size_t{1} << 20;
+constexpr size_t kMostEntries = size_t{1} << 20;
+
 // The bytes of the size of the first frame.
 constexpr size_t kPrefixSize = 4;
 

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <span>
+#include <stdexcept>
 #include <utility>
 
 #include "knvlibs/recording/chunk.h"
@@ -41,6 +42,12 @@ uint64_t SizeOf(const std::vector<Bytes>& pieces) {
   return size;
 }
 
+size_t EntriesOf(const std::vector<MomentReading>& readings) {
+  size_t entries = 0;
+  for (const MomentReading& reading : readings) entries += reading.answer.entries.size();
+  return entries;
+}
+
 Bytes PackNodes(const std::vector<size_t>& nodes, const std::vector<std::vector<Bytes>>& pieces) {
   std::vector<ByteView> packed;
   for (const size_t node : nodes)
@@ -78,7 +85,17 @@ ChunkWriter::ChunkWriter(HostIdentity host) : host_(std::move(host)) {
   for (const RecordedNode& node : host_.nodes) nodes_.emplace_back(node);
 }
 
+size_t ChunkWriter::Readings() const {
+  size_t readings = 0;
+  for (const NodeWriter& node : nodes_) readings += node.Readings();
+  return readings;
+}
+
 void ChunkWriter::Add(const MomentFacts& facts, const std::vector<MomentReading>& readings) {
+  if (Readings() + readings.size() > chunk::kMostReadings ||
+      EntriesOf(readings) > chunk::kMostEntries) {
+    throw std::length_error("more than a recording holds");
+  }
   auto at = readings.begin();
   for (size_t node = 0; node < nodes_.size(); ++node) {
     const auto end = std::find_if(at, readings.end(), [node](const MomentReading& each) {

@@ -27,7 +27,12 @@ class ChunkWriter {
   const MomentFacts& At(size_t i) const { return moments_[i]; }
   const MomentFacts& Last() const { return moments_.back(); }
 
-  // Takes the next moment of the host, with its readings in the order of SortReadings.
+  // How many readings have been numbered.
+  size_t Readings() const;
+
+  // Takes the next moment of the host, with its readings in the order of SortReadings. Fails with
+  // std::length_error if a chunk may not have so many, or their lists so many entries; then it is
+  // as it was.
   void Add(const MomentFacts& facts, const std::vector<MomentReading>& readings);
 
   // The moments from `from` to the last as a part; from 0 on it starts the chunk. Fails as

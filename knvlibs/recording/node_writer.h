@@ -20,6 +20,9 @@ class NodeWriter {
   // Takes the node's readings of the next moment, in the order of SortReadings.
   void Add(std::span<const MomentReading> readings);
 
+  // How many readings have been numbered.
+  size_t Readings() const { return readings_.size(); }
+
   // What happened from the moment `from` to the last: the sizes of the streams and the streams;
   // nothing if nothing did.
   std::vector<Bytes> PiecesFrom(size_t from) const;

@@ -51,15 +51,15 @@ class RecordingTest : public Ksicache {
     return moments;
   }
 
-  // A moment that takes some KB, however it is packed.
-  static Moment NoiseAt(int64_t number) {
+  // A moment that takes some KB, however it is packed: for each group some hundred bytes.
+  static Moment NoiseAt(int64_t number, int64_t groups = 8) {
     std::mt19937_64 random(static_cast<uint64_t>(number));
     Moment moment;
     moment.host = Host();
     moment.facts.taken = kStart + number * kSecond;
     const auto node =
         std::ranges::find(RecordedNodes(), "sched/groups/stats/memoryStats", &RecordedNode::path);
-    for (int64_t group = 0; group < 8; ++group) {
+    for (int64_t group = 0; group < groups; ++group) {
       MomentReading& reading = moment.readings.emplace_back();
       reading.question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
       reading.question.keys[0] = group;

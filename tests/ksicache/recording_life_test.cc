@@ -21,6 +21,7 @@
 #include <vector>
 
 #include <knvlibs/ksi_status.h>
+#include "knvlibs/recording/chunk_writer.h"
 #include "knvlibs/times.h"
 #include "tests/knvlibs/host_tree.h"
 #include "tests/ksicache/recording_fixture.h"
@@ -320,6 +321,66 @@ TEST_F(RecordingLife, TheBoundOfTheSizeHoldsForEver) {
     const int64_t last = part.End() - 1;
     ASSERT_NO_FATAL_FAILURE(ExpectMoments(*file, {NoiseAt(last)}, last));
   }
+}
+
+// Moments that are large beside the file, such that fewer of them fit than are packed together.
+TEST_F(RecordingLife, LargeMomentsGoOnForEverInASmallFile) {
+  constexpr int64_t kBound = RecordingStore::kSmallestFile;
+  // How large, and how many are there at least.
+  for (const auto& [groups, wanted] :
+       {std::pair<int64_t, int64_t>{300, 12}, {1500, 2}, {4000, 2}, {8000, 1}}) {
+    SCOPED_TRACE(groups);
+    MakeEmpty(file_);
+    RecordingStore store(file_, kBound);
+    Recorder recorder(store);
+    int64_t fewest = INT64_MAX;
+    for (int64_t next = 0; next < 60; ++next) {
+      const Moment moment = NoiseAt(next, groups);
+      recorder.Add(moment.host, moment.facts, moment.readings);
+      recorder.Tidy();
+      ASSERT_LE(store.Size(), kBound) << next;
+      ASSERT_EQ(store.Parts().back().End(), next + 1);
+      if (next >= 30) fewest = std::min(fewest, next + 1 - store.Parts().front().number);
+    }
+    EXPECT_GE(fewest, wanted);
+    const std::unique_ptr<RecordingFile> file = OpenFile(file_);
+    for (const Part& part : file->Parts()) {
+      const int64_t last = part.End() - 1;
+      ASSERT_NO_FATAL_FAILURE(ExpectMoments(*file, {NoiseAt(last, groups)}, last));
+    }
+  }
+}
+
+// A chunk that fills the file, as moments that were small before may leave it.
+TEST_F(RecordingLife, AFileFullOfOneChunkIsGoneOnWith) {
+  constexpr int64_t kBound = RecordingStore::kSmallestFile;
+  ChunkWriter chunk(Host());
+  int64_t next = 0;
+  {
+    RecordingStore store(file_, kBound);
+    const auto add = [&] {
+      const Moment moment = NoiseAt(next, 300);
+      chunk.Add(moment.facts, moment.readings);
+      store.Add({0, 1, next, 0, moment.facts.taken, moment.facts.taken, 0, 0},
+                chunk.PartFrom(static_cast<size_t>(next)));
+      ++next;
+    };
+    ASSERT_THROW(for (;;) add(), ksicache::NoRoom);
+    // None left for one for which there is no room.
+    ASSERT_EQ(store.Parts().front().number, 0);
+    ASSERT_GT(next, 10);
+  }
+  RecordingStore store(file_, kBound);
+  Recorder recorder(store);
+  EXPECT_EQ(recorder.Adopt(*OpenFile(file_)), 0u);
+  ASSERT_EQ(store.Parts().back().End(), next);
+  for (int64_t end = next + 50; next < end; ++next) {
+    const Moment moment = NoiseAt(next, 300);
+    recorder.Add(moment.host, moment.facts, moment.readings);
+    recorder.Tidy();
+    ASSERT_LE(store.Size(), kBound);
+  }
+  EXPECT_EQ(store.Parts().back().End(), next);
 }
 
 TEST_F(RecordingLife, TheBoundOfAgeHoldsForEver) {

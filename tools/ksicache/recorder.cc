@@ -1,5 +1,6 @@
 #include "tools/ksicache/recorder.h"
 
+#include <algorithm>
 #include <stdexcept>
 #include <string>
 #include <utility>
@@ -14,11 +15,29 @@ namespace {
 // So much is packed at once, whatever the number of moments: it is held in memory.
 constexpr size_t kMostBytes = size_t{4} << 20;
 
+// And no more than this share of the file, for it stays there until the next time; of a chunk,
+// which leaves as a whole, this one.
+constexpr int64_t kPartsInFile = 8;
+constexpr int64_t kChunksInFile = 4;
+
+Error TooLarge(const std::length_error& error) {
+  return Error(std::string("a moment of this host is ") + error.what());
+}
+
 ksi::Bytes PartOf(const ksi::ChunkWriter& chunk, size_t first) {
   try {
     return chunk.PartFrom(first);
   } catch (const std::length_error& error) {
-    throw Error(std::string("a moment of this host is ") + error.what());
+    throw TooLarge(error);
+  }
+}
+
+void AddTo(ksi::ChunkWriter& chunk, const ksi::MomentFacts& facts,
+           const std::vector<ksi::MomentReading>& readings) {
+  try {
+    chunk.Add(facts, readings);
+  } catch (const std::length_error& error) {
+    throw TooLarge(error);
   }
 }
 
@@ -30,19 +49,34 @@ Recorder::Recorder(RecordingStore& store, Singles singles, int64_t longestChunk)
 }
 
 // What a chunk's moments have in common; in one the clock only goes on.
-bool Recorder::Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& facts) const {
+bool Recorder::Continues(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
+                         size_t readings) const {
   return chunk_ != nullptr && chunk_->Count() < kChunkMoments && chunk_->Host() == host &&
          chunk_->Last().taken < facts.taken &&
-         ksi::chunk::Minus(facts.taken, chunk_->At(0).taken) <= longestChunk_;
+         chunk_->Readings() + readings <= ksi::chunk::kMostReadings &&
+         ksi::chunk::Minus(facts.taken, chunk_->At(0).taken) <= longestChunk_ &&
+         static_cast<int64_t>(packedBytes_ + bytes_) <= store_.MaxSize() / kChunksInFile;
 }
 
 void Recorder::Add(const ksi::HostIdentity& host, const ksi::MomentFacts& facts,
                    const std::vector<ksi::MomentReading>& readings) {
-  if (!Continues(host, facts)) Begin(host);
+  if (!Continues(host, facts, readings.size())) Begin(host);
+  const bool isFirst = chunk_->Count() == 0;
+  try {
+    Write(facts, readings);
+  } catch (const NoRoom&) {
+    if (isFirst) throw;
+    Begin(host);
+    Write(facts, readings);
+  }
+}
+
+void Recorder::Write(const ksi::MomentFacts& facts,
+                     const std::vector<ksi::MomentReading>& readings) {
   // Until it is written, what the next one would differ from is not in the file.
   std::unique_ptr<ksi::ChunkWriter> chunk = std::move(chunk_);
   const size_t place = chunk->Count();
-  chunk->Add(facts, readings);
+  AddTo(*chunk, facts, readings);
   const ksi::Bytes content = PartOf(*chunk, place);
   if (singles_ == Singles::kWritten) {
     store_.Add({0, 1, next_, chunkNumber_, facts.taken, facts.taken, 0, 0}, content);
@@ -62,13 +96,13 @@ void Recorder::Begin(const ksi::HostIdentity& host) {
   chunk_ = std::make_unique<ksi::ChunkWriter>(host);
   chunkNumber_ = next_;
   packed_ = 0;
+  packedBytes_ = 0;
   bytes_ = 0;
 }
 
 void Recorder::Tidy() {
-  if (chunk_ != nullptr && (chunk_->Count() - packed_ >= kPartMoments || bytes_ > kMostBytes)) {
-    Pack();
-  }
+  const size_t most = std::min(kMostBytes, static_cast<size_t>(store_.MaxSize() / kPartsInFile));
+  if (chunk_ != nullptr && (chunk_->Count() - packed_ >= kPartMoments || bytes_ > most)) Pack();
 }
 
 void Recorder::Pack() {
@@ -84,8 +118,14 @@ void Recorder::Pack() {
                                      0,
                                      0};
   const ksi::Bytes content = PartOf(*chunk_, packed_);
-  hasSingles ? store_.Replace(part, content) : store_.Add(part, content);
+  try {
+    hasSingles ? store_.Replace(part, content) : store_.Add(part, content);
+  } catch (const NoRoom&) {
+    if (!hasSingles) throw;
+    return;
+  }
   packed_ = chunk_->Count();
+  packedBytes_ += content.size();
   bytes_ = 0;
 }
 
@@ -108,13 +148,17 @@ size_t Recorder::Adopt(ksi::RecordingFile& recording) {
     ksi::SortReadings(moment.readings);
     if (chunk_ == nullptr ||
         parts[from].number != chunkNumber_ + static_cast<int64_t>(chunk_->Count()) ||
-        !Continues(moment.host, moment.facts)) {
+        !Continues(moment.host, moment.facts, moment.readings.size())) {
       Begin(moment.host);
       chunkNumber_ = parts[from].number;
     }
-    chunk_->Add(moment.facts, moment.readings);
+    AddTo(*chunk_, moment.facts, moment.readings);
   }
-  Pack();
+  try {
+    Pack();
+  } catch (const Error&) {
+    // They stay as they are, and whether there is room for another will be seen.
+  }
   chunk_ = nullptr;
   return damaged;
 }

@@ -254,8 +254,10 @@ void RecordingStore::Add(Part part, ksi::ByteView content) {
 void RecordingStore::Put(Part part, ksi::ByteView content, bool replaces) {
   part.size = static_cast<int64_t>(content.size());
   const size_t count = ksi::cache::BlocksOf(content.size());
+  RequireRoom(count, part.chunk);
+  if (part.number == part.chunk) taken_ = 0;  // of the one before nothing will be packed
   KeepSpare(count);
-  const std::vector<int64_t> blocks = TakeBlocks(count);
+  const std::vector<int64_t> blocks = TakeBlocks(count, part.chunk);
   part.block = blocks.front();
   WriteBlocks(blocks, content);
   // Its row hides those of older parts, which are on the disk already.
@@ -345,6 +347,19 @@ void RecordingStore::Remove(const std::vector<Part>& parts) {
   }
 }
 
+// What does not fit whatever leaves is nothing to leave for.
+void RecordingStore::RequireRoom(size_t count, int64_t chunk) const {
+  size_t room = blocks_.size() + Room();
+  for (const std::vector<Part>* list : {&parts_, &replaced_}) {
+    for (const Part& each : *list) {
+      if (room >= count) return;
+      if (each.chunk != chunk) room += blocksOf_.at(each.id).size();
+    }
+  }
+  if (room >= count) return;
+  throw NoRoom(name_ + ": there is no room for a moment in " + std::to_string(maxSize_) + " bytes");
+}
+
 size_t RecordingStore::Room() const {
   return static_cast<size_t>(std::max(maxSize_ - Size(), int64_t{0}) / kBlockOnDisk);
 }
@@ -374,16 +389,16 @@ void RecordingStore::Reserve(size_t count) {
   }
 }
 
-std::vector<int64_t> RecordingStore::TakeBlocks(size_t count) {
+std::vector<int64_t> RecordingStore::TakeBlocks(size_t count, int64_t chunk) {
   while (blocks_.size() < count) {
     const size_t wanting = count - blocks_.size();
     if (Room() >= wanting) {
       Grow(std::min(Room(), std::max(wanting, std::min(moreBlocks_, RoomOnDisk()))));
-    } else if (HasOldChunk()) {
+    } else if (!parts_.empty() && parts_.front().chunk != chunk) {
       RemoveFirstChunk();
     } else {
-      throw Error(name_ + ": there is no room for a moment in " + std::to_string(maxSize_) +
-                  " bytes");
+      throw NoRoom(name_ + ": there is no room for a moment in " + std::to_string(maxSize_) +
+                   " bytes");
     }
   }
   const auto end = blocks_.begin() + static_cast<ptrdiff_t>(count);

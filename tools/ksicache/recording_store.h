@@ -16,6 +16,7 @@
 
 #include "knvlibs/recording/recording_file.h"
 #include "knvlibs/sqlite.h"
+#include "tools/ksicache/error.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/page_file.h"
 
@@ -25,6 +26,12 @@ namespace ksicache {
 class FileLost : public std::runtime_error {
  public:
   using std::runtime_error::runtime_error;
+};
+
+// What was to be written does not fit beside what has to stay.
+class NoRoom : public Error {
+ public:
+  using Error::Error;
 };
 
 // Every call may fail with an Error, those that write also with a FileLost. What it was to write is
@@ -54,7 +61,8 @@ class RecordingStore {
   // Grows by no fewer blocks than these from now on.
   void GrowBy(size_t blocks) { moreBlocks_ = blocks; }
 
-  // Adds a part; its id, size and block are chosen here. Old parts make room, from the first on.
+  // Adds a part; its id, size and block are chosen here. Old chunks make room, from the first on,
+  // but not its own. Fails with a NoRoom if they do not make enough, and none leaves.
   void Add(Part part, ksi::ByteView content);
 
   // Adds it in the place of those that it holds the moments of. Those stay until the next Replace,
@@ -90,6 +98,9 @@ class RecordingStore {
 
   int64_t Size() const;
 
+  // What it may grow to.
+  int64_t MaxSize() const { return maxSize_; }
+
  private:
   void Lock();
   void TakeStock();
@@ -106,11 +117,12 @@ class RecordingStore {
   void RemoveFirstChunk();
   void CountGone(int64_t chunk);
   void Remove(const std::vector<Part>& parts);
+  void RequireRoom(size_t count, int64_t chunk) const;
   size_t Room() const;
   size_t RoomOnDisk() const;
   void Grow(size_t count);
   void KeepSpare(size_t count);
-  std::vector<int64_t> TakeBlocks(size_t count);
+  std::vector<int64_t> TakeBlocks(size_t count, int64_t chunk);
   int64_t TakeRow();
   void WriteBlocks(const std::vector<int64_t>& blocks, ksi::ByteView content);
   void WriteRow(const Part& part);
@@ -127,7 +139,7 @@ class RecordingStore {
   // What is free, the one that has been so for longest first.
   std::deque<int64_t> rows_;
   std::deque<int64_t> blocks_;
-  // Blocks that were taken since moments were packed, and the most until that was done.
+  // Blocks that were taken since moments were packed or a chunk began, and the most until then.
   size_t taken_ = 0;
   size_t mostTaken_ = 0;
   Gone gone_;
