@@ -74,7 +74,7 @@ void PutEdit(const Entries& before, const Entries& after, ByteWriter& out) {
   PutStep({}, out);
 }
 
-bool TakeEdit(ByteReader& in, std::vector<Key>& entries) {
+bool TakeEdit(ByteReader& in, size_t most, std::vector<Key>& entries) {
   std::vector<Key> after;
   int64_t number = 0;
   for (size_t at = 0;;) {
@@ -83,6 +83,7 @@ bool TakeEdit(ByteReader& in, std::vector<Key>& entries) {
     step.gone = in.Bounded(entries.size() - at - step.stayed);
     step.come = in.Bounded(in.Left());
     const size_t stay = step.IsLast() ? entries.size() - at : step.stayed;
+    if (stay + step.come > most - after.size()) return false;
     const auto from = entries.begin() + static_cast<ptrdiff_t>(at);
     after.insert(after.end(), from, from + static_cast<ptrdiff_t>(stay));
     if (step.IsLast()) break;

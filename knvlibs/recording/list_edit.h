@@ -6,6 +6,7 @@
 #ifndef KNVLIBS_RECORDING_LIST_EDIT_H_
 #define KNVLIBS_RECORDING_LIST_EDIT_H_
 
+#include <cstddef>
 #include <cstdint>
 #include <vector>
 
@@ -21,8 +22,8 @@ Key TakeEntry(ByteReader& in, int64_t& before);
 
 void PutEdit(const std::vector<OwnKey>& before, const std::vector<OwnKey>& after, ByteWriter& out);
 
-// Changes the list; false if the edit is not one of it.
-[[nodiscard]] bool TakeEdit(ByteReader& in, std::vector<Key>& entries);
+// Changes the list; false if the edit is not one of it, or leads to more than `most` entries.
+[[nodiscard]] bool TakeEdit(ByteReader& in, size_t most, std::vector<Key>& entries);
 
 // Passes over an edit of a list that is not known.
 void PassEdit(ByteReader& in);

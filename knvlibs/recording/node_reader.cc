@@ -218,7 +218,10 @@ bool NodeReader::GoTo(size_t moment) {
 bool NodeReader::Apply(const Event& event) {
   for (const uint32_t number : event.gone) {
     readings_[number].isThere = false;
-    lists_.erase(number);
+    const auto list = lists_.find(number);
+    if (list == lists_.end()) continue;
+    budget_->entries += list->second.size();
+    lists_.erase(list);
   }
   for (uint32_t number = event.come; number < event.end; ++number) {
     readings_[number].isThere = true;
@@ -231,8 +234,13 @@ bool NodeReader::Apply(const Event& event) {
 bool NodeReader::Apply(const Edit& edit) {
   std::vector<Key>& entries = lists_[edit.reading];
   budget_->bytes += SizeOf(entries);
+  budget_->entries += entries.size();
   ByteReader in = edit.edit;
-  if (!TakeEdit(in, entries)) return false;
+  if (!TakeEdit(in, budget_->entries, entries)) {
+    lists_.erase(edit.reading);  // which nobody accounts for any more
+    return false;
+  }
+  budget_->entries -= entries.size();
   const size_t size = SizeOf(entries);
   return ChunkBudget::Spend(budget_->bytes, size) && ChunkBudget::Spend(budget_->work, size);
 }

@@ -17,11 +17,13 @@
 
 namespace ksi {
 
-// What all nodes of a chunk may take together, when it is damaged: readings; bytes of what is
-// unpacked, and of records and entries; bytes of the lists that are changed one after the other,
-// with the readings that are gone through for it. The largest hosts need a part of it.
+// What all nodes of a chunk may take together, when it is damaged: readings; entries of the lists
+// that there are at a moment; bytes of what is unpacked, and of records and entries; bytes of the
+// lists that are changed one after the other, with the readings that are gone through for it. The
+// largest hosts need a part of it.
 struct ChunkBudget {
-  size_t readings = size_t{1} << 20;
+  size_t readings = chunk::kMostReadings;
+  size_t entries = chunk::kMostEntries;
   size_t bytes = size_t{256} << 20;
   size_t work = size_t{2} << 30;
 

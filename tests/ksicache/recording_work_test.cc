@@ -4,12 +4,15 @@
 #include <cstdint>
 #include <memory>
 #include <span>
+#include <stdexcept>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "knvlibs/recording/chunk.h"
 #include "knvlibs/recording/chunk_writer.h"
 #include "knvlibs/recording/frame.h"
+#include "knvlibs/recording/list_edit.h"
 #include "tests/ksicache/recording_fixture.h"
 
 namespace ksi {
@@ -21,17 +24,38 @@ class RecordingWork : public RecordingTest {
  protected:
   RecordingWork() { MakeEmpty(file_); }
 
-  // So many values of nothing but zeros.
-  static std::vector<MomentReading> Zeros(size_t count) {
-    const auto node =
-        std::ranges::find(RecordedNodes(), "sched/groups/groupFlags", &RecordedNode::path);
+  static size_t PlaceOf(const std::string& path, Kind kind) {
+    const auto node = std::ranges::find_if(RecordedNodes(), [&](const RecordedNode& each) {
+      return each.path == path && each.kind == kind;
+    });
+    return static_cast<size_t>(node - RecordedNodes().begin());
+  }
+
+  // So many values of nothing but zeros, with keys from `first` on.
+  static std::vector<MomentReading> Zeros(size_t count, int64_t first = 0) {
+    const size_t node = PlaceOf("sched/groups/groupFlags", Kind::kValue);
     std::vector<MomentReading> readings(count);
-    for (size_t i = 0; i < count; ++i) {
-      readings[i].question.node = static_cast<uint32_t>(node - RecordedNodes().begin());
-      readings[i].question.keys[0].emplace<int64_t>(static_cast<int64_t>(i));
-      readings[i].answer.record.resize(node->recordSize);
+    for (MomentReading& reading : readings) {
+      reading.question.node = static_cast<uint32_t>(node);
+      reading.question.keys[0].emplace<int64_t>(first++);
+      reading.answer.record.resize(RecordedNodes()[node].recordSize);
     }
     return readings;
+  }
+
+  // What the index of a chunk's first moment says before it comes to the nodes: what it does if
+  // none has anything, but for a byte for each.
+  static Bytes HeadOfOne() {
+    MomentFacts facts;
+    facts.taken = kStart;
+    ChunkWriter writer(Host());
+    writer.Add(facts, {});
+    Bytes index;
+    EXPECT_EQ(
+        Unpack(ByteView(writer.PartFrom(0)).subspan(chunk::kPrefixSize), kLargestFrame, index),
+        kOk);
+    index.resize(index.size() - RecordedNodes().size());
+    return index;
   }
 
   // The first moment of a chunk with them, and one more, in which one of them may have changed.
@@ -187,6 +211,66 @@ TEST_F(RecordingWork, ExportEndsByTheSizeOfTheFile) {
               std::string::npos)
         << result.err.substr(0, 4096);
   });
+}
+
+// Entries that count on by one take no room.
+TEST_F(RecordingWork, AListHasABoundOfEntries) {
+  constexpr size_t kMany = 25'000'000;
+  ByteWriter events;
+  for (const uint64_t number : {0, 0, 1}) events.Unsigned(number);
+  int64_t before = 0;
+  for (int key = 0; key < 2; ++key) PutEntry(std::string(), before, events);
+  for (const uint64_t number : {0, 1, 0, 0, 0}) events.Unsigned(number);
+  events.Unsigned(kMany);
+  for (size_t i = 0; i < kMany; ++i) PutEntry(static_cast<int64_t>(i), before, events);
+  for (int i = 0; i < 3; ++i) events.Unsigned(0);
+  ByteWriter sizes;
+  sizes.Unsigned(events.All().size());
+  for (size_t i = 1; i < chunk::kStreams; ++i) sizes.Unsigned(0);
+  std::vector<std::vector<Bytes>> nodes(RecordedNodes().size());
+  nodes[PlaceOf("system/heaps", Kind::kList)] = {sizes.All(), events.All()};
+  AddChunks(1, MakePart(HeadOfOne(), nodes));
+  ExpectEnds({"extract", file_, Path("out.ksi")}, "",
+             "ksicache: " + file_ +
+                 ": damaged: the moment of 2026-11-21T10:00:00Z: the part of 2026-11-21T10:00:00Z "
+                 "is damaged\n");
+}
+
+TEST_F(RecordingWork, NothingIsWrittenThatIsNotRead) {
+  std::vector<MomentReading> readings(1);
+  readings[0].question.node = static_cast<uint32_t>(PlaceOf("system/heaps", Kind::kList));
+  std::vector<OwnKey>& entries = readings[0].answer.entries;
+  for (size_t i = 0; i < chunk::kMostEntries; ++i) entries.emplace_back(static_cast<int64_t>(i));
+  MomentFacts facts;
+  facts.taken = kStart;
+  ChunkWriter writer(Host());
+  writer.Add(facts, readings);
+  AddChunks(1, writer.PartFrom(0));
+  Moment moment;
+  ChunkReader reader;
+  EXPECT_EQ(OpenFile(file_)->ReadWhole(0, reader, moment), kOk);
+  EXPECT_EQ(moment.readings, readings);
+  entries.emplace_back(-1);
+  EXPECT_THROW(writer.Add(facts, readings), std::length_error);
+}
+
+// Readings that come and go are numbered on and on.
+TEST_F(RecordingWork, AChunkThatHasNumberedManyReadingsEnds) {
+  RecordingStore store(file_, kUnbounded);
+  ksicache::Recorder recorder(store);
+  MomentFacts facts;
+  std::vector<MomentReading> readings;
+  for (int64_t i = 0; i < 3; ++i) {
+    readings = Zeros(400'000, 400'000 * i);
+    facts.taken = kStart + i * kSecond;
+    recorder.Add(Host(), facts, readings);
+  }
+  EXPECT_EQ(store.Parts()[1].chunk, 0);
+  EXPECT_EQ(store.Parts()[2].chunk, 2);
+  Moment moment;
+  ChunkReader reader;
+  ASSERT_EQ(store.Read()->ReadWhole(2, reader, moment), kOk);
+  EXPECT_EQ(moment.readings, readings);
 }
 
 TEST_F(RecordingWork, AChunkHasABoundOfMoments) {
