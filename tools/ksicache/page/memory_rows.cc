@@ -32,7 +32,7 @@ constexpr RowColumn kColumns[] = {
 constexpr Part kCompared[] = {Part::machines,   Part::overheads, Part::userWorlds,
                               Part::pageTables, Part::heaps,     Part::groups};
 
-// Behind these: figures of the host, and the parts of which nobody knows what is in them.
+// Behind these: figures of the host, and the parts of which something is missing.
 constexpr uint64_t kHost = std::size(kCompared);
 constexpr uint64_t kUnknown = kHost + 1;
 
@@ -56,12 +56,12 @@ class Writer {
  private:
   void PutPart(uint64_t number, const Memory& memory, const Memory* byPath) {
     const PartInfo& info = InfoOf(kCompared[number]);
-    const auto& things = memory.Of(info.part);
-    if (!things) {
-      return PutRow(kUnknown, info.name, std::nullopt, info.name, std::nullopt, std::nullopt);
+    const auto& [things, isWhole] = memory.Of(info.part);
+    if (!isWhole) {
+      PutRow(kUnknown, info.name, std::nullopt, info.name, std::nullopt, std::nullopt);
     }
-    for (size_t i = 0; i < things->size(); ++i) {
-      const Amount& thing = (*things)[i];
+    for (size_t i = 0; i < things.size(); ++i) {
+      const Amount& thing = things[i];
       PutRow(number, thing.identity, PathOf(byPath, info.part, i), thing.name,
              thing.number < 0 ? std::nullopt : std::make_optional(thing.number), thing.bytes);
     }
@@ -69,9 +69,9 @@ class Writer {
 
   static std::optional<std::string_view> PathOf(const Memory* byPath, Part part, size_t place) {
     if (byPath == nullptr) return std::nullopt;
-    const auto& things = byPath->Of(part);
-    if (!things || place >= things->size()) return std::nullopt;
-    return (*things)[place].identity;
+    const std::vector<Amount>& things = byPath->Of(part).amounts;
+    return place < things.size() ? std::make_optional<std::string_view>(things[place].identity)
+                                 : std::nullopt;
   }
 
   void PutHost(const HostMemory& host) {

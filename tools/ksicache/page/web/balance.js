@@ -62,8 +62,8 @@ class Things {
     this.unknown = 0;
     this.all = [];
     const {parts} = data.memory[moment];
-    this.beside = new Map((parts[beside] ?? []).map((thing) => [String(thing.number), thing.bytes]));
-    for (const thing of parts[kind] ?? []) this.add(thing);
+    this.beside = new Map((parts[beside]?.things ?? []).map((thing) => [String(thing.number), thing.bytes]));
+    for (const thing of parts[kind]?.things ?? []) this.add(thing);
   }
 
   add(thing) {

@@ -60,12 +60,15 @@ function stateOf([before, after]) {
 
 // What became of a part: {info, isKnown, count, unknown, before, after, growth, things}.
 function partGrowth(info, before, after, shown, keyOf, mayRepeat) {
-  const part = {info, isKnown: before !== null && after !== null, count: 0, unknown: 0, ...growthOf(null, null), things: []};
+  const isTold = ({things, isWhole}) => isWhole || things.length > 0;
+  const part = {info, isKnown: isTold(before) && isTold(after), count: 0, unknown: 0, ...growthOf(null, null), things: []};
   if (!part.isKnown) return part;
-  part.count = after.length;
+  part.count = after.things.length;
+  // What a thing has that is not there: it may be missing.
+  const ofNone = before.isWhole && after.isWhole ? 0n : null;
   let [was, is] = [0n, 0n];
-  for (const pair of matched(before, after, keyOf, mayRepeat)) {
-    const [from, to] = pair.map((thing) => (thing === null ? 0n : exact(thing.bytes)));
+  for (const pair of matched(before.things, after.things, keyOf, mayRepeat)) {
+    const [from, to] = pair.map((thing) => (thing === null ? ofNone : exact(thing.bytes)));
     if (less(to, from) === null) {
       ++part.unknown;
       continue;
