@@ -113,7 +113,7 @@ in use                                 89435992           -          -
   others                               72078752           -          -
 
 who grows steadily                          now      growth    an hour   full in
-heap heap0                               110844        9836        225  367d 20h
+heap heap0                               110844        9836        225     1y 2d
 )");
 }
 

@@ -119,7 +119,7 @@ TEST_F(Diff, Report) {
             R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
 vm-stats, KB, by consumed
 
-                               before           after         growth    a second
+                               before           after         growth
 build-linux, schedGrp 1060
   consumed                   14696852         6769616       -7927236
   swapped                     1509948         9437184        7927236
@@ -136,7 +136,7 @@ mail, schedGrp 1050
             R"(hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:05:00Z: 3m 0s
 vm-stats, MB, by ballooned
 
-                               before           after         growth    a second
+                               before           after         growth
 mail, schedGrp 1050
   consumed                       6684            3776          -2908
   ballooned                      2211            5120           2909
@@ -155,9 +155,9 @@ comp-stats, MB, by otherConsumed
 host
   otherConsumed                114423          248380         133957
   free                         134856             900        -133956
-  numClear                         13              14              1      0.0056
-  numSoft                           5               6              1      0.0056
-  numHard                           1               2              1      0.0056
+  numClear                         13              14              1       0.006
+  numSoft                           5               6              1       0.006
+  numHard                           1               2              1       0.006
   memState                       High            Hard              -
 
 1 row changed, 0 of them new and 0 gone; 0 did not
@@ -285,10 +285,21 @@ TEST_F(Diff, OtherHosts) {
 Another boot or host: groups and processes are matched by their names.
 vm-stats, KB
 
-                               before           after         growth    a second
+                               before           after         growth
 
 0 rows changed, 0 of them new and 0 gone; 12 did not
 )");
+}
+
+// Figures have a space between them however long they are.
+TEST_F(Diff, LongFigures) {
+  const std::string later = Later("later.ksi", {{R"("free":138092636)", R"("free":138092632)"}});
+  const std::string out = Output({"diff", kExample, later, "-u", "b"});
+  EXPECT_NE(out.find("\nfree                             141406859264  141406855168         -4096"),
+            std::string::npos)
+      << out;
+  // Nothing stands below a title.
+  EXPECT_EQ(out.find("groups, which"), std::string::npos) << out;
 }
 
 // A capture alone is compared with what the library reads by itself.

@@ -19,7 +19,13 @@ std::span<const ThingGrowth> FirstOf(const PartGrowth& part, size_t top) {
 class Screen {
  public:
   Screen(const Sides& sides, const Balance& balance, size_t top)
-      : sides_(sides), balance_(balance), top_(top), whole_(balance.used.Amount()) {}
+      : sides_(sides), balance_(balance), top_(top), whole_(balance.used.Amount()) {
+    // The host's own figures are the largest.
+    for (const auto& figure : {balance.total.before, balance.total.after}) {
+      width_ = std::max(width_, NumberText(figure).size() + 2);
+    }
+    left_ = kLine - std::min(kLine - kLeastLeft, 3 * width_ + kPart);
+  }
 
   void Print(tally::DisplayUnit unit) {
     PrintLine(sides_.Title());
@@ -37,6 +43,7 @@ class Screen {
     for (const PartGrowth& part : balance_.parts) PrintPart(part);
     Figures("nobody", "", "", balance_.unexplained, true);
     Figures("in use", "", "", whole_, true);
+    if (balance_.groups.isKnown && balance_.groups.things.empty()) return;
     PrintLine("");
     Header("groups, which contain the above");
     PrintThings(balance_.groups);
@@ -44,18 +51,22 @@ class Screen {
   }
 
  private:
+  static constexpr size_t kLine = 80;
+  static constexpr size_t kPart = 7;
+  static constexpr size_t kLeastLeft = 20;
+
   // What stands on the right of a line: three figures, and the part of the growth of what is in
   // use.
   void Figures(const std::string& name, const std::string& before, const std::string& after,
                std::optional<int64_t> growth, bool hasPart) const {
-    PrintLine(OnTheLeft(name, 34) + OnTheRight(before, 13) + OnTheRight(after, 13) +
-              OnTheRight(NumberText(growth), 13) +
-              (hasPart ? OnTheRight(PartText(growth, whole_), 7) : ""));
+    PrintLine(OnTheLeft(name, left_) + OnTheRight(before, width_) + OnTheRight(after, width_) +
+              OnTheRight(NumberText(growth), width_) +
+              (hasPart ? OnTheRight(PartText(growth, whole_), kPart) : ""));
   }
 
-  static void Header(const std::string& what) {
-    PrintLine(OnTheLeft(what, 34) + OnTheRight("before", 13) + OnTheRight("after", 13) +
-              OnTheRight("growth", 13) + OnTheRight("part", 7));
+  void Header(const std::string& what) const {
+    PrintLine(OnTheLeft(what, left_) + OnTheRight("before", width_) + OnTheRight("after", width_) +
+              OnTheRight("growth", width_) + OnTheRight("part", kPart));
   }
 
   void Line(const std::string& name, const Growth& growth, bool hasPart) const {
@@ -65,21 +76,24 @@ class Screen {
   void PrintPart(const PartGrowth& part) const {
     const bool isNothing = part.sum.before == 0 && part.sum.after == 0 && part.unknown == 0;
     if (part.isKnown && isNothing && part.things.empty()) return;
-    const std::string name =
-        part.isKnown ? std::to_string(part.after) + " " + part.info->name : part.info->name;
+    const std::string name = part.isKnown ? std::to_string(part.after) + " " +
+                                                (part.after == 1 ? part.info->one : part.info->name)
+                                          : part.info->name;
     Line(name, part.sum, true);
     PrintThings(part);
     if (part.unknown == 0) return;
     PrintLine("  " + std::to_string(part.unknown) + " more without a figure, not added");
   }
 
-  // Names that several have are told apart by their numbers.
+  // Names that look alike are told apart by their numbers.
   void PrintThings(const PartGrowth& part) const {
     std::map<std::string, int> known;
-    for (const ThingGrowth& thing : part.things) ++known[thing.name];
+    const auto shown = [this](const ThingGrowth& thing, int64_t number) {
+      return OnTheLeft("  " + NameText(thing.name, number), left_);
+    };
+    for (const ThingGrowth& thing : part.things) ++known[shown(thing, -1)];
     for (const ThingGrowth& thing : FirstOf(part, top_)) {
-      const bool isNumbered = known[thing.name] > 1 && thing.number >= 0;
-      Figures("  " + thing.name + (isNumbered ? " " + std::to_string(thing.number) : ""),
+      Figures(shown(thing, known[shown(thing, -1)] > 1 ? thing.number : -1),
               thing.isNew ? "new" : NumberText(thing.growth.before),
               thing.isGone ? "gone" : NumberText(thing.growth.after), thing.growth.Amount(), true);
     }
@@ -89,6 +103,8 @@ class Screen {
   const Balance& balance_;
   size_t top_;
   std::optional<int64_t> whole_;
+  size_t width_ = 13;  // of a figure
+  size_t left_ = 0;    // of a name
 };
 
 void PutGrowth(const Growth& growth, JsonText& json) {

@@ -31,6 +31,7 @@ enum class Part : uint8_t {
 struct PartInfo {
   Part part;
   const char* name;    // of many
+  const char* one;     // of one
   const char* of;      // what stands before the name of one
   const char* source;  // the report and the column
   bool isAdded;        // to what is explained: no two that are added have memory in common
@@ -38,18 +39,24 @@ struct PartInfo {
 };
 
 inline constexpr PartInfo kParts[] = {
-    {Part::machines, "machines", "machine ", "vm-stats consumed", true, false},
-    {Part::overheads, "overheads of machines", "overhead of ", "vm-stats ovhd", true, false},
-    {Part::userWorlds, "user worlds", "user world ", "uw-stats consumed", true, false},
-    {Part::pageTables, "page tables", "page tables of ", "group-stats ovhd", true, false},
-    {Part::heaps, "heaps", "heap ", "heap-stats size", true, false},
-    {Part::groups, "groups", "group ", "group-stats consumed", false, false},
-    {Part::heapUse, "heaps", "heap ", "heap-stats used", false, false},
-    {Part::largePages, "pools of large pages", "large pages ", "lpool-stats nrLPages", false,
+    {Part::machines, "machines", "machine", "machine ", "vm-stats consumed", true, false},
+    {Part::overheads, "overheads of machines", "overhead of a machine", "overhead of ",
+     "vm-stats ovhd", true, false},
+    {Part::userWorlds, "user worlds", "user world", "user world ", "uw-stats consumed", true,
      false},
-    {Part::machineSharing, "page sharing", "sharing lost by ", "vm-stats sharedSaved", false, true},
-    {Part::hostSharing, "page sharing", "sharing lost by ", "pshare-stats reclaimed", false, true},
-    {Part::worldsOfName, "user worlds", "user worlds ", "uw-stats consumed", false, false},
+    {Part::pageTables, "page tables", "page table", "page tables of ", "group-stats ovhd", true,
+     false},
+    {Part::heaps, "heaps", "heap", "heap ", "heap-stats size", true, false},
+    {Part::groups, "groups", "group", "group ", "group-stats consumed", false, false},
+    {Part::heapUse, "heaps", "heap", "heap ", "heap-stats used", false, false},
+    {Part::largePages, "pools of large pages", "pool of large pages", "large pages ",
+     "lpool-stats nrLPages", false, false},
+    {Part::machineSharing, "page sharing", "page sharing", "sharing lost by ",
+     "vm-stats sharedSaved", false, true},
+    {Part::hostSharing, "page sharing", "page sharing", "sharing lost by ",
+     "pshare-stats reclaimed", false, true},
+    {Part::worldsOfName, "user worlds", "user world", "user worlds ", "uw-stats consumed", false,
+     false},
 };
 
 constexpr const PartInfo& InfoOf(Part part) { return kParts[static_cast<size_t>(part)]; }

@@ -68,6 +68,13 @@ std::string CountText(const ReportDiff& diff) {
          (diff.Unknown() == 0 ? "" : ", of " + std::to_string(diff.Unknown()) + " nobody knows");
 }
 
+bool HasRates(const ReportDiff& diff, size_t top) {
+  return std::ranges::any_of(FirstOf(diff, top), [](const RowChange& row) {
+    return std::ranges::any_of(row.changes,
+                               [](const Change& change) { return change.perSecond.has_value(); });
+  });
+}
+
 // The unit of memory in the report; empty if it has no memory.
 const char* UnitOf(const ReportDiff& diff) {
   const auto found = std::ranges::find_if(diff.Columns(), tally::IsMemory, &RowColumn::kind);
@@ -138,7 +145,7 @@ void PrintReportDiff(const Sides& sides, const ReportDiff& diff, size_t top) {
   if (diff.By()) title += std::string(", by ") + diff.Columns()[*diff.By()].name;
   PrintLine(title);
   Print("\n" + OnTheLeft("", 22) + OnTheRight("before", 15) + OnTheRight("after", 16) +
-        OnTheRight("growth", 15) + OnTheRight("a second", 12) + "\n");
+        OnTheRight("growth", 15) + (HasRates(diff, top) ? OnTheRight("a second", 12) : "") + "\n");
   for (const RowChange& row : FirstOf(diff, top)) {
     PrintLine(NameOfRow(diff, row));
     for (const Change& change : row.changes) PrintChange(diff, change);

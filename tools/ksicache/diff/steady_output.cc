@@ -61,14 +61,16 @@ class Screen {
   }
 
  private:
+  static constexpr size_t kLeft = 34;
+
   static void Header(const std::string& what) {
-    PrintLine(OnTheLeft(what, 34) + OnTheRight("now", 13) + OnTheRight("growth", 12) +
+    PrintLine(OnTheLeft(what, kLeft) + OnTheRight("now", 13) + OnTheRight("growth", 12) +
               OnTheRight("an hour", 11) + OnTheRight("full in", 10));
   }
 
   void PrintGrowth(const SteadyGrowth& growth, const std::string& name) const {
     const std::string full = growth.fullIn ? DurationText(*growth.fullIn) : "";
-    std::string line = OnTheLeft(name, 34) + OnTheRight(NumberText(In(unit_, growth.now)), 13) +
+    std::string line = OnTheLeft(name, kLeft) + OnTheRight(NumberText(In(unit_, growth.now)), 13) +
                        OnTheRight(NumberText(In(unit_, growth.growth)), 12) +
                        OnTheRight(NumberText(In(unit_, PerHour(growth))), 11);
     if (!full.empty()) line += OnTheRight(full, 10);
@@ -90,11 +92,12 @@ class Screen {
     if (growths.empty()) return PrintLine(none);
     Header(title);
     std::map<std::string, int> known;
-    for (const SteadyGrowth& growth : growths) ++known[growth.info->of + growth.name];
+    const auto shown = [](const SteadyGrowth& growth, int64_t number) {
+      return OnTheLeft(growth.info->of + NameText(growth.name, number), kLeft);
+    };
+    for (const SteadyGrowth& growth : growths) ++known[shown(growth, -1)];
     for (const SteadyGrowth& growth : FirstOf(growths, top_)) {
-      const std::string name = growth.info->of + growth.name;
-      const bool isNumbered = known[name] > 1 && growth.number >= 0;
-      PrintGrowth(growth, name + (isNumbered ? " " + std::to_string(growth.number) : ""));
+      PrintGrowth(growth, shown(growth, known[shown(growth, -1)] > 1 ? growth.number : -1));
     }
     const size_t more = growths.size() - FirstOf(growths, top_).size();
     if (more != 0) PrintLine("and " + std::to_string(more) + " more");
