@@ -13,6 +13,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
 #include <functional>
 #include <future>
 #include <random>
@@ -334,13 +335,13 @@ TEST_F(RecordingLife, LargeMomentsGoOnForEverInASmallFile) {
     RecordingStore store(file_, kBound);
     Recorder recorder(store);
     int64_t fewest = INT64_MAX;
-    for (int64_t next = 0; next < 60; ++next) {
+    for (int64_t next = 0; next < 18'000 / groups + 8; ++next) {
       const Moment moment = NoiseAt(next, groups);
       recorder.Add(moment.host, moment.facts, moment.readings);
       recorder.Tidy();
       ASSERT_LE(store.Size(), kBound) << next;
       ASSERT_EQ(store.Parts().back().End(), next + 1);
-      if (next >= 30) fewest = std::min(fewest, next + 1 - store.Parts().front().number);
+      if (next > wanted + 6) fewest = std::min(fewest, next + 1 - store.Parts().front().number);
     }
     EXPECT_GE(fewest, wanted);
     const std::unique_ptr<RecordingFile> file = OpenFile(file_);
@@ -381,6 +382,36 @@ TEST_F(RecordingLife, AFileFullOfOneChunkIsGoneOnWith) {
     ASSERT_LE(store.Size(), kBound);
   }
   EXPECT_EQ(store.Parts().back().End(), next);
+}
+
+TEST_F(RecordingLife, WhatOthersWriteIntoItEndsIt) {
+  const std::function<void()> changes[] = {
+      // Another recording, which is as long.
+      [this] {
+        const Bytes other = RecordingStore::Empty("other");
+        ASSERT_EQ(other.size(), std::filesystem::file_size(file_));
+        std::fstream(file_, std::ios::in | std::ios::out | std::ios::binary)
+            .write(reinterpret_cast<const char*>(other.data()),
+                   static_cast<std::streamsize>(other.size()));
+      },
+      [this] { RunSql(file_, "UPDATE part SET moments = 0 WHERE id = 1"); },
+      [this] { RunSql(file_, "DELETE FROM block"); },
+      [this] { std::filesystem::resize_file(file_, 8192); },
+  };
+  for (const std::function<void()>& change : changes) {
+    MakeEmpty(file_);
+    RecordingStore store(file_, kUnbounded);
+    Recorder recorder(store);
+    const auto add = [&recorder](int64_t number) {
+      const Moment moment = NoiseAt(number);
+      recorder.Add(moment.host, moment.facts, moment.readings);
+    };
+    add(0);
+    add(1);
+    change();
+    EXPECT_THROW(add(2), ksicache::FileLost);
+    EXPECT_THROW(store.RequireThere(), ksicache::FileLost);
+  }
 }
 
 TEST_F(RecordingLife, TheBoundOfAgeHoldsForEver) {

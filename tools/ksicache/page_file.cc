@@ -22,6 +22,9 @@ namespace {
 constexpr size_t kCountAt = 28;
 constexpr size_t kLastChildAt = 8;
 
+// The header of a database.
+constexpr size_t kHeaderSize = 100;
+
 uint32_t NumberAt(const std::string& page, size_t at) {
   uint32_t number = 0;
   for (size_t i = 0; i < 4 && at + 4 <= page.size(); ++i) {
@@ -95,7 +98,8 @@ int PageFile::Open(ksi::Database* database) {
   const int code = sqlite3_initialize();
   if (code != SQLITE_OK) return code;
   pages_.clear();
-  end_ = EndOnDisk();
+  start_ = StartOnDisk();
+  end_ = EndIn(start_);
   vfs_ = ksi::sqlite_file::MakeVfs("ksi-recording", static_cast<int>(sizeof(Handle)), OpenFile);
   vfs_.pAppData = this;
   vfs_.xDelete = NoDelete;
@@ -205,18 +209,26 @@ bool PageFile::Flush() {
   const bool isWritten = (!grows || (WritePages(end_, std::numeric_limits<int64_t>::max()) &&
                                      Sync() && WritePages(0, 1) && Sync())) &&
                          WritePages(grows ? 1 : 0, end_);
-  if (isWritten) end_ = end;
+  if (isWritten && header != pages_.end()) {
+    end_ = end;
+    start_.replace(0, kHeaderSize, header->second, 0, kHeaderSize);
+  }
   pages_.clear();
   return isWritten;
 }
 
-int64_t PageFile::EndOnDisk() const {
-  std::string header(kCountAt + 4, '\0');
-  const ssize_t size = pread(descriptor_, header.data(), header.size(), 0);
-  return size < static_cast<ssize_t>(header.size()) ? 0 : EndIn(header);
+// The header and the second page; shorter in a file that is.
+std::string PageFile::StartOnDisk() const {
+  constexpr auto kSize = static_cast<size_t>(ksi::cache::kPageSize);
+  std::string start(2 * kSize, '\0');
+  const ssize_t size = pread(descriptor_, start.data(), start.size(), 0);
+  start.resize(static_cast<size_t>(std::max<ssize_t>(size, 0)));
+  // The schema stands in the rest of the first page.
+  start.erase(std::min(kHeaderSize, start.size()), kSize - kHeaderSize);
+  return start;
 }
 
-bool PageFile::IsWhole() const { return SizeOnDisk() >= end_ && EndOnDisk() == end_; }
+bool PageFile::IsWhole() const { return SizeOnDisk() >= end_ && StartOnDisk() == start_; }
 
 bool PageFile::Sync() const { return fdatasync(descriptor_) == 0; }
 

@@ -37,7 +37,8 @@ class PageFile {
   // Whether pages stand elsewhere than where SQLite wrote them: it has to be opened anew.
   bool HasMoved() const { return hasMoved_; }
 
-  // Whether the file is still as long as it was left, and says so itself.
+  // Whether the file is still as long as it was left, and begins as it did: its header, which
+  // SQLite changes whenever it writes, and the page of the table that is made with the file alone.
   [[nodiscard]] bool IsWhole() const;
 
   // Brings what has been flushed to the disk; false, errno says why.
@@ -56,12 +57,13 @@ class PageFile {
   void MoveInner();
   [[nodiscard]] bool WritePages(int64_t from, int64_t to) const;
   int64_t SizeOnDisk() const;
-  int64_t EndOnDisk() const;
+  std::string StartOnDisk() const;
 
   int descriptor_;
   sqlite3_vfs vfs_;
   bool hasMoved_ = false;
   int64_t end_ = 0;                       // of the pages that the header on the disk knows
+  std::string start_;                     // what the file begins with, as far as IsWhole looks
   std::map<int64_t, std::string> pages_;  // not yet written, by offset
 };
 
