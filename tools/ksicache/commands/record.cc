@@ -226,6 +226,7 @@ class Recording {
   void TakeOver(ksi::RecordingFile& recording, const std::string& host, const std::string& boot) {
     const std::vector<ksi::RecordingFile::Part>& parts = recording.Parts();
     bool isOwn = false;
+    size_t damaged = 0;
     std::string other;
     for (size_t i = 0; i < parts.size(); ++i) {
       if (i + 1 < parts.size() && parts[i + 1].chunk == parts[i].chunk) continue;
@@ -235,7 +236,14 @@ class Recording {
       isOwn = isOwn || (isRead && (its.name == host || (!boot.empty() && its.boot == boot)));
       if (isRead) other = its.name;
       const bool isTold = isRead && recording.ReadFacts(parts[i], facts) == ksi::kOk;
+      // What of the last one is damaged is told when it is packed.
+      if (!isTold && i + 1 < parts.size()) ++damaged;
       retention_.Add(parts[i].chunk, {its.boot, isTold ? facts.back().uptime : 0, parts[i].last});
+    }
+    if (damaged != 0) {
+      PrintError(fileName_ +
+                 ": is damaged, and stays so, which check tells more of; chunks of it: " +
+                 std::to_string(damaged));
     }
     if (isOwn || other.empty()) return;
     throw Error(fileName_ + ": is of the host " + other + ", not of " + host);
@@ -317,9 +325,9 @@ class Recording {
     outdated_.Add(fileName_, store_.TakeGone());
     const bool holdsBack = retention_.HoldsBack();
     if (holdsBack && !saidHoldsBack_) {
-      PrintError(
-          fileName_ +
-          ": the clock was set, or the host started: for an hour it makes no moment too old");
+      const char* why = facts.uptime == 0 ? "files tell no uptime, and recording began anew"
+                                          : "the clock was set, or the host started";
+      PrintError(fileName_ + ": " + why + ": for an hour the clock makes no moment too old");
     }
     saidHoldsBack_ = holdsBack;
   }
