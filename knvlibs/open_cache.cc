@@ -10,6 +10,7 @@
 #include <knvlibs/ksi_status.h>
 #include "knvlibs/cache_source.h"
 #include "knvlibs/linux/host/text.h"
+#include "knvlibs/recording/earlier_moment.h"
 #include "knvlibs/recording/moment_source.h"
 #include "knvlibs/recording/when.h"
 #include "knvlibs/times.h"
@@ -49,6 +50,16 @@ Status CheckTime(const std::string& when, OpenedCache& opened, std::string* why)
   return *opened.asked >= taken ? kOk : NotSoEarly(span, why);
 }
 
+// The moment of the time that was asked for. A time of day that is only later than the last moment,
+// where the clock was set back, is of that day.
+Status FindTime(const std::string& when, OpenedCache& opened) {
+  RecordingFile& recording = *opened.recording;
+  const Status status = recording.FindMoment(*opened.asked, opened.number);
+  if (status != kOk || opened.number >= 0) return status;
+  opened.asked = TimeOf(when, recording.Times()).value_or(*opened.asked);
+  return recording.FindMoment(*opened.asked, opened.number);
+}
+
 Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened, std::string* why) {
   RecordingFile& recording = *opened.recording;
   const std::vector<RecordingFile::Part>& parts = recording.Parts();
@@ -56,7 +67,8 @@ Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened,
     *why = "it has no moments yet";
     return KSI_STATUS_NOT_FOUND;
   }
-  if (!when || *when == "last") {
+  opened.isLast = !when || *when == "last";
+  if (opened.isLast) {
     opened.number = parts.back().End() - 1;
     return kOk;
   }
@@ -64,14 +76,29 @@ Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened,
     opened.number = parts.front().number;
     return kOk;
   }
-  opened.asked = TimeOf(*when, {parts.front().first, parts.back().last});
+  const Span span = {parts.front().first, parts.back().last};
+  opened.asked = TimeOf(*when, span);
   if (!opened.asked) return NotATime(*when, recording.Times(), why);
-  const Status status = recording.FindMoment(*opened.asked, opened.number);
+  const Status status = when->starts_with('-')
+                            ? EarlierMoment(recording).Find(TimeBetween(*opened.asked, span.last),
+                                                            opened.number, *opened.asked)
+                            : FindTime(*when, opened);
   if (status != kOk) {
     *why = recording.Why();
     return status;
   }
   return opened.number >= 0 ? kOk : NotSoEarly(recording.Times(), why);
+}
+
+Status ReadMomentOf(OpenedCache& opened, ChunkReader& moment) {
+  const int64_t wanted = opened.number;
+  if (!opened.isLast) return opened.recording->ReadMoment(wanted, moment);
+  const Status status = opened.recording->ReadLast(moment, opened.number);
+  if (status == kOk && opened.number != wanted) {
+    opened.remark =
+        "its last moments are damaged; this is the one of " + TextOfTime(moment.Facts().taken);
+  }
+  return status;
 }
 
 }  // namespace
@@ -108,8 +135,9 @@ Status ReadCache(const std::string& name, OpenedCache* opened, ChunkReader* mome
     if (status == kOk && opened->recording == nullptr) return kOk;
     if (status == kOk) {
       *moment = {};
-      status = opened->recording->ReadMoment(opened->number, *moment);
+      status = ReadMomentOf(*opened, *moment);
       *why = opened->recording->Why();
+      if (status == kOk && !opened->remark.empty() && tries != 1) continue;
     }
     if (status != KSI_STATUS_METADATA_READ_ERROR || !opened->isMoment) return status;
   }
@@ -125,7 +153,12 @@ Status OpenCacheSource(const char* name, std::unique_ptr<Source>* source) {
     // Of a damaged capture the program says what the status does.
     if (!why.empty() && opened.isMoment)
       Warning("%s: %s\n", Printable(name).c_str(), Printable(why).c_str());
-  } else if (opened.recording == nullptr) {
+    return status;
+  }
+  if (!opened.remark.empty()) {
+    Warning("%s: %s\n", Printable(name).c_str(), Printable(opened.remark).c_str());
+  }
+  if (opened.recording == nullptr) {
     *source = std::make_unique<CacheSource>(name, std::move(opened.capture));
   } else {
     *source = std::make_unique<MomentSource>(name, std::move(opened.recording), opened.number,

@@ -21,6 +21,8 @@ struct OpenedCache {
   int64_t number = 0;     // of the moment
   bool isMoment = false;  // one of many, or asked for by its time; told of what is not opened, too
   bool hasWhen = false;   // whether the name has a time
+  bool isLast = false;    // whether the last moment is wanted
+  std::string remark = {};            // what is to be said of the moment, if anything
   std::optional<int64_t> asked = {};  // the time that was asked for, us since 1970
 };
 
@@ -31,6 +33,8 @@ struct OpenedCache {
 [[nodiscard]] Status OpenCache(const std::string& name, OpenedCache* opened, std::string* why);
 
 // The same with the moment, if it is one of a recording. Somebody may be recording it meanwhile.
+// Where the last one is wanted and damaged, as by a loss of power, this is the last one that is
+// not, which the remark says.
 [[nodiscard]] Status ReadCache(const std::string& name, OpenedCache* opened, ChunkReader* moment,
                                std::string* why);
 

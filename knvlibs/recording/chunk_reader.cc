@@ -138,6 +138,37 @@ Status ChunkReader::TakePlaces(ByteReader& in, ByteView packed, Part& part) {
   return in.IsAtEnd() && frames.IsAtEnd() ? kOk : kDamaged;
 }
 
+Status ChunkReader::UnpackFrame(const Frame& frame, Bytes& content) {
+  // What is damaged is so for each of its nodes.
+  Bytes unpacked;
+  const Status status = Unpack(frame.packed, frame.size, unpacked);
+  if (status != kOk) return status;
+  if (unpacked.size() != frame.size) return kDamaged;
+  content = std::move(unpacked);
+  return kOk;
+}
+
+Status ChunkReader::CheckSingles() {
+  Status status = kOk;
+  for (Part& part : parts_) {
+    if (part.count > 1) continue;
+    for (Frame& frame : part.frames) {
+      if (status == kOk && frame.content.empty()) status = UnpackFrame(frame, frame.content);
+    }
+  }
+  return status;
+}
+
+// What it holds is not kept.
+Status ChunkReader::CheckLastPart() const {
+  Bytes content;
+  Status status = kOk;
+  for (const Frame& frame : parts_.back().frames) {
+    if (status == kOk) status = UnpackFrame(frame, content);
+  }
+  return status;
+}
+
 // What happened to a node in a part.
 Status ChunkReader::ContentOf(Part& part, size_t node, ByteView& content) {
   const Place& place = part.places[node];
@@ -145,12 +176,8 @@ Status ChunkReader::ContentOf(Part& part, size_t node, ByteView& content) {
   if (place.size == 0) return kOk;
   Frame& frame = part.frames[place.frame];
   if (frame.content.empty()) {
-    // What is damaged is so for each of its nodes.
-    Bytes unpacked;
-    const Status status = Unpack(frame.packed, frame.size, unpacked);
+    const Status status = UnpackFrame(frame, frame.content);
     if (status != kOk) return status;
-    if (unpacked.size() != frame.size) return kDamaged;
-    frame.content = std::move(unpacked);
   }
   content = ByteView(frame.content).subspan(place.from, place.size);
   return kOk;

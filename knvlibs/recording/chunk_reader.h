@@ -40,12 +40,20 @@ class ChunkReader {
   // The moment that has been come to; none before the first.
   MomentFacts Facts() const { return moment_ < facts_.size() ? facts_[moment_] : MomentFacts(); }
 
+  // Those of all moments of the last part.
+  const std::vector<MomentFacts>& PartFacts() const { return facts_; }
+
   // Whether the last part has another moment, and goes on to it.
   bool HasNext() const { return moment_ + 1 < facts_.size(); }
   void Next() { ++moment_; }
 
   // A node at the moment, until another one is come to. Fails as Take.
   [[nodiscard]] Status ReadNode(size_t node, const NodeReader** reader);
+
+  // Whether all that was taken of the parts of one moment, or of the last part, can be unpacked.
+  // Fails as Take.
+  [[nodiscard]] Status CheckSingles();
+  [[nodiscard]] Status CheckLastPart() const;
 
   // All of it, the readings by nodes and keys. Fails as Take.
   [[nodiscard]] Status ReadAll(Moment& moment);
@@ -71,6 +79,7 @@ class ChunkReader {
 
   [[nodiscard]] Status TakePlaces(ByteReader& in, ByteView packed, Part& part);
   [[nodiscard]] Status TakeParts(size_t node);
+  [[nodiscard]] static Status UnpackFrame(const Frame& frame, Bytes& content);
   [[nodiscard]] static Status ContentOf(Part& part, size_t node, ByteView& content);
   [[nodiscard]] size_t MomentIn(size_t part) const;
 

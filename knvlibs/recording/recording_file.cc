@@ -214,7 +214,47 @@ Status RecordingFile::TakePart(const Part& part, size_t last, ChunkReader& reade
   const bool isGood = reader.Take(std::move(content), last) == kOk;
   constexpr uint64_t kAnyPart = 65536;  // that the smallest one is like
   taken_ += kAnyPart + reader.Size() - before;
-  return isGood ? kOk : Damaged(part, "is damaged");
+  return isGood ? CheckFacts(part, reader.PartFacts()) : Damaged(part, "is damaged");
+}
+
+Status RecordingFile::CheckPart(const Part& part, ChunkReader& reader, int64_t at) {
+  const Status status = ReadMoment(part.End() - 1, reader, at);
+  if (status != kOk || reader.CheckLastPart() == kOk) return status;
+  reader = {};
+  return Damaged(part, "is damaged");
+}
+
+Status RecordingFile::ReadLast(ChunkReader& reader, int64_t& number) {
+  // Each loss of power harms one at most.
+  constexpr int kMostChunks = 16;
+  number = parts_.back().End() - 1;
+  Status status = ReadMoment(number, reader);
+  if (status == kOk && reader.CheckSingles() == kOk) return kOk;
+  if (status == kOk) status = Damaged(parts_.back(), "is damaged");
+  const Part* last = &parts_.back();
+  for (int i = 0; i < kMostChunks && status == KSI_STATUS_METADATA_READ_ERROR; ++i) {
+    status = ReadLastOf(last->chunk, reader, number);
+    const auto start = std::ranges::lower_bound(parts_, last->chunk, {}, &Part::number);
+    if (start == parts_.begin()) break;
+    last = &*std::prev(start);
+  }
+  return status;
+}
+
+// Up to where a chunk can be read.
+Status RecordingFile::ReadLastOf(int64_t chunk, ChunkReader& reader, int64_t& number) {
+  ChunkReader next;
+  int64_t at = kNoMoment;
+  Status status = kOk;
+  for (const Part* part = FindPart(chunk); part != nullptr && part->chunk == chunk;
+       part = FindPart(part->End())) {
+    status = CheckPart(*part, next, at);
+    if (status != kOk) break;
+    at = part->End() - 1;
+  }
+  if (at == kNoMoment) return status == kOk ? Damaged(parts_.back(), "has no start") : status;
+  number = at;
+  return ReadMoment(number, reader);
 }
 
 Status RecordingFile::ReadNext(int64_t& number, ChunkReader& reader) {

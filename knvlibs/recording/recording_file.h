@@ -70,6 +70,13 @@ class RecordingFile {
   [[nodiscard]] Status ReadWhole(int64_t number, ChunkReader& reader, Moment& moment,
                                  int64_t at = kNoMoment);
 
+  // The same of the last moment of a part, and whether all that it holds can be unpacked.
+  [[nodiscard]] Status CheckPart(const Part& part, ChunkReader& reader, int64_t at = kNoMoment);
+
+  // The moment recorded last; where what was recorded last is damaged, as a loss of power leaves
+  // it, the last one before that which can be read. REQUIRES: there are moments.
+  [[nodiscard]] Status ReadLast(ChunkReader& reader, int64_t& number);
+
   // The same as a whole of the moment with `number`, which `reader` has been given.
   [[nodiscard]] Status ReadAll(int64_t number, ChunkReader& reader, Moment& moment);
 
@@ -117,6 +124,7 @@ class RecordingFile {
   [[nodiscard]] Status TakePart(const Part& part, size_t last, ChunkReader& reader);
   [[nodiscard]] Status CheckFacts(const Part& part, const std::vector<MomentFacts>& facts);
   const Part* FindPart(int64_t number) const;
+  [[nodiscard]] Status ReadLastOf(int64_t chunk, ChunkReader& reader, int64_t& number);
   [[nodiscard]] Status FindIn(const Part& part, int64_t second, int64_t& number, int64_t& found);
 
   std::unique_ptr<CacheDatabase> database_;

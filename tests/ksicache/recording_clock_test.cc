@@ -75,6 +75,52 @@ TEST_F(RecordingClock, MomentsOfAClockThatWasWrongAreFound) {
                     "2026-11-21T10:00:00Z to 2026-11-22T10:00:15Z");
 }
 
+// Ten moments each from some starts on, as the clock on the wall went, of which the last may be of
+// another boot.
+TEST_F(RecordingClock, SoLongBeforeIsByTheClockThatNobodySets) {
+  const auto record = [this](int64_t second, bool isBooted) {
+    RecordFrom({0, second}, 10);
+    for (size_t i = 0; i < moments_.size(); ++i) {
+      const bool isOther = isBooted && i >= 10;
+      moments_[i].host.boot = isOther ? "b" : "a";
+      moments_[i].facts.uptime = static_cast<int64_t>(isOther ? 5 * i - 30 : 500 + 5 * i) * kSecond;
+    }
+    Record(file_, moments_);
+  };
+  // Put forward by a day, or set back by half an hour.
+  for (const int64_t second : {50, 86400, -1800}) {
+    SCOPED_TRACE(second);
+    record(second, false);
+    EXPECT_EQ(NumberAt("-0s"), 19);
+    EXPECT_EQ(NumberAt("-5s"), 18);
+    EXPECT_EQ(NumberAt("-7s"), 17);
+    EXPECT_EQ(NumberAt("-45s"), 10);
+    EXPECT_EQ(NumberAt("-50s"), 9);
+    EXPECT_EQ(NumberAt("-60s"), 7);
+    EXPECT_EQ(NumberAt("-95s"), 0);
+    EXPECT_EQ(NumberAt("-96s"), KSI_STATUS_NOT_FOUND);
+  }
+  // A host that was down for some time; by a clock that was behind then for none.
+  record(145, true);
+  EXPECT_EQ(NumberAt("-45s"), 10);
+  EXPECT_EQ(NumberAt("-60s"), 9);
+  EXPECT_EQ(NumberAt("-145s"), 9);
+  EXPECT_EQ(NumberAt("-146s"), 8);
+  record(-1800, true);
+  EXPECT_EQ(NumberAt("-45s"), 10);
+  EXPECT_EQ(NumberAt("-46s"), 8);
+  EXPECT_EQ(NumberAt("-60s"), 6);
+  EXPECT_EQ(NumberAt("-91s"), KSI_STATUS_NOT_FOUND);
+}
+
+// From 11:06:40 on, and then from 10:00.
+TEST_F(RecordingClock, ATimeOfDayThatIsLaterThanTheLastMomentIsFound) {
+  RecordFrom({4000, 0}, 10);
+  EXPECT_EQ(NumberAt("11:07Z"), 4);
+  EXPECT_EQ(NumberAt("10:00:20Z"), 14);
+  EXPECT_EQ(NumberAt("12:00Z"), KSI_STATUS_NOT_FOUND);
+}
+
 TEST_F(RecordingClock, SpansHaveAllOfTheirTimesInTheOrderOfTheRecording) {
   RecordFrom({0, 10, -100}, 4);
   // Of a host that has rows.

@@ -279,7 +279,8 @@ TEST_F(RecordingWork, AChunkHasABoundOfMoments) {
   AddMoments(1, 2, more);
   const auto expect = [this](const std::string& number, const std::string& why) {
     RunSql(file_, "UPDATE part SET number = " + number + " WHERE number > 0 AND moments = 1");
-    ExpectFailure({"dump", file_}, file_ + ": damaged: the part of 2026-11-21T10:00:00Z " + why);
+    const std::string name = file_ + "@2026-11-21T10:00:00Z";
+    ExpectFailure({"dump", name}, name + ": damaged: the part of 2026-11-21T10:00:00Z " + why);
   };
   expect("4095", "has not all that it continues");
   expect("4096", "is not understood");

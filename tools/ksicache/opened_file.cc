@@ -16,6 +16,7 @@
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/failures.h"
 #include "tools/ksicache/moment_builder.h"
+#include "tools/ksicache/output.h"
 #include "tools/ksicache/reading_walk.h"
 
 namespace ksicache {
@@ -60,6 +61,13 @@ ksi::OpenedCache OpenAny(const std::string& name, ksi::ChunkReader& moment) {
   std::string why;
   const ksi::Status status = ksi::ReadCache(name, &opened, &moment, &why);
   if (status != ksi::kOk) Throw(status, name, why);
+  return opened;
+}
+
+// The same; what is to be said of the moment is said.
+ksi::OpenedCache OpenAloud(const std::string& name, ksi::ChunkReader& moment) {
+  ksi::OpenedCache opened = OpenAny(name, moment);
+  if (!opened.remark.empty()) PrintError(name + ": " + opened.remark);
   return opened;
 }
 
@@ -127,7 +135,7 @@ void Count(ksi::Status status, ksi::MomentFacts& facts) {
 
 OpenedFile::OpenedFile(const std::string& name) {
   ksi::ChunkReader moment;
-  ksi::OpenedCache opened = OpenAny(name, moment);
+  ksi::OpenedCache opened = OpenAloud(name, moment);
   hasWhen_ = opened.hasWhen;
   asked_ = opened.asked;
   if (opened.recording == nullptr) {
@@ -169,10 +177,8 @@ std::unique_ptr<ksi::RecordingFile> OpenRecording(const std::string& fileName) {
 }
 
 NamedMoment OpenNamed(const std::string& name) {
-  ksi::OpenedCache opened;
-  std::string why;
-  const ksi::Status status = ksi::OpenCache(name, &opened, &why);
-  if (status != ksi::kOk) Throw(status, name, why);
+  ksi::ChunkReader moment;
+  ksi::OpenedCache opened = OpenAloud(name, moment);
   if (opened.recording == nullptr) throw DataError("is no recording");
   return {std::move(opened.recording), opened.number};
 }
@@ -186,7 +192,7 @@ MomentHead HeadOf(const std::string& name) {
 
 ksi::Moment ReadMoment(const std::string& name) {
   ksi::ChunkReader moment;
-  const ksi::OpenedCache opened = OpenAny(name, moment);
+  const ksi::OpenedCache opened = OpenAloud(name, moment);
   if (opened.recording == nullptr) throw DataError("is no recording");
   return WholeOf(opened, moment);
 }

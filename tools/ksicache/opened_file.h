@@ -13,7 +13,8 @@
 
 namespace ksicache {
 
-// Every call fails with a DataError that says what is wrong with the file.
+// Every call fails with a DataError that says what is wrong with the file. But for HeadOf, each
+// says by an error that the last moments are damaged, and which one is taken for them.
 
 // A capture, or a moment as the capture that it would be.
 class OpenedFile {
