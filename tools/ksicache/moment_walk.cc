@@ -1,6 +1,7 @@
 #include "tools/ksicache/moment_walk.h"
 
 #include <algorithm>
+#include <string>
 #include <utility>
 #include <vector>
 
@@ -30,17 +31,23 @@ void MomentWalk::Run(const std::function<bool(const Part&)>& wants) {
     progress.Show(i, parts.size());
     if (wants(parts[i])) Walk(parts[i]);
   }
+  Complain();
   while (!upcoming_.empty()) Pass();
 }
 
 void MomentWalk::Walk(const Part& part) {
-  const bool knowsHost = ReadHost(part);
-  const std::string why = file_.Why();
-  std::vector<ksi::MomentFacts> facts;
-  if (file_.ReadFacts(part, facts) != ksi::kOk) return complain_(file_.Why());
-  if (!knowsHost) complain_(why);
+  if (lost_.Take(part)) return;
+  Complain();
+  if (file_.CheckPart(part, reader_, at_) != ksi::kOk) {
+    at_ = ksi::RecordingFile::kNoMoment;
+    return lost_.Begin(part, file_.Why());
+  }
+  at_ = part.End() - 1;
+  host_ = reader_.Host().name;
+  boot_ = reader_.Host().boot;
   const size_t blocks = ksi::cache::BlocksOf(static_cast<size_t>(part.size));
   const auto bytes = static_cast<double>(blocks * ksi::cache::kBlockSize);
+  const std::vector<ksi::MomentFacts>& facts = reader_.PartFacts();
   for (size_t i = 0; i < facts.size(); ++i) {
     WalkedMoment moment;
     moment.number = part.number + static_cast<int64_t>(i);
@@ -52,14 +59,8 @@ void MomentWalk::Walk(const Part& part) {
   }
 }
 
-// The host of a part's chunk, empty if it cannot be told; false then.
-bool MomentWalk::ReadHost(const Part& part) {
-  if (part.chunk == std::exchange(chunk_, part.chunk)) return true;
-  ksi::HostIdentity host;
-  const bool isGood = file_.ReadHost(part, host) == ksi::kOk;
-  host_ = isGood ? host.name : "";
-  boot_ = isGood ? host.boot : "";
-  return isGood;
+void MomentWalk::Complain() {
+  if (!lost_.IsEmpty()) complain_(lost_.TakeText());
 }
 
 void MomentWalk::Add(WalkedMoment moment) {

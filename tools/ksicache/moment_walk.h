@@ -11,6 +11,7 @@
 
 #include "knvlibs/recording/moment.h"
 #include "knvlibs/recording/recording_file.h"
+#include "tools/ksicache/lost_moments.h"
 
 namespace ksicache {
 
@@ -36,7 +37,8 @@ class MomentWalk {
   using Part = ksi::RecordingFile::Part;
 
   // Calls `visit` with the moments of each part that `wants` wants, in the order in which they were
-  // recorded, and `complain` with what is wrong where something cannot be read.
+  // recorded, and `complain` with what is wrong where something cannot be read: once of each chunk,
+  // of which then nothing behind it can.
   MomentWalk(ksi::RecordingFile& file, std::function<void(const WalkedMoment&)> visit,
              std::function<void(const std::string& what)> complain)
       : file_(file), visit_(std::move(visit)), complain_(std::move(complain)) {}
@@ -56,7 +58,7 @@ class MomentWalk {
   static constexpr size_t kAround = 3;
 
   void Walk(const Part& part);
-  bool ReadHost(const Part& part);
+  void Complain();
   void Add(WalkedMoment moment);
   void Compare(WalkedMoment& moment) const;
   void Pass();
@@ -64,8 +66,10 @@ class MomentWalk {
   ksi::RecordingFile& file_;
   std::function<void(const WalkedMoment&)> visit_;
   std::function<void(const std::string&)> complain_;
-  int64_t chunk_ = -1;  // whose host this is
-  std::string host_;
+  ksi::ChunkReader reader_;
+  int64_t at_ = ksi::RecordingFile::kNoMoment;  // the moment that it has
+  LostMoments lost_;
+  std::string host_;  // of the part that is walked
   std::string boot_;
   std::optional<Before> before_;
   std::deque<int64_t> strides_;        // of the last moments that were visited

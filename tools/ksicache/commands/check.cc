@@ -1,5 +1,7 @@
 // check: says all that is wrong with a cache file, and where.
 #include <algorithm>
+#include <cstdint>
+#include <memory>
 #include <optional>
 #include <set>
 #include <string>
@@ -13,11 +15,13 @@
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/group_tree.h"
+#include "tools/ksicache/lost_moments.h"
 #include "tools/ksicache/moment_work.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/progress.h"
 #include "tools/ksicache/reading_walk.h"
+#include "tools/ksicache/recording_structure.h"
 
 namespace ksicache {
 namespace {
@@ -218,47 +222,76 @@ bool HasLeft(const std::string& fileName, const ksi::RecordingFile::Part& part) 
 }
 
 // All parts of a recording, and of each its last moment as a capture.
-bool CheckRecording(const std::string& fileName) {
-  const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName);
-  const std::vector<ksi::RecordingFile::Part>& parts = recording->Parts();
-  Progress progress("checking");
-  size_t problems = 0;
-  MomentWork work(*recording, 1);
-  ksi::ChunkReader reader;
-  int64_t at = ksi::RecordingFile::kNoMoment;
-  for (size_t i = 0; i < parts.size(); ++i) {
-    progress.Show(i, parts.size());
-    if (work.IsTooMuch()) {
-      PrintLine(fileName + ": damaged: " + MomentWork::kTooMuch);
-      return false;
+class RecordingChecker {
+ public:
+  explicit RecordingChecker(const std::string& fileName)
+      : fileName_(fileName), recording_(OpenRecording(fileName)), work_(*recording_, 1) {}
+
+  bool Run() {
+    for (const std::string& line : WrongStructure(fileName_)) Report(fileName_, line);
+    for (const std::string& line : WrongRows(*recording_)) Report(fileName_, line);
+    const std::vector<Part>& parts = recording_->Parts();
+    Progress progress("checking");
+    for (size_t i = 0; i < parts.size() && !work_.IsTooMuch(); ++i) {
+      progress.Show(i, parts.size());
+      CheckPart(parts[i]);
     }
-    const std::string name = fileName + "@" + ksi::TextOfTime(parts[i].last);
+    TellLost();
+    if (work_.IsTooMuch()) Report(fileName_, std::string("damaged: ") + MomentWork::kTooMuch);
+    return problems_ == 0;
+  }
+
+ private:
+  using Part = ksi::RecordingFile::Part;
+
+  void Report(const std::string& name, const std::string& what) {
+    PrintLine(name + ": " + what);
+    ++problems_;
+  }
+
+  std::string NameOf(const Part& part) const {
+    return fileName_ + "@" + ksi::TextOfTime(part.last);
+  }
+
+  void CheckPart(const Part& part) {
+    if (lost_.Take(part)) return;
+    TellLost();
     ksi::Moment moment;
-    std::vector<ksi::MomentFacts> facts;
-    const int64_t before = std::exchange(at, parts[i].End() - 1);
-    if (recording->ReadFacts(parts[i], facts) != ksi::kOk ||
-        recording->ReadWhole(at, reader, moment, before) != ksi::kOk) {
-      const std::string why = ": damaged: " + recording->Why();
-      if (HasLeft(fileName, parts[i])) continue;
-      PrintLine(name + why);
-      ++problems;
-      continue;
+    const int64_t before = std::exchange(at_, part.End() - 1);
+    if (recording_->CheckPart(part, reader_, before) == ksi::kOk &&
+        recording_->ReadAll(at_, reader_, moment) == ksi::kOk) {
+      return CheckMoment(NameOf(part), moment);
     }
-    work.Add(moment);
+    const std::string why = recording_->Why();
+    if (!HasLeft(fileName_, part)) lost_.Begin(part, why);
+  }
+
+  void CheckMoment(const std::string& name, const ksi::Moment& moment) {
+    work_.Add(moment);
     try {
       const OpenedFile opened(name, moment);
-      problems += Checker(name, opened.File()).Run();
+      problems_ += Checker(name, opened.File()).Run();
     } catch (const DataError& error) {
-      PrintLine(name + ": " + error.what());
-      ++problems;
+      Report(name, error.what());
     }
   }
-  return problems == 0;
-}
+
+  void TellLost() {
+    if (!lost_.IsEmpty()) Report(NameOf(lost_.First()), "damaged: " + lost_.TakeText());
+  }
+
+  const std::string& fileName_;
+  std::unique_ptr<ksi::RecordingFile> recording_;
+  MomentWork work_;
+  ksi::ChunkReader reader_;
+  int64_t at_ = ksi::RecordingFile::kNoMoment;
+  LostMoments lost_;
+  size_t problems_ = 0;
+};
 
 int Check(const CommandLine& line) {
   return ForEachFile(line.arguments, [](const std::string& fileName) {
-    if (IsRecording(fileName)) return CheckRecording(fileName);
+    if (IsRecording(fileName)) return RecordingChecker(fileName).Run();
     const OpenedFile opened(fileName);
     return Checker(fileName, opened.File()).Run() == 0;
   });
