@@ -20,15 +20,15 @@ constexpr size_t kMostBytes = size_t{4} << 20;
 constexpr int64_t kPartsInFile = 8;
 constexpr int64_t kChunksInFile = 4;
 
-Error TooLarge(const std::length_error& error) {
-  return Error(std::string("a moment of this host is ") + error.what());
+std::string TooLarge(const std::length_error& error) {
+  return std::string("a moment of this host is ") + error.what();
 }
 
 ksi::Bytes PartOf(const ksi::ChunkWriter& chunk, size_t first) {
   try {
     return chunk.PartFrom(first);
   } catch (const std::length_error& error) {
-    throw TooLarge(error);
+    throw Error(TooLarge(error));
   }
 }
 
@@ -37,7 +37,7 @@ void AddTo(ksi::ChunkWriter& chunk, const ksi::MomentFacts& facts,
   try {
     chunk.Add(facts, readings);
   } catch (const std::length_error& error) {
-    throw TooLarge(error);
+    throw Error(TooLarge(error));
   }
 }
 
