@@ -87,7 +87,7 @@ class Groups {
   constructor(data, moment) {
     const role = data.head.roles.groups;
     const rows = new Rows(data, moment, role.report);
-    const told = new Map((data.memory[moment].parts.groups ?? []).map((thing) => [String(thing.number), thing]));
+    const told = new Map(data.memory[moment].parts.groups.things.map((thing) => [String(thing.number), thing]));
     this.told = told;
     this.source = data.head.parts.find((each) => each.name === 'groups').source;
     this.groups = new Map(rows.rows.map((row) => [String(rows.value(row, role.id)), {
