@@ -299,8 +299,8 @@ class Collector {
     growth.name = series.name;
     growth.number = series.number;
     growth.info = series.info;
-    const auto known = std::ranges::find_if_not(series.figures | std::views::reverse,
-                                                [](double figure) { return std::isnan(figure); });
+    const auto known = std::find_if_not(series.figures.rbegin(), series.figures.rend(),
+                                        [](double figure) { return std::isnan(figure); });
     const bool isNow = series.info != nullptr || known == series.figures.rbegin();
     if (isNow && known != series.figures.rend()) growth.now = static_cast<int64_t>(*known);
     // Things that grow are sought; the host's own figures are told whichever way they go.
