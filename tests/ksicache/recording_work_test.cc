@@ -217,10 +217,10 @@ TEST_F(RecordingWork, ExportEndsByTheSizeOfTheFile) {
 TEST_F(RecordingWork, AListHasABoundOfEntries) {
   constexpr size_t kMany = 25'000'000;
   ByteWriter events;
-  for (const uint64_t number : {0, 0, 1}) events.Unsigned(number);
+  for (const unsigned number : {0U, 0U, 1U}) events.Unsigned(number);
   int64_t before = 0;
   for (int key = 0; key < 2; ++key) PutEntry(std::string(), before, events);
-  for (const uint64_t number : {0, 1, 0, 0, 0}) events.Unsigned(number);
+  for (const unsigned number : {0U, 1U, 0U, 0U, 0U}) events.Unsigned(number);
   events.Unsigned(kMany);
   for (size_t i = 0; i < kMany; ++i) PutEntry(static_cast<int64_t>(i), before, events);
   for (int i = 0; i < 3; ++i) events.Unsigned(0);
