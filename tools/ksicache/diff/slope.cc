@@ -143,7 +143,7 @@ Ramp RampOf(std::span<const Point> points) {
     }
   }
   // A few points at either end are no rest.
-  const double few = (whole.end - whole.begin) / (kPlaces / 2);
+  const double few = 2 * (whole.end - whole.begin) / kPlaces;
   if (best.begin < whole.begin + few) best.begin = whole.begin;
   if (best.end > whole.end - few) best.end = whole.end;
   return best;
