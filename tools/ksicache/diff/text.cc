@@ -83,7 +83,8 @@ std::string DurationText(double seconds) {
     const char* name;
     int64_t size;
   };
-  constexpr Unit kUnits[] = {{"y", 365 * 86400}, {"d", 86400}, {"h", 3600}, {"m", 60}, {"s", 1}};
+  constexpr Unit kUnits[] = {
+      {"y", int64_t{365} * 86400}, {"d", 86400}, {"h", 3600}, {"m", 60}, {"s", 1}};
   const auto whole = static_cast<int64_t>(std::llround(std::fabs(seconds)));
   const std::string sign = seconds < 0 ? "-" : "";
   for (size_t i = 0; i + 1 < std::size(kUnits); ++i) {
@@ -132,7 +133,7 @@ std::string OnTheRight(std::string_view text, size_t width) {
 
 std::string NameText(std::string_view name, int64_t number) {
   constexpr int64_t kFirstProcess = int64_t{1} << 40;
-  const std::string text(name.empty() ? "(no name)" : name);
+  std::string text(name.empty() ? "(no name)" : name);
   if (number < 0) return text;
   return text + " " + std::to_string(number >= kFirstProcess ? number - kFirstProcess : number);
 }
