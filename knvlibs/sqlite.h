@@ -62,13 +62,14 @@ class Statement {
 
   explicit operator bool() const { return handle_ != nullptr; }
 
-  // Parameters count from 1. A text is copied; a blob must live until the statement is stepped for
-  // the last time or bound anew.
+  // Parameters count from 1. A text is copied, if there is any; a blob must live until the statement
+  // is stepped for the last time or bound anew.
   int Bind(int parameter, int64_t number) { return sqlite3_bind_int64(handle_, parameter, number); }
   int Bind(int parameter, double number) { return sqlite3_bind_double(handle_, parameter, number); }
   int Bind(int parameter, std::string_view text) {
-    return sqlite3_bind_text(handle_, parameter, text.data() == nullptr ? "" : text.data(),
-                             static_cast<int>(text.size()), SQLITE_TRANSIENT);
+    if (text.empty()) return sqlite3_bind_text(handle_, parameter, "", 0, SQLITE_STATIC);
+    return sqlite3_bind_text(handle_, parameter, text.data(), static_cast<int>(text.size()),
+                             SQLITE_TRANSIENT);
   }
   int Bind(int parameter, std::span<const std::byte> blob) {
     return sqlite3_bind_blob(handle_, parameter, blob.data(), static_cast<int>(blob.size()),

@@ -5,9 +5,9 @@
 
 namespace ksicache {
 
-void FailedReads::Add(const std::string& name, int64_t status) {
+void FailedReads::Add(int64_t status, const std::function<std::string()>& name) {
   if (count_++ < kMostNamed) {
-    first_.push_back(name + " (" + StatusText(static_cast<ksi::Status>(status)) + ")");
+    first_.push_back(name() + " (" + StatusText(static_cast<ksi::Status>(status)) + ")");
   }
 }
 
@@ -18,16 +18,16 @@ std::string FailedReads::Text() const {
   return text;
 }
 
-void Failures::Add(const std::string& name, int64_t status) {
+void Failures::Add(int64_t status, const std::function<std::string()>& name) {
   switch (status) {
     case KSI_STATUS_NOT_FOUND:
     case KSI_STATUS_NO_HANDLER:
     case KSI_STATUS_INVALID_NODE:
-      return absent.Add(name, status);
+      return absent.Add(status, name);
     case KSI_STATUS_PERMISSION_DENIED:
-      return refused.Add(name, status);
+      return refused.Add(status, name);
     default:
-      return failed.Add(name, status);
+      return failed.Add(status, name);
   }
 }
 

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -12,7 +13,8 @@ namespace ksicache {
 // The reads that failed in one way: how many, and the names of the first few.
 class FailedReads {
  public:
-  void Add(const std::string& name, int64_t status);
+  // The others' names are not asked for: most things have no value for some node, thousands of them.
+  void Add(int64_t status, const std::function<std::string()>& name);
 
   size_t Count() const { return count_; }
 
@@ -34,7 +36,7 @@ struct Failures {
   // All others.
   FailedReads failed;
 
-  void Add(const std::string& name, int64_t status);
+  void Add(int64_t status, const std::function<std::string()>& name);
 };
 
 }  // namespace ksicache

@@ -110,7 +110,7 @@ void HostWalk::ReadList(const ksi::Node& node, const ksi::Keys& keys, const Obje
 void HostWalk::AddFailure(const ksi::Node& node, ksi::Kind kind, const ksi::Keys& keys,
                           ksi::Status status) {
   sink_.AddFailure(node, kind, keys, status);
-  failures_.Add(NameOf(node.path, keys), status);
+  failures_.Add(status, [&] { return NameOf(node.path, keys); });
 }
 
 // Objects that a value, and no list, leads to.

@@ -1,6 +1,7 @@
 // ksicache: the tool for KSI cache files.
 #include <getopt.h>
 #include <signal.h>
+#include <sqlite3.h>
 
 #include <algorithm>
 #include <cstdio>
@@ -124,6 +125,8 @@ int Run(int argc, char** argv) {
 int main(int argc, char** argv) {
   // A file that may grow no more is an error like others, with a message and nothing left behind.
   static_cast<void>(signal(SIGXFSZ, SIG_IGN));
+  // Nobody asks SQLite how much memory it has, which it would count with a lock for each piece.
+  static_cast<void>(sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0));
   try {
     const int status = ksicache::Run(argc, argv);
     ksicache::FinishOutput();

@@ -126,7 +126,7 @@ void AddList(const Reading& reading, InstanceWalk& instances, MomentBuilder& bui
 
 void Count(ksi::Status status, ksi::MomentFacts& facts) {
   Failures failures;
-  failures.Add("", status);
+  failures.Add(status, [] { return std::string(); });
   facts.refused += failures.refused.Count();
   facts.failed += failures.failed.Count();
 }

@@ -33,7 +33,7 @@ Contents ContentsOf(const ksi::CacheFile& file) {
   Contents contents;
   ForEachReading(file, [&](const Reading& reading) {
     if (reading.status != ksi::kOk) {
-      contents.failures.Add(reading.Name(), reading.status);
+      contents.failures.Add(reading.status, [&] { return reading.Name(); });
     } else if (reading.row != nullptr && reading.row->kind == ksi::Kind::kList) {
       ++contents.lists;
       contents.instances = Sum(contents.instances, std::max<int64_t>(reading.count, 0));
