@@ -120,12 +120,11 @@ Device DeviceOf(const Json* data) {
           address ? address : NumberOf(FindMember(data, "memaddr"))};
 }
 
-MemoryModule ModuleOf(const Backends& backends, const Json& device) {
-  const Json* data = FindMember(&device, "data");
-  const std::string* type = TextOf(FindMember(&device, "type"));
-  const auto backend = backends.find(DeviceOf(data).backend);
+MemoryModule ModuleOf(const Backends& backends, const Device& device, const Json& told) {
+  const std::string* type = TextOf(FindMember(&told, "type"));
+  const auto backend = backends.find(device.backend);
   MemoryModule module;
-  module.size = KBOf(data, "size");
+  module.size = KBOf(FindMember(&told, "data"), "size");
   if (backend != backends.end()) module.block.size = backend->second;
   module.isDimm = type != nullptr && *type == "dimm";
   return module;
@@ -198,9 +197,9 @@ void AskForModules(Conversation& monitor, GuestMemory& memory) {
   const Backends backends = BackendsOf(*objects);
   std::vector<Device> devices;
   MachineMemory machine = {.base = 0, .blocks = {}, .modules = {{}}};
-  for (const auto& [name, device] : list->members) {
-    devices.push_back(DeviceOf(FindMember(&device, "data")));
-    machine.modules->push_back(ModuleOf(backends, device));
+  for (const auto& [name, told] : list->members) {
+    devices.push_back(DeviceOf(FindMember(&told, "data")));
+    machine.modules->push_back(ModuleOf(backends, devices.back(), told));
   }
   const Figure plugged = KBOf(&*summary, "plugged-memory");
   if (!plugged || machine.Size() != plugged) return;
