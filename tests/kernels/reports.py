@@ -683,6 +683,13 @@ def touched_of(pid, own, resident):
     return min((stat["active_anon"] + stat["active_file"]) // 1024, resident) if own else None
 
 
+def merged_beside(pid, merged):
+    """Merged pages that are not the guest's and yet counted: before Linux 6.8 all of the process are."""
+    if RELEASE >= (6, 8):
+        return 0
+    return min(ROMS, max(0, kernel.ksm_of(pid)["ksm_merging_pages"] * kernel.PAGE - merged))
+
+
 def vm_stats():
     for pid in machines():
         own, guest = own_cgroup(pid), guest_memory(pid)
@@ -690,8 +697,7 @@ def vm_stats():
         merged, zero = guest["merged"], zero_pages(pid)
         mapped = guest["resident"] + zero
         saves = saved(merged) + zero
-        # Before Linux 6.8 merged pages are known of the whole process.
-        other = ROMS if merged and RELEASE < (6, 8) else 0
+        other = merged_beside(pid, merged)
         has_balloon = machine_name(pid) == "alone"
         zipped, pool = in_kb(stat, "zswapped"), in_kb(stat, "zswap")
         yield machine_name(pid), {
