@@ -62,8 +62,8 @@ class Statement {
 
   explicit operator bool() const { return handle_ != nullptr; }
 
-  // Parameters count from 1. A text is copied, if there is any; a blob must live until the statement
-  // is stepped for the last time or bound anew.
+  // Parameters count from 1. A text is copied, if there is any; a blob must live until the
+  // statement is stepped for the last time or bound anew.
   int Bind(int parameter, int64_t number) { return sqlite3_bind_int64(handle_, parameter, number); }
   int Bind(int parameter, double number) { return sqlite3_bind_double(handle_, parameter, number); }
   int Bind(int parameter, std::string_view text) {

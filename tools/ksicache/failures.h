@@ -13,7 +13,8 @@ namespace ksicache {
 // The reads that failed in one way: how many, and the names of the first few.
 class FailedReads {
  public:
-  // The others' names are not asked for: most things have no value for some node, thousands of them.
+  // The others' names are not asked for: most things have no value for some node, thousands of
+  // them.
   void Add(int64_t status, const std::function<std::string()>& name);
 
   size_t Count() const { return count_; }
