@@ -4,8 +4,9 @@
 #include <map>
 #include <span>
 #include <string>
+#include <utility>
 
-#include "tools/ksicache/diff/json_text.h"
+#include "tools/ksicache/diff/sides_json.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/output.h"
 
@@ -107,59 +108,48 @@ class Screen {
   size_t left_ = 0;    // of a name
 };
 
-void PutGrowth(const Growth& growth, JsonText& json) {
-  json.Name("before");
-  json.PutNumber(growth.before);
-  json.Name("after");
-  json.PutNumber(growth.after);
-  json.Name("growth");
-  json.PutNumber(growth.Amount());
+void PutGrowth(const Growth& growth, JsonWriter& json) {
+  json.Number("before", growth.before)
+      .Number("after", growth.after)
+      .Number("growth", growth.Amount());
 }
 
-void PutFigure(const char* name, const Growth& growth, JsonText& json) {
-  json.NewLine();
-  json.Name(name);
-  json.Begin('{');
+std::string ToJson(const Growth& growth) {
+  JsonWriter json;
   PutGrowth(growth, json);
-  json.End('}');
+  return json.Object();
 }
 
-void PutThing(const ThingGrowth& thing, JsonText& json) {
-  json.NewLine();
-  json.Begin('{');
-  json.Name("name");
-  json.PutText(thing.name);
-  if (thing.number >= 0) {
-    json.Name("group");
-    json.PutNumber(thing.number);
-  }
-  json.Name("state");
-  json.PutText(thing.isNew ? "new" : thing.isGone ? "gone" : "changed");
+std::string ToJson(const ThingGrowth& thing) {
+  JsonWriter json;
+  json.Text("name", thing.name);
+  if (thing.number >= 0) json.Number("group", thing.number);
+  json.Text("state", thing.isNew ? "new" : thing.isGone ? "gone" : "changed");
   PutGrowth(thing.growth, json);
-  json.End('}');
+  return json.Object();
 }
 
-void PutPart(const PartGrowth& part, size_t top, JsonText& json) {
-  json.NewLine();
-  json.Begin('{');
-  json.Name("what");
-  json.PutText(part.info->name);
-  json.Name("source");
-  json.PutText(part.info->source);
-  json.Name("added");
-  json.PutFlag(part.info->isAdded);
-  json.Name("known");
-  json.PutFlag(part.isKnown);
-  json.Name("count");
-  json.PutNumber(static_cast<int64_t>(part.after));
-  json.Name("withoutFigure");
-  json.PutNumber(static_cast<int64_t>(part.unknown));
+std::string ToJson(const PartGrowth& part, size_t top) {
+  JsonWriter rows;
+  for (const ThingGrowth& thing : FirstOf(part, top)) rows.NewLine().Json("", ToJson(thing));
+  JsonWriter json;
+  json.Text("what", part.info->name)
+      .Text("source", part.info->source)
+      .Flag("added", part.info->isAdded)
+      .Flag("known", part.isKnown)
+      .Number("count", part.after)
+      .Number("withoutFigure", part.unknown);
   if (part.info->isAdded) PutGrowth(part.sum, json);
-  json.Name("rows");
-  json.Begin('[');
-  for (const ThingGrowth& thing : FirstOf(part, top)) PutThing(thing, json);
-  json.End(']');
-  json.End('}');
+  return json.Json("rows", rows.Array()).Object();
+}
+
+std::string HostToJson(const Balance& balance) {
+  const std::pair<const char*, const Growth&> figures[] = {
+      {"total", balance.total},   {"free", balance.free},     {"used", balance.used},
+      {"kernel", balance.kernel}, {"caches", balance.caches}, {"others", balance.others}};
+  JsonWriter json;
+  for (const auto& [name, growth] : figures) json.NewLine().Json(name, ToJson(growth));
+  return json.Object();
 }
 
 }  // namespace
@@ -170,30 +160,16 @@ void PrintBalance(const Sides& sides, const Balance& balance, tally::DisplayUnit
 
 void PrintBalanceJson(const Sides& sides, const Balance& balance, tally::DisplayUnit unit,
                       size_t top) {
-  JsonText json;
-  json.Begin('{');
+  JsonWriter parts;
+  for (const PartGrowth& part : balance.parts) parts.NewLine().Json("", ToJson(part, top));
+  parts.NewLine().Json("", ToJson(balance.groups, top));
+  JsonWriter json;
   PutSides(sides, json);
-  json.Name("unit");
-  json.PutText(tally::UnitTitle(unit));
-  json.Name("host");
-  json.Begin('{');
-  PutFigure("total", balance.total, json);
-  PutFigure("free", balance.free, json);
-  PutFigure("used", balance.used, json);
-  PutFigure("kernel", balance.kernel, json);
-  PutFigure("caches", balance.caches, json);
-  PutFigure("others", balance.others, json);
-  json.End('}');
-  json.Name("parts");
-  json.Begin('[');
-  for (const PartGrowth& part : balance.parts) PutPart(part, top, json);
-  PutPart(balance.groups, top, json);
-  json.End(']');
-  json.Name("nobody");
-  json.PutNumber(balance.unexplained);
-  json.End('}');
-  json.NewLine();
-  json.Flush();
+  json.Text("unit", tally::UnitTitle(unit))
+      .Json("host", HostToJson(balance))
+      .Json("parts", parts.Array())
+      .Number("nobody", balance.unexplained);
+  Print(json.Object() + "\n");
 }
 
 }  // namespace ksicache

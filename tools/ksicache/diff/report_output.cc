@@ -4,7 +4,7 @@
 #include <span>
 #include <string>
 
-#include "tools/ksicache/diff/json_text.h"
+#include "tools/ksicache/diff/sides_json.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/printable.h"
@@ -81,57 +81,54 @@ const char* UnitOf(const ReportDiff& diff) {
   return found == diff.Columns().end() ? "" : found->unit;
 }
 
-void PutValue(const Value& value, JsonText& json) {
+void PutValue(const char* name, const Value& value, JsonWriter& json) {
   switch (value.type) {
     case ValueType::none:
-      return json.PutNone();
+      json.None(name);
+      break;
     case ValueType::signedNumber:
-      return json.PutNumber(static_cast<int64_t>(value.number));
+      json.Number(name, static_cast<int64_t>(value.number));
+      break;
     case ValueType::unsignedNumber:
-      return json.PutUnsigned(value.number);
+      json.Number(name, value.number);
+      break;
     case ValueType::flag:
-      return json.PutFlag(value.number != 0);
+      json.Flag(name, value.number != 0);
+      break;
     case ValueType::text:
-      return json.PutText(value.text);
+      json.Text(name, value.text);
+      break;
   }
 }
 
-void PutChange(const ReportDiff& diff, const Change& change, JsonText& json) {
-  json.Name(diff.Columns()[change.column].name);
-  json.Begin('{');
-  json.Name("before");
-  PutValue(change.before, json);
-  json.Name("after");
-  PutValue(change.after, json);
-  json.Name("growth");
-  json.PutNumber(change.growth);
-  if (diff.Columns()[change.column].isCounter) {
-    json.Name("perSecond");
-    json.PutReal(change.perSecond);
-    json.Name("restarted");
-    json.PutFlag(change.isRestarted);
-  }
-  json.End('}');
+std::string ToJson(const Change& change, bool isCounter) {
+  JsonWriter json;
+  PutValue("before", change.before, json);
+  PutValue("after", change.after, json);
+  json.Number("growth", change.growth);
+  if (isCounter) json.Real("perSecond", change.perSecond).Flag("restarted", change.isRestarted);
+  return json.Object();
 }
 
-void PutRow(const ReportDiff& diff, const RowChange& row, JsonText& json) {
-  json.Begin('{');
+std::string ToJson(const ReportDiff& diff, const RowChange& row) {
+  JsonWriter keys;
   const auto values = diff.RowOf(row);
-  json.Name("row");
-  json.Begin('{');
   for (size_t i = 0; i < values.size(); ++i) {
-    if (!diff.Columns()[i].isKey) continue;
-    json.Name(diff.Columns()[i].name);
-    PutValue(values[i], json);
+    const RowColumn& column = diff.Columns()[i];
+    if (column.isKey) PutValue(column.name, values[i], keys);
   }
-  json.End('}');
-  json.Name("state");
-  json.PutText(row.match.IsNew() ? "new" : row.match.IsGone() ? "gone" : "changed");
-  json.Name("columns");
-  json.Begin('{');
-  for (const Change& change : row.changes) PutChange(diff, change, json);
-  json.End('}');
-  json.End('}');
+  JsonWriter columns;
+  for (const Change& change : row.changes) {
+    const RowColumn& column = diff.Columns()[change.column];
+    columns.Json(column.name, ToJson(change, column.isCounter));
+  }
+  return JsonWriter()
+      .Json("row", keys.Object())
+      .Text("state", row.match.IsNew()    ? "new"
+                     : row.match.IsGone() ? "gone"
+                                          : "changed")
+      .Json("columns", columns.Object())
+      .Object();
 }
 
 }  // namespace
@@ -156,37 +153,18 @@ void PrintReportDiff(const Sides& sides, const ReportDiff& diff, size_t top) {
 }
 
 void PrintReportDiffJson(const Sides& sides, const ReportDiff& diff, size_t top) {
-  JsonText json;
-  json.Begin('{');
+  JsonWriter rows;
+  for (const RowChange& row : FirstOf(diff, top)) rows.NewLine().Json("", ToJson(diff, row));
+  JsonWriter json;
   PutSides(sides, json);
-  json.Name("report");
-  json.PutText(diff.After().GetReport().name);
-  json.Name("unit");
-  json.PutText(UnitOf(diff));
-  json.Name("by");
-  if (diff.By()) {
-    json.PutText(diff.Columns()[*diff.By()].name);
-  } else {
-    json.PutNone();
-  }
-  json.Name("unchanged");
-  json.PutNumber(static_cast<int64_t>(diff.Unchanged()));
-  json.Name("unknown");
-  json.PutNumber(static_cast<int64_t>(diff.Unknown()));
-  json.Name("changed");
-  json.PutNumber(static_cast<int64_t>(diff.Changed().size()));
-  json.Name("rows");
-  json.Begin('[');
-  for (const RowChange& row : FirstOf(diff, top)) {
-    json.NewLine();
-    PutRow(diff, row, json);
-    json.Flush();
-  }
-  json.NewLine();
-  json.End(']');
-  json.End('}');
-  json.NewLine();
-  json.Flush();
+  json.Text("report", diff.After().GetReport().name)
+      .Text("unit", UnitOf(diff))
+      .Text("by", diff.By() ? diff.Columns()[*diff.By()].name : nullptr)
+      .Number("unchanged", diff.Unchanged())
+      .Number("unknown", diff.Unknown())
+      .Number("changed", diff.Changed().size())
+      .Json("rows", rows.NewLine().Array());
+  Print(json.Object() + "\n");
 }
 
 }  // namespace ksicache

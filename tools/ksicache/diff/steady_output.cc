@@ -7,9 +7,9 @@
 #include <string>
 
 #include "knvlibs/times.h"
-#include "tools/ksicache/diff/json_text.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/diff/unit.h"
+#include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/output.h"
 
 namespace ksicache {
@@ -107,45 +107,30 @@ class Screen {
   size_t top_;
 };
 
-void PutTime(const char* name, std::optional<int64_t> time, JsonText& json) {
-  json.Name(name);
-  time ? json.PutText(ksi::TextOfTime(*time)) : json.PutNone();
+void PutTime(const char* name, std::optional<int64_t> time, JsonWriter& json) {
+  time ? json.Text(name, ksi::TextOfTime(*time)) : json.None(name);
 }
 
-void PutGrowth(const SteadyGrowth& growth, tally::DisplayUnit unit, JsonText& json) {
-  json.NewLine();
-  json.Begin('{');
+std::string ToJson(const SteadyGrowth& growth, tally::DisplayUnit unit) {
+  JsonWriter json;
   if (growth.info != nullptr) {
-    json.Name("what");
-    json.PutText(growth.info->name);
-    json.Name("source");
-    json.PutText(growth.info->source);
+    json.Text("what", growth.info->name).Text("source", growth.info->source);
   }
-  json.Name("name");
-  json.PutText(std::string_view(growth.name).substr(growth.name.find_first_not_of(' ')));
-  if (growth.number >= 0) {
-    json.Name("group");
-    json.PutNumber(growth.number);
-  }
-  json.Name("now");
-  json.PutNumber(In(unit, growth.now));
-  json.Name("growth");
-  json.PutNumber(In(unit, growth.growth));
-  json.Name("perHour");
-  json.PutNumber(In(unit, PerHour(growth)));
-  json.Name("fullInSeconds");
-  json.PutReal(growth.fullIn);
+  json.Text("name", std::string_view(growth.name).substr(growth.name.find_first_not_of(' ')));
+  if (growth.number >= 0) json.Number("group", growth.number);
+  json.Number("now", In(unit, growth.now))
+      .Number("growth", In(unit, growth.growth))
+      .Number("perHour", In(unit, PerHour(growth)))
+      .Real("fullInSeconds", growth.fullIn);
   PutTime("begun", growth.begun, json);
   PutTime("stopped", growth.stopped, json);
-  json.End('}');
+  return json.Object();
 }
 
-void PutGrowths(const char* name, std::span<const SteadyGrowth> growths, tally::DisplayUnit unit,
-                JsonText& json) {
-  json.Name(name);
-  json.Begin('[');
-  for (const SteadyGrowth& growth : growths) PutGrowth(growth, unit, json);
-  json.End(']');
+std::string ToJson(std::span<const SteadyGrowth> growths, tally::DisplayUnit unit) {
+  JsonWriter json;
+  for (const SteadyGrowth& growth : growths) json.NewLine().Json("", ToJson(growth, unit));
+  return json.Array();
 }
 
 }  // namespace
@@ -155,28 +140,18 @@ void PrintSteady(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t t
 }
 
 void PrintSteadyJson(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t top) {
-  JsonText json;
-  json.Begin('{');
-  json.Name("host");
-  json.PutText(growths.last.host);
-  json.Name("from");
-  json.PutText(growths.first.time);
-  json.Name("to");
-  json.PutText(growths.last.time);
-  json.Name("sinceBoot");
-  json.PutFlag(growths.isSinceBoot);
-  json.Name("moments");
-  json.PutNumber(static_cast<int64_t>(growths.moments));
-  json.Name("read");
-  json.PutNumber(static_cast<int64_t>(growths.samples));
-  json.Name("unit");
-  json.PutText(tally::UnitTitle(unit));
-  PutGrowths("memory", growths.host, unit, json);
-  PutGrowths("things", FirstOf(growths.things, top), unit, json);
-  PutGrowths("groups", FirstOf(growths.groups, top), unit, json);
-  json.End('}');
-  json.NewLine();
-  json.Flush();
+  JsonWriter json;
+  json.Text("host", growths.last.host)
+      .Text("from", growths.first.time)
+      .Text("to", growths.last.time)
+      .Flag("sinceBoot", growths.isSinceBoot)
+      .Number("moments", growths.moments)
+      .Number("read", growths.samples)
+      .Text("unit", tally::UnitTitle(unit))
+      .Json("memory", ToJson(growths.host, unit))
+      .Json("things", ToJson(FirstOf(growths.things, top), unit))
+      .Json("groups", ToJson(FirstOf(growths.groups, top), unit));
+  Print(json.Object() + "\n");
 }
 
 }  // namespace ksicache

@@ -4,8 +4,8 @@
 #include <bit>
 #include <string_view>
 
+#include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/page/packing.h"
-#include "tools/ksicache/page/page_json.h"
 
 namespace ksicache {
 namespace {
@@ -39,6 +39,25 @@ int BitsToCut(const Line& line) {
 int64_t CutUpward(int64_t figure, int bits) {
   const int64_t cut = figure >> bits;
   return cut << bits == figure ? cut : cut + 1;
+}
+
+// A text is its number, a number is a text: JSON's own have 53 bits.
+void PutKey(const PageValue& key, JsonWriter& keys) {
+  switch (key.type) {
+    case ValueType::none:
+      keys.None("");
+      break;
+    case ValueType::text:
+      keys.Number("", key.number);
+      break;
+    case ValueType::signedNumber:
+      keys.Text("", std::to_string(static_cast<int64_t>(key.number)));
+      break;
+    case ValueType::flag:
+    case ValueType::unsignedNumber:
+      keys.Text("", std::to_string(key.number));
+      break;
+  }
 }
 
 }  // namespace
@@ -154,7 +173,7 @@ std::string ReportLines::ThingsToJson() const {
   JsonWriter things;
   for (const std::vector<PageValue>& keys : keys_) {
     JsonWriter thing;
-    for (const PageValue& key : keys) thing.Value("", key);
+    for (const PageValue& key : keys) PutKey(key, thing);
     things.Json("", thing.Array());
   }
   return things.Array();

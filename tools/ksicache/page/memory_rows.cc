@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "tools/ksicache/diff/memory.h"
-#include "tools/ksicache/page/page_json.h"
+#include "tools/ksicache/json_writer.h"
 
 namespace ksicache {
 namespace {

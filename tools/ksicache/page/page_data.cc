@@ -4,8 +4,8 @@
 
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/page/memory_rows.h"
-#include "tools/ksicache/page/page_json.h"
 #include "tools/ksicache/page/roles.h"
 
 namespace ksicache {
@@ -99,10 +99,10 @@ std::string ToJson(const Marks& marks, const Survey& survey) {
   }
   return JsonWriter()
       .Json("all", all.Array())
-      .Number("leftOut", static_cast<int64_t>(marks.leftOut))
-      .Number("refused", static_cast<int64_t>(marks.refused))
-      .Number("failed", static_cast<int64_t>(marks.failed))
-      .Number("lossy", static_cast<int64_t>(marks.lossy))
+      .Number("leftOut", marks.leftOut)
+      .Number("refused", marks.refused)
+      .Number("failed", marks.failed)
+      .Number("lossy", marks.lossy)
       .Object();
 }
 
@@ -119,7 +119,7 @@ std::string ToJson(const PageLines& lines) {
                          .Object());
   }
   return JsonWriter()
-      .Number("stretches", static_cast<int64_t>(lines.times.size()))
+      .Number("stretches", lines.times.size())
       .Flag("isCut", lines.isCut)
       .Json("reports", reports.Array())
       .Object();
@@ -156,7 +156,7 @@ std::string HeadToJson(const PageData& data) {
   return JsonWriter()
       .Text("title", data.title)
       .Text("host", survey.host)
-      .Number("moments", static_cast<int64_t>(survey.moments.size()))
+      .Number("moments", survey.moments.size())
       .Text("kernel", survey.kernel)
       .Json("states", StatesToJson(survey))
       .Json("points", TimesToJson(survey, data.tables.points.moments))

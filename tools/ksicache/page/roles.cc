@@ -1,7 +1,7 @@
 #include "tools/ksicache/page/roles.h"
 
 #include <knvlibs/ksi_records.h>
-#include "tools/ksicache/page/page_json.h"
+#include "tools/ksicache/json_writer.h"
 
 namespace ksicache::roles {
 namespace {
