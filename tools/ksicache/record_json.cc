@@ -8,6 +8,7 @@
 #include <knvlibs/ksi_records.h>
 #include "knvlibs/characters.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/printable.h"
 
 namespace ksicache {
@@ -191,14 +192,12 @@ int64_t NumberFromJson(const Json& json, const std::string& where) {
 }
 
 std::string RecordToJson(const ksi::Node& node, std::span<const std::byte> record) {
-  std::string json = "{";
-  const auto add = [&](std::string_view name, const std::string& value) {
-    json += (json.size() == 1 ? "" : ",") + Quoted(name) + ":" + value;
-  };
-  for (const ksi::Field& field : node.fields) add(field.name, FieldToJson(field, record));
-  ForEachUnused(node, record,
-                [&](const std::string& name, const std::string& hex) { add(name, Quoted(hex)); });
-  return json + "}";
+  JsonWriter json;
+  for (const ksi::Field& field : node.fields) json.Json(field.name, FieldToJson(field, record));
+  ForEachUnused(node, record, [&](const std::string& name, const std::string& hex) {
+    json.Json(name, Quoted(hex));
+  });
+  return json.Object();
 }
 
 std::vector<std::byte> RecordFromJson(const ksi::Node& node, const Json& json) {

@@ -7,6 +7,7 @@
 
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/node_names.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
@@ -88,15 +89,17 @@ class Dumper {
 
   // One reading, one line: such files compare well.
   void PrintJson(const Reading& reading, std::string_view member, const std::string& answer) {
-    std::string line = R"({"node":)" + TextToJson(reading.row->path) + R"(,"keys":[)";
+    JsonWriter keys;
     for (size_t i = 0; i < reading.keys.count; ++i) {
       const ksi::Key& key = reading.keys[i];
-      line += i == 0 ? "" : ",";
-      line += key.kind == ksi::KeyKind::kNumber ? std::to_string(key.number) : TextToJson(key.text);
+      key.kind == ksi::KeyKind::kNumber ? keys.Number("", key.number) : keys.Text("", key.text);
     }
-    line.append("],\"").append(member).append("\":").append(answer).append("}");
     Print(first_ ? "\n    " : ",\n    ");
-    Print(line);
+    Print(JsonWriter()
+              .Text("node", reading.row->path)
+              .Json("keys", keys.Array())
+              .Json(member, answer)
+              .Object());
     first_ = false;
   }
 
@@ -151,9 +154,9 @@ class Dumper {
       for (const std::string& entry : entries) PrintLine("    " + entry);
       return;
     }
-    std::string list;
-    for (const std::string& entry : entries) list += (list.empty() ? "" : ",") + entry;
-    PrintJson(reading, "instances", "[" + list + "]");
+    JsonWriter list;
+    for (const std::string& entry : entries) list.Json("", entry);
+    PrintJson(reading, "instances", list.Array());
   }
 
   void PrintList(const Reading& reading) {
