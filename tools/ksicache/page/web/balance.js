@@ -1,8 +1,9 @@
 // How the memory of a host divides at one moment: a tree of parts whose sizes add up.
 //
-// A part is {name, key, bytes, source, children, share, note}: `key` is the style that it has,
-// `source` says which report and columns it comes from, `share` by how much its children are drawn
-// smaller than they are because together they would be larger than it.
+// A part is {name, id, key, bytes, source, children, share, note}: `id` is the kernel's number of its
+// group, if it has one, `key` the style that it has, `source` says which report and columns it comes
+// from, `share` by how much its children are drawn smaller than they are because together they would
+// be larger than it.
 import {bytesOf, memoryText, shownText} from './format.js';
 
 // Groups in groups that a page follows; those further down belong to the last one.
@@ -27,7 +28,7 @@ export class Rows {
 }
 
 function part(name, key, bytes, source, children = []) {
-  return {name, key, bytes, source, children, share: 1, note: ''};
+  return {name, id: null, key, bytes, source, children, share: 1, note: ''};
 }
 
 function sumOf(parts) {
@@ -121,6 +122,7 @@ class Groups {
   grouped(group, parts) {
     if (parts.length <= 1) return parts;
     const whole = part(group.name, 'groups', sumOf(parts), 'the sum of what is in it', parts);
+    whole.id = group.id;
     const own = this.told.get(group.id)?.bytes ?? null;
     if (own !== null) whole.note = `the group itself has ${memoryText(Number(own))} (${this.source})`;
     return [whole];

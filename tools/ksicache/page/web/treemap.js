@@ -17,7 +17,6 @@ function squarified(part, width, height) {
     node.scale = node.parent === null ? 1 : node.parent.scale * node.parent.data.share;
   });
   // What is in a part adds up to it, and so only what has nothing in it has a size of its own.
-  root.sum((each) => 0);
   root.eachAfter((node) => {
     node.value = node.children === undefined
       ? node.data.bytes * node.scale : d3.sum(node.children, (child) => child.value);
@@ -41,12 +40,13 @@ export class Treemap {
     new ResizeObserver(() => this.draw()).observe(this.box);
   }
 
-  // The parts from the host down to the one that is looked into, by their names: at another moment
-  // it is another part of that name.
+  // The parts from the host down to the one that is looked into, which at another moment is another
+  // one of its number and name, or after a restart of its name.
   chain() {
     const chain = [this.root];
-    for (const name of this.path) {
-      const next = chain.at(-1).children.find((child) => child.name === name && child.children.length > 0);
+    for (const {id, name} of this.path) {
+      const namesakes = chain.at(-1).children.filter((child) => child.name === name && child.children.length > 0);
+      const next = namesakes.find((child) => child.id === id) ?? namesakes[0];
       if (next === undefined) break;
       chain.push(next);
     }
@@ -96,11 +96,10 @@ export class Treemap {
     const {data: part} = node;
     const isOpen = part.children.length > 0 && node.depth < LEVELS && height > HEAD + 4 && width > OPEN;
     if (isOpen) this.opened.add(node);
-    const names = node.ancestors().reverse().slice(1).map((each) => each.data.name);
     const tile = element('button', {
       type: 'button', class: `tile ${part.key}${isOpen ? ' open' : ''}`, tabindex: -1,
       'aria-label': `${part.name} ${memoryText(part.bytes)}`,
-      onclick: () => this.open(node, names),
+      onclick: () => this.open(node),
       onfocus: () => this.focus(tile, part, node),
       onpointerenter: () => this.describe(part, this.partsTo(node)),
     });
@@ -128,8 +127,9 @@ export class Treemap {
   }
 
   // Looks into the part, or into the one that it is in.
-  open(node, names) {
-    const inside = node.data.children.length > 0 ? names : names.slice(0, -1);
+  open(node) {
+    const inside = (node.data.children.length > 0 ? node : node.parent).ancestors().reverse().slice(1)
+      .map(({data: {id, name}}) => ({id, name}));
     if (inside.length > 0) this.lookInto([...this.path, ...inside]);
   }
 
@@ -157,7 +157,8 @@ export class Treemap {
 
   key(event) {
     if (event.key === 'Escape' || event.key === 'Backspace') {
-      if (this.path.length > 0) this.lookInto(this.path.slice(0, -1));
+      const depth = this.chain().length - 1;
+      if (depth > 0) this.lookInto(this.path.slice(0, depth - 1));
     } else if (event.key.startsWith('Arrow')) {
       this.neighbour(event.target, event.key)?.focus();
     } else {
