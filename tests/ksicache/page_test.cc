@@ -35,6 +35,16 @@ TEST_F(PageTest, SaysWithoutScriptsWhereTheMemoryIs) {
             "<td>1228</td><td>1376</td>");
 }
 
+// What is no memory has a unit of its own.
+TEST_F(PageTest, SaysWithoutScriptsWhoMayRun) {
+  const std::string page = Output({"page", kExample});
+  ExpectHas(page,
+            "<caption>Groups: the largest of 52</caption><tr><th scope=\"col\">name</th>"
+            "<th scope=\"col\">consumed (MB)</th><th scope=\"col\">throttlePct (%)</th></tr>"
+            "<tr><th scope=\"row\">host</th>");
+  ExpectHas(page, "</td><td>100</td></tr>");
+}
+
 TEST_F(PageTest, MayRunItsOwnScriptsAndNothingElse) {
   const std::string page = Output({"page", kExample});
   ExpectHas(page, "content=\"default-src 'none'; script-src 'sha256-");

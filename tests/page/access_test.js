@@ -4,14 +4,14 @@ import {readFileSync} from 'node:fs';
 import {createRequire} from 'node:module';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, makePage, openPage} from './browser.js';
+import {build, closePage, hostWithHeaps, ksicache, makePage, openPage, scratch} from './browser.js';
 
 const RECORDING = join(build, 'incident.rec');
 const AXE = readFileSync(createRequire(import.meta.url).resolve('axe-core/axe.min.js'), 'utf8');
 
-async function violations(page, rules = {}) {
+async function violations(page) {
   await page.evaluate(AXE);
-  const found = await page.evaluate((options) => axe.run(options), rules);
+  const found = await page.evaluate(() => axe.run());
   return found.violations.map(({id, nodes}) => `${id}: ${nodes[0].html} ${nodes[0].failureSummary}`);
 }
 
@@ -25,17 +25,44 @@ test('axe-core: a recording, as it opens and with all that can be opened', async
   await closePage(page);
 });
 
-test('axe-core: in the dark', async () => {
-  const page = await openPage(makePage(RECORDING), {colorScheme: 'dark'});
-  assert.deepEqual(await violations(page, {runOnly: ['color-contrast']}), []);
-  await closePage(page);
-});
+// Two moments, the first of which has long tables.
+function recordingWithHeaps() {
+  const [after, recording] = ['after.ksi', 'heaps.rec'].map((name) => join(scratch, name));
+  ksicache('extract', '--force', `${RECORDING}@10:05Z`, after);
+  ksicache('join', '--force', recording, hostWithHeaps(100), after);
+  return recording;
+}
 
-test('axe-core: on a narrow screen', async () => {
-  const page = await openPage(makePage(RECORDING), {viewport: {width: 360, height: 780}});
-  assert.deepEqual(await violations(page), []);
-  await closePage(page);
-});
+// By the keyboard alone: looks into a part, opens the columns, sorts a table and shows all of it.
+async function openAll(page) {
+  const enter = async (what) => {
+    await what.focus();
+    await page.keyboard.press('Enter');
+  };
+  await enter(page.locator('button', {hasText: 'First moment'}));
+  await enter(page.locator('.tile', {hasText: 'Machines and processes'}));
+  await page.selectOption('.reports label:has-text("Report") select', {label: 'heap-stats'});
+  await enter(page.locator('summary:has-text("Columns")'));
+  await enter(page.locator('.reports thead button').nth(1));
+  await enter(page.locator('.reports .more'));
+  assert.equal(await page.locator('.reports tbody tr').count(), 114);
+  await enter(page.locator('.changes thead button').nth(3));
+  assert.match(await page.locator('.changes .about').textContent(), /^state: /);
+  assert.equal(await page.locator('.crumbs li').count(), 2);
+  assert.equal(await page.locator('.reports .columns input').first().isVisible(), true);
+}
+
+for (const colorScheme of ['light', 'dark']) {
+  for (const width of [360, 1280]) {
+    test(`axe-core: ${colorScheme}, ${width} pixels wide, with all that the keyboard opens`, async () => {
+      const page = await openPage(makePage(recordingWithHeaps()), {colorScheme, viewport: {width, height: 780}});
+      assert.deepEqual(await violations(page), []);
+      await openAll(page);
+      assert.deepEqual(await violations(page), []);
+      await closePage(page);
+    });
+  }
+}
 
 test('axe-core: a single moment', async () => {
   const page = await openPage(makePage(join(build, 'hypervisor.ksi')));

@@ -2,7 +2,7 @@
 import assert from 'node:assert/strict';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, makePage, openPage} from './browser.js';
+import {build, closePage, hostWithHeaps, makePage, openPage} from './browser.js';
 
 const RECORDING = join(build, 'incident.rec');
 const SIZES = {bytes: 1, KB: 2 ** 10, MB: 2 ** 20, GB: 2 ** 30, TB: 2 ** 40};
@@ -116,6 +116,33 @@ test('a table is sorted, filtered, narrowed and copied', async () => {
   await closePage(page);
 });
 
+test('a long table is shown piece by piece, and filtered, sorted and copied as a whole', async () => {
+  const page = await openPage(makePage(hostWithHeaps(2500)), {permissions: ['clipboard-read', 'clipboard-write']});
+  const reports = page.locator('.reports');
+  const count = () => reports.locator('tbody tr').count();
+  const more = reports.locator('.more');
+  await reports.locator('label:has-text("Report") select').selectOption({label: 'heap-stats'});
+  assert.equal(await count(), 60);
+  await more.click();
+  assert.equal(await count(), 1060);
+  assert.match(await reports.locator('p.note').first().textContent(), /: 2514 rows, the first 1060 shown$/);
+  assert.equal(await more.textContent(), 'Show 1000 more rows');
+  await more.click();
+  assert.equal(await more.textContent(), 'Show all 2514 rows');
+  await more.click();
+  assert.equal(await count(), 2514);
+  assert.equal(await more.isVisible(), false);
+  await reports.locator('input[type=search]').fill('heap249');
+  assert.equal(await count(), 11);
+  await reports.locator('thead button', {hasText: /^name/}).click();
+  assert.deepEqual((await reports.locator('tbody th').allTextContents()).slice(0, 2), ['heap249', 'heap2490']);
+  await reports.locator('input[type=search]').fill('');
+  await reports.locator('button', {hasText: 'Copy as CSV'}).click();
+  await reports.locator('[role=status]', {hasText: '2514 rows copied'}).waitFor();
+  assert.equal((await page.evaluate(() => navigator.clipboard.readText())).trimEnd().split('\n').length, 2515);
+  await closePage(page);
+});
+
 test('lines of what is chosen', async () => {
   const page = await openPage(makePage(RECORDING));
   const lines = page.locator('section', {has: page.locator('#lines-title')});
@@ -126,6 +153,46 @@ test('lines of what is chosen', async () => {
   const before = await lines.locator('path.line').count();
   await lines.locator('.lines input').first().check();
   assert.equal(await lines.locator('path.line').count(), before + 1);
+  await closePage(page);
+});
+
+test('columns by their names, and what they are', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const reports = page.locator('.reports');
+  const heads = () => reports.locator('thead th').allTextContents();
+  await reports.locator('label:has-text("Report") select').selectOption({label: 'vm-stats'});
+  const all = await heads();
+  await reports.locator('summary').click();
+  const names = reports.locator('.names input');
+  await names.fill('NAME:consumed');
+  await names.press('Enter');
+  assert.deepEqual(await heads(), ['name', 'consumed']);
+  assert.equal(await reports.locator('.columns input:checked').count(), 2);
+  await reports.locator('.columns label:has-text("ballooned") input').check();
+  assert.equal(await names.inputValue(), 'name:consumed:ballooned');
+  await names.fill('name:nothing');
+  await names.press('Enter');
+  assert.equal(await reports.locator('.tools .note', {hasText: 'no column'}).textContent(), 'vm-stats has no column nothing');
+  assert.deepEqual(await heads(), ['name', 'consumed', 'ballooned']);
+  await names.fill('');
+  await names.press('Enter');
+  assert.deepEqual(await heads(), all);
+  await reports.locator('thead button', {hasText: /^consumed/}).hover();
+  assert.match(await reports.locator('.about').textContent(), /^consumed: .* \(KB\)$/);
+  await closePage(page);
+});
+
+test('lines of pressure', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const lines = page.locator('section', {has: page.locator('#lines-title')});
+  const choices = (await lines.locator('option').allTextContents()).filter((text) => /^Pressure/.test(text));
+  assert.equal(choices.length, 2);
+  await page.click('text=Least free memory');
+  await lines.locator('select').selectOption({label: choices.find((text) => /state/.test(text))});
+  assert.match(await lines.locator('.detail').textContent(), /hypervisor\.example\.org Hard$/);
+  assert.equal(await lines.locator('path.line').count(), 1);
+  await lines.locator('select').selectOption({label: choices.find((text) => /groups/.test(text))});
+  assert.match(await lines.locator('.detail').textContent(), / 100 %$/);
   await closePage(page);
 });
 

@@ -1,7 +1,7 @@
 // Pages of what stands in the build tree, in a browser.
 import assert from 'node:assert/strict';
 import {spawnSync} from 'node:child_process';
-import {mkdtempSync, rmSync} from 'node:fs';
+import {mkdtempSync, readFileSync, rmSync, writeFileSync} from 'node:fs';
 import {tmpdir} from 'node:os';
 import {join} from 'node:path';
 import {after} from 'node:test';
@@ -30,6 +30,28 @@ export function ksicache(...words) {
 // The same where something is left out, which is told.
 export function ksicachePartly(...words) {
   return run(words, 1);
+}
+
+// A recording as if something else had happened: see reshape.cc.
+export function reshaped(recording, ...changes) {
+  const name = join(scratch, `${Math.random().toString(36).slice(2)}.rec`);
+  const {status, stderr} = spawnSync(join(build, 'tests/page/reshape'), [recording, name, ...changes], {encoding: 'utf8'});
+  assert.equal(status, 0, stderr);
+  return name;
+}
+
+// The example host with so many heaps more.
+export function hostWithHeaps(count) {
+  const lines = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8').split('\n');
+  const heap = lines.findIndex((line) => line.includes('"node":"system/heaps/stats","keys":["acpi"]'));
+  const names = Array.from({length: count}, (_, i) => `heap${i}`);
+  const list = lines.findIndex((line) => line.includes('"node":"system/heaps","keys":[]'));
+  lines[list] = lines[list].replace(']},', `,${names.map((name) => `"${name}"`).join(',')}]},`);
+  lines.splice(heap, 0, ...names.map((name) => lines[heap].replaceAll('"acpi"', `"${name}"`).replace(/,?$/, ',')));
+  const [json, capture] = ['heaps.json', 'heaps.ksi'].map((name) => join(scratch, name));
+  writeFileSync(json, lines.join('\n'));
+  ksicache('load', json, capture, '--force');
+  return capture;
 }
 
 // Makes a page of what stands in the build tree, or elsewhere; gives its name.

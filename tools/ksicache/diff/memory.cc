@@ -80,11 +80,7 @@ class Reader {
   bool ForEachRow(const tally::Report& report, Rows::Names names, Visit&& visit) {
     const Rows rows(report, origin_, tally::DisplayUnit::b, names);
     std::vector<size_t> places;
-    for (const std::string_view name : names) {
-      size_t place = 0;
-      while (rows.Columns()[place].name != name) ++place;
-      places.push_back(place);
-    }
+    for (const std::string_view name : names) places.push_back(PlaceOf(rows.Columns(), name));
     for (size_t i = 0; i < rows.Count(); ++i) visit(Row(places, rows.At(i)));
     if (!rows.IsWhole()) memory_.complaints.push_back(rows.Complaint());
     return rows.IsWhole();

@@ -2,6 +2,7 @@
 #ifndef TOOLS_KSICACHE_EXPORT_ROW_FORMAT_H_
 #define TOOLS_KSICACHE_EXPORT_ROW_FORMAT_H_
 
+#include <cstddef>
 #include <cstdint>
 #include <span>
 #include <string>
@@ -23,6 +24,13 @@ struct RowColumn {
   const char* unit;                     // that its numbers are in; empty: they have none
   std::span<const char* const> states;  // all that its texts may be; none: anything
 };
+
+// The place of the column of a name; behind all of them if there is none.
+inline size_t PlaceOf(std::span<const RowColumn> columns, std::string_view name) {
+  size_t place = 0;
+  while (place < columns.size() && columns[place].name != name) ++place;
+  return place;
+}
 
 enum class ValueType : uint8_t { none, text, flag, signedNumber, unsignedNumber };
 

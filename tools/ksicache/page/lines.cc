@@ -6,6 +6,7 @@
 
 #include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/page/packing.h"
+#include "tools/ksicache/page/roles.h"
 
 namespace ksicache {
 namespace {
@@ -19,8 +20,13 @@ std::optional<int64_t> Drawable(int64_t figure) {
   return figure < -kMost || figure > kMost ? std::nullopt : std::make_optional(figure);
 }
 
-// None if the figure is not known or cannot be drawn.
+// None if the figure is not known or cannot be drawn. A state of the memory is drawn as its place
+// among them.
 std::optional<int64_t> FigureOf(const Value& value) {
+  if (value.type == ValueType::text) {
+    const size_t state = roles::StateOf(value.text);
+    return state < roles::States().size() ? std::make_optional<int64_t>(state) : std::nullopt;
+  }
   const auto number = static_cast<int64_t>(value.number);
   const bool isNumber = value.type == ValueType::signedNumber ||
                         (value.type == ValueType::unsignedNumber && number >= 0);
@@ -99,17 +105,16 @@ void PutLine(const Line& line, size_t stretches, int bits, std::string& bytes) {
 ReportLines::ReportLines(PageTexts& texts, std::vector<const char*> columns)
     : texts_(texts), names_(std::move(columns)), sums_(names_.size()) {}
 
-void ReportLines::Begin(std::span<const RowColumn> columns, size_t stretch) {
+void ReportLines::BeginMoment(size_t stretch) {
   stretch_ = stretch;
   sum_.assign(names_.size(), 0);
   identities_.Restart();
+}
+
+void ReportLines::Begin(std::span<const RowColumn> columns) {
   if (!columns_.empty()) return;
   columns_.assign(columns.begin(), columns.end());
-  for (const std::string_view name : names_) {
-    const auto place = std::ranges::find(
-        columns_, name, [](const RowColumn& column) { return std::string_view(column.name); });
-    places_.push_back(static_cast<size_t>(place - columns_.begin()));
-  }
+  for (const std::string_view name : names_) places_.push_back(PlaceOf(columns_, name));
 }
 
 void ReportLines::Row(std::span<const Value> values) {
@@ -129,26 +134,31 @@ void ReportLines::AddTo(Line& line, int64_t figure) const {
 // None for one that has no lines.
 std::optional<size_t> ReportLines::ThingOf(std::span<const Value> values) {
   row_.assign(columns_.size(), {});
-  std::vector<PageValue> keys;
   for (size_t i = 0; i < columns_.size(); ++i) {
     if (!columns_[i].isKey) continue;
     const bool isText = values[i].type == ValueType::text;
     row_[i] = {values[i].type, isText ? texts_.NumberOf(values[i].text) : values[i].number};
-    keys.push_back(row_[i]);
   }
   const uint32_t thing = identities_.NumberOf(columns_, row_, kMostThings);
   if (thing == kMostThings) {
     leavesOut_ = true;
     return std::nullopt;
   }
-  if (thing == keys_.size()) {
-    keys_.push_back(std::move(keys));
-    lines_.resize(lines_.size() + names_.size());
-  }
+  if (thing == keys_.size()) AddThing();
   return thing;
 }
 
-void ReportLines::End() {
+// That of the row at hand.
+void ReportLines::AddThing() {
+  std::vector<PageValue>& keys = keys_.emplace_back();
+  for (size_t i = 0; i < columns_.size(); ++i) {
+    if (columns_[i].isKey) keys.push_back(row_[i]);
+  }
+  lines_.resize(lines_.size() + names_.size());
+}
+
+void ReportLines::End(bool isWhole) {
+  if (!isWhole) return;
   for (size_t i = 0; i < sum_.size(); ++i) {
     if (sum_[i]) AddTo(sums_[i], *sum_[i]);
   }

@@ -50,12 +50,13 @@ class ReportLines {
   // `columns`: names of figures.
   ReportLines(PageTexts& texts, std::vector<const char*> columns);
 
-  // The rows of one moment, of this stretch, which is none before that of the last one; the same as
-  // of TableStream.
-  void Begin(std::span<const RowColumn> columns, size_t stretch);
+  // The rows of one moment, of this stretch, which is none before that of the last one: End behind
+  // them, the rest as of TableStream.
+  void BeginMoment(size_t stretch);
+  void Begin(std::span<const RowColumn> columns);
   void Row(std::span<const Value> values);
-  // The sums of the moment's rows are known now.
-  void End();
+  // `isWhole`: no row is missing from the sums.
+  void End(bool isWhole);
 
   void Thin();
 
@@ -73,6 +74,7 @@ class ReportLines {
  private:
   void AddTo(Line& line, int64_t figure) const;
   std::optional<size_t> ThingOf(std::span<const Value> values);
+  void AddThing();
 
   PageTexts& texts_;
   std::vector<const char*> names_;
@@ -80,7 +82,7 @@ class ReportLines {
 
   std::vector<RowColumn> columns_;
   std::vector<size_t> places_;  // of the names among the columns
-  std::vector<PageValue> row_;
+  std::vector<PageValue> row_;  // at hand: its keys
   RowIdentities identities_;
   std::vector<Line> lines_;  // of the first thing, of the second, ...; a line a column
   std::vector<Line> sums_;   // a line a column

@@ -1,11 +1,8 @@
 #include "tools/ksicache/page/lines_reader.h"
 
-#include <optional>
-#include <span>
 #include <utility>
 
 #include "reports/reports.h"
-#include "tools/ksicache/export/row_sink.h"
 #include "tools/ksicache/page/packing.h"
 #include "tools/ksicache/page/report_rows.h"
 #include "tools/ksicache/page/roles.h"
@@ -15,20 +12,6 @@ namespace {
 
 constexpr size_t kMostStretches = 720;
 constexpr size_t kFewestStretches = 64;
-
-// Hands rows on to the lines of the report at hand.
-class Rows : public RowFormat {
- public:
-  Rows(ReportLines& lines, size_t stretch) : lines_(lines), stretch_(stretch) {}
-
-  void Begin(const RowTable& table) override { lines_.Begin(table.columns, stretch_); }
-  void Row(std::span<const Value> values) override { lines_.Row(values); }
-  void Finish() override {}
-
- private:
-  ReportLines& lines_;
-  size_t stretch_;
-};
 
 // The reports that have lines, with the columns of these.
 std::vector<PageLines::OfReport> EmptyLines(PageTexts& texts) {
@@ -47,6 +30,16 @@ std::vector<PageLines::OfReport> EmptyLines(PageTexts& texts) {
   return lines;
 }
 
+Line TimesOf(const Line& moments, const Survey& survey) {
+  Line times;
+  times.reserve(moments.size());
+  for (const Extent& places : moments) {
+    times.push_back({survey.moments[static_cast<size_t>(places.least)].steady,
+                     survey.moments[static_cast<size_t>(places.greatest)].steady});
+  }
+  return times;
+}
+
 }  // namespace
 
 LinesReader::LinesReader(PageTexts& texts, Problems& problems) : problems_(problems) {
@@ -54,45 +47,52 @@ LinesReader::LinesReader(PageTexts& texts, Problems& problems) : problems_(probl
 }
 
 void LinesReader::Read(const Origin& origin) {
-  if (lines_.times.empty() || moments_ == capacity_) {
-    if (lines_.times.size() == kMostStretches) {
-      Thin();
-      capacity_ *= 2;
-    }
-    lines_.times.emplace_back();
-    moments_ = 0;
-  }
-  ++moments_;
-  const size_t stretch = lines_.times.size() - 1;
-  lines_.times[stretch].Add(origin.taken);
+  const size_t stretch = NextStretch();
+  lines_.moments[stretch].Add(count_++);
   for (PageLines::OfReport& each : lines_.reports) {
-    Rows rows(each.lines, stretch);
-    RowSink sink(rows, std::nullopt, {each.columns.begin(), each.columns.end()});
-    RunForPage(*tally::FindReport(each.report.c_str()), origin, sink, problems_);
-    each.lines.End();
+    each.lines.BeginMoment(stretch);
+    const bool isWhole =
+        GiveRows(*tally::FindReport(each.report.c_str()), origin,
+                 {each.columns.begin(), each.columns.end()}, each.lines, problems_);
+    each.lines.End(isWhole);
   }
 }
 
-PageLines LinesReader::Finish(size_t room) {
-  Pack(room);
+// That of the moment at hand.
+size_t LinesReader::NextStretch() {
+  if (lines_.moments.empty() || inStretch_ == capacity_) {
+    if (lines_.moments.size() == kMostStretches) {
+      Thin();
+      capacity_ *= 2;
+    }
+    lines_.moments.emplace_back();
+    inStretch_ = 0;
+  }
+  ++inStretch_;
+  return lines_.moments.size() - 1;
+}
+
+PageLines LinesReader::Finish(const Survey& survey, size_t room) {
+  Pack(survey, room);
   return std::move(lines_);
 }
 
 void LinesReader::Thin() {
-  Halve(lines_.times);
+  Halve(lines_.moments);
   for (PageLines::OfReport& each : lines_.reports) each.lines.Thin();
 }
 
 // Cuts off what does not fit: first of the figures, then of the stretches.
-void LinesReader::Pack(size_t room) {
+void LinesReader::Pack(const Survey& survey, size_t room) {
   for (;;) {
     std::string bytes;
-    PutLine(lines_.times, lines_.times.size(), 0, bytes);
+    const size_t stretches = lines_.moments.size();
+    PutLine(TimesOf(lines_.moments, survey), stretches, 0, bytes);
     for (const PageLines::OfReport& each : lines_.reports) {
-      each.lines.Put(lines_.times.size(), lines_.isCut, bytes);
+      each.lines.Put(stretches, lines_.isCut, bytes);
     }
     lines_.bytes = Packed(bytes);
-    const bool isThin = lines_.isCut && lines_.times.size() <= kFewestStretches;
+    const bool isThin = lines_.isCut && stretches <= kFewestStretches;
     if (lines_.bytes.size() <= room || isThin) return;
     if (std::exchange(lines_.isCut, true)) Thin();
   }

@@ -3,11 +3,13 @@
 #define TOOLS_KSICACHE_PAGE_LINES_READER_H_
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <vector>
 
 #include "tools/ksicache/page/lines.h"
 #include "tools/ksicache/page/problems.h"
+#include "tools/ksicache/page/survey.h"
 #include "tools/ksicache/page/table_stream.h"
 #include "tools/ksicache/report_run.h"
 
@@ -20,10 +22,10 @@ struct PageLines {
     std::vector<const char*> columns;
     ReportLines lines;
   };
-  Line times;  // when the moments of each stretch were taken
+  Line moments;  // of each stretch: their places in the survey
   bool isCut = false;
   std::vector<OfReport> reports;
-  std::string bytes;  // deflated: the times and the lines of each report
+  std::string bytes;  // deflated: the steady times of the stretches and the lines of each report
 };
 
 // However many moments there are, the lines have up to so many stretches as a screen has points.
@@ -35,16 +37,18 @@ class LinesReader {
   void Read(const Origin& origin);
 
   // All of them, as exact as `room` bytes allow.
-  PageLines Finish(size_t room);
+  PageLines Finish(const Survey& survey, size_t room);
 
  private:
+  size_t NextStretch();
   void Thin();
-  void Pack(size_t room);
+  void Pack(const Survey& survey, size_t room);
 
   Problems& problems_;
   PageLines lines_;
-  size_t moments_ = 0;   // of the stretch at hand
-  size_t capacity_ = 1;  // of each stretch
+  int64_t count_ = 0;     // of moments
+  size_t inStretch_ = 0;  // of these
+  size_t capacity_ = 1;   // of each stretch
 };
 
 }  // namespace ksicache

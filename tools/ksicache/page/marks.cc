@@ -4,11 +4,14 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <utility>
 
 #include "knvlibs/recording/recording_file.h"
-#include "tools/ksicache/error.h"
+#include "knvlibs/times.h"
+#include "tools/ksicache/failures.h"
 #include "tools/ksicache/moment_walk.h"
 #include "tools/ksicache/opened_file.h"
+#include "tools/ksicache/reading_walk.h"
 
 namespace ksicache {
 namespace {
@@ -21,18 +24,21 @@ class Marker {
     last_ = last.taken;
   }
 
-  bool MayHave(int64_t first, int64_t last) const { return first <= last_ && last >= first_; }
+  // Whether moments of a part may be the page's. Parts are asked about in their order, before any
+  // moment behind them.
+  bool Wants(const ksi::RecordingFile::Part& part) {
+    if (part.first <= last_ && part.last >= first_) return true;
+    unwanted_.emplace_back(part.number, part.moments);
+    return false;
+  }
 
   // The next moment of the recording.
   void Add(const WalkedMoment& moment) {
-    const std::optional<size_t> place = survey_.Find(moment.facts.taken, next_);
-    if (!MayHave(moment.facts.taken, moment.facts.taken) || !place) return;
-    next_ = *place + 1;
-    survey_.moments[*place].boot = NumberOf(moment.boot);
-    if (*place > 0) AddMarks(*place, moment);
-    marks_.refused = std::max(marks_.refused, moment.facts.refused);
-    marks_.failed = std::max(marks_.failed, moment.facts.failed);
-    marks_.lossy += moment.facts.loss == ksi::kOk ? 0 : 1;
+    const int64_t taken = moment.facts.taken;
+    const std::optional<size_t> place = survey_.Find(taken, next_);
+    if (place) AddAt(*place, moment);
+    // What is of another time than the page is not missing from it.
+    if (place || taken < first_ || taken > last_) number_ = moment.number;
   }
 
   Marks Take() {
@@ -46,11 +52,36 @@ class Marker {
     return boots_.try_emplace(boot, static_cast<uint32_t>(boots_.size() + 1)).first->second;
   }
 
+  void AddAt(size_t place, const WalkedMoment& moment) {
+    next_ = place + 1;
+    survey_.moments[place].boot = NumberOf(moment.boot);
+    if (place > 0) AddMarks(place, moment);
+    marks_.refused = std::max(marks_.refused, moment.facts.refused);
+    marks_.failed = std::max(marks_.failed, moment.facts.failed);
+    marks_.lossy += moment.facts.loss == ksi::kOk ? 0 : 1;
+  }
+
   void AddMarks(size_t place, const WalkedMoment& moment) {
+    if (HasLost(moment.number)) {
+      Put({"lost", place, ksi::TimeBetween(survey_.moments[place - 1].taken, moment.facts.taken)});
+    }
     if (moment.isRebooted) Put({"reboot", place, moment.passed});
-    if (moment.step != 0) Put({"clock", place, moment.step});
+    if (moment.step != 0) {
+      Put({"clock", place, moment.step});
+      marks_.steps[place] = moment.step;
+    }
     if (moment.isAfterGap) Put({"gap", place, moment.passed});
     if (moment.facts.skipped != 0) Put({"skipped", place, moment.passed});
+  }
+
+  // Whether moments that the page would have are missing before this one.
+  bool HasLost(int64_t number) const {
+    if (!number_) return false;
+    int64_t missing = number - *number_ - 1;
+    for (const auto& [first, count] : unwanted_) {
+      if (first > *number_ && first < number) missing -= count;
+    }
+    return missing > 0;
   }
 
   void Put(const Mark& mark) {
@@ -65,23 +96,40 @@ class Marker {
   int64_t first_;
   int64_t last_;
   size_t next_ = 0;
+  std::optional<int64_t> number_;                      // of the moment before
+  std::vector<std::pair<int64_t, int64_t>> unwanted_;  // first moments of parts, and how many
   std::map<std::string, uint32_t> boots_;
   Marks marks_;
 };
 
-}  // namespace
-
-Marks MarksOf(const std::string& name, Survey& survey, Problems& problems) {
+Marks MarksOfRecording(const std::string& fileName, Survey& survey, Problems& problems) {
   Marker marker(survey);
-  const std::string fileName = FileNameOf(name);
-  if (!IsRecording(fileName)) return marker.Take();
   const std::unique_ptr<ksi::RecordingFile> file = OpenRecording(fileName);
   MomentWalk walk(
       *file, [&](const WalkedMoment& moment) { marker.Add(moment); },
       [&](const std::string& what) { problems.Add("damaged: " + what); });
-  walk.Run(
-      [&](const ksi::RecordingFile::Part& part) { return marker.MayHave(part.first, part.last); });
+  walk.Run([&](const ksi::RecordingFile::Part& part) { return marker.Wants(part); });
   return marker.Take();
+}
+
+Marks MarksOfCapture(const std::string& fileName) {
+  Failures failures;
+  const OpenedFile opened(fileName);
+  ForEachReading(opened.File(), [&](const Reading& reading) {
+    if (reading.status != ksi::kOk) failures.Add(reading.status, [&] { return reading.Name(); });
+  });
+  Marks marks;
+  marks.refused = failures.refused.Count();
+  marks.failed = failures.failed.Count();
+  return marks;
+}
+
+}  // namespace
+
+Marks MarksOf(const std::string& name, Survey& survey, Problems& problems) {
+  const std::string fileName = FileNameOf(name);
+  return IsRecording(fileName) ? MarksOfRecording(fileName, survey, problems)
+                               : MarksOfCapture(fileName);
 }
 
 }  // namespace ksicache

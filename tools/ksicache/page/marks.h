@@ -1,9 +1,10 @@
-// What there is to say of a recording's moments beside their figures.
+// What there is to say of a page's moments beside their figures.
 #ifndef TOOLS_KSICACHE_PAGE_MARKS_H_
 #define TOOLS_KSICACHE_PAGE_MARKS_H_
 
 #include <cstddef>
 #include <cstdint>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -14,7 +15,7 @@ namespace ksicache {
 
 // Something that happened between two moments.
 struct Mark {
-  const char* kind;  // "reboot", "clock", "gap" or "skipped"
+  const char* kind;  // "reboot", "clock", "gap", "skipped" or "lost"
   size_t moment;     // the place of the moment after it
   int64_t time;      // how much later that is, how far the clock was set; us
 };
@@ -25,12 +26,13 @@ struct Marks {
 
   std::vector<Mark> all;
   size_t leftOut = 0;
-  uint64_t refused = 0;  // reads of one moment for want of rights, at most
-  uint64_t failed = 0;   // reads of one moment for other reasons, at most
-  size_t lossy = 0;      // moments of which something was left out
+  uint64_t refused = 0;             // reads of one moment for want of rights, at most
+  uint64_t failed = 0;              // reads of one moment for other reasons, at most
+  size_t lossy = 0;                 // moments of which something was left out
+  std::map<size_t, int64_t> steps;  // of the clock, before these moments: Survey::Steady
 };
 
-// Of a capture there are none. Tells the survey which of its moments are of one boot.
+// Tells the survey which of its moments are of one boot.
 Marks MarksOf(const std::string& name, Survey& survey, Problems& problems);
 
 }  // namespace ksicache

@@ -82,10 +82,19 @@ std::string BootsToJson(const Survey& survey, const std::vector<size_t>& moments
   return boots.Array();
 }
 
-std::string TimesToJson(const Survey& survey, const std::vector<size_t>& moments) {
+std::string TimesToJson(const Survey& survey, const std::vector<size_t>& moments,
+                        int64_t SurveyedMoment::*time) {
   JsonWriter times;
-  for (const size_t moment : moments) times.Number("", survey.moments[moment].taken);
+  for (const size_t moment : moments) times.Number("", survey.moments[moment].*time);
   return times.Array();
+}
+
+// When moments were taken, by the clock on the wall and by one that is never set.
+std::string ToJson(const Survey& survey, const std::vector<size_t>& moments) {
+  return JsonWriter()
+      .Json("taken", TimesToJson(survey, moments, &SurveyedMoment::taken))
+      .Json("steady", TimesToJson(survey, moments, &SurveyedMoment::steady))
+      .Object();
 }
 
 std::string ToJson(const Marks& marks, const Survey& survey) {
@@ -94,6 +103,7 @@ std::string ToJson(const Marks& marks, const Survey& survey) {
     all.Json("", JsonWriter()
                      .Text("kind", mark.kind)
                      .Number("at", survey.moments[mark.moment].taken)
+                     .Number("steady", survey.moments[mark.moment].steady)
                      .Number("time", mark.time)
                      .Object());
   }
@@ -119,13 +129,14 @@ std::string ToJson(const PageLines& lines) {
                          .Object());
   }
   return JsonWriter()
-      .Number("stretches", lines.times.size())
+      .Number("stretches", lines.moments.size())
       .Flag("isCut", lines.isCut)
       .Json("reports", reports.Array())
       .Object();
 }
 
-std::string TextsToJson(const std::vector<std::string>& texts) {
+template <class Texts>
+std::string TextsToJson(const Texts& texts) {
   JsonWriter all;
   for (const std::string& text : texts) all.Text("", text);
   return all.Array();
@@ -140,12 +151,13 @@ void ReadPage(const std::string& name, PageData& data) {
       name, [&](const Origin& origin) { lines.Read(origin); }, problem);
   data.problems.AddDiagnostics();
   if (!problem.empty()) data.problems.Add(problem);
-  data.lines = lines.Finish(kRoomOfLines);
   try {
     data.marks = MarksOf(name, data.survey, data.problems);
   } catch (const DataError& error) {
     data.problems.Add(error.what());
   }
+  data.survey.Steady(data.marks.steps);
+  data.lines = lines.Finish(data.survey, kRoomOfLines);
   ReadTablesOf(name, data);
   if (data.tables.full.moments.empty()) throw DataError("nothing of it could be read");
 }
@@ -159,8 +171,8 @@ std::string HeadToJson(const PageData& data) {
       .Number("moments", survey.moments.size())
       .Text("kernel", survey.kernel)
       .Json("states", StatesToJson(survey))
-      .Json("points", TimesToJson(survey, data.tables.points.moments))
-      .Json("full", TimesToJson(survey, full))
+      .Json("points", ToJson(survey, data.tables.points.moments))
+      .Json("full", ToJson(survey, full))
       .Json("boots", BootsToJson(survey, full))
       .Json("reports", ReportsToJson(data.tables.full))
       .Json("memory", ToJson("memory", data.tables.full.streams.back()))

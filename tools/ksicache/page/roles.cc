@@ -1,5 +1,8 @@
 #include "tools/ksicache/page/roles.h"
 
+#include <algorithm>
+#include <iterator>
+
 #include <knvlibs/ksi_records.h>
 #include "tools/ksicache/json_writer.h"
 
@@ -46,6 +49,7 @@ std::string ToJson(const Line& line) {
       .Text("title", line.title)
       .Text("report", line.report)
       .Text("column", line.column)
+      .Flag("isLessWorse", line.isLessWorse)
       .Object();
 }
 
@@ -59,6 +63,10 @@ std::string AllToJson(const Role (&roles)[kCount]) {
 }  // namespace
 
 std::span<const char* const> States() { return kStates; }
+
+size_t StateOf(std::string_view state) {
+  return static_cast<size_t>(std::ranges::find(kStates, state) - std::begin(kStates));
+}
 
 std::string ToJson() {
   return JsonWriter()

@@ -6,8 +6,10 @@
 #ifndef TOOLS_KSICACHE_PAGE_ROLES_H_
 #define TOOLS_KSICACHE_PAGE_ROLES_H_
 
+#include <cstddef>
 #include <span>
 #include <string>
+#include <string_view>
 
 namespace ksicache::roles {
 
@@ -64,11 +66,12 @@ struct Groups {
 
 inline constexpr Groups kGroups = {"group-stats", "name", "gid", "parGid"};
 
-// A figure of each row of a report over time.
+// A figure of each row of a report over time: a number, or a state of the memory.
 struct Line {
   const char* title;
   const char* report;
   const char* column;
+  bool isLessWorse = false;  // the less, the worse
 };
 
 // Those of one report stand together.
@@ -79,14 +82,18 @@ inline constexpr Line kLines[] = {
     {"Machines: compressed", "vm-stats", "zipped"},
     {"Machines: saved by sharing", "vm-stats", "sharedSaved"},
     {"Groups: consumed", "group-stats", "consumed"},
-    {"Groups: kept from running", "group-stats", "throttlePct"},
+    {"Pressure: how much of the time groups may run", "group-stats", "throttlePct", true},
     {"Processes: consumed", "uw-stats", "consumed"},
     {"Heaps: size", "heap-stats", "size"},
     {"The host: free", kHostReport, kFree},
+    {"Pressure: the state of the host's memory", kHostReport, kState},
 };
 
 // As reports show the memory states, from best to worst.
 std::span<const char* const> States();
+
+// The place of a state among them; as many as there are if it is none.
+size_t StateOf(std::string_view state);
 
 // All of it for the page's scripts.
 std::string ToJson();

@@ -6,8 +6,10 @@
 #include <optional>
 #include <vector>
 
+#include "framework/display_unit.h"
 #include "knvlibs/times.h"
 #include "reports/reports.h"
+#include "tools/ksicache/diff/unit.h"
 #include "tools/ksicache/page/roles.h"
 #include "tools/ksicache/printable.h"
 
@@ -16,6 +18,18 @@ namespace {
 
 constexpr size_t kLargest = 10;
 constexpr const char* kNoValue = "–";
+
+// "1234", of MB
+std::string MemoryText(std::optional<uint64_t> bytes) {
+  return bytes ? std::to_string(*bytes >> 20) : kNoValue;
+}
+
+// That of a column of memory.
+tally::DisplayUnit UnitOf(const RowColumn& column) {
+  return std::ranges::find(tally::kUnitNames, std::string_view(column.unit),
+                           &tally::UnitName::title)
+      ->unit;
+}
 
 // The rows of a report at the last moment, by the names of the columns.
 class LastRows {
@@ -30,30 +44,40 @@ class LastRows {
 
   std::string TextAt(size_t row, std::string_view name) const {
     const PageValue* value = Find(row, name);
-    return value == nullptr ? "" : data_.texts.All()[value->number];
+    const bool isText = value != nullptr && value->type == ValueType::text;
+    return isText ? data_.texts.All()[value->number] : kNoValue;
   }
 
   // Memory, in bytes; none if it has no value.
   std::optional<uint64_t> BytesAt(size_t row, std::string_view name) const {
     const PageValue* value = Find(row, name);
     if (value == nullptr || value->type != ValueType::unsignedNumber) return std::nullopt;
-    const bool isBytes = UnitOf(name) == tally::UnitTitle(tally::DisplayUnit::b);
-    return isBytes ? value->number : value->number << 10;
+    uint64_t bytes = 0;
+    const auto size = static_cast<uint64_t>(BytesIn(UnitOf(ColumnOf(name))));
+    if (__builtin_mul_overflow(value->number, size, &bytes)) return std::nullopt;
+    return bytes;
+  }
+
+  // A figure as a cell: memory in MB.
+  std::string FigureAt(size_t row, std::string_view name) const {
+    if (tally::IsMemory(ColumnOf(name).kind)) return MemoryText(BytesAt(row, name));
+    const PageValue* value = Find(row, name);
+    return value->type == ValueType::none ? kNoValue : std::to_string(value->number);
+  }
+
+  // "consumed (MB)"
+  std::string HeadOf(std::string_view name) const {
+    const RowColumn& column = ColumnOf(name);
+    return std::string(name) + " (" + (tally::IsMemory(column.kind) ? "MB" : column.unit) + ")";
   }
 
  private:
-  size_t PlaceOf(std::string_view name) const {
-    const auto& columns = stream_->Columns();
-    return static_cast<size_t>(
-        std::ranges::find(columns, name,
-                          [](const RowColumn& each) { return std::string_view(each.name); }) -
-        columns.begin());
-  }
-  std::string_view UnitOf(std::string_view name) const {
-    return stream_->Columns()[PlaceOf(name)].unit;
+  // REQUIRES: there is one of that name.
+  const RowColumn& ColumnOf(std::string_view name) const {
+    return stream_->Columns()[PlaceOf(stream_->Columns(), name)];
   }
   const PageValue* Find(size_t row, std::string_view name) const {
-    const size_t place = PlaceOf(name);
+    const size_t place = PlaceOf(stream_->Columns(), name);
     return place == stream_->Columns().size() ? nullptr : &stream_->RowAt(row)[place];
   }
 
@@ -63,11 +87,6 @@ class LastRows {
 
 std::string Tagged(const char* tag, const std::string& html) {
   return std::string("<") + tag + ">" + html + "</" + tag + ">";
-}
-
-// "1234 MB"
-std::string MemoryText(std::optional<uint64_t> bytes) {
-  return bytes ? std::to_string(*bytes >> 20) : kNoValue;
 }
 
 std::string ShareText(std::optional<uint64_t> part, std::optional<uint64_t> whole) {
@@ -133,22 +152,28 @@ std::string LargestToHtml(const PageData& data, const roles::Things& things) {
   const std::vector<const char*> columns = ColumnsOf(things.report);
   std::vector<std::string> names = {things.name};
   names.reserve(1 + columns.size());
-  for (const char* column : columns) names.push_back(column + std::string(" (MB)"));
+  for (const char* column : columns) names.push_back(rows.HeadOf(column));
   std::string body = HeadRow(names);
   for (const size_t row : order) {
     std::vector<std::string> numbers;
     numbers.reserve(columns.size());
-    for (const char* column : columns) numbers.push_back(MemoryText(rows.BytesAt(row, column)));
+    for (const char* column : columns) numbers.push_back(rows.FigureAt(row, column));
     body += RowOf(rows.TextAt(row, things.name), numbers);
   }
   return Table(things.title + std::string(": the largest of ") + std::to_string(rows.Count()),
                body);
 }
 
-std::string ProblemsToHtml(const std::vector<std::string>& problems) {
-  if (problems.empty()) return {};
-  std::string items;
-  for (const std::string& problem : problems) items += Tagged("li", HtmlText(problem));
+std::string FailuresToHtml(uint64_t count, const std::string& what) {
+  return count == 0 ? ""
+                    : Tagged("li", "reads of a moment that " + what + ": " + std::to_string(count));
+}
+
+std::string ProblemsToHtml(const PageData& data) {
+  std::string items = FailuresToHtml(data.marks.refused, "were refused for want of rights") +
+                      FailuresToHtml(data.marks.failed, "failed");
+  for (const std::string& problem : data.problems.All()) items += Tagged("li", HtmlText(problem));
+  if (items.empty()) return {};
   return Tagged("h3", "What could not be read") + Tagged("ul", items) + "\n";
 }
 
@@ -192,7 +217,7 @@ std::string SummaryToHtml(const PageData& data) {
                                             " moments; scripts show all of them"));
   html += Tagged("h2", "At " + last) + "\n" + BalanceToHtml(data);
   for (const roles::Things& things : roles::kThings) html += LargestToHtml(data, things);
-  return html + ProblemsToHtml(data.problems.All());
+  return html + ProblemsToHtml(data);
 }
 
 }  // namespace ksicache

@@ -5,6 +5,7 @@
 #include <string_view>
 #include <utility>
 
+#include "knvlibs/times.h"
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/row_sink.h"
@@ -16,18 +17,6 @@ namespace ksicache {
 namespace {
 
 constexpr uint64_t kUnknown = UINT64_MAX;
-
-size_t PlaceOf(std::span<const RowColumn> columns, std::string_view name) {
-  size_t place = 0;
-  while (columns[place].name != name) ++place;
-  return place;
-}
-
-size_t StateOf(const Value& value) {
-  const auto states = roles::States();
-  const auto found = std::ranges::find(states, value.text);
-  return static_cast<size_t>(found - states.begin());
-}
 
 // Takes what a survey has of a moment from the host's row.
 class HostFigures : public RowFormat {
@@ -44,12 +33,12 @@ class HostFigures : public RowFormat {
   }
   void Row(std::span<const Value> values) override {
     if (values[free_].type == ValueType::unsignedNumber) moment_.free = values[free_].number;
-    moment_.state = StateOf(values[state_]);
+    moment_.state = roles::StateOf(values[state_].text);
   }
   void Finish() override {}
 
  private:
-  static inline const SurveyedMoment kNothing = {0, kUnknown, roles::States().size()};
+  static inline const SurveyedMoment kNothing = {0, 0, kUnknown, roles::States().size()};
 
   size_t free_ = 0;
   size_t state_ = 0;
@@ -102,6 +91,19 @@ std::optional<size_t> Survey::Find(int64_t taken, size_t from) const {
     if (moments[i].taken == taken) return i;
   }
   return std::nullopt;
+}
+
+void Survey::Steady(const std::map<size_t, int64_t>& steps) {
+  int64_t ahead = 0;
+  for (size_t i = 0; i < moments.size(); ++i) {
+    SurveyedMoment& moment = moments[i];
+    const auto step = steps.find(i);
+    if (step != steps.end()) ahead = ksi::TimeBetween(-step->second, ahead);
+    moment.steady = ksi::TimeBetween(ahead, moment.taken);
+    if (i == 0 || moment.steady > moments[i - 1].steady) continue;
+    moment.steady = moments[i - 1].steady + 1;
+    ahead = ksi::TimeBetween(moment.steady, moment.taken);
+  }
 }
 
 Survey MakeSurvey(const std::string& name, const std::function<void(const Origin&)>& also,

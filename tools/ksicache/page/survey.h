@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <functional>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -15,6 +16,7 @@ namespace ksicache {
 
 struct SurveyedMoment {
   int64_t taken;      // us since 1970
+  int64_t steady;     // the same, had nobody set the clock since the first moment
   uint64_t free;      // KB; all ones if it is not known
   size_t state;       // of the memory, among roles::States(); as many as these if it is not known
   uint32_t boot = 0;  // of which start of the host; 0 if it is not known
@@ -29,6 +31,10 @@ struct Survey {
   // The place of the moment that was taken then, at `from` or behind it: a recording that is still
   // written may have other moments by the time it is read again.
   std::optional<size_t> Find(int64_t taken, size_t from) const;
+
+  // Tells how far the clock was put forward before which moments, us: later ones than that are
+  // steady without it, each after the one before.
+  void Steady(const std::map<size_t, int64_t>& steps);
 };
 
 // Goes through all moments and calls `also` with each while the library answers from it. Fails with

@@ -35,26 +35,29 @@ void PutValue(std::string& bytes, const PageValue& value, const PageValue& base)
 }  // namespace
 
 uint32_t PageTexts::NumberOf(std::string_view text) {
-  const auto [found, isNew] =
-      numbers_.try_emplace(std::string(text), static_cast<uint32_t>(all_.size()));
-  if (isNew) all_.emplace_back(text);
-  return found->second;
+  const auto found = numbers_.find(text);
+  if (found != numbers_.end()) return found->second;
+  const auto number = static_cast<uint32_t>(all_.size());
+  numbers_.emplace(all_.emplace_back(text), number);
+  return number;
 }
 
 uint32_t RowIdentities::NumberOf(std::span<const RowColumn> columns, std::span<const PageValue> row,
                                  uint32_t most) {
-  std::string key;
+  key_.clear();
   for (size_t i = 0; i < columns.size(); ++i) {
     if (!columns[i].isKey) continue;
-    key += static_cast<char>(row[i].type);
-    PutNumber(key, row[i].number);
+    key_ += static_cast<char>(row[i].type);
+    PutNumber(key_, row[i].number);
   }
-  PutNumber(key, seen_[key]++);
-  const auto found = numbers_.find(key);
-  if (found != numbers_.end()) return found->second;
-  const auto number = static_cast<uint32_t>(numbers_.size());
-  if (number < most) numbers_.emplace(std::move(key), number);
-  return number;
+  // Of those that get no number nothing is kept.
+  if (count_ >= most && !known_.contains(key_)) return most;
+  auto& [numbers, moment, seen] = known_[key_];
+  if (std::exchange(moment, moment_) != moment_) seen = 0;
+  const size_t place = seen++;
+  if (place < numbers.size()) return numbers[place];
+  if (count_ >= most) return most;
+  return numbers.emplace_back(count_++);
 }
 
 void TableStream::Begin(std::span<const RowColumn> columns) {

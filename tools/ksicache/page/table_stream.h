@@ -21,6 +21,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <deque>
 #include <span>
 #include <string>
 #include <string_view>
@@ -34,13 +35,17 @@ namespace ksicache {
 // All texts of a page, each once.
 class PageTexts {
  public:
+  PageTexts() = default;
+  PageTexts(const PageTexts&) = delete;
+  PageTexts& operator=(const PageTexts&) = delete;
+
   uint32_t NumberOf(std::string_view text);
 
-  const std::vector<std::string>& All() const { return all_; }
+  const std::deque<std::string>& All() const { return all_; }
 
  private:
-  std::unordered_map<std::string, uint32_t> numbers_;
-  std::vector<std::string> all_;
+  std::unordered_map<std::string_view, uint32_t> numbers_;
+  std::deque<std::string> all_;
 };
 
 // A value that lives as long as the page's texts.
@@ -59,13 +64,22 @@ class RowIdentities {
                     uint32_t most = UINT32_MAX);
 
   // A new moment: rows may repeat what an earlier one had.
-  void Restart() { seen_.clear(); }
+  void Restart() { ++moment_; }
 
-  size_t Count() const { return numbers_.size(); }
+  size_t Count() const { return count_; }
 
  private:
-  std::unordered_map<std::string, uint32_t> numbers_;
-  std::unordered_map<std::string, uint32_t> seen_;
+  // The rows with the same key values.
+  struct Namesakes {
+    std::vector<uint32_t> numbers;
+    size_t moment = 0;
+    size_t seen = 0;  // in that moment
+  };
+
+  std::unordered_map<std::string, Namesakes> known_;
+  std::string key_;
+  size_t moment_ = 0;
+  uint32_t count_ = 0;
 };
 
 class TableStream {

@@ -2,12 +2,10 @@
 
 #include <algorithm>
 #include <optional>
-#include <span>
 #include <utility>
 
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
-#include "tools/ksicache/export/row_sink.h"
 #include "tools/ksicache/page/memory_rows.h"
 #include "tools/ksicache/page/packing.h"
 #include "tools/ksicache/page/report_rows.h"
@@ -16,19 +14,6 @@
 
 namespace ksicache {
 namespace {
-
-// Hands rows on to the stream of the report at hand.
-class Rows : public RowFormat {
- public:
-  explicit Rows(TableStream& stream) : stream_(stream) {}
-
-  void Begin(const RowTable& table) override { stream_.Begin(table.columns); }
-  void Row(std::span<const Value> values) override { stream_.Row(values); }
-  void Finish() override {}
-
- private:
-  TableStream& stream_;
-};
 
 // Ends the reading of moments when all that is wanted has been read.
 struct Enough {};
@@ -79,9 +64,7 @@ class Reader {
 
   void Put(const tally::Report& report, const Origin& origin, TableStream& stream,
            std::string& bytes) {
-    Rows rows(stream);
-    RowSink sink(rows, std::nullopt);
-    const bool isWhole = RunForPage(report, origin, sink, problems_);
+    const bool isWhole = GiveRows(report, origin, {}, stream, problems_);
     stream.End(isWhole, bytes);
   }
 

@@ -99,7 +99,7 @@ export class Changes {
     const [from, at] = ['from', 'at'].map((name) => this.state.get(name)).sort((a, b) => a - b);
     const [bootFrom, bootAt] = [head.boots[from], head.boots[at]];
     const isRebooted = bootFrom !== 0 && bootAt !== 0 && bootFrom !== bootAt;
-    this.times = `${timeText(head.full[from])} to ${timeText(head.full[at])}`;
+    this.times = `${timeText(head.full.taken[from])} to ${timeText(head.full.taken[at])}`;
     this.result = compared(memory[from], memory[at], head.parts, UNITS[this.unit].shift, !isRebooted);
     this.note.textContent = `From ${this.times}, in ${UNITS[this.unit].title}.${isRebooted ? ' The host was started anew in between: groups and processes are matched by their names.' : ''}`;
     this.showHost();

@@ -2,6 +2,7 @@
 import {element} from './dom.js';
 
 const SHOWN = 60; // rows, until more are asked for
+const MORE = 1000; // that are added then: a browser lays out so many at once
 
 // `columns`: {name, title, isNumber, compare(a, b), text(row), csv(row), class}; rows are whatever
 // these take.
@@ -15,14 +16,15 @@ export class Grid {
     this.head = element('tr');
     this.body = element('tbody');
     this.caption = element('p', {class: 'note', role: 'status'});
-    this.more = element('button', {type: 'button', class: 'more', onclick: () => this.showAll()});
+    this.more = element('button', {type: 'button', class: 'more', onclick: () => this.showMore()});
     this.input = element('input', {type: 'search', 'aria-label': `Filter ${label}`, placeholder: 'Filter', oninput: () => this.search()});
     this.copied = element('span', {class: 'note', role: 'status'});
     this.tools = element('div', {class: 'tools'}, this.input,
       element('button', {type: 'button', onclick: () => this.copy()}, 'Copy as CSV'), this.copied);
     this.scroller = element('div', {class: 'scroller', tabindex: 0, role: 'region', 'aria-label': label},
       element('table', {class: 'grid', 'aria-label': label}, element('thead', {}, this.head), this.body));
-    this.view = element('div', {}, this.tools, this.caption, this.scroller, this.more);
+    this.about = element('p', {class: 'about', 'aria-hidden': 'true'}); // a title that the keyboard shows, too
+    this.view = element('div', {}, this.tools, this.caption, this.about, this.scroller, this.more);
   }
 
   // Shows other rows, or others of their columns.
@@ -45,8 +47,8 @@ export class Grid {
     this.draw();
   }
 
-  showAll() {
-    this.most = Infinity;
+  showMore() {
+    this.most += MORE;
     this.draw();
     this.scroller.focus();
   }
@@ -58,8 +60,15 @@ export class Grid {
       return element('th', {
         scope: 'col', class: column.isNumber ? 'number' : null,
         'aria-sort': isSorted ? (this.isDown ? 'descending' : 'ascending') : null,
-      }, element('button', {type: 'button', title: column.title, onclick: () => this.turn(column)}, `${column.name}${arrow}`));
+      }, this.headButton(column, arrow));
     }));
+  }
+
+  headButton(column, arrow) {
+    const tell = () => { this.about.textContent = `${column.name}: ${column.title}`; };
+    return element('button', {
+      type: 'button', title: column.title, onclick: () => this.turn(column), onfocus: tell, onpointerenter: tell,
+    }, `${column.name}${arrow}`);
   }
 
   // Sorts by a column, numbers with the greatest first, or the other way round.
@@ -86,9 +95,11 @@ export class Grid {
     const shown = rows.slice(0, this.most);
     this.body.replaceChildren(...shown.map((row) => element('tr', {}, ...this.columns.map((column, i) =>
       element(i === 0 ? 'th' : 'td', {scope: i === 0 ? 'row' : null, class: column.isNumber ? 'number' : null}, column.text(row))))));
-    this.caption.textContent = `${this.text}: ${rows.length === this.rows.length ? '' : `${rows.length} of `}${this.rows.length} rows`;
-    this.more.hidden = shown.length === rows.length;
-    this.more.textContent = `Show all ${rows.length} rows`;
+    const isAll = shown.length === rows.length;
+    const count = rows.length === this.rows.length ? rows.length : `${rows.length} of ${this.rows.length}`;
+    this.caption.textContent = `${this.text}: ${count} rows${isAll ? '' : `, the first ${shown.length} shown`}`;
+    this.more.hidden = isAll;
+    this.more.textContent = rows.length <= this.most + MORE ? `Show all ${rows.length} rows` : `Show ${MORE} more rows`;
     this.copied.textContent = '';
   }
 
@@ -113,9 +124,11 @@ export class Grid {
   }
 }
 
+const COLLATOR = new Intl.Collator('en', {numeric: true});
+
 // Compares values of one column: those without one stand last, whichever way it is sorted.
 export function compareValues(a, b, sign) {
   if (a === null || b === null) return (a === null) - (b === null);
-  if (typeof a === 'string') return sign * a.localeCompare(b, 'en', {numeric: true});
+  if (typeof a === 'string') return sign * COLLATOR.compare(a, b);
   return sign * (a < b ? -1 : a > b ? 1 : 0);
 }

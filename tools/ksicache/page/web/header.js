@@ -1,8 +1,9 @@
 // The head of the page: whose memory, when, and in short what there is to see.
+import {markText} from './chart.js';
 import {compared} from './comparison.js';
 import {element} from './dom.js';
 import {ZONE, growthText, isUtc, memoryText, shownText, spanText, timeText} from './format.js';
-import {markText} from './timeline.js';
+import {leastFree} from './memory.js';
 
 const NAMED = 3; // who grew or shrank most
 
@@ -11,23 +12,18 @@ function count(number, one, many) {
 }
 
 // The moment with the least free memory; the last one if that is the first.
-export function tightest({head, memory}) {
-  let least = 0;
-  memory.forEach(({host}, moment) => {
-    if (host.free !== null && (memory[least].host.free ?? Infinity) > host.free) least = moment;
-  });
-  return least === 0 ? head.full.length - 1 : least;
+export function tightest(data) {
+  return leastFree(data) || data.head.full.taken.length - 1;
 }
 
 // How much of what was recorded the page shows.
 function extentText({moments, full, points, lines}) {
-  const first = points[0];
-  const last = points.at(-1);
+  const [first, last] = [points.taken[0], points.taken.at(-1)];
   if (moments === 1) return timeText(first);
-  const span = `${timeText(first)} to ${timeText(last)}, ${count(moments, 'moment', 'moments')} in ${spanText(last - first)}`;
-  if (full.length === moments) return `${span}, all of them in full`;
+  const span = `${timeText(first)} to ${timeText(last)}, ${count(moments, 'moment', 'moments')} in ${spanText(points.steady.at(-1) - points.steady[0])}`;
+  if (full.taken.length === moments) return `${span}, all of them in full`;
   const cut = lines.isCut ? ', to 1/256 of its range' : '';
-  return `${span}. Shown in full: ${full.length} of them, those with the least free memory in each stretch and those after a gap or restart. The balance is drawn from ${points.length} moments, the least and the most free memory of each stretch; a line from the least and the greatest figure of each of ${lines.stretches} stretches${cut}.`;
+  return `${span}. Shown in full: ${full.taken.length} of them, those with the least free memory in each stretch and those after a gap or restart. The balance is drawn from ${points.taken.length} moments, the least and the most free memory of each stretch; a line from the least and the greatest figure of each of ${lines.stretches} stretches${cut}.`;
 }
 
 // How long the memory was in which state.
@@ -52,21 +48,22 @@ function inShort(data) {
   const moment = tightest(data);
   const {free, total} = memory[moment].host;
   if (free === null || total === null) return null;
-  const words = [element('strong', {}, `${memoryText(Number(free))} of ${memoryText(Number(total))} free`), ` at ${timeText(head.full[moment])}`];
+  const words = [element('strong', {}, `${memoryText(Number(free))} of ${memoryText(Number(total))} free`), ` at ${timeText(head.full.taken[moment])}`];
   if (moment !== 0) {
-    const isLeast = moment !== head.full.length - 1;
+    const isLeast = moment === leastFree(data);
     const grown = growths(data, moment).map((text) => element('span', {class: text.length < 40 ? 'word' : null}, text));
     words.push(isLeast ? ', the least of all. ' : '. ');
-    if (grown.length > 0) words.push(`Since ${timeText(head.full[0])}: `, ...grown.flatMap((each, i) => (i === 0 ? [each] : [', ', each])), '.');
+    if (grown.length > 0) words.push(`Since ${timeText(head.full.taken[0])}: `, ...grown.flatMap((each, i) => (i === 0 ? [each] : [', ', each])), '.');
   }
   return element('p', {class: 'short'}, ...words);
 }
 
-function remarks({marks, problems}) {
+function remarks({moments, marks, problems}) {
   const items = marks.all.map((mark) => `${timeText(mark.at)}: ${markText(mark)}`);
   if (marks.leftOut > 0) items.push(`and ${marks.leftOut} more of these`);
-  if (marks.refused > 0) items.push(`up to ${marks.refused} reads of a moment were refused for want of rights`);
-  if (marks.failed > 0) items.push(`up to ${marks.failed} reads of a moment failed`);
+  const reads = (number) => (moments === 1 ? count(number, 'read', 'reads') : `up to ${count(number, 'read', 'reads')} of a moment`);
+  if (marks.refused > 0) items.push(`${reads(marks.refused)} refused for want of rights`);
+  if (marks.failed > 0) items.push(`${reads(marks.failed)} failed`);
   if (marks.lossy > 0) items.push(`of ${count(marks.lossy, 'moment', 'moments')} something was left out`);
   items.push(...problems.map(shownText));
   if (items.length === 0) return null;

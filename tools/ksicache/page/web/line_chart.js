@@ -1,42 +1,49 @@
 // Figures of machines, groups, processes and heaps over time, as bands from the least to the
 // greatest of each stretch of moments.
+import {BOTTOM, chosenLines, figureAxis, markShapes, memoryTicks, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
 import {choice, element, svg} from './dom.js';
-import {bytesOf, isMemory, memoryText, shownText, tickText, timeText} from './format.js';
+import {bytesOf, isMemory, memoryText, shownText, timeText} from './format.js';
 import {Kind} from './tables.js';
-import {isBreak, memoryTicks, tickTime} from './timeline.js';
 
 const HEIGHT = 200;
-const MARGIN = {left: 52, right: 26, top: 10, bottom: 22};
+const TOP = 10;
 const OFFERED = 24; // lines to choose from
 const DRAWN = 5; // at first
 const COLORS = 8; // that lines can have
 const TOGETHER = 'all together';
 
-// The figures of a column as they are drawn: memory in bytes.
-function toDraw(column) {
-  return isMemory(column) ? (figure) => bytesOf(figure, column) : (figure) => figure;
+// How the figures of a column are drawn and written: {figure, text, most, ticks}; of what has a
+// greatest one, `most` is it.
+function styleOf(column, {states}) {
+  const same = (figure) => figure;
+  if (isMemory(column)) return {figure: (figure) => bytesOf(figure, column), text: memoryText, ticks: memoryTicks};
+  if (column.kind === Kind.text) {
+    const text = (state) => states[state];
+    return {figure: same, text, most: states.length - 1, ticks: () => (axis) => axis.tickValues(d3.range(states.length)).tickFormat(text)};
+  }
+  const text = (figure) => `${figure}${column.kind === Kind.percent ? ' %' : ''}`;
+  return {figure: same, text, most: column.kind === Kind.percent ? 100 : undefined, ticks: () => (axis) => axis.ticks(4).tickFormat(text)};
 }
 
-// How the figures of a line are written.
-function textOf(column) {
-  return isMemory(column) ? memoryText : (figure) => `${figure}${column.kind === Kind.percent ? ' %' : ''}`;
-}
-
-// The lines of one figure: {name, line, text}, that of all together first if it is memory.
+// The lines of one figure: {name, line, style}, that of all together first if it is memory.
 function linesOf(data, role) {
   const report = data.head.reports.find((each) => each.name === role.report);
   const column = report.columns.find((each) => each.name === role.column);
   if (column === undefined) return [];
   const found = data.lines.lines.get(`${role.report} ${role.column}`);
   const place = report.columns.filter((each) => each.isKey).findIndex((each) => each.name === data.nameOf.get(role.report));
-  const [figure, text] = [toDraw(column), textOf(column)];
-  const ofLine = (name, line) => ({name, line: line.map((extent) => extent && extent.map(figure)), text});
+  const style = styleOf(column, data.head.roles);
+  const ofLine = (name, line) => ({name, line: line.map((extent) => extent && extent.map(style.figure)), style});
   const things = found.things.map(({keys, line}) => ofLine(shownText(data.head.texts[keys[place]] ?? data.head.host), line));
   return isMemory(column) && place >= 0 ? [ofLine(TOGETHER, found.together), ...things] : things;
 }
 
 function peak({line}) {
   return d3.max(line, (extent) => extent?.[1] ?? 0) ?? 0;
+}
+
+function least({line}) {
+  return d3.min(line, (extent) => extent?.[0]) ?? Infinity;
 }
 
 // By how much a line goes up and down; where there is none, it is at 0.
@@ -54,12 +61,16 @@ function movedLines(data) {
 
 const MOVED = {title: 'What changed most'};
 
-// The lines to choose from, and how many more there are.
+// The lines to choose from, the most telling first, and how many more there are.
 function offered(data, role) {
   const lines = role === MOVED ? movedLines(data) : linesOf(data, role);
   const together = lines.filter(({name}) => name === TOGETHER);
-  const things = lines.filter((each) => !together.includes(each) && peak(each) > 0);
-  if (role !== MOVED) things.sort((a, b) => peak(b) - peak(a));
+  let things = lines.filter((each) => !together.includes(each));
+  if (role.isLessWorse) {
+    things = things.filter((each) => least(each) !== Infinity).sort((a, b) => least(a) - least(b));
+  } else if (role !== MOVED) {
+    things = things.filter((each) => each.style.most !== undefined || peak(each) > 0).sort((a, b) => peak(b) - peak(a));
+  }
   return {lines: [...together, ...things.slice(0, OFFERED)], more: Math.max(0, things.length - OFFERED)};
 }
 
@@ -108,39 +119,29 @@ export class LineChart {
   draw() {
     const width = this.svg.clientWidth;
     if (width === 0) return;
-    const {times} = this.data.lines;
+    const {head, lines} = this.data;
     const drawn = this.lines.filter((each) => each.isDrawn);
-    this.x = d3.scaleTime([times[0][0] / 1000, times.at(-1)[1] / 1000], [MARGIN.left, width - MARGIN.right]);
-    const most = d3.max(drawn, (each) => d3.max(each.line, (extent) => extent?.[1] ?? 0)) || 1;
-    this.y = d3.scaleLinear([0, most * 1.04], [HEIGHT - MARGIN.bottom, MARGIN.top]);
-    const bottom = svg('g', {class: 'axis', transform: `translate(0,${HEIGHT - MARGIN.bottom})`});
-    const left = svg('g', {class: 'axis', transform: `translate(${MARGIN.left},0)`});
-    d3.axisBottom(this.x).tickFormat(tickTime).ticks(Math.max(2, Math.floor(width / 110))).tickSizeOuter(0)(d3.select(bottom));
-    this.leftAxis(most).tickSizeOuter(0)(d3.select(left));
+    const {ticks, most = this.mostOf(drawn)} = this.lines[0]?.style ?? {ticks: memoryTicks};
+    this.x = timeScale(lines.times[0][0], lines.times.at(-1)[1], width);
+    this.y = d3.scaleLinear([0, most * 1.04], [HEIGHT - BOTTOM, TOP]);
     this.cursor = svg('g', {class: 'cursor'});
     this.svg.setAttribute('viewBox', `0 0 ${width} ${HEIGHT}`);
     this.svg.replaceChildren(svg('title', {id: 'lines-name'}, `${this.role.title} over time`),
-      bottom, left, ...drawn.flatMap((each) => this.paths(each)), this.cursor);
+      timeAxis(this.x, head.points, width, HEIGHT), figureAxis(this.y, ticks(most)),
+      ...markShapes(head.marks.all, this.x, TOP, HEIGHT), ...drawn.flatMap((each) => this.paths(each)), this.cursor);
     this.showChosen();
   }
 
-  leftAxis(most) {
-    const axis = d3.axisLeft(this.y);
-    const text = this.lines[0]?.text ?? memoryText;
-    return text === memoryText ? axis.tickValues(memoryTicks(most)).tickFormat(tickText) : axis.ticks(4).tickFormat(text);
+  mostOf(lines) {
+    return d3.max(lines, peak) || 1;
   }
 
   paths({line, color}) {
-    const {times} = this.data.lines;
-    const marks = this.data.head.marks.all;
-    const runs = [[]];
-    line.forEach((extent, i) => {
-      if (extent === null || (i > 0 && isBreak(marks, times[i - 1][1], times[i][0]))) runs.push([]);
-      if (extent !== null) runs.at(-1).push({x: this.x((times[i][0] + times[i][1]) / 2000), extent});
-    });
-    const band = d3.area().x((each) => each.x).y0((each) => this.y(each.extent[0])).y1((each) => this.y(each.extent[1]));
-    const middle = d3.line().x((each) => each.x).y((each) => this.y((each.extent[0] + each.extent[1]) / 2));
-    return runs.filter((run) => run.length > 0).flatMap((run) => [
+    const points = line.map((extent, i) => ({from: this.data.lines.times[i][0], to: this.data.lines.times[i][1], extent}));
+    const x = (point) => this.x(point.time / 1000);
+    const band = d3.area().x(x).y0(({extent}) => this.y(extent[0])).y1(({extent}) => this.y(extent[1]));
+    const middle = d3.line().x(x).y(({extent}) => this.y((extent[0] + extent[1]) / 2));
+    return runsOf(points, this.data.head.marks.all, ({extent}) => extent !== null).flatMap((run) => [
       svg('path', {class: `band ${color}`, d: band(run)}),
       svg('path', {class: `line ${color}`, d: run.length > 1 ? middle(run) : `${middle(run).replace('Z', '')}h3`}),
     ]);
@@ -148,13 +149,10 @@ export class LineChart {
 
   showChosen() {
     if (this.x === undefined) return;
-    const {full} = this.data.head;
-    const line = (moment, kind) => {
-      const x = this.x(full[this.state.get(moment)] / 1000);
-      return svg('line', {class: kind, x1: x, x2: x, y1: MARGIN.top, y2: HEIGHT - MARGIN.bottom});
-    };
-    this.cursor.replaceChildren(line('from', 'from'), line('at', 'at'));
-    this.tell(full[this.state.get('at')]);
+    const {steady} = this.data.head.full;
+    const [at, from] = ['at', 'from'].map((name) => steady[this.state.get(name)]);
+    this.cursor.replaceChildren(...chosenLines({at, from}, this.x, TOP, HEIGHT - BOTTOM));
+    this.tell(at);
   }
 
   point(event) {
@@ -166,12 +164,12 @@ export class LineChart {
   tell(time) {
     const {times} = this.data.lines;
     const place = Math.max(0, times.findLastIndex((each) => each[0] <= time));
-    const words = this.lines.filter((each) => each.isDrawn).map(({name, line, text}) => {
+    const words = this.lines.filter((each) => each.isDrawn).map(({name, line, style}) => {
       const extent = line[place];
       if (extent === null) return `${name} –`;
-      const [least, greatest] = extent.map(text);
+      const [least, greatest] = extent.map(style.text);
       return `${name} ${least === greatest ? least : `${least} to ${greatest}`}`;
     });
-    this.told.replaceChildren(element('strong', {}, timeText(times[place][0])), ` ${words.join(' · ')}`);
+    this.told.replaceChildren(element('strong', {}, timeText(wallTime(this.data.head.points, times[place][0]))), ` ${words.join(' · ')}`);
   }
 }

@@ -16,8 +16,8 @@ import {Reports} from './reports.js';
 function unpacked({head, points, tables, lines}) {
   const {reports, roles, texts} = head;
   const hostReport = reports.findIndex((report) => report.name === roles.report);
-  const hostRows = readTables(points, [reports[hostReport]], head.points.length, texts);
-  const moments = readTables(tables, [...reports, head.memory], head.full.length, texts);
+  const hostRows = readTables(points, [reports[hostReport]], head.points.taken.length, texts);
+  const moments = readTables(tables, [...reports, head.memory], head.full.taken.length, texts);
   return {
     head,
     hostReport,
@@ -36,7 +36,7 @@ function unpacked({head, points, tables, lines}) {
 
 function show(data) {
   const {head} = data;
-  const hasMany = head.full.length > 1;
+  const hasMany = head.full.taken.length > 1;
   const state = new State({at: tightest(data), from: 0});
   const treemap = new Treemap(data, state);
   const changes = hasMany ? new Changes(data, state) : null;

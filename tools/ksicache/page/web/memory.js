@@ -17,3 +17,12 @@ export function memoryOf(rows, parts) {
   }
   return memory;
 }
+
+// The moment with the least free memory; null if that is known of none.
+export function leastFree({memory}) {
+  let least = null;
+  memory.forEach(({host}, moment) => {
+    if (host.free !== null && host.free !== undefined && (least === null || host.free < memory[least].host.free)) least = moment;
+  });
+  return least;
+}

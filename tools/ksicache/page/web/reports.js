@@ -19,6 +19,8 @@ export class Reports {
     this.hidden = new Set(); // "report column"
     this.grid = new Grid('rows of the report');
     this.columns = element('div', {class: 'columns'});
+    this.names = element('input', {type: 'text', spellcheck: 'false', autocomplete: 'off', onchange: () => this.select()});
+    this.unknown = element('span', {class: 'note', role: 'status'});
     const {reports} = data.head;
     const units = Object.entries(UNITS).map(([word, {title}]) => [word, title]);
     this.view = element('section', {class: 'reports', 'aria-labelledby': 'reports'},
@@ -29,7 +31,9 @@ export class Reports {
           this.unit = unit;
           this.show();
         })),
-      element('details', {}, element('summary', {}, 'Columns'), this.columns), this.grid.view);
+      element('details', {}, element('summary', {}, 'Columns'),
+        element('div', {class: 'tools'}, element('label', {class: 'names'}, 'Names as with -s, empty for all ', this.names), this.unknown),
+        this.columns), this.grid.view);
     state.watch(['at'], () => this.show());
     this.drawColumns();
   }
@@ -54,10 +58,35 @@ export class Reports {
     const name = `${this.report().name} ${column.name}`;
     if (isShown) this.hidden.delete(name);
     else this.hidden.add(name);
+    this.nameColumns();
     this.show();
   }
 
+  // Shows the columns that are named, "name:consumed".
+  select() {
+    const wanted = this.names.value.split(':').map((name) => name.trim().toLowerCase()).filter((name) => name !== '');
+    const {name: report, columns} = this.report();
+    const isKnown = (name) => columns.some((column) => column.name.toLowerCase() === name);
+    const unknown = wanted.filter((name) => !isKnown(name));
+    this.unknown.textContent = unknown.length === 0 ? '' : `${report} has no column ${unknown.join(', ')}`;
+    if (unknown.length > 0) return;
+    for (const column of columns) {
+      const isShown = wanted.length === 0 || wanted.includes(column.name.toLowerCase());
+      this.hidden[isShown ? 'delete' : 'add'](`${report} ${column.name}`);
+    }
+    this.drawColumns();
+    this.show();
+  }
+
+  nameColumns() {
+    const {columns} = this.report();
+    const shown = columns.filter((column) => !this.isHidden(column));
+    this.names.value = shown.length === columns.length ? '' : shown.map((column) => column.name).join(':');
+    this.unknown.textContent = '';
+  }
+
   drawColumns() {
+    this.nameColumns();
     this.columns.replaceChildren(...this.report().columns.map((column) => element('label', {},
       element('input', {type: 'checkbox', checked: !this.isHidden(column), onchange: (event) => this.turn(column, event.target.checked)}),
       element('b', {}, column.name), ` ${column.description.trim()}`)));
@@ -87,7 +116,7 @@ export class Reports {
     const report = this.report();
     const rows = this.data.moments[at][this.place];
     const columns = report.columns.map((column, place) => ({column, place})).filter(({column}) => !this.isHidden(column));
-    const time = timeText(this.data.head.full[at]);
+    const time = timeText(this.data.head.full.taken[at]);
     const caption = rows === null ? `${report.name} at ${time} could not be read` : `${report.name} at ${time}`;
     this.grid.show(columns.map(({column, place}) => this.columnOf(column, place)), rows ?? [], caption);
   }

@@ -1,28 +1,25 @@
 // What happened: the balance of the host over time. A moment is chosen by a click, a span by
 // dragging, and both by the sliders below.
 import {Rows, stackOf} from './balance.js';
+import {BOTTOM, chosenLines, figureAxis, markShapes, memoryTicks, runsOf, timeAxis, timeScale} from './chart.js';
 import {element, svg} from './dom.js';
-import {memoryText, spanText, tickText, timeText} from './format.js';
+import {memoryText, timeText} from './format.js';
+import {leastFree} from './memory.js';
 
 const HEIGHT = 210;
-const MARGIN = {left: 52, right: 26, top: 20, bottom: 22};
+const TOP = 20;
 const DRAG = 5; // what is moved less is a click
 
 // The host's balance at the moments that it is drawn from.
 function balances(data) {
   const roles = data.head.roles;
   const host = new Rows({...data, moments: data.points}, 0, roles.report);
-  const points = [];
-  data.points.forEach((reports, i) => {
+  const {taken, steady} = data.head.points;
+  return data.points.map((reports, i) => {
     const row = reports[data.hostReport]?.[0];
     const stack = row === undefined ? null : stackOf(host, row, roles);
-    points.push({time: data.head.points[i], stack, state: row === undefined ? null : host.value(row, roles.state)});
+    return {from: steady[i], to: steady[i], taken: taken[i], stack, state: row === undefined ? null : host.value(row, roles.state)};
   });
-  return points;
-}
-
-function freeOf(point) {
-  return point.stack.find((part) => part.key === 'free').bytes;
 }
 
 // How bad a memory state is, from 0 to 4; what is not told is none.
@@ -31,30 +28,9 @@ function levelOf(data, state) {
   return state === null ? 0 : place < 0 ? 1 : Math.min(place, 4);
 }
 
-// Between which points nothing was recorded.
-export function isBreak(marks, before, after) {
-  return marks.some((mark) => mark.kind !== 'clock' && mark.at > before && mark.at <= after);
-}
-
-// Splits points where nothing was recorded between two of them.
-export function runsOf(points, marks, isDrawn) {
-  const runs = [[]];
-  points.forEach((point, i) => {
-    if (!isDrawn(point) || (i > 0 && isBreak(marks, points[i - 1].time, point.time))) runs.push([]);
-    if (isDrawn(point)) runs.at(-1).push(point);
-  });
-  return runs.filter((run) => run.length > 0);
-}
-
-const MARKS = {
-  reboot: (mark) => `restarted, ${spanText(mark.time)} between the moments`,
-  gap: (mark) => `nothing recorded for ${spanText(mark.time)}`,
-  skipped: () => 'moments before it were left out',
-  clock: (mark) => `the clock was set ${mark.time > 0 ? 'forward' : 'back'} by ${spanText(mark.time)}`,
-};
-
-export function markText(mark) {
-  return MARKS[mark.kind](mark);
+// The place of the time that is nearest to one.
+function nearest(times, time) {
+  return d3.minIndex(times, (each) => Math.abs(each - time));
 }
 
 export class Timeline {
@@ -87,7 +63,7 @@ export class Timeline {
     const slider = (name, text) => {
       const output = element('output', {});
       const input = element('input', {
-        type: 'range', min: 0, max: this.data.head.full.length - 1, step: 1, id: `slider-${name}`,
+        type: 'range', min: 0, max: this.data.head.full.taken.length - 1, step: 1, id: `slider-${name}`,
         oninput: () => this.choose(name, Number(input.value)),
       });
       this.inputs[name] = {input, output};
@@ -102,26 +78,25 @@ export class Timeline {
 
   // The moments that are asked for most.
   shortcuts() {
-    const {full} = this.data.head;
-    const tightest = this.points.filter((point) => point.stack !== null)
-      .reduce((best, point) => (best === null || freeOf(point) < freeOf(best) ? point : best), null);
+    const least = leastFree(this.data);
     const button = (text, moment) => element('button', {type: 'button', onclick: () => this.choose('at', moment)}, text);
     return element('div', {class: 'tools'}, button('First moment', 0),
-      tightest === null ? null : button('Least free memory', this.momentAt(tightest.time)),
-      button('Last moment', full.length - 1));
+      least === null ? null : button('Least free memory', least),
+      button('Last moment', this.data.head.full.taken.length - 1));
   }
 
   draw() {
     this.width = this.svg.clientWidth;
     if (this.width === 0) return;
     const {points} = this;
-    this.x = d3.scaleTime([points[0].time / 1000, points.at(-1).time / 1000], [MARGIN.left, this.width - MARGIN.right]);
+    this.x = timeScale(points[0].from, points.at(-1).to, this.width);
     const most = d3.max(points, (point) => (point.stack === null ? 0 : d3.sum(point.stack, (part) => part.bytes)));
-    this.y = d3.scaleLinear([0, most || 1], [HEIGHT - MARGIN.bottom, MARGIN.top]);
+    this.y = d3.scaleLinear([0, most || 1], [HEIGHT - BOTTOM, TOP]);
     this.svg.setAttribute('viewBox', `0 0 ${this.width} ${HEIGHT}`);
     this.svg.replaceChildren(
       svg('title', {id: 'timeline-name'}, 'The balance of the memory over time'),
-      ...this.areas(), ...this.states(), ...this.axes(), ...this.markLines(), this.ticks());
+      ...this.areas(), ...this.states(), timeAxis(this.x, this.data.head.points, this.width, HEIGHT),
+      figureAxis(this.y, memoryTicks(most)), ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks());
     this.cursor = svg('g', {class: 'cursor'});
     this.svg.append(this.cursor);
     this.showChosen();
@@ -153,70 +128,46 @@ export class Timeline {
     this.points.forEach((point, i) => {
       const level = levelOf(this.data, point.state);
       if (level === 0) return;
-      const from = this.at(point.time);
-      const to = i + 1 < this.points.length ? this.at(this.points[i + 1].time) : from + 3;
-      bars.push(svg('rect', {class: `state level${level}`, x: from, width: Math.max(to - from, 2), y: MARGIN.top - 9, height: 6},
-        svg('title', {}, `memory state ${point.state} at ${timeText(point.time)}`)));
+      const from = this.at(point.from);
+      const to = i + 1 < this.points.length ? this.at(this.points[i + 1].from) : from + 3;
+      bars.push(svg('rect', {class: `state level${level}`, x: from, width: Math.max(to - from, 2), y: TOP - 9, height: 6},
+        svg('title', {}, `memory state ${point.state} at ${timeText(point.taken)}`)));
     });
     return bars;
   }
 
-  axes() {
-    const bottom = svg('g', {class: 'axis', transform: `translate(0,${HEIGHT - MARGIN.bottom})`});
-    const left = svg('g', {class: 'axis', transform: `translate(${MARGIN.left},0)`});
-    d3.axisBottom(this.x).tickFormat(tickTime).ticks(Math.max(2, Math.floor(this.width / 110))).tickSizeOuter(0)(d3.select(bottom));
-    d3.axisLeft(this.y).tickValues(memoryTicks(this.y.domain()[1])).tickFormat(tickText).tickSizeOuter(0)(d3.select(left));
-    return [bottom, left];
-  }
-
-  markLines() {
-    return this.marks.map((mark) => {
-      const x = this.at(mark.at);
-      const from = mark.kind === 'clock' ? x : this.at(mark.at - mark.time);
-      return svg('g', {class: `mark ${mark.kind}`},
-        svg('rect', {x: Math.max(from, MARGIN.left), y: MARGIN.top, width: Math.max(x - Math.max(from, MARGIN.left), 1), height: HEIGHT - MARGIN.top - MARGIN.bottom}),
-        ['gap', 'skipped'].includes(mark.kind) ? null : svg('text', {x: x + 3, y: MARGIN.top + 10}, mark.kind === 'reboot' ? 'restart' : 'clock'),
-        svg('title', {}, `${timeText(mark.at)}: ${markText(mark)}`));
-    });
-  }
-
   // The moments that are shown in full.
   ticks() {
-    const y = HEIGHT - MARGIN.bottom;
-    const d = this.data.head.full.map((time) => `M${this.at(time).toFixed(1)},${y}v4`).join('');
+    const y = HEIGHT - BOTTOM;
+    const d = this.data.head.full.steady.map((time) => `M${this.at(time).toFixed(1)},${y}v4`).join('');
     return svg('path', {class: 'full', d});
   }
 
   showChosen() {
-    const {full} = this.data.head;
-    const at = this.state.get('at');
-    const from = this.state.get('from');
-    for (const [name, moment] of [['at', at], ['from', from]]) {
+    const {taken, steady} = this.data.head.full;
+    const chosen = {at: this.state.get('at'), from: this.state.get('from')};
+    for (const [name, moment] of Object.entries(chosen)) {
       const {input, output} = this.inputs[name];
       input.value = moment;
-      input.setAttribute('aria-valuetext', timeText(full[moment]));
-      output.textContent = timeText(full[moment]);
+      input.setAttribute('aria-valuetext', timeText(taken[moment]));
+      output.textContent = timeText(taken[moment]);
     }
     if (this.x === undefined) return;
-    const [left, right] = [full[at], full[from]].map((time) => this.at(time)).sort((a, b) => a - b);
-    const line = (time, kind) => svg('line', {class: kind, x1: this.at(time), x2: this.at(time), y1: MARGIN.top - 2, y2: HEIGHT - MARGIN.bottom + 4});
+    const [at, from] = [steady[chosen.at], steady[chosen.from]];
+    const [left, right] = [this.at(at), this.at(from)].sort((a, b) => a - b);
     this.cursor.replaceChildren(
-      svg('rect', {class: 'span', x: left, width: right - left, y: HEIGHT - MARGIN.bottom, height: 4}),
-      line(full[from], 'from'), line(full[at], 'at'));
-    this.tell(full[at]);
+      svg('rect', {class: 'span', x: left, width: right - left, y: HEIGHT - BOTTOM, height: 4}),
+      ...chosenLines({at, from}, this.x, TOP - 2, HEIGHT - BOTTOM + 4));
+    this.tell(at);
   }
 
   // What the balance was then.
   tell(time) {
-    const point = this.nearest(this.points, (each) => each.time, time);
-    if (point.stack === null) return this.told.replaceChildren(`${timeText(point.time)}: no figures`);
+    const point = this.points[nearest(this.data.head.points.steady, time)];
+    if (point.stack === null) return this.told.replaceChildren(`${timeText(point.taken)}: no figures`);
     const parts = point.stack.filter((part) => part.bytes > 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
     const state = point.state === null ? [] : [`memory state ${point.state}`];
-    return this.told.replaceChildren(element('strong', {}, timeText(point.time)), ` ${[...parts, ...state].join(' · ')}`);
-  }
-
-  nearest(all, timeOf, time) {
-    return all.reduce((best, each) => (Math.abs(timeOf(each) - time) < Math.abs(timeOf(best) - time) ? each : best));
+    return this.told.replaceChildren(element('strong', {}, timeText(point.taken)), ` ${[...parts, ...state].join(' · ')}`);
   }
 
   // The time below the pointer.
@@ -226,8 +177,7 @@ export class Timeline {
   }
 
   momentAt(time) {
-    const {full} = this.data.head;
-    return full.indexOf(this.nearest(full, (each) => each, time));
+    return nearest(this.data.head.full.steady, time);
   }
 
   listen() {
@@ -245,21 +195,6 @@ export class Timeline {
       if (start !== null && Math.abs(event.clientX - start.x) <= DRAG) this.state.set({at: start.moment});
       start = null;
     });
-    this.svg.addEventListener('pointerleave', () => this.tell(this.data.head.full[this.state.get('at')]));
+    this.svg.addEventListener('pointerleave', () => this.tell(this.data.head.full.steady[this.state.get('at')]));
   }
-}
-
-// A time on an axis: its day at midnight, its second where there is one.
-export function tickTime(date) {
-  const isAt = (interval) => interval(date).getTime() === date.getTime();
-  const format = isAt(d3.timeDay) ? '%Y-%m-%d' : isAt(d3.timeMinute) ? '%H:%M' : '%H:%M:%S';
-  return d3.timeFormat(format)(date);
-}
-
-// Round figures of memory from 0 to about `most`.
-export function memoryTicks(most) {
-  const rough = Math.max(most, 1) / 4;
-  let step = 2 ** Math.floor(Math.log2(rough));
-  if (most / step > 6) step *= 2;
-  return d3.range(0, most * 1.0001, step);
 }

@@ -1,0 +1,105 @@
+// What the charts have in common: their times, what happened between moments, and their axes.
+//
+// They go by the steady time of moments, so that none lies on another where the clock was set back;
+// what they say of it is the time on the wall.
+import {svg} from './dom.js';
+import {spanText, tickText, timeText} from './format.js';
+
+const LEFT = 52;
+const RIGHT = 26;
+export const BOTTOM = 22;
+
+// The time on the wall at a steady one, by moments {taken, steady} around it.
+export function wallTime({taken, steady}, time) {
+  const place = Math.max(0, d3.bisectRight(steady, time) - 1);
+  return time + taken[place] - steady[place];
+}
+
+export function timeScale(first, last, width) {
+  return d3.scaleTime([first / 1000, last / 1000], [LEFT, width - RIGHT]);
+}
+
+// A time on an axis: its day at midnight, its second where there is one.
+function tickTime(date) {
+  const isAt = (interval) => interval(date).getTime() === date.getTime();
+  const format = isAt(d3.timeDay) ? '%Y-%m-%d' : isAt(d3.timeMinute) ? '%H:%M' : '%H:%M:%S';
+  return d3.timeFormat(format)(date);
+}
+
+export function timeAxis(x, moments, width, height) {
+  const axis = svg('g', {class: 'axis', transform: `translate(0,${height - BOTTOM})`});
+  const text = (date) => tickTime(new Date(wallTime(moments, date.getTime() * 1000) / 1000));
+  d3.axisBottom(x).tickFormat(text).ticks(Math.max(2, Math.floor(width / 110))).tickSizeOuter(0)(d3.select(axis));
+  return axis;
+}
+
+// Of a scale from 0 on; `ticks` adds what stands on it.
+export function figureAxis(y, ticks) {
+  const axis = svg('g', {class: 'axis', transform: `translate(${LEFT},0)`});
+  ticks(d3.axisLeft(y)).tickSizeOuter(0)(d3.select(axis));
+  return axis;
+}
+
+// Round figures of memory from 0 to about `most`.
+export function memoryTicks(most) {
+  const rough = Math.max(most, 1) / 4;
+  let step = 2 ** Math.floor(Math.log2(rough));
+  if (most / step > 6) step *= 2;
+  return (axis) => axis.tickValues(d3.range(0, most * 1.0001, step)).tickFormat(tickText);
+}
+
+const MARKS = {
+  reboot: (mark) => `restarted, ${spanText(mark.time)} between the moments`,
+  gap: (mark) => `nothing recorded for ${spanText(mark.time)}`,
+  lost: (mark) => `nothing that can be read for ${spanText(mark.time)}`,
+  skipped: () => 'moments before it were left out',
+  clock: (mark) => `the clock was set ${mark.time > 0 ? 'forward' : 'back'} by ${spanText(mark.time)}`,
+};
+
+// What has a word in a chart; the others are seen as gaps.
+const WORDS = {reboot: 'restart', clock: 'clock', lost: 'damage'};
+
+export function markText(mark) {
+  return MARKS[mark.kind](mark);
+}
+
+export function markShapes(marks, x, top, height) {
+  return marks.map((mark) => {
+    const end = x(mark.steady / 1000);
+    const start = mark.kind === 'clock' ? end : Math.max(LEFT, x((mark.steady - mark.time) / 1000));
+    const word = WORDS[mark.kind];
+    return svg('g', {class: `mark ${mark.kind}`},
+      svg('rect', {x: start, y: top, width: Math.max(end - start, 1), height: height - top - BOTTOM}),
+      word === undefined ? null : svg('text', {x: end + 3, y: top + 10}, word),
+      svg('title', {}, `${timeText(mark.at)}: ${markText(mark)}`));
+  });
+}
+
+// Whether nothing is known of some time between two steady ones.
+function isBreak(marks, before, after) {
+  return marks.some((mark) => mark.kind !== 'clock' && mark.steady > before && mark.steady <= after);
+}
+
+// Splits points {from, to}, which are steady times, where nothing is known between two of them. One
+// with such a time within has an end of its own on both sides. Each has `time`, where it is drawn.
+export function runsOf(points, marks, isDrawn) {
+  const runs = [[]];
+  points.forEach((point, i) => {
+    const isDue = isDrawn(point);
+    if (!isDue || (i > 0 && isBreak(marks, points[i - 1].to, point.from))) runs.push([]);
+    if (!isDue) return;
+    if (isBreak(marks, point.from, point.to)) {
+      runs.at(-1).push({...point, time: point.from});
+      runs.push([{...point, time: point.to}]);
+    } else {
+      runs.at(-1).push({...point, time: (point.from + point.to) / 2});
+    }
+  });
+  return runs.filter((run) => run.length > 0);
+}
+
+// Lines at the chosen moments.
+export function chosenLines({at, from}, x, top, bottom) {
+  const line = (time, kind) => svg('line', {class: kind, x1: x(time / 1000), x2: x(time / 1000), y1: top, y2: bottom});
+  return [line(from, 'from'), line(at, 'at')];
+}
