@@ -100,7 +100,7 @@ TEST_F(Ksicache, StandardOutputTakesNoOption) {
 
 TEST_F(Ksicache, StandardOutputIsNoTerminal) {
   const int terminal = posix_openpt(O_RDWR | O_NOCTTY);
-  ASSERT_GE(terminal, 0);
+  ASSERT_GE(terminal, 0) << "is /dev/pts mounted?";
   ASSERT_EQ(grantpt(terminal), 0);
   ASSERT_EQ(unlockpt(terminal), 0);
   harness::Program program = Command({"capture", "-"});

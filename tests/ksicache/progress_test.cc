@@ -22,7 +22,7 @@ Progress::Clock::time_point now;
 class ProgressTest : public testing::Test {
  protected:
   void SetUp() override {
-    ASSERT_GE(screen_, 0);
+    ASSERT_GE(screen_, 0) << "is /dev/pts mounted?";
     ASSERT_EQ(grantpt(screen_), 0);
     ASSERT_EQ(unlockpt(screen_), 0);
     const int terminal = open(ptsname(screen_), O_RDWR | O_NOCTTY | O_CLOEXEC);
