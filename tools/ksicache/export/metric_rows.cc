@@ -26,24 +26,9 @@ bool MetricRows::BeginMoment(const std::string& host, int64_t time, int64_t take
 
 void MetricRows::Add(std::string& labels, std::span<const Value> values) {
   const auto moment = static_cast<uint32_t>(moments_.size());
-  const size_t size = labels.size();
-  uint32_t series = 0;
-  for (int nth = 1;; ++nth) {
-    if (nth > 1) {
-      labels.resize(size);
-      labels += (labels.back() == '{' ? "nth=\"" : ",nth=\"") + std::to_string(nth) + '"';
-    }
-    const auto [found, isNew] =
-        seriesOf_.try_emplace(labels, static_cast<uint32_t>(labels_.size()));
-    series = found->second;
-    if (isNew) {
-      labels_.push_back(&found->first);
-      seenIn_.push_back(0);
-      textSize_ += found->first.capacity();
-    }
-    if (seenIn_[series] != moment) break;
-  }
-  seenIn_[series] = moment;
+  const uint32_t series = NewSeriesOf(labels, moment);
+  series_[series].moment = moment;
+  series_[series].repeats = 0;
   rows_.push_back({series, moment - 1});
   for (size_t i = 0; i < values.size(); ++i) {
     Column& column = columns_[i];
@@ -52,6 +37,30 @@ void MetricRows::Add(std::string& labels, std::span<const Value> values) {
     if (isKnown) column.type = values[i].type;
     column.known.push_back(isKnown);
     column.numbers.push_back(isKnown ? NumberOf(values[i]) : 0);
+  }
+}
+
+uint32_t MetricRows::SeriesCalled(const std::string& labels) {
+  ++lookUps_;
+  const auto [found, isNew] = seriesOf_.try_emplace(labels, static_cast<uint32_t>(series_.size()));
+  if (isNew) {
+    series_.push_back({&found->first, 0, 0});
+    textSize_ += found->first.capacity();
+  }
+  return found->second;
+}
+
+// One that the moment has not: its labels, or with one more that counts on from the last time.
+uint32_t MetricRows::NewSeriesOf(std::string& labels, uint32_t moment) {
+  const uint32_t first = SeriesCalled(labels);
+  if (series_[first].moment != moment) return first;
+  const size_t size = labels.size();
+  for (;;) {
+    const std::string nth = std::to_string(++series_[first].repeats + 1);
+    labels.resize(size);
+    labels += (labels.back() == '{' ? "nth=\"" : ",nth=\"") + nth + '"';
+    const uint32_t series = SeriesCalled(labels);
+    if (series_[series].moment != moment) return series;
   }
 }
 
@@ -75,7 +84,7 @@ size_t MetricRows::Size() const {
   size_t kept = 0;
   for (const Column& column : columns_) kept += column.isKept ? 1 : 0;
   return rows_.size() * (sizeof(Row) + sizeof(uint32_t) + kept * (sizeof(uint64_t) + 1)) +
-         moments_.size() * 2 * kAnyEntry + (labels_.size() + texts_.size()) * kAnyEntry + textSize_;
+         moments_.size() * 2 * kAnyEntry + (series_.size() + texts_.size()) * kAnyEntry + textSize_;
 }
 
 std::vector<uint32_t> MetricRows::Order() const {

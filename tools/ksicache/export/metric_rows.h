@@ -31,11 +31,14 @@ class MetricRows {
   bool BeginMoment(const std::string& host, int64_t time, int64_t taken);
 
   // A row of the moment that was begun last, told apart from others by its labels. Labels that the
-  // moment has already get one more.
+  // moment has already get one more, which is the label nth.
   void Add(std::string& labels, std::span<const Value> values);
 
   // Keeps the values of a column no more, nor those to come.
   void Drop(size_t column);
+
+  // How often labels have been looked up.
+  uint64_t LookUps() const { return lookUps_; }
 
   // About the bytes that all this takes.
   size_t Size() const;
@@ -46,7 +49,7 @@ class MetricRows {
   const Row& At(uint32_t row) const { return rows_[row]; }
   size_t Count() const { return rows_.size(); }
   int64_t TakenOf(uint32_t row) const { return moments_[rows_[row].moment].taken; }
-  std::string_view LabelsOf(uint32_t row) const { return *labels_[rows_[row].series]; }
+  std::string_view LabelsOf(uint32_t row) const { return *series_[rows_[row].series].labels; }
   Value ValueOf(size_t place, uint32_t row) const;
 
  private:
@@ -64,6 +67,15 @@ class MetricRows {
     std::vector<bool> known;
   };
 
+  // What is known of a series.
+  struct Series {
+    const std::string* labels;
+    uint32_t moment;   // counted from 1, that had it last
+    uint32_t repeats;  // how often that moment had its labels before they got one more
+  };
+
+  uint32_t SeriesCalled(const std::string& labels);
+  uint32_t NewSeriesOf(std::string& labels, uint32_t moment);
   uint64_t NumberOf(const Value& value);
 
   std::vector<Column> columns_;
@@ -71,8 +83,8 @@ class MetricRows {
   std::vector<Moment> moments_;
   std::map<std::pair<std::string, int64_t>, uint32_t> momentOf_;
   std::unordered_map<std::string, uint32_t> seriesOf_;
-  std::vector<const std::string*> labels_;  // of the series
-  std::vector<uint32_t> seenIn_;            // the moment, counted from 1, that had the series last
+  std::vector<Series> series_;
+  uint64_t lookUps_ = 0;
   std::unordered_map<std::string, uint64_t> textOf_;
   std::vector<const std::string*> texts_;
   size_t textSize_ = 0;
