@@ -79,7 +79,7 @@ function __ksicache_words
     while set -q words[1]
         switch $words[1]
             case --root --mode --every --keep --max-size --count --format --unit --output --cluster -u -o \
-                --columns --files-from -s \
+                --columns --files-from -s --group --levels --include --exclude -g -l -i -e \
                 --report --by --top --since --fail-above -r
                 set -e words[1]
             case '-*'
@@ -162,6 +162,10 @@ complete -c ksicache -n '__ksicache_command diff' -l across-hosts -d 'Compare mo
 complete -c ksicache -n '__ksicache_command export' -l format -x -a 'csv json sqlite openmetrics prometheus clickhouse-schema' -d 'Write in this format'
 complete -c ksicache -n '__ksicache_command diff export' -s u -l unit -x -a 'mb kb pg b' -d 'Show memory in this unit'
 complete -c ksicache -n '__ksicache_command export' -s s -l columns -x -d 'Export only these columns'
+complete -c ksicache -n '__ksicache_command export' -s g -l group -x -d 'Export only what is in this group'
+complete -c ksicache -n '__ksicache_command export' -s l -l levels -x -a '(seq 12)' -d 'Go down so many levels of groups'
+complete -c ksicache -n '__ksicache_command export' -s i -l include -x -d 'Export only groups with one of these flags'
+complete -c ksicache -n '__ksicache_command export' -s e -l exclude -x -d 'Export only groups with none of these flags'
 complete -c ksicache -n '__ksicache_command export' -l every -x -a '1m 5m 1h 1d' -d 'Take a moment of a recording so often'
 complete -c ksicache -n '__ksicache_command export' -l files-from -r -F -d 'Take also the files that this one names'
 complete -c ksicache -n '__ksicache_command export' -l append -d 'Add to a database'

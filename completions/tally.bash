@@ -359,13 +359,13 @@ declare -gA _ksicache_values=(
 
 _ksicache() {
   local _tally_line word command='' count=0 skip='' head='' i
-  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|files-from|report|by|top|since|fail-above|title'
+  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|group|levels|include|exclude|files-from|report|by|top|since|fail-above|title'
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
     if [[ -n $skip ]]; then
       skip=
-    elif [[ $word =~ ^(--($valued)|-[uors])$ ]]; then
+    elif [[ $word =~ ^(--($valued)|-[uorsglie])$ ]]; then
       skip=$word
     elif [[ $word != -* ]]; then
       if [[ -z $command ]]; then command=$word; else count=$((count + 1)); fi
@@ -381,6 +381,10 @@ _ksicache() {
     -o) skip=--output ;;
     -r) skip=--report ;;
     -s) skip=--columns ;;
+    -g) skip=--group ;;
+    -l) skip=--levels ;;
+    -i) skip=--include ;;
+    -e) skip=--exclude ;;
   esac
   if [[ $skip == --root ]]; then
     _tally_reply_files "$head" "$word" -d
@@ -402,7 +406,7 @@ _ksicache() {
         ;;
       export)
         _tally_reply '' "$word" \
-          '--format --unit -u --columns -s --every --files-from --output -o --append --force --mode --cluster'
+          '--format --unit -u --columns -s --group -g --levels -l --include -i --exclude -e --every --files-from --output -o --append --force --mode --cluster'
         ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
       page) _tally_reply '' "$word" '--output -o --title --force --mode' ;;

@@ -370,6 +370,74 @@ TEST_F(ExportTest, TakesTheColumnsThatAreNamed) {
   for (size_t row = 0; row < all.size(); ++row) EXPECT_EQ(some[row].back(), all[row][place]);
 }
 
+// Those that tally shows with the same options.
+TEST_F(ExportTest, TakesTheRowsThatAreSelected) {
+  const auto namesOf = [](const std::vector<Row>& cells) {
+    const auto place = static_cast<size_t>(std::ranges::find(cells[0], "name") - cells[0].begin());
+    std::vector<std::string> names;
+    for (size_t row = 1; row < cells.size(); ++row) {
+      const std::string& name = cells[row][place];
+      if (name != "Total" && !name.empty()) names.push_back(name);
+    }
+    return names;
+  };
+  const std::vector<std::vector<std::string>> selections = {
+      {"vm-stats", "-g", "1050"},
+      {"vm-stats", "-g", "4", "-l", "1"},
+      {"uw-stats", "-g", "3", "-l", "2"},
+      {"uw-stats", "-i", "uw"},
+      {"uw-stats", "-e", "UW"},
+      {"group-stats", "-l", "2"},
+      {"group-stats", "-i", "vm:vmm", "-e", "sys"},
+      {"asyncremap-stats", "-g", "1010"},
+  };
+  std::set<size_t> counts;
+  for (const std::vector<std::string>& selection : selections) {
+    SCOPED_TRACE(selection[0] + selection[1] + selection[2]);
+    std::vector<std::string> shown = {"-c", kExample, "-r"};
+    shown.insert(shown.end(), selection.begin(), selection.end());
+    shown.insert(shown.end(), {"-q", "-s", "name"});
+    std::vector<std::string> exported = {"export"};
+    exported.insert(exported.end(), selection.begin(), selection.end());
+    exported.push_back(kExample);
+    const std::vector<std::string> names = namesOf(Cells(Output(exported)));
+    EXPECT_EQ(names, namesOf(Cells(RunTally(shown).out)));
+    counts.insert(names.size());
+  }
+  EXPECT_GE(counts.size(), 4u);
+  // Of several reports each takes what it can.
+  EXPECT_EQ(Lines(Output({"export", "vm-stats,comp-stats", "--group", "1050", "--levels=3",
+                          kIncident + "@.."}))
+                .size(),
+            1u + 5u + 2u + 5u);
+}
+
+TEST_F(ExportTest, RefusesSelectionsThatThereAreNot) {
+  ExpectFailure({"export", "comp-stats,heap-stats", "-g", "1", kExample},
+                "no report that is exported takes --group", 2);
+  ExpectFailure({"export", "pmem-stats", "-l", "2", kExample},
+                "no report that is exported takes --levels", 2);
+  ExpectFailure({"export", "vm-stats", "-i", "vm", kExample},
+                "no report that is exported takes --include", 2);
+  ExpectFailure({"export", "vm-stats", "-g", "1x", kExample},
+                "--group takes the number of a group: 1x", 2);
+  ExpectFailure({"export", "vm-stats", "-g", "-1", kExample},
+                "--group takes the number of a group: -1", 2);
+  ExpectFailure({"export", "vm-stats", "-l", "0", kExample}, "--levels takes a number from 1 on: 0",
+                2);
+  ExpectFailure({"export", "vm-stats", "-l", "13", kExample}, "--levels takes a number up to 12",
+                2);
+  const harness::Result result = Run({"export", "all", "-e", "uw:sys", kExample});
+  EXPECT_EQ(result.status, 2);
+  EXPECT_EQ(result.err, "ksicache: --exclude takes flags of uw-stats: uw:sys\nThere are uw, vm\n");
+  // A moment without the group is said, and the others are there.
+  const harness::Result none = Run({"export", "vm-stats", "-g", "999", kExample});
+  EXPECT_EQ(none.status, 1);
+  EXPECT_EQ(none.err, "ksicache: " + kExample +
+                          ": TallyTraverseGroups: KSI_GetInstanceListAlloc failure: Not found\n" +
+                          "ksicache: " + kExample + ": vm-stats: 0xbad0003 Not found\n");
+}
+
 TEST_F(ExportTest, TakesAListOfFiles) {
   const std::string one = RecordingAt("one.rec", {"2026-11-21T10:00:00Z"});
   const std::string odd = Path("a\nb.ksi");
@@ -641,9 +709,10 @@ TEST_F(ExportTest, RefusesWhatItDoesNotUnderstand) {
   ExpectFailure({"export"},
                 "not as in:\nUsage: ksicache export REPORT[,REPORT...]|all "
                 "[FILE[@WHEN|@FROM..TO]...]\n                       [--format FORMAT] "
-                "[--unit UNIT] [--columns NAMES]\n                       [--every TIME] "
-                "[--files-from LIST] [--output OUT]\n                       [--append] [--force] "
-                "[--mode MODE] [--cluster NAME]",
+                "[--unit UNIT] [--columns NAMES]\n                       [--group GID] "
+                "[--levels N] [--include FLAGS]\n                       [--exclude FLAGS] "
+                "[--every TIME] [--files-from LIST]\n                       [--output OUT] "
+                "[--append] [--force] [--mode MODE]\n                       [--cluster NAME]",
                 2);
   ExpectFailure({"export", "vm-stats,vm-stats"}, "vm-stats is named twice", 2);
   const harness::Result report = Run({"export", "vm-stats,", kExample});

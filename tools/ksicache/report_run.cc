@@ -152,8 +152,17 @@ void ForEachMoment(const std::string& name, const std::function<void(const Origi
   visit(OriginOf(head.host, head.taken));
 }
 
-void RunReport(const tally::Report& report, tally::Sink& sink) {
-  const tally::ReportOptions options = {.levels = report.frame->defaultLevels};
+bool GoesDownGroups(const tally::Report& report) {
+  return report.frame->Takes('g') && report.frame->Takes('l');
+}
+
+void RunReport(const tally::Report& report, tally::Sink& sink,
+               const tally::ReportOptions& selection) {
+  tally::ReportOptions options = {.levels = report.frame->defaultLevels};
+  if (report.frame->Takes('g')) options.startGid = selection.startGid;
+  if (GoesDownGroups(report)) options.levels = selection.levels;
+  if (report.frame->Takes('i')) options.inclusionText = selection.inclusionText;
+  if (report.frame->Takes('e')) options.exclusionText = selection.exclusionText;
   const std::string name = report.name;
   static_cast<void>(tally::TakeLoss());
   const ksi::Status status = report.run(options, sink);

@@ -26,9 +26,15 @@ Origin LiveOrigin();
 // all that a recording has from the one time to the other. Fails with a DataError.
 void ForEachMoment(const std::string& name, const std::function<void(const Origin&)>& visit);
 
-// Runs a report on what the library answers from. Fails with a DataError that starts with the
-// report's name, after the library's diagnostics, if rows are missing; the others have been given.
-void RunReport(const tally::Report& report, tally::Sink& sink);
+// Runs a report on what the library answers from, of `selection` with the groups to start from, the
+// levels to go down and the flags, as far as it takes them; by itself it has all rows. Fails with a
+// DataError that starts with the report's name, after the library's diagnostics, if rows are
+// missing; the others have been given.
+void RunReport(const tally::Report& report, tally::Sink& sink,
+               const tally::ReportOptions& selection = {});
+
+// Whether levels, for the report, are those of groups.
+bool GoesDownGroups(const tally::Report& report);
 
 }  // namespace ksicache
 

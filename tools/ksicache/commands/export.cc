@@ -2,7 +2,9 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <charconv>
 #include <cstdint>
+#include <cstring>
 #include <memory>
 #include <optional>
 #include <string>
@@ -12,6 +14,7 @@
 #include "framework/name_list.h"
 #include "reports/reports.h"
 #include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/diagnostics.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/export/exporter.h"
 #include "tools/ksicache/export/formats.h"
@@ -23,6 +26,7 @@
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/quantity.h"
+#include "tools/ksicache/report_run.h"
 
 namespace ksicache {
 namespace {
@@ -31,10 +35,16 @@ constexpr Option kFormat = {"format", "FORMAT", "write another format than csv"}
 constexpr Option kAppend = {"append", nullptr, "add to the database OUT what it has not"};
 constexpr Option kColumns = {"columns", "NAMES",
                              "only these, such as used:free, and what rows are of", 's'};
+constexpr Option kGroup = {"group", "GID", "only what is in this group", 'g'};
+constexpr Option kLevels = {"levels", "N", "go down so many levels of groups", 'l'};
+constexpr Option kInclude = {"include", "FLAGS", "only groups with one of these, such as vm:uw",
+                             'i'};
+constexpr Option kExclude = {"exclude", "FLAGS", "only groups with none of these", 'e'};
 constexpr Option kFilesFrom = {"files-from", "LIST", "take also the files that LIST names"};
 constexpr Option kCluster = {"cluster", "NAME", "have tables over all servers of this cluster"};
-constexpr const Option* kOptions[] = {&kFormat, &kUnit,   &kColumns, &kEvery, &kFilesFrom,
-                                      &kOutput, &kAppend, &kForce,   &kMode,  &kCluster};
+constexpr const Option* kOptions[] = {&kFormat,  &kUnit,    &kColumns, &kGroup,     &kLevels,
+                                      &kInclude, &kExclude, &kEvery,   &kFilesFrom, &kOutput,
+                                      &kAppend,  &kForce,   &kMode,    &kCluster};
 
 using Reports = std::vector<const tally::Report*>;
 
@@ -143,6 +153,66 @@ std::vector<std::string_view> WantedColumns(const CommandLine& line, const Repor
   return columns;
 }
 
+bool TakesGroup(const tally::Report& report) { return report.frame->Takes('g'); }
+bool TakesFlags(const tally::Report& report) { return report.frame->filterNames != nullptr; }
+
+// The value of an option that some reports take; null if it is not there.
+const char* Selecting(const CommandLine& line, const Option& option, const Reports& reports,
+                      bool (*takes)(const tally::Report&)) {
+  const std::string* value = line.ValueOf(option);
+  if (value == nullptr) return nullptr;
+  const bool isTaken =
+      std::ranges::any_of(reports, [takes](const tally::Report* report) { return takes(*report); });
+  if (!isTaken) {
+    throw UsageError(std::string("no report that is exported takes --") + option.name);
+  }
+  return value->c_str();
+}
+
+// Flags that all reports know that take any.
+const char* FlagsOf(const CommandLine& line, const Option& option, const Reports& reports) {
+  const char* text = Selecting(line, option, reports, TakesFlags);
+  Diagnostics said;  // what is wrong stands in the error
+  for (const tally::Report* report : reports) {
+    if (text == nullptr || !TakesFlags(*report)) continue;
+    uint32_t mask = 0;
+    const tally::FlagName* flags = report->frame->filterNames;
+    if (tally::ParseFlagFilter(text, flags, mask, false) == tally::kSuccess && mask != 0) continue;
+    said.TakeKept();
+    std::vector<std::string_view> names;
+    for (; flags->name != nullptr; ++flags) names.emplace_back(flags->name);
+    throw UsageError(
+        std::string("--") + option.name + " takes flags of " + report->name + ": " + text,
+        ListOf("There are ", names));
+  }
+  return text;
+}
+
+int64_t GroupOf(const char* text) {
+  if (text == nullptr) return 0;
+  int64_t group = 0;
+  const char* end = text + std::strlen(text);
+  const auto [stop, error] = std::from_chars(text, end, group);
+  if (error != std::errc() || stop != end || group < 0) {
+    throw UsageError(std::string("--group takes the number of a group: ") + text);
+  }
+  return group;
+}
+
+// Which rows are wanted.
+tally::ReportOptions SelectionOf(const CommandLine& line, const Reports& reports) {
+  tally::ReportOptions selection;
+  selection.startGid = GroupOf(Selecting(line, kGroup, reports, TakesGroup));
+  if (Selecting(line, kLevels, reports, GoesDownGroups) != nullptr) {
+    const int64_t levels = CountOf(line, kLevels, tally::kMaxLevels);
+    if (levels > tally::kMaxLevels) throw UsageError("--levels takes a number up to 12");
+    selection.levels = static_cast<uint32_t>(levels);
+  }
+  selection.inclusionText = FlagsOf(line, kInclude, reports);
+  selection.exclusionText = FlagsOf(line, kExclude, reports);
+  return selection;
+}
+
 std::vector<std::string> FilesOf(const CommandLine& line) {
   std::vector<std::string> files(line.arguments.begin() + 1, line.arguments.end());
   if (const std::string* list = line.ValueOf(kFilesFrom)) {
@@ -166,6 +236,7 @@ int Export(const CommandLine& line) {
   const FormatInfo& info = FormatOf(line);
   const std::optional<tally::DisplayUnit> unit = UnitOf(line, info);
   const std::vector<std::string_view> columns = WantedColumns(line, reports);
+  const tally::ReportOptions selection = SelectionOf(line, reports);
   const int64_t every = DurationOf(line, kEvery, 0);
   const std::string database = DatabaseOf(line, info);
   std::optional<NewFile> file = database.empty() ? FileOf(line, info) : std::nullopt;
@@ -181,7 +252,7 @@ int Export(const CommandLine& line) {
                                                        .cluster = ClusterOf(line, info),
                                                        .database = database});
   RowSink sink(*format, unit, columns);
-  Exporter exporter(info, *format, sink, every);
+  Exporter exporter(info, *format, sink, every, selection);
   info.isSchema ? exporter.Describe(reports) : exporter.Export(reports, files);
   if (exporter.HasBegun()) format->Finish();
   return exporter.IsWhole() ? 0 : 1;

@@ -55,7 +55,7 @@ void Exporter::ExportMoment(Reports reports, const Origin& origin) {
   for (const tally::Report* report : reports) {
     hasBegun_ = true;
     sink_.Expect(*report, origin);
-    Saying([&] { RunReport(*report, sink_); });
+    Saying([&] { RunReport(*report, sink_, selection_); });
     const std::string lost = sink_.TakeComplaint();
     if (!lost.empty()) complaints_.Say(report->name + (": " + lost));
   }

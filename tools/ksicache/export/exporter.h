@@ -18,8 +18,14 @@ namespace ksicache {
 class Exporter {
  public:
   // `every`: of a file's moments the first in each interval of so many us is taken; 0: all.
-  Exporter(const FormatInfo& info, RowFormat& format, RowSink& sink, int64_t every)
-      : isByReport_(info.isByReport), format_(format), sink_(sink), every_(every) {}
+  // `selection`: as of RunReport.
+  Exporter(const FormatInfo& info, RowFormat& format, RowSink& sink, int64_t every,
+           const tally::ReportOptions& selection)
+      : isByReport_(info.isByReport),
+        format_(format),
+        sink_(sink),
+        every_(every),
+        selection_(selection) {}
 
   using Reports = std::span<const tally::Report* const>;
 
@@ -46,6 +52,7 @@ class Exporter {
   RowFormat& format_;
   RowSink& sink_;
   int64_t every_;
+  tally::ReportOptions selection_;
   Complaints complaints_;
   bool hasBegun_ = false;
 };
