@@ -494,8 +494,8 @@ TEST_F(ExportTest, ExportsWhatIsNotDamagedOfARecording) {
       if (i == 0 || (i - 1) / 3 != chunk) rest += lines[i] + "\n";
     }
     EXPECT_EQ(result.out, rest);
-    EXPECT_EQ(result.err, "ksicache: " + damaged + "@..: " + damaged + "@first: the part of " +
-                              times[3 * chunk] + " is damaged\nksicache: " + damaged +
+    EXPECT_EQ(result.err, "ksicache: " + damaged + "@..: the part of " + times[3 * chunk] +
+                              " is damaged\nksicache: " + damaged +
                               "@..: moments are missing: 0xbad0008 Metadata read error\n");
     // Nothing is wrong with what was not asked for.
   }

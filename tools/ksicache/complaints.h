@@ -1,11 +1,14 @@
 #ifndef TOOLS_KSICACHE_COMPLAINTS_H_
 #define TOOLS_KSICACHE_COMPLAINTS_H_
 
+#include <cstddef>
 #include <set>
 #include <string>
 
 #include "tools/ksicache/diagnostics.h"
+#include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
+#include "tools/ksicache/printable.h"
 
 namespace ksicache {
 
@@ -13,7 +16,10 @@ namespace ksicache {
 class Complaints {
  public:
   // `name`: empty for the host itself.
-  void BeginFile(const std::string& name) { before_ = name.empty() ? "" : name + ": "; }
+  void BeginFile(const std::string& name) {
+    before_ = name.empty() ? "" : name + ": ";
+    file_ = name.empty() ? "" : Printable(FileNameOf(name));
+  }
 
   void Say(const std::string& text) {
     isEmpty_ = false;
@@ -22,13 +28,23 @@ class Complaints {
 
   // What the library has said meanwhile: what it could not read.
   void SayDiagnostics() {
-    for (const std::string& text : diagnostics_.TakeKept()) Say(text);
+    for (const std::string& text : diagnostics_.TakeKept()) Say(WithoutFile(text));
   }
 
   bool IsEmpty() const { return isEmpty_; }
 
  private:
+  // The library names the file and the moment that it was given, which need not be the one that
+  // was asked for.
+  std::string WithoutFile(const std::string& text) const {
+    const bool isOfFile = !file_.empty() && text.starts_with(file_) &&
+                          (text[file_.size()] == ':' || text[file_.size()] == '@');
+    const size_t end = isOfFile ? text.find(": ", file_.size()) : std::string::npos;
+    return end == std::string::npos ? text : text.substr(end + 2);
+  }
+
   std::string before_;
+  std::string file_;
   Diagnostics diagnostics_;
   std::set<std::string> said_;
   bool isEmpty_ = true;
