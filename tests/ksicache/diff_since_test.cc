@@ -39,6 +39,17 @@ class DiffSince : public RecordingTest {
     return value;
   }
 
+  // So many more than `from`.
+  static uint64_t Beyond(size_t i, size_t from) { return i > from ? i - from : 0; }
+
+  // Has a user world have so much mapped, in KB.
+  static void Set(MomentReading& reading, uint64_t kilobytes) {
+    KSI_UwTally tally = {};
+    std::memcpy(&tally, reading.answer.record.data(), sizeof tally);
+    tally.mapped = kilobytes;
+    std::memcpy(reading.answer.record.data(), &tally, sizeof tally);
+  }
+
   // Adds to what a user world has mapped, in KB.
   static void Grow(MomentReading& reading, uint64_t kilobytes) {
     KSI_UwTally tally = {};
@@ -85,15 +96,19 @@ TEST_F(DiffSince, FindsLeaks) {
 TEST_F(DiffSince, IsQuietWhereNothingLeaks) {
   constexpr uint32_t kHosts = 50;
   uint32_t alarms = 0;
+  uint32_t late = 0;
   for (uint32_t seed = 1000; seed < 1000 + kHosts; ++seed) {
     LeakHost host(seed, kMoments);
     const json steady = SteadyOf(MomentsOf(host));
+    late += steady["late"].empty() ? 0 : 1;
     if (steady["things"].empty() && steady["groups"].empty()) continue;
     ++alarms;
     std::cout << "seed " << seed << ": " << steady["things"] << steady["groups"] << "\n";
   }
   std::cout << alarms << " alarms of " << kHosts << " quiet hosts\n";
   EXPECT_LE(alarms, 1U);
+  std::cout << late << " with some that grew late or in steps\n";
+  EXPECT_LE(late, 5U);
 }
 
 // The screen, with when what is full.
@@ -154,6 +169,116 @@ TEST_F(DiffSince, AClockSetBack) {
   EXPECT_TRUE(
       Output({"diff", Path("r.rec") + "@10:06:10", Path("r.rec")}).find("later one first") ==
       std::string::npos);
+}
+
+// Which moment is the later one, the recording knows, whatever its clock says.
+TEST_F(DiffSince, TheOrderIsThatOfTheRecording) {
+  LeakHost host(2, kMoments);
+  std::vector<Moment> moments = MomentsOf(host);
+  moments.resize(3);
+  moments[2].facts.taken = kStart - 3600 * kSecond;
+  moments[2].host.boot = "2";
+  Record(Path("r.rec"), moments);
+  const std::string first = Path("r.rec") + "@first";
+  const std::string last = Path("r.rec") + "@last";
+  EXPECT_TRUE(Output({"diff", first, last})
+                  .starts_with("h, 2026-11-21T10:00:00Z to 2026-11-21T09:00:00Z, the clock was set "
+                               "back\n"));
+  EXPECT_TRUE(
+      Output({"diff", last, first})
+          .starts_with("h, 2026-11-21T09:00:00Z to 2026-11-21T10:00:00Z, the later one first\n"));
+  EXPECT_EQ(json::parse(Output({"diff", first, last, "--json"}))["seconds"], nullptr);
+  EXPECT_EQ(Run({"diff", first, last, "--fail-above", "9t"}).status, 0);
+  ExpectFailure({"diff", last, first, "--fail-above", "9t"},
+                "--fail-above takes the earlier moment first");
+}
+
+// The rows of one report, by a column of it.
+TEST_F(DiffSince, OfAReport) {
+  LeakHost host(2, kMoments);
+  host.Leak(LeakHost::Kind::heap);
+  Record(Path("r.rec"), MomentsOf(host));
+  const std::vector<std::string> used = {"diff", "--since",    "7d",   Path("r.rec"),
+                                         "-r",   "heap-stats", "--by", "used"};
+  EXPECT_EQ(Output(used), R"(h, 2026-11-21T10:00:00Z to 2026-11-23T09:40:48Z: 1d 23h
+150 of 150 moments read; the recording begins there
+heap-stats, Bytes, by used
+
+who grows steadily                          now      growth    an hour   full in
+heap0                                 113504256    10072064     230400
+)");
+  std::vector<std::string> args = used;
+  args.insert(args.end(), {"--json", "-u", "kb", "--fail-above", "9m"});
+  const harness::Result result = Run(args);
+  EXPECT_EQ(result.status, 3);
+  const json steady = json::parse(result.out);
+  EXPECT_EQ(steady["report"], "heap-stats");
+  EXPECT_EQ(steady["by"], "used");
+  EXPECT_EQ(steady["unit"], "KB");
+  ASSERT_EQ(steady["things"].size(), 1U);
+  EXPECT_EQ(steady["things"][0]["name"], "heap0");
+  EXPECT_EQ(steady["things"][0]["growth"], 9836);
+  args.back() = "10m";
+  EXPECT_EQ(Run(args).status, 0);
+  // What is no memory has no unit, and is none that could be too much.
+  ExpectFailure({"diff", "--since", "7d", Path("r.rec"), "-r", "lpool-stats", "--by", "nrLPages",
+                 "--fail-above", "1"},
+                "--fail-above takes memory, and nrLPages is none: --by names another column", 2);
+  EXPECT_NE(
+      Output({"diff", "--since", "7d", Path("r.rec"), "-r", "lpool-stats", "--by", "nrLPages"})
+          .find("moments read; the recording begins there\nlpool-stats, by nrLPages\n\n"
+                "nobody grows steadily\n"),
+      std::string::npos);
+}
+
+// One that begins in the last third, and one that climbs four steps, are told apart from those that
+// grow all the time.
+TEST_F(DiffSince, WhoGrewLateOrInSteps) {
+  LeakHost host(1000, kMoments);
+  std::vector<Moment> moments = MomentsOf(host);
+  const size_t late = moments.size() * 3 / 4;
+  for (size_t i = 0; i < moments.size(); ++i) {
+    for (MomentReading& reading : moments[i].readings) {
+      const std::string& path = RecordedNodes()[reading.question.node].path;
+      if (path != "sched/memClients/tally/uw") continue;
+      const OwnKey& key = reading.question.keys[0];
+      if (key == OwnKey(int64_t{1003}))
+        Set(reading, 500'000 + i % 2 * 400 + Beyond(i, late) * 20'000);
+      if (key == OwnKey(int64_t{1004})) Set(reading, 500'000 + i % 2 * 400 + i / 34 * 90'000);
+    }
+  }
+  const json steady = SteadyOf(moments);
+  ASSERT_EQ(steady["late"].size(), 2U) << steady;
+  EXPECT_EQ(steady["late"][0]["name"], "process3");
+  EXPECT_EQ(steady["late"][1]["name"], "process4");
+  EXPECT_EQ(steady["late"][1]["steps"], 4);
+  EXPECT_EQ(Run({"diff", "--since", "7d", Path("r.rec"), "--fail-above", "1m"}).status, 0);
+  EXPECT_TRUE(Output({"diff", "--since", "7d", Path("r.rec")}).ends_with(R"(
+nobody grows steadily
+
+who grew late, or in steps                  now      growth    an hour   full in
+user world process3                     1240400      709800      62500
+    it began at 2026-11-22T21:31:12Z
+user world process4                      860400      360200       7683
+    it grew in 4 steps, the last one at 2026-11-23T06:09:36Z
+)"));
+}
+
+// A name may be anything.
+TEST_F(DiffSince, ANameOfBlanks) {
+  LeakHost host(1000, kMoments);
+  std::vector<Moment> moments = MomentsOf(host);
+  for (size_t i = 0; i < moments.size(); ++i) {
+    for (MomentReading& reading : moments[i].readings) {
+      const std::string& path = RecordedNodes()[reading.question.node].path;
+      if (reading.question.keys[0] != OwnKey(int64_t{1003})) continue;
+      if (path == "sched/memClients/tally/uw") Set(reading, 500'000 + i * 1000);
+      if (path == "sched/groups/groupName") Rename(reading, "  ");
+    }
+  }
+  const json steady = SteadyOf(moments);
+  ASSERT_EQ(steady["things"].size(), 1U) << steady;
+  EXPECT_EQ(steady["things"][0]["name"], "  ");
 }
 
 // A process for each few moments, and one that changes its name while it grows.

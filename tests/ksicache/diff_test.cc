@@ -313,6 +313,26 @@ TEST_F(Diff, WithThisHost) {
   EXPECT_NE(result.out.find("1 row changed"), std::string::npos) << result.out;
 }
 
+// Names that differ in their middle alone are told apart; of one name the numbers do it.
+TEST_F(Diff, LongNamesThatLookAlike) {
+  const std::vector<std::pair<std::string, std::string>> names = {
+      {R"("text":"db-orders")", R"("text":"db-ledger-replica-third-of-the-data-center")"},
+      {R"("text":"db-ledger-replica-of-the-second-site")",
+       R"("text":"db-ledger-replica-second-of-the-data-center")"}};
+  const std::string before = ExampleWith("before.ksi", names);
+  std::vector<std::pair<std::string, std::string>> changes = names;
+  changes.emplace_back(R"("mapped":32547796)", R"("mapped":32548796)");
+  const std::string out = Output({"diff", before, Later("later.ksi", changes)});
+  EXPECT_NE(out.find(R"(
+  db-ledger-replica-third-of-the-data-center 1000
+                                       30668752     30669752         1000      -
+  db-ledger-replica-second-of-the-data-center 1010
+                                       24377296     24378296         1000      -
+)"),
+            std::string::npos)
+      << out;
+}
+
 TEST_F(Diff, FailAbove) {
   const auto status = [](std::vector<std::string> args) {
     args.insert(args.begin(), "diff");
@@ -342,6 +362,29 @@ TEST_F(Diff, FailAboveLooksAtWhatIsConsumed) {
   EXPECT_EQ(Run({"diff", afternoon, "-r", "vm-stats", "--fail-above", "2g"}).status, 0);
   ExpectFailure({"diff", kBefore, kAfter, "-r", "comp-stats", "--fail-above", "1g"},
                 "--fail-above takes memory: --by names the column of comp-stats", 2);
+}
+
+// What was started anew has not grown by all it has.
+TEST_F(Diff, FailAboveAfterARestart) {
+  const std::string restarted =
+      Later("restarted.ksi",
+            {{"[307]", "[309]"}, {",307]", ",309]"}, {R"("mapped":196608)", R"("mapped":198656)"}});
+  for (const std::vector<std::string>& more : {{}, std::vector<std::string>{"-r", "uw-stats"}}) {
+    std::vector<std::string> args = {"diff", kExample, restarted, "--json"};
+    args.insert(args.end(), more.begin(), more.end());
+    args.insert(args.end(), {"--fail-above", "2m"});
+    const harness::Result result = Run(args);
+    EXPECT_EQ(result.status, 0);
+    EXPECT_NE(result.out.find(R"("state":"new")"), std::string::npos) << result.out;
+    EXPECT_NE(result.out.find(R"("state":"gone")"), std::string::npos);
+    args.back() = "2097151";
+    EXPECT_EQ(Run(args).status, 3);
+  }
+  // Another one beside it has grown by all it has.
+  const std::string another =
+      Later("another.ksi", {{R"("text":"storage-daemon")", R"("text":"another")"}});
+  EXPECT_EQ(Run({"diff", kExample, another, "--fail-above", "100m"}).status, 3);
+  EXPECT_EQ(Run({"diff", kExample, another, "-r", "uw-stats", "--fail-above", "100m"}).status, 3);
 }
 
 // It is not said that nothing grew where that cannot be told.
@@ -431,8 +474,10 @@ TEST_F(Diff, Misused) {
   ExpectFailure({"diff", kExample, kExample, "--fail-above", "much"},
                 "--fail-above takes a size such as 500M or 2G: much", 2);
   ExpectFailure({"diff", kExample, kExample, "--since", "1h"}, "--since takes one FILE", 2);
-  ExpectFailure({"diff", kExample, "--since", "1h", "-r", "vm-stats"},
-                "--since looks at all memory, and takes no --report", 2);
+  ExpectFailure({"diff", kIncident, "--since", "1h", "-r", "comp-stats"},
+                "--since takes a column of comp-stats: --by names it", 2);
+  ExpectFailure({"diff", kIncident, "--since", "1h", "-r", "vm-stats", "--by", "none"},
+                "vm-stats has no column none that could grow", 2);
   ExpectFailure({"diff", kExample, "--since", "1h"}, kExample + ": --since takes a recording");
   ExpectFailure({"diff", Path("none.rec"), "--since", "1h"},
                 Path("none.rec") + ": No such file or directory");

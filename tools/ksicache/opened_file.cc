@@ -186,8 +186,11 @@ NamedMoment OpenNamed(const std::string& name) {
 MomentHead HeadOf(const std::string& name) {
   ksi::ChunkReader moment;
   const ksi::OpenedCache opened = OpenAny(name, moment);
-  if (opened.recording != nullptr) return {moment.Host().name, moment.Facts().taken};
-  return {opened.capture->GetCapture().host, TakenOf(*opened.capture)};
+  if (opened.recording == nullptr) {
+    return {opened.capture->GetCapture().host, TakenOf(*opened.capture)};
+  }
+  return {moment.Host().name, moment.Facts().taken, opened.number, moment.Host().boot,
+          moment.Facts().uptime};
 }
 
 ksi::Moment ReadMoment(const std::string& name) {

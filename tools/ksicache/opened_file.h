@@ -58,10 +58,15 @@ struct NamedMoment {
 };
 NamedMoment OpenNamed(const std::string& name);
 
-// Whose moment a name stands for, and when it was taken, us since 1970.
+// Whose moment a name stands for, and when it was taken, us since 1970. Of a recording's moment
+// also its number, in the order in which they were recorded; the boot that it is of; and how long
+// the host had run then, in us. These two are empty and 0 if it does not tell.
 struct MomentHead {
   std::string host;
   int64_t taken;
+  std::optional<int64_t> number = std::nullopt;
+  std::string boot = {};
+  int64_t uptime = 0;
 };
 MomentHead HeadOf(const std::string& name);
 

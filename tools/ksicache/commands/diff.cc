@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 
@@ -18,8 +19,11 @@
 #include "tools/ksicache/diff/report_output.h"
 #include "tools/ksicache/diff/rows.h"
 #include "tools/ksicache/diff/steady.h"
+#include "tools/ksicache/diff/steady_memory.h"
 #include "tools/ksicache/diff/steady_output.h"
+#include "tools/ksicache/diff/steady_rows.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/export/row_sink.h"
 #include "tools/ksicache/quantity.h"
 
 namespace ksicache {
@@ -64,7 +68,7 @@ int StatusOf(const CommandLine& line, int64_t growth, bool isWhole) {
 // Whoever asks what grew by too much has to name the earlier moment first.
 Sides SidesOf(const CommandLine& line) {
   Sides sides = SidesOf(NamesOf(line.arguments), line.Has(kAcrossHosts));
-  if (line.Has(kFailAbove) && sides.Seconds() < 0) {
+  if (line.Has(kFailAbove) && sides.IsBackward()) {
     throw Error("--fail-above takes the earlier moment first");
   }
   return sides;
@@ -92,12 +96,22 @@ int DiffHost(const CommandLine& line) {
   return StatusOf(line, balance.largest, complaints.IsEmpty());
 }
 
-// All moments of a recording for a time.
-int DiffSince(const CommandLine& line) {
-  const tally::DisplayUnit unit = UnitOf(line).value_or(tally::DisplayUnit::kb);
+[[noreturn]] void RefuseToFail(const char* column) {
+  throw UsageError(std::string("--fail-above takes memory, and ") + column +
+                   " is none: --by names another column");
+}
+
+// All moments of a recording for a time: the rows of a report, or all memory.
+int DiffSince(const CommandLine& line, const tally::Report* report) {
+  const tally::DisplayUnit own = report == nullptr ? tally::DisplayUnit::kb : OwnUnitOf(*report);
+  const tally::DisplayUnit unit = UnitOf(line).value_or(own);
   const auto top = static_cast<size_t>(CountOf(line, kTop, kSomeThings));
+  std::unique_ptr<Sampler> sampler = std::make_unique<MemorySampler>();
+  if (report != nullptr) sampler = std::make_unique<RowSampler>(*report, line.ValueOf(kBy));
   bool isWhole = true;
-  const SteadyGrowths growths = FindSteady(line.arguments[0], DurationOf(line, kSince, 0), isWhole);
+  const SteadyGrowths growths =
+      FindSteady(line.arguments[0], DurationOf(line, kSince, 0), *sampler, isWhole);
+  if (line.Has(kFailAbove) && !growths.AreBytes()) RefuseToFail(growths.column->name);
   line.Has(kJson) ? PrintSteadyJson(growths, unit, top) : PrintSteady(growths, unit, top);
   constexpr double kMost = 9e18;
   const auto largest = static_cast<int64_t>(std::min(growths.Largest(), kMost));
@@ -112,8 +126,7 @@ void CheckCanFail(const ReportDiff& diff) {
                      diff.After().GetReport().name);
   }
   if (diff.LargestBytes()) return;
-  throw UsageError(std::string("--fail-above takes memory, and ") +
-                   diff.Columns()[*diff.Measure()].name + " is none: --by names another column");
+  RefuseToFail(diff.Columns()[*diff.Measure()].name);
 }
 
 // Two moments of one report.
@@ -133,7 +146,7 @@ int DiffReport(const CommandLine& line) {
     if (!sides.HaveSameNumbers()) paths[isAfter].emplace(origin);
   });
   const ReportDiff diff(*rows[0], *rows[1], paths[0] ? &*paths[0] : nullptr,
-                        paths[1] ? &*paths[1] : nullptr, sides.Seconds(), line.ValueOf(kBy));
+                        paths[1] ? &*paths[1] : nullptr, sides, line.ValueOf(kBy));
   if (line.Has(kFailAbove)) CheckCanFail(diff);
   line.Has(kJson) ? PrintReportDiffJson(sides, diff, top) : PrintReportDiff(sides, diff, top);
   return StatusOf(line, diff.LargestBytes().value_or(0), complaints.IsEmpty());
@@ -144,9 +157,8 @@ int Diff(const CommandLine& line) {
   SizeOf(line, kFailAbove, 0);  // one that is none fails at once
   if (line.Has(kBy) && !isOfReport) throw UsageError("--by goes with --report");
   if (!line.Has(kSince)) return isOfReport ? DiffReport(line) : DiffHost(line);
-  if (isOfReport) throw UsageError("--since looks at all memory, and takes no --report");
   if (line.arguments.size() > 1) throw UsageError("--since takes one FILE");
-  return DiffSince(line);
+  return DiffSince(line, isOfReport ? &ReportOf(line) : nullptr);
 }
 
 }  // namespace
@@ -159,7 +171,7 @@ const Command kDiff = {
 rows of one report. A recording alone is its first and its last moment, one of
 its moments that and the last; a capture alone is compared with this host.
 With --since it looks at all moments for so long before the one named, and tells
-who grew steadily and what is full when.
+who grew steadily, of all memory or of a report, and what is full when.
 )",
     .options = kOptions,
     .fewest = 1,

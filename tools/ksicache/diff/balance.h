@@ -41,6 +41,9 @@ struct PartGrowth {
   size_t unknown = 0;  // left out
   Growth sum;
   std::vector<ThingGrowth> things;  // that changed, those that did most first
+  // The most bytes that any of them grew by; what came under a name in place of what has gone under
+  // it grew by the difference.
+  int64_t largest = 0;
 };
 
 // How a host's memory went from one moment to another, and who explains it.
@@ -55,7 +58,7 @@ struct Balance {
   PartGrowth groups;                   // which are not
   std::optional<int64_t> unexplained;  // used less all that are added
 
-  // The most bytes that the host, a part's thing or a group grew by.
+  // The most bytes that the host or anything in a part grew by.
   int64_t largest = 0;
 };
 

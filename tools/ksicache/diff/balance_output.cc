@@ -1,11 +1,11 @@
 #include "tools/ksicache/diff/balance_output.h"
 
 #include <algorithm>
-#include <map>
 #include <span>
 #include <string>
 #include <utility>
 
+#include "tools/ksicache/diff/names.h"
 #include "tools/ksicache/diff/sides_json.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/output.h"
@@ -86,16 +86,13 @@ class Screen {
     PrintLine("  " + std::to_string(part.unknown) + " more without a figure, not added");
   }
 
-  // Names that look alike are told apart by their numbers.
   void PrintThings(const PartGrowth& part) const {
-    std::map<std::string, int> known;
-    const auto shown = [this](const ThingGrowth& thing, int64_t number) {
-      return OnTheLeft("  " + NameText(thing.name, number), left_);
-    };
-    for (const ThingGrowth& thing : part.things) ++known[shown(thing, -1)];
+    NameColumn names(left_);
+    for (const ThingGrowth& thing : part.things) names.Add("  ", thing.name);
     for (const ThingGrowth& thing : FirstOf(part, top_)) {
-      Figures(shown(thing, known[shown(thing, -1)] > 1 ? thing.number : -1),
-              thing.isNew ? "new" : NumberText(thing.growth.before),
+      const NameColumn::Cell name = names.CellOf("  ", thing.name, thing.number);
+      if (!name.above.empty()) PrintLine(name.above);
+      Figures(name.text, thing.isNew ? "new" : NumberText(thing.growth.before),
               thing.isGone ? "gone" : NumberText(thing.growth.after), thing.growth.Amount(), true);
     }
   }

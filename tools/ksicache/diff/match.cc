@@ -1,7 +1,7 @@
 #include "tools/ksicache/diff/match.h"
 
-#include <cstring>
 #include <string_view>
+#include <utility>
 
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
@@ -12,47 +12,46 @@ namespace {
 // The kernel has no more levels of groups than this.
 constexpr int kMostLevels = 256;
 
-// Whether the numbers of a report's keys are those of groups and processes: its rows are found by
-// a walk over the groups then, which can be told where to start.
-bool GoesByGroups(const tally::Report& report) {
-  return std::strchr(report.frame->options, 'g') != nullptr;
-}
+// Where identities are: those of one in a chain, in their order.
+class Places {
+ public:
+  explicit Places(std::span<const std::string_view> identities)
+      : next_(identities.size(), Match::kNone) {
+    first_.reserve(identities.size());
+    for (size_t i = identities.size(); i-- > 0;) {
+      const auto [found, isOnly] = first_.try_emplace(identities[i], i);
+      if (!isOnly) next_[i] = std::exchange(found->second, i);
+    }
+  }
 
-// Adds a part of an identity, so that none can be taken for two.
-void AddPart(std::string_view part, std::string& identity) {
-  identity += std::to_string(part.size()) + ":";
-  identity += part;
-}
+  bool HasOne(std::string_view identity) const {
+    const auto found = first_.find(identity);
+    return found != first_.end() && next_[found->second] == Match::kNone;
+  }
 
-size_t PlaceOf(const Rows& rows, std::string_view name) {
-  size_t place = 0;
-  while (place < rows.Columns().size() && rows.Columns()[place].name != name) ++place;
-  return place;
-}
+  // The first place that has not been taken; kNone if there is none.
+  size_t Take(std::string_view identity) {
+    const auto found = first_.find(identity);
+    if (found == first_.end() || found->second == Match::kNone) return Match::kNone;
+    return std::exchange(found->second, next_[found->second]);
+  }
 
-// Where an identity is, and how many of these places have been matched.
-struct Places {
-  std::vector<size_t> at;
-  size_t used = 0;
+ private:
+  std::unordered_map<std::string_view, size_t> first_;
+  std::vector<size_t> next_;
 };
 
-using PlacesOf = std::unordered_map<std::string_view, Places>;
-
-PlacesOf Find(const std::vector<std::string>& identities) {
-  PlacesOf found;
-  found.reserve(identities.size());
-  for (size_t i = 0; i < identities.size(); ++i) found[identities[i]].at.push_back(i);
-  return found;
-}
-
 }  // namespace
+
+// The walk over the groups, by which rows are found, can be told where to start then.
+bool GoesByGroups(const tally::Report& report) { return report.frame->Takes('g'); }
 
 GroupPaths::GroupPaths(const Origin& origin) {
   const Rows groups(tally::groupStats, origin, std::nullopt, {"gid", "name", "parGid"});
   if (!groups.IsWhole()) throw DataError(groups.Complaint());
-  const size_t gid = PlaceOf(groups, "gid");
-  const size_t name = PlaceOf(groups, "name");
-  const size_t parent = PlaceOf(groups, "parGid");
+  const size_t gid = PlaceOf(groups.Columns(), "gid");
+  const size_t name = PlaceOf(groups.Columns(), "name");
+  const size_t parent = PlaceOf(groups.Columns(), "parGid");
   for (size_t i = 0; i < groups.Count(); ++i) {
     const auto row = groups.At(i);
     groups_.emplace(NumberOf(row[gid]).value_or(-1),
@@ -74,6 +73,11 @@ std::optional<std::string> GroupPaths::Of(int64_t group) const {
   return std::nullopt;
 }
 
+void AddPart(std::string_view part, std::string& identity) {
+  identity += std::to_string(part.size()) + ":";
+  identity += part;
+}
+
 std::vector<std::string> IdentitiesOf(const Rows& rows, const GroupPaths* paths) {
   const bool hasNumbers = paths == nullptr || !GoesByGroups(rows.GetReport());
   std::vector<std::string> identities(rows.Count());
@@ -93,22 +97,20 @@ std::vector<std::string> IdentitiesOf(const Rows& rows, const GroupPaths* paths)
   return identities;
 }
 
-std::vector<Match> MatchAll(const std::vector<std::string>& before,
-                            const std::vector<std::string>& after, bool mayRepeat) {
-  PlacesOf earlier = Find(before);
-  const PlacesOf later = mayRepeat ? PlacesOf() : Find(after);
+std::vector<Match> MatchAll(std::span<const std::string_view> before,
+                            std::span<const std::string_view> after, bool mayRepeat) {
+  Places earlier(before);
+  const std::optional<Places> later = mayRepeat ? std::nullopt : std::make_optional<Places>(after);
+  const auto isMatchable = [&](std::string_view identity) {
+    return !later || (earlier.HasOne(identity) && later->HasOne(identity));
+  };
   std::vector<bool> isMatched(before.size());
   std::vector<Match> matches;
   matches.reserve(after.size());
   for (size_t i = 0; i < after.size(); ++i) {
-    Match& match = matches.emplace_back(Match{Match::kNone, i});
-    const auto found = earlier.find(after[i]);
-    if (found == earlier.end()) continue;
-    Places& places = found->second;
-    if (!mayRepeat && (places.at.size() > 1 || later.at(after[i]).at.size() > 1)) continue;
-    if (places.used == places.at.size()) continue;
-    match.before = places.at[places.used++];
-    isMatched[match.before] = true;
+    const size_t place = isMatchable(after[i]) ? earlier.Take(after[i]) : Match::kNone;
+    matches.push_back({place, i});
+    if (place != Match::kNone) isMatched[place] = true;
   }
   for (size_t i = 0; i < before.size(); ++i) {
     if (!isMatched[i]) matches.push_back({i, Match::kNone});

@@ -4,13 +4,18 @@
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <unordered_map>
 #include <vector>
 
 #include "tools/ksicache/diff/rows.h"
 
 namespace ksicache {
+
+// Whether the numbers of a report's keys are those of groups and processes.
+bool GoesByGroups(const tally::Report& report);
 
 // The names of groups from the root down, "host/services/sshd", by their numbers.
 class GroupPaths {
@@ -28,6 +33,9 @@ class GroupPaths {
   };
   std::unordered_map<int64_t, Group> groups_;
 };
+
+// Adds a part of an identity, so that none can be taken for two.
+void AddPart(std::string_view part, std::string& identity);
 
 // What each row is of, as far as its report tells: its name, and the number that the kernel gave
 // it, for a number alone may have been taken again by something else. After a reboot numbers of
@@ -48,8 +56,8 @@ struct Match {
 
 // Those of the moment after in their order, then those that have gone. Where several have one
 // identity they are matched in their order if `mayRepeat`; otherwise none of them is.
-std::vector<Match> MatchAll(const std::vector<std::string>& before,
-                            const std::vector<std::string>& after, bool mayRepeat);
+std::vector<Match> MatchAll(std::span<const std::string_view> before,
+                            std::span<const std::string_view> after, bool mayRepeat);
 
 }  // namespace ksicache
 

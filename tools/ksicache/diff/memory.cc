@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "reports/reports.h"
+#include "tools/ksicache/diff/figure.h"
 #include "tools/ksicache/diff/match.h"
 #include "tools/ksicache/diff/rows.h"
 #include "tools/ksicache/error.h"
@@ -16,24 +17,6 @@ namespace {
 
 constexpr int64_t kPage = 4096;
 constexpr int64_t kLargePage = int64_t{2} << 20;
-
-std::optional<int64_t> Difference(std::optional<int64_t> a, std::optional<int64_t> b) {
-  int64_t difference = 0;
-  if (!a || !b || __builtin_sub_overflow(*a, *b, &difference)) return std::nullopt;
-  return difference;
-}
-
-std::optional<int64_t> Sum(std::optional<int64_t> a, std::optional<int64_t> b) {
-  int64_t sum = 0;
-  if (!a || !b || __builtin_add_overflow(*a, *b, &sum)) return std::nullopt;
-  return sum;
-}
-
-std::optional<int64_t> Times(std::optional<int64_t> number, int64_t size) {
-  int64_t product = 0;
-  if (!number || __builtin_mul_overflow(*number, size, &product)) return std::nullopt;
-  return product;
-}
 
 class Reader {
  public:
@@ -77,7 +60,7 @@ class Reader {
 
   // Calls `visit` with each row of a report; false if there may be others.
   template <class Visit>
-  bool ForEachRow(const tally::Report& report, Rows::Names names, Visit&& visit) {
+  bool ForEachRow(const tally::Report& report, const Rows::Names& names, Visit&& visit) {
     const Rows rows(report, origin_, tally::DisplayUnit::b, names);
     std::vector<size_t> places;
     for (const std::string_view name : names) places.push_back(PlaceOf(rows.Columns(), name));
@@ -199,7 +182,7 @@ class Reader {
           const std::string name =
               std::string(row.Text(0)) + " of node " + std::to_string(row.Number(1).value_or(-1));
           const std::optional<int64_t> bytes =
-              Difference(Times(row.Number(2), kLargePage), Times(row.Number(3), kPage));
+              Less(Times(row.Number(2), kLargePage), Times(row.Number(3), kPage));
           pools.push_back({name, name, -1, bytes, Times(row.Number(2), kLargePage)});
         });
     SetWhole(isWhole, {Part::largePages});

@@ -2,8 +2,6 @@
 
 #include <optional>
 
-#include <knvlibs/ksi.h>
-#include "knvlibs/open_cache.h"
 #include "knvlibs/times.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/error.h"
@@ -13,26 +11,13 @@
 namespace ksicache {
 namespace {
 
-// The boot that a moment is of, and how long the host had run then, in us; empty and 0 if it does
-// not tell.
-struct Run {
-  std::string boot;
-  int64_t uptime = 0;
-};
-
-Run RunOf(const std::string& name) {
-  if (name.empty()) return {};
-  ksi::OpenedCache opened;
-  ksi::ChunkReader moment;
-  std::string why;
-  const ksi::Status status = ksi::ReadCache(name, &opened, &moment, &why);
-  if (status != ksi::kOk || opened.recording == nullptr) return {};
-  return {moment.Host().boot, moment.Facts().uptime};
+MomentHead NowOf(const std::string& name) {
+  if (!name.empty()) return HeadOf(name);
+  const Origin live = LiveOrigin();
+  return {live.host, live.taken};
 }
 
-Origin OriginOf(const std::string& name) {
-  if (name.empty()) return LiveOrigin();
-  const MomentHead head = HeadOf(name);
+Origin OriginOf(const MomentHead& head) {
   return {head.host, ksi::TextOfTime(head.taken), head.taken};
 }
 
@@ -50,6 +35,10 @@ auto With(const std::string& name, Do&& act) {
   }
 }
 
+int64_t PassedBetween(const Sides& sides) {
+  return sides.ran.value_or(ksi::TimeBetween(sides.before.taken, sides.after.taken));
+}
+
 }  // namespace
 
 MomentNames NamesOf(const std::vector<std::string>& arguments) {
@@ -64,33 +53,39 @@ MomentNames NamesOf(const std::vector<std::string>& arguments) {
   return {name == fileName ? fileName + "@first" : name, fileName + "@last"};
 }
 
-double Sides::Seconds() const {
-  return static_cast<double>(ran.value_or(after.taken - before.taken)) /
-         static_cast<double>(ksi::kSecond);
+std::optional<double> Sides::Seconds() const {
+  const int64_t passed = PassedBetween(*this);
+  if (isInOrder && passed != 0 && *isInOrder != (passed > 0)) return std::nullopt;
+  return static_cast<double>(passed) / static_cast<double>(ksi::kSecond);
 }
+
+bool Sides::IsBackward() const { return isInOrder ? !*isInOrder : PassedBetween(*this) < 0; }
 
 std::string Sides::Title() const {
   std::string title = before.host + ", " + before.time + " to ";
   if (after.host != before.host) title += after.host + ", ";
-  title += after.time + ": " + DurationText(Seconds());
-  if (Seconds() < 0) title += ", the later one first";
-  if (Seconds() > 0 && after.taken < before.taken) title += ", the clock was set back";
+  title += after.time;
+  if (const std::optional<double> seconds = Seconds()) title += ": " + DurationText(*seconds);
+  if (IsBackward()) title += ", the later one first";
+  if (!IsBackward() && after.taken < before.taken) title += ", the clock was set back";
   return title;
 }
 
 Sides SidesOf(const MomentNames& names, bool mayDiffer) {
-  Sides sides = {
-      .names = names, .before = With(names.before, OriginOf), .after = With(names.after, OriginOf)};
-  if (!mayDiffer && sides.before.host != sides.after.host) {
-    throw Error("they are of two hosts, " + sides.before.host + " and " + sides.after.host +
+  const MomentHead from = With(names.before, NowOf);
+  const MomentHead to = With(names.after, NowOf);
+  Sides sides = {.names = names, .before = OriginOf(from), .after = OriginOf(to)};
+  if (!mayDiffer && from.host != to.host) {
+    throw Error("they are of two hosts, " + from.host + " and " + to.host +
                 ": --across-hosts compares them");
   }
-  const Run from = RunOf(names.before);
-  const Run to = RunOf(names.after);
   sides.isRebooted = !from.boot.empty() && !to.boot.empty() && from.boot != to.boot;
   const bool isOneFile = FileNameOf(names.before) == FileNameOf(names.after);
+  if (isOneFile && from.number && to.number) sides.isInOrder = *from.number <= *to.number;
   const bool isOneBoot = from.boot == to.boot && (isOneFile || !from.boot.empty());
-  if (isOneBoot && from.uptime != 0 && to.uptime != 0) sides.ran = to.uptime - from.uptime;
+  if (isOneBoot && from.uptime != 0 && to.uptime != 0) {
+    sides.ran = ksi::TimeBetween(from.uptime, to.uptime);
+  }
   return sides;
 }
 

@@ -32,13 +32,18 @@ struct Sides {
   Origin before;
   Origin after;
   bool isRebooted = false;  // the host was started anew in between, as far as recordings tell
+  // Whether the one was recorded before the other; none if they are not of one recording.
+  std::optional<bool> isInOrder = std::nullopt;
   // By how much longer the host ran at the moment after, in us; none if recordings do not tell.
   std::optional<int64_t> ran = std::nullopt;
 
   // Whether the kernel's numbers name the same groups and processes in both.
   bool HaveSameNumbers() const { return !isRebooted && before.host == after.host; }
-  // How long after the one the other is, whatever the clock was set to.
-  double Seconds() const;
+  // How long after the one the other is, whatever the clock was set to; none if only a clock tells
+  // that was set meanwhile.
+  std::optional<double> Seconds() const;
+  // Whether the one that is named first is the later one.
+  bool IsBackward() const;
   // "a17, 2026-11-21T10:00:00Z to 2026-11-21T10:05:00Z: 5m 0s"
   std::string Title() const;
 };

@@ -5,31 +5,15 @@
 #include <string_view>
 
 #include "framework/display_unit.h"
-#include "framework/name_list.h"
-#include "reports/reports.h"
+#include "tools/ksicache/diff/figure.h"
+#include "tools/ksicache/diff/largest_growth.h"
+#include "tools/ksicache/diff/measure.h"
 #include "tools/ksicache/diff/unit.h"
-#include "tools/ksicache/error.h"
 
 namespace ksicache {
 namespace {
 
 using tally::IsMemory;
-using tally::Kind;
-
-// Whether there is none of it where there is nothing.
-bool IsAmount(Kind kind) {
-  return IsMemory(kind) || kind == Kind::count || kind == Kind::microseconds;
-}
-
-bool CanGrow(Kind kind) { return IsAmount(kind) || kind == Kind::percent || kind == Kind::time; }
-
-std::optional<int64_t> Difference(const Value& before, const Value& after) {
-  const std::optional<int64_t> from = NumberOf(before);
-  const std::optional<int64_t> to = NumberOf(after);
-  int64_t growth = 0;
-  if (!from || !to || __builtin_sub_overflow(*to, *from, &growth)) return std::nullopt;
-  return growth;
-}
 
 // How much the amounts of a column say of who grew: memory more than what is counted, and what was
 // counted for ever least.
@@ -39,53 +23,25 @@ int RankOf(const RowColumn& column) {
   return IsMemory(column.kind) ? 3 : 2;
 }
 
-// What the things of a report have taken, which says who grew.
-struct Use {
-  const tally::Report* report;
-  const char* column;
-};
-constexpr Use kUses[] = {
-    {&tally::groupStats, "consumed"},  {&tally::vmStats, "consumed"},
-    {&tally::uwStats, "consumed"},     {&tally::swapStats, "swapped"},
-    {&tally::zipStats, "usedCache"},   {&tally::heapStats, "size"},
-    {&tally::guestStats, "memNeeded"},
-};
-
-// Empty if it tells of nothing of the kind.
-std::string_view UseOf(const tally::Report& report) {
-  const auto* found = std::ranges::find(kUses, &report, &Use::report);
-  return found == std::end(kUses) ? std::string_view() : found->column;
-}
-
 int64_t SizeOf(int64_t growth) { return growth == INT64_MIN ? INT64_MAX : std::abs(growth); }
 
 }  // namespace
 
 ReportDiff::ReportDiff(const Rows& before, const Rows& after, const GroupPaths* pathsBefore,
-                       const GroupPaths* pathsAfter, double seconds, const std::string* by)
-    : before_(before), after_(after) {
-  measure_ = ColumnCalled(by != nullptr ? *by : UseOf(after.GetReport()));
-  if (by != nullptr && !measure_) {
-    throw UsageError(std::string(after.GetReport().name) + " has no column " + *by +
-                     " that could grow");
-  }
-  for (const Match& match : MatchAll(IdentitiesOf(before, pathsBefore),
-                                     IdentitiesOf(after, pathsAfter), pathsBefore == nullptr)) {
-    Compare(match, seconds);
-  }
+                       const GroupPaths* pathsAfter, const Sides& sides, const std::string* by)
+    : before_(before), after_(after), sides_(sides) {
+  measure_ = MeasureOf(after.GetReport(), Columns(), by);
+  const std::vector<std::string> earlier = IdentitiesOf(before, pathsBefore);
+  const std::vector<std::string> later = IdentitiesOf(after, pathsAfter);
+  const std::vector<std::string_view> from(earlier.begin(), earlier.end());
+  const std::vector<std::string_view> to(later.begin(), later.end());
+  for (const Match& match : MatchAll(from, to, pathsBefore == nullptr)) Compare(match);
   by_ = by != nullptr || HasChanged(measure_) ? measure_ : Best();
   std::ranges::stable_sort(changed_, std::ranges::greater(),
                            [this](const RowChange& row) { return SizeOf(GrowthOf(row, by_)); });
 }
 
-std::optional<size_t> ReportDiff::ColumnCalled(std::string_view name) const {
-  for (size_t i = 0; i < Columns().size(); ++i) {
-    if (tally::SameName(name, Columns()[i].name) && CanGrow(Columns()[i].kind)) return i;
-  }
-  return std::nullopt;
-}
-
-Change ReportDiff::ChangeOf(size_t column, const Match& match, double seconds) const {
+Change ReportDiff::ChangeOf(size_t column, const Match& match) const {
   constexpr Value kNothing = {ValueType::none, 0, {}};
   constexpr Value kZero = {ValueType::unsignedNumber, 0, {}};
   const RowColumn& info = Columns()[column];
@@ -96,20 +52,23 @@ Change ReportDiff::ChangeOf(size_t column, const Match& match, double seconds) c
                    {}};
   const bool isThroughout = !match.IsNew() && !match.IsGone();
   if (!CanGrow(info.kind) || (!isThroughout && !IsAmount(info.kind))) return change;
-  change.growth =
-      Difference(match.IsNew() ? kZero : change.before, match.IsGone() ? kZero : change.after);
-  if (!info.isCounter || !change.growth || !isThroughout) return change;
-  // The one that was given last may be the earlier one.
-  if (*change.growth != 0 && (*change.growth < 0) != (seconds < 0)) {
-    change.isRestarted = true;
-    change.growth.reset();
-  } else if (seconds != 0) {
-    change.perSecond = static_cast<double>(*change.growth) / seconds;
-  }
+  change.growth = Less(NumberOf(match.IsGone() ? kZero : change.after),
+                       NumberOf(match.IsNew() ? kZero : change.before));
+  if (info.isCounter && change.growth && isThroughout) TakeRate(change);
   return change;
 }
 
-void ReportDiff::Compare(const Match& match, double seconds) {
+void ReportDiff::TakeRate(Change& change) const {
+  const std::optional<double> seconds = sides_.Seconds();
+  if (*change.growth != 0 && (*change.growth < 0) != sides_.IsBackward()) {
+    change.isRestarted = true;
+    change.growth.reset();
+  } else if (seconds && *seconds != 0) {
+    change.perSecond = static_cast<double>(*change.growth) / *seconds;
+  }
+}
+
+void ReportDiff::Compare(const Match& match) {
   if ((match.IsNew() && !before_.IsWhole()) || (match.IsGone() && !after_.IsWhole())) {
     ++unknown_;
     return;
@@ -121,7 +80,7 @@ void ReportDiff::Compare(const Match& match, double seconds) {
     const bool isSame =
         isThroughout && IsSame(before_.At(match.before)[i], after_.At(match.after)[i]);
     if (isSame) continue;
-    const Change change = ChangeOf(i, match, seconds);
+    const Change change = ChangeOf(i, match);
     if (isThroughout || change.growth.value_or(0) != 0) row.changes.push_back(change);
   }
   if (isThroughout && row.changes.empty()) {
@@ -160,13 +119,31 @@ bool ReportDiff::HasChanged(std::optional<size_t> column) const {
 
 std::optional<int64_t> ReportDiff::LargestBytes() const {
   if (!measure_ || !IsMemory(Columns()[*measure_].kind)) return std::nullopt;
-  int64_t largest = 0;
-  for (const RowChange& row : changed_) largest = std::max(largest, GrowthOf(row, measure_));
+  LargestGrowth largest;
+  for (const RowChange& row : changed_) {
+    const int64_t growth = GrowthOf(row, measure_);
+    const std::string name = NameOf(row);
+    if (name.empty() || !(row.match.IsNew() || row.match.IsGone())) {
+      largest.Changed(growth);
+    } else if (row.match.IsNew()) {
+      largest.Came(name, growth);
+    } else {
+      largest.Gone(name, SizeOf(growth));
+    }
+  }
   const std::string_view unit = Columns()[*measure_].unit;
   const auto* found = std::ranges::find(tally::kUnitNames, unit, &tally::UnitName::title);
-  int64_t bytes = 0;
-  const bool isTooLarge = __builtin_mul_overflow(largest, BytesIn(found->unit), &bytes);
-  return isTooLarge ? INT64_MAX : bytes;
+  return Times(largest.Find(), BytesIn(found->unit)).value_or(INT64_MAX);
+}
+
+// Empty if the row is known by numbers alone.
+std::string ReportDiff::NameOf(const RowChange& row) const {
+  std::string name;
+  const std::span<const Value> values = RowOf(row);
+  for (size_t i = 0; i < values.size(); ++i) {
+    if (Columns()[i].isKey && values[i].type == ValueType::text) AddPart(values[i].text, name);
+  }
+  return name;
 }
 
 std::span<const Value> ReportDiff::RowOf(const RowChange& row) const {

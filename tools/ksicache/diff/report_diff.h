@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "tools/ksicache/diff/match.h"
+#include "tools/ksicache/diff/moments.h"
 #include "tools/ksicache/diff/rows.h"
 
 namespace ksicache {
@@ -32,12 +33,12 @@ struct RowChange {
 // Two moments of one report.
 class ReportDiff {
  public:
-  // `paths`: of each moment, if the host was started anew in between; else null.
+  // `paths`: of each moment, if the kernel's numbers are not the same in both; else null.
   // `by`: the column to rank by; null: that of what the report's things have taken, or if it did
   // not change the one that changed most, of the memory, else of what is counted now. Fails with a
   // UsageError if there is none of that name.
   ReportDiff(const Rows& before, const Rows& after, const GroupPaths* pathsBefore,
-             const GroupPaths* pathsAfter, double seconds, const std::string* by);
+             const GroupPaths* pathsAfter, const Sides& sides, const std::string* by);
 
   const Rows& Before() const { return before_; }
   const Rows& After() const { return after_; }
@@ -57,22 +58,25 @@ class ReportDiff {
   // have taken.
   std::optional<size_t> Measure() const { return measure_; }
 
-  // The most bytes that a row grew by in that column; none if it is not one of memory.
+  // The most bytes that a row grew by in that column; none if it is not one of memory. What came
+  // under a name in place of what has gone under it grew by the difference.
   std::optional<int64_t> LargestBytes() const;
 
   // The row with its values, of the moment in which it was last.
   std::span<const Value> RowOf(const RowChange& row) const;
 
  private:
-  Change ChangeOf(size_t column, const Match& match, double seconds) const;
-  void Compare(const Match& match, double seconds);
-  std::optional<size_t> ColumnCalled(std::string_view name) const;
+  Change ChangeOf(size_t column, const Match& match) const;
+  void TakeRate(Change& change) const;
+  void Compare(const Match& match);
+  std::string NameOf(const RowChange& row) const;
   std::optional<size_t> Best() const;
   static int64_t GrowthOf(const RowChange& row, std::optional<size_t> column);
   bool HasChanged(std::optional<size_t> column) const;
 
   const Rows& before_;
   const Rows& after_;
+  const Sides& sides_;
   std::vector<RowChange> changed_;
   size_t unchanged_ = 0;
   size_t unknown_ = 0;

@@ -10,12 +10,12 @@ namespace ksicache {
 // Takes them as any format does.
 class Rows::Keeper : public RowFormat {
  public:
-  Keeper(Rows& rows, Names kept) : rows_(rows), kept_(kept) {}
+  Keeper(Rows& rows, const Names& kept) : rows_(rows), kept_(kept) {}
 
   void Begin(const RowTable& table) override {
     for (size_t i = 0; i < table.columns.size(); ++i) {
       const RowColumn& column = table.columns[i];
-      if (kept_.size() != 0 && std::ranges::find(kept_, column.name) == kept_.end()) continue;
+      if (!kept_.empty() && std::ranges::find(kept_, column.name) == kept_.end()) continue;
       places_.push_back(i);
       rows_.columns_.push_back(column);
     }
@@ -32,15 +32,15 @@ class Rows::Keeper : public RowFormat {
 
  private:
   Rows& rows_;
-  Names kept_;
+  const Names& kept_;
   std::vector<size_t> places_;
 };
 
 Rows::Rows(const tally::Report& report, const Origin& origin,
-           std::optional<tally::DisplayUnit> unit, Names kept)
+           std::optional<tally::DisplayUnit> unit, const Names& kept)
     : report_(&report) {
   Keeper keeper(*this, kept);
-  RowSink sink(keeper, unit, {kept.begin(), kept.end()});
+  RowSink sink(keeper, unit, kept);
   sink.Expect(report, origin);
   try {
     RunReport(report, sink);

@@ -4,7 +4,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
-#include <initializer_list>
 #include <optional>
 #include <span>
 #include <string>
@@ -20,12 +19,12 @@ namespace ksicache {
 // The rows of one report on one moment, kept beyond it.
 class Rows {
  public:
-  using Names = std::initializer_list<std::string_view>;
+  using Names = std::vector<std::string_view>;
 
   // Runs the report on what the library answers from, and keeps the columns of these names, or all.
   // Memory is in `unit`; none: in that of the report.
   Rows(const tally::Report& report, const Origin& origin, std::optional<tally::DisplayUnit> unit,
-       Names kept = {});
+       const Names& kept = {});
 
   const tally::Report& GetReport() const { return *report_; }
 

@@ -1,20 +1,11 @@
 #include "tools/ksicache/diff/slope.h"
 
 #include <algorithm>
-#include <array>
 #include <cmath>
 #include <vector>
 
 namespace ksicache {
 namespace {
-
-// REQUIRES: there are numbers.
-double MedianOf(std::span<double> numbers) {
-  const auto middle = numbers.begin() + static_cast<std::ptrdiff_t>(numbers.size() / 2);
-  std::ranges::nth_element(numbers, middle);
-  if (numbers.size() % 2 != 0) return *middle;
-  return (*middle + *std::max_element(numbers.begin(), middle)) / 2;
-}
 
 double MedianSlopeOfAll(std::span<const Point> points) {
   std::vector<double> slopes;
@@ -82,6 +73,13 @@ Point MiddleOf(std::span<const Point> stretch, std::vector<double>& scratch) {
 
 }  // namespace
 
+double MedianOf(std::span<double> numbers) {
+  const auto middle = numbers.begin() + static_cast<std::ptrdiff_t>(numbers.size() / 2);
+  std::ranges::nth_element(numbers, middle);
+  if (numbers.size() % 2 != 0) return *middle;
+  return (*middle + *std::max_element(numbers.begin(), middle)) / 2;
+}
+
 double MedianSlope(std::span<const Point> points) {
   if (points.size() <= kMostPairedPoints) return MedianSlopeOfAll(points);
   std::vector<Point> some;
@@ -91,15 +89,20 @@ double MedianSlope(std::span<const Point> points) {
   return MedianSlopeOfAll(some);
 }
 
+std::vector<Point> MediansOf(std::span<const Point> points, size_t stretches) {
+  std::vector<Point> medians;
+  std::vector<double> scratch;
+  for (size_t i = 0; i < stretches; ++i) {
+    const size_t begin = i * points.size() / stretches;
+    const size_t end = (i + 1) * points.size() / stretches;
+    medians.push_back(MiddleOf(points.subspan(begin, end - begin), scratch));
+  }
+  return medians;
+}
+
 std::optional<Trend> TrendOf(std::span<const Point> points) {
   if (points.size() < kStretches) return std::nullopt;
-  std::array<Point, kStretches> medians;
-  std::vector<double> scratch;
-  for (size_t i = 0; i < kStretches; ++i) {
-    const size_t begin = i * points.size() / kStretches;
-    const size_t end = (i + 1) * points.size() / kStretches;
-    medians[i] = MiddleOf(points.subspan(begin, end - begin), scratch);
-  }
+  const std::vector<Point> medians = MediansOf(points, kStretches);
   const double slope = MedianSlopeOfAll(medians);
   double above = -1e300;
   double below = 1e300;

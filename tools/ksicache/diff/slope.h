@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <optional>
 #include <span>
+#include <vector>
 
 namespace ksicache {
 
@@ -18,6 +19,13 @@ struct Point {
 // different x.
 inline constexpr size_t kMostPairedPoints = 400;
 double MedianSlope(std::span<const Point> points);
+
+// REQUIRES: there are numbers. Puts them into another order.
+double MedianOf(std::span<double> numbers);
+
+// The medians of so many stretches of a series, each as many points long, in their middles.
+// REQUIRES: there are no fewer points.
+std::vector<Point> MediansOf(std::span<const Point> points, size_t stretches);
 
 // The fewest points that a trend can be told from: one for each of its stretches.
 inline constexpr size_t kStretches = 12;

@@ -2,11 +2,11 @@
 
 #include <algorithm>
 #include <cmath>
-#include <map>
 #include <span>
 #include <string>
 
 #include "knvlibs/times.h"
+#include "tools/ksicache/diff/names.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/diff/unit.h"
 #include "tools/ksicache/json_writer.h"
@@ -38,26 +38,32 @@ std::optional<double> PerHour(const SteadyGrowth& growth) {
   return *growth.perSecond * kHour;
 }
 
+// The unit that figures are counted in: those that are no memory are what they are.
+tally::DisplayUnit UnitOf(const SteadyGrowths& growths, tally::DisplayUnit unit) {
+  return growths.AreBytes() ? unit : tally::DisplayUnit::b;
+}
+
+const char* UnitTitle(const SteadyGrowths& growths, tally::DisplayUnit unit) {
+  return growths.AreBytes() ? tally::UnitTitle(unit) : growths.column->unit;
+}
+
 class Screen {
  public:
-  Screen(tally::DisplayUnit unit, size_t top) : unit_(unit), top_(top) {}
+  Screen(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t top)
+      : growths_(growths),
+        title_(UnitTitle(growths, unit)),
+        unit_(UnitOf(growths, unit)),
+        top_(top) {}
 
-  void Print(const SteadyGrowths& growths) const {
-    PrintLine(growths.last.host + ", " + growths.first.time + " to " + growths.last.time + ": " +
-              DurationText(growths.seconds));
-    PrintLine(std::to_string(growths.samples) + " of " + std::to_string(growths.moments) +
-              " moments read" + (growths.isSinceBoot ? ", since the host was started" : "") +
-              (growths.isShort ? "; the recording begins there" : ""));
-    PrintLine("");
-    Header(tally::UnitTitle(unit_));
-    for (const SteadyGrowth& growth : growths.host) PrintGrowth(growth, growth.name);
+  void Print() const {
+    PrintTitle();
+    growths_.report == nullptr ? PrintHost() : PrintColumn();
     PrintLine("");
     PrintAll("who grows steadily",
-             growths.groups.empty() ? "nobody grows steadily" : "nobody alone grows steadily",
-             growths.things);
-    if (growths.groups.empty()) return;
-    PrintLine("");
-    PrintAll("groups, which contain the above", "", growths.groups);
+             growths_.groups.empty() ? "nobody grows steadily" : "nobody alone grows steadily",
+             growths_.things);
+    PrintMore("who grew late, or in steps", growths_.late);
+    PrintMore("groups, which contain the above", growths_.groups);
   }
 
  private:
@@ -68,9 +74,32 @@ class Screen {
               OnTheRight("an hour", 11) + OnTheRight("full in", 10));
   }
 
+  void PrintTitle() const {
+    PrintLine(growths_.last.host + ", " + growths_.first.time + " to " + growths_.last.time + ": " +
+              DurationText(growths_.seconds));
+    PrintLine(std::to_string(growths_.samples) + " of " + std::to_string(growths_.moments) +
+              " moments read" + (growths_.isSinceBoot ? ", since the host was started" : "") +
+              (growths_.isShort ? "; the recording begins there" : ""));
+  }
+
+  void PrintHost() const {
+    constexpr size_t kParts = 2;  // from there on they are parts of what is in use
+    PrintLine("");
+    Header(title_);
+    for (size_t i = 0; i < growths_.host.size(); ++i) {
+      const SteadyGrowth& growth = growths_.host[i];
+      PrintGrowth(growth, OnTheLeft((i < kParts ? "" : "  ") + growth.name, kLeft));
+    }
+  }
+
+  void PrintColumn() const {
+    PrintLine(growths_.report->name + (title_.empty() ? "" : ", " + title_) + ", by " +
+              growths_.column->name);
+  }
+
   void PrintGrowth(const SteadyGrowth& growth, const std::string& name) const {
     const std::string full = growth.fullIn ? DurationText(*growth.fullIn) : "";
-    std::string line = OnTheLeft(name, kLeft) + OnTheRight(NumberText(In(unit_, growth.now)), 13) +
+    std::string line = name + OnTheRight(NumberText(In(unit_, growth.now)), 13) +
                        OnTheRight(NumberText(In(unit_, growth.growth)), 12) +
                        OnTheRight(NumberText(In(unit_, PerHour(growth))), 11);
     if (!full.empty()) line += OnTheRight(full, 10);
@@ -80,6 +109,10 @@ class Screen {
 
   // When it grew, if not all the time.
   static void PrintTimes(const SteadyGrowth& growth) {
+    if (growth.steps != 0) {
+      PrintLine("    it grew in " + std::to_string(growth.steps) + " steps, the last one at " +
+                ksi::TextOfTime(*growth.lastStep));
+    }
     if (!growth.begun && !growth.stopped) return;
     std::string line = "    it";
     if (growth.begun) line += " began at " + ksi::TextOfTime(*growth.begun);
@@ -88,21 +121,33 @@ class Screen {
     PrintLine(line);
   }
 
+  // A table that is there only if it has rows.
+  void PrintMore(const char* title, const Growths& growths) const {
+    if (growths.empty()) return;
+    PrintLine("");
+    PrintAll(title, "", growths);
+  }
+
   void PrintAll(const char* title, const char* none, const Growths& growths) const {
     if (growths.empty()) return PrintLine(none);
     Header(title);
-    std::map<std::string, int> known;
-    const auto shown = [](const SteadyGrowth& growth, int64_t number) {
-      return OnTheLeft(growth.info->of + NameText(growth.name, number), kLeft);
-    };
-    for (const SteadyGrowth& growth : growths) ++known[shown(growth, -1)];
+    NameColumn names(kLeft);
+    for (const SteadyGrowth& growth : growths) names.Add(StartOf(growth), growth.name);
     for (const SteadyGrowth& growth : FirstOf(growths, top_)) {
-      PrintGrowth(growth, shown(growth, known[shown(growth, -1)] > 1 ? growth.number : -1));
+      const NameColumn::Cell name = names.CellOf(StartOf(growth), growth.name, growth.number);
+      if (!name.above.empty()) PrintLine(name.above);
+      PrintGrowth(growth, name.text);
     }
     const size_t more = growths.size() - FirstOf(growths, top_).size();
     if (more != 0) PrintLine("and " + std::to_string(more) + " more");
   }
 
+  static const char* StartOf(const SteadyGrowth& growth) {
+    return growth.info == nullptr ? "" : growth.info->of;
+  }
+
+  const SteadyGrowths& growths_;
+  std::string title_;  // of the unit
   tally::DisplayUnit unit_;
   size_t top_;
 };
@@ -116,7 +161,7 @@ std::string ToJson(const SteadyGrowth& growth, tally::DisplayUnit unit) {
   if (growth.info != nullptr) {
     json.Text("what", growth.info->name).Text("source", growth.info->source);
   }
-  json.Text("name", std::string_view(growth.name).substr(growth.name.find_first_not_of(' ')));
+  json.Text("name", growth.name);
   if (growth.number >= 0) json.Number("group", growth.number);
   json.Number("now", In(unit, growth.now))
       .Number("growth", In(unit, growth.growth))
@@ -124,6 +169,10 @@ std::string ToJson(const SteadyGrowth& growth, tally::DisplayUnit unit) {
       .Real("fullInSeconds", growth.fullIn);
   PutTime("begun", growth.begun, json);
   PutTime("stopped", growth.stopped, json);
+  if (growth.steps != 0) {
+    json.Number("steps", growth.steps);
+    PutTime("lastStep", growth.lastStep, json);
+  }
   return json.Object();
 }
 
@@ -136,21 +185,26 @@ std::string ToJson(std::span<const SteadyGrowth> growths, tally::DisplayUnit uni
 }  // namespace
 
 void PrintSteady(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t top) {
-  Screen(unit, top).Print(growths);
+  Screen(growths, unit, top).Print();
 }
 
 void PrintSteadyJson(const SteadyGrowths& growths, tally::DisplayUnit unit, size_t top) {
+  const tally::DisplayUnit counted = UnitOf(growths, unit);
+  const auto first = [&](const Growths& all) { return ToJson(FirstOf(all, top), counted); };
   JsonWriter json;
   json.Text("host", growths.last.host)
       .Text("from", growths.first.time)
       .Text("to", growths.last.time)
       .Flag("sinceBoot", growths.isSinceBoot)
       .Number("moments", growths.moments)
-      .Number("read", growths.samples)
-      .Text("unit", tally::UnitTitle(unit))
-      .Json("memory", ToJson(growths.host, unit))
-      .Json("things", ToJson(FirstOf(growths.things, top), unit))
-      .Json("groups", ToJson(FirstOf(growths.groups, top), unit));
+      .Number("read", growths.samples);
+  if (growths.report != nullptr) {
+    json.Text("report", growths.report->name).Text("by", growths.column->name);
+  }
+  json.Text("unit", UnitTitle(growths, unit));
+  if (growths.report == nullptr) json.Json("memory", ToJson(growths.host, counted));
+  json.Json("things", first(growths.things)).Json("late", first(growths.late));
+  if (growths.report == nullptr) json.Json("groups", first(growths.groups));
   Print(json.Object() + "\n");
 }
 

@@ -43,6 +43,10 @@ std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report) {
   return (variant == report.variants.end() ? report.variants.front() : *variant).columns;
 }
 
+DisplayUnit OwnUnitOf(const tally::Report& report) {
+  return report.frame->allowBytes ? DisplayUnit::b : DisplayUnit::kb;
+}
+
 RowColumn RowColumnOf(const tally::ColumnInfo& column, DisplayUnit unit) {
   const auto& [desc, figure] = column;
   return {desc.name,        desc.description, figure.kind,          figure.isKey,
@@ -58,7 +62,7 @@ void RowSink::Expect(const tally::Report& report, const Origin& origin) {
 }
 
 void RowSink::TakeColumns(const tally::Report& report) {
-  shown_ = unit_.value_or(report.frame->allowBytes ? DisplayUnit::b : DisplayUnit::kb);
+  shown_ = unit_.value_or(OwnUnitOf(report));
   places_.clear();
   columns_.clear();
   const std::span<const tally::ColumnInfo> all = ColumnsOf(report);

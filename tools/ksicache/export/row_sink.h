@@ -19,6 +19,9 @@ namespace ksicache {
 // The columns of a report, those of the level that it goes down to by itself.
 std::span<const tally::ColumnInfo> ColumnsOf(const tally::Report& report);
 
+// The unit of a report if none is asked for.
+tally::DisplayUnit OwnUnitOf(const tally::Report& report);
+
 // A column as a format sees it that shows memory in this unit.
 RowColumn RowColumnOf(const tally::ColumnInfo& column, tally::DisplayUnit unit);
 
