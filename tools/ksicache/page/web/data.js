@@ -1,9 +1,16 @@
 // Unpacks what the page carries.
 import {Bytes} from './bytes.js';
 
+// The bytes of base64.
+function bytesOf(base64) {
+  const text = atob(base64);
+  const bytes = new Uint8Array(text.length);
+  for (let i = 0; i < text.length; ++i) bytes[i] = text.charCodeAt(i);
+  return bytes;
+}
+
 async function unpack(id) {
-  const text = atob(document.getElementById(id).textContent.trim());
-  const packed = Uint8Array.from(text, (c) => c.charCodeAt(0));
+  const packed = bytesOf(document.getElementById(id).textContent.trim());
   const stream = new Blob([packed]).stream().pipeThrough(new DecompressionStream('deflate'));
   return new Uint8Array(await new Response(stream).arrayBuffer());
 }

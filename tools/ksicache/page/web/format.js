@@ -12,18 +12,16 @@ export const UNITS = {
   b: {title: 'Bytes', shift: 0},
 };
 
-function shiftOf(title) {
-  return Object.values(UNITS).find((unit) => unit.title === title).shift;
-}
+const SHIFTS = new Map(Object.values(UNITS).map(({title, shift}) => [title, shift]));
 
 export function isMemory(column) {
-  return Object.values(UNITS).some((unit) => unit.title === column.unit);
+  return SHIFTS.has(column.unit);
 }
 
 // A figure of memory in another unit, as `ksicache export` has it: fractions are dropped, and what
 // is too large for 64 bits has no value.
 export function converted(value, column, unit) {
-  const shift = shiftOf(column.unit) - UNITS[unit].shift;
+  const shift = SHIFTS.get(column.unit) - UNITS[unit].shift;
   if (shift === 0) return value;
   const whole = BigInt(value);
   const result = shift < 0 ? whole >> BigInt(-shift) : whole << BigInt(shift);
@@ -34,7 +32,7 @@ export function converted(value, column, unit) {
 // Memory in bytes, to draw; null if it has no value.
 export function bytesOf(value, column) {
   return typeof value === 'number' || typeof value === 'bigint'
-    ? Number(value) * 2 ** shiftOf(column.unit) : null;
+    ? Number(value) * 2 ** SHIFTS.get(column.unit) : null;
 }
 
 // What hides, or turns the direction of what is around it, is written out.
