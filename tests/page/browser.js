@@ -40,11 +40,11 @@ export function reshaped(recording, ...changes) {
   return name;
 }
 
-// The example host with so many heaps more.
-export function hostWithHeaps(count) {
+// The example host with so many heaps more; what their names begin with.
+export function hostWithHeaps(count, start = 'heap') {
   const lines = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8').split('\n');
   const heap = lines.findIndex((line) => line.includes('"node":"system/heaps/stats","keys":["acpi"]'));
-  const names = Array.from({length: count}, (_, i) => `heap${i}`);
+  const names = Array.from({length: count}, (_, i) => `${start}${i}`);
   const list = lines.findIndex((line) => line.includes('"node":"system/heaps","keys":[]'));
   lines[list] = lines[list].replace(']},', `,${names.map((name) => `"${name}"`).join(',')}]},`);
   lines.splice(heap, 0, ...names.map((name) => lines[heap].replaceAll('"acpi"', `"${name}"`).replace(/,?$/, ',')));

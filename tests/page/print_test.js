@@ -8,6 +8,7 @@ const RECORDING = join(build, 'incident.rec');
 
 // A4 in the browser's pixels, less margins of 1 cm.
 const PORTRAIT = {width: 718, height: 1047};
+const LANDSCAPE = {width: 1047, height: 718};
 
 async function printed(options = {}) {
   const page = await openPage(makePage(RECORDING), {viewport: PORTRAIT, ...options});
@@ -22,18 +23,32 @@ test('no dark ground, whatever is chosen', async () => {
   await closePage(page);
 });
 
+// What of the page would be cut off.
+async function cutOff(page) {
+  return page.evaluate(() => {
+    const cut = [...document.querySelectorAll('th, td, p, li, caption, .scroller')].filter((each) =>
+      each.clientWidth > 0 && each.scrollWidth > each.clientWidth + 1 && getComputedStyle(each).overflowX !== 'visible');
+    const {scrollWidth, clientWidth} = document.documentElement;
+    return [...cut.map((each) => each.textContent.slice(0, 40)), ...(scrollWidth > clientWidth ? [`${scrollWidth} of ${clientWidth}`] : [])];
+  });
+}
+
+// Tables of reports are printed in landscape.
 test('nothing is cut off', async () => {
-  const page = await printed();
-  for (const report of await page.locator('.reports label:has-text("Report") option').allTextContents()) {
-    await page.emulateMedia({media: 'screen'});
+  const page = await openPage(makePage(hostWithHeaps(2, 'a-heap-of-a-long-name-')), {viewport: PORTRAIT});
+  const reports = await page.locator('.reports label:has-text("Report") option').allTextContents();
+  for (const report of reports) {
     await page.selectOption('.reports label:has-text("Report") select', {label: report});
     await page.emulateMedia({media: 'print'});
-    const cut = await page.evaluate(() => [...document.querySelectorAll('th, td, p, li, caption, .scroller')]
-      .filter((each) => each.scrollWidth > each.clientWidth + 1 && getComputedStyle(each).overflowX !== 'visible' && each.clientWidth > 0)
-      .map((each) => each.textContent.slice(0, 40)));
-    assert.deepEqual(cut, [], report);
+    await page.setViewportSize(LANDSCAPE);
+    assert.deepEqual(await cutOff(page), [], report);
+    await page.emulateMedia({media: 'screen'});
   }
   await closePage(page);
+  const recording = await printed();
+  await recording.evaluate(() => { document.querySelector('.reports').hidden = true; });
+  assert.deepEqual(await cutOff(recording), []);
+  await closePage(recording);
 });
 
 test('rows that are left out are counted', async () => {
