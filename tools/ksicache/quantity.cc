@@ -7,6 +7,7 @@
 #include <span>
 #include <string_view>
 
+#include "framework/name_list.h"
 #include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 
@@ -52,6 +53,15 @@ int64_t DurationOf(const CommandLine& line, const Option& option, int64_t standa
 
 int64_t SizeOf(const CommandLine& line, const Option& option, int64_t standard) {
   return QuantityOf(line, option, standard, kSizes, "a size such as 500M or 2G");
+}
+
+std::optional<tally::DisplayUnit> UnitOf(const CommandLine& line) {
+  const std::string* word = line.ValueOf(kUnit);
+  if (word == nullptr) return std::nullopt;
+  for (const tally::UnitName& name : tally::kUnitNames) {
+    if (tally::SameName(*word, name.word)) return name.unit;
+  }
+  throw UsageError("--unit is mb, kb, pg or b");
 }
 
 int64_t CountOf(const CommandLine& line, const Option& option, int64_t standard) {

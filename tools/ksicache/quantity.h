@@ -3,8 +3,10 @@
 #define TOOLS_KSICACHE_QUANTITY_H_
 
 #include <cstdint>
+#include <optional>
 #include <string>
 
+#include "framework/display_unit.h"
 #include "tools/ksicache/command.h"
 
 namespace ksicache {
@@ -16,6 +18,8 @@ namespace ksicache {
 int64_t DurationOf(const CommandLine& line, const Option& option, int64_t standard);
 // "500M" or "2G" in bytes of 1024; a number alone is bytes.
 int64_t SizeOf(const CommandLine& line, const Option& option, int64_t standard);
+// The unit of --unit; none if it is not there.
+std::optional<tally::DisplayUnit> UnitOf(const CommandLine& line);
 // A number that is not 0.
 int64_t CountOf(const CommandLine& line, const Option& option, int64_t standard);
 

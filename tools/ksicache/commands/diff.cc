@@ -6,7 +6,6 @@
 #include <optional>
 #include <string>
 
-#include "framework/name_list.h"
 #include "reports/reports.h"
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/complaints.h"
@@ -41,15 +40,6 @@ constexpr const Option* kOptions[] = {&kReport, &kBy,   &kTop,       &kSince,
 // So many things of each kind leave two moments on one screen, and so many those of --since.
 constexpr int64_t kFewThings = 3;
 constexpr int64_t kSomeThings = 10;
-
-std::optional<tally::DisplayUnit> UnitOf(const CommandLine& line) {
-  const std::string* word = line.ValueOf(kUnit);
-  if (word == nullptr) return std::nullopt;
-  for (const tally::UnitName& name : tally::kUnitNames) {
-    if (tally::SameName(*word, name.word)) return name.unit;
-  }
-  throw UsageError("--unit is mb, kb, pg or b");
-}
 
 const tally::Report& ReportOf(const CommandLine& line) {
   const std::string& name = *line.ValueOf(kReport);

@@ -89,16 +89,10 @@ const FormatInfo& FormatOf(const CommandLine& line) {
 
 // None: that of each report.
 std::optional<tally::DisplayUnit> UnitOf(const CommandLine& line, const FormatInfo& format) {
-  const std::string* word = line.ValueOf(kUnit);
-  if (format.isInBaseUnits && word != nullptr) {
+  if (format.isInBaseUnits && line.Has(kUnit)) {
     throw UsageError(std::string(format.name) + " is in bytes and seconds, and takes no --unit");
   }
-  if (format.isInBaseUnits) return tally::DisplayUnit::b;
-  if (word == nullptr) return std::nullopt;
-  for (const tally::UnitName& name : tally::kUnitNames) {
-    if (tally::SameName(*word, name.word)) return name.unit;
-  }
-  throw UsageError("--unit is mb, kb, pg or b");
+  return format.isInBaseUnits ? tally::DisplayUnit::b : UnitOf(line);
 }
 
 // The file to make; none for standard output.

@@ -13,10 +13,6 @@
 namespace ksicache {
 namespace {
 
-std::span<const ThingGrowth> FirstOf(const PartGrowth& part, size_t top) {
-  return std::span(part.things).first(std::min(top, part.things.size()));
-}
-
 class Screen {
  public:
   Screen(const Sides& sides, const Balance& balance, size_t top)
@@ -89,7 +85,7 @@ class Screen {
   void PrintThings(const PartGrowth& part) const {
     NameColumn names(left_);
     for (const ThingGrowth& thing : part.things) names.Add("  ", thing.name);
-    for (const ThingGrowth& thing : FirstOf(part, top_)) {
+    for (const ThingGrowth& thing : FirstOf(part.things, top_)) {
       const NameColumn::Cell name = names.CellOf("  ", thing.name, thing.number);
       if (!name.above.empty()) PrintLine(name.above);
       Figures(name.text, thing.isNew ? "new" : NumberText(thing.growth.before),
@@ -128,7 +124,7 @@ std::string ToJson(const ThingGrowth& thing) {
 
 std::string ToJson(const PartGrowth& part, size_t top) {
   JsonWriter rows;
-  for (const ThingGrowth& thing : FirstOf(part, top)) rows.NewLine().Json("", ToJson(thing));
+  for (const ThingGrowth& thing : FirstOf(part.things, top)) rows.NewLine().Json("", ToJson(thing));
   JsonWriter json;
   json.Text("what", part.info->name)
       .Text("source", part.info->source)

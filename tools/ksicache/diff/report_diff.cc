@@ -8,7 +8,7 @@
 #include "tools/ksicache/diff/figure.h"
 #include "tools/ksicache/diff/largest_growth.h"
 #include "tools/ksicache/diff/measure.h"
-#include "tools/ksicache/diff/unit.h"
+#include "tools/ksicache/unit.h"
 
 namespace ksicache {
 namespace {

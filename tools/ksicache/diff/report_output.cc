@@ -12,10 +12,6 @@
 namespace ksicache {
 namespace {
 
-std::span<const RowChange> FirstOf(const ReportDiff& diff, size_t top) {
-  return std::span(diff.Changed()).first(std::min(top, diff.Changed().size()));
-}
-
 std::string TextOf(const Value& value) {
   switch (value.type) {
     case ValueType::none:
@@ -69,7 +65,7 @@ std::string CountText(const ReportDiff& diff) {
 }
 
 bool HasRates(const ReportDiff& diff, size_t top) {
-  return std::ranges::any_of(FirstOf(diff, top), [](const RowChange& row) {
+  return std::ranges::any_of(FirstOf(diff.Changed(), top), [](const RowChange& row) {
     return std::ranges::any_of(row.changes,
                                [](const Change& change) { return change.perSecond.has_value(); });
   });
@@ -143,18 +139,19 @@ void PrintReportDiff(const Sides& sides, const ReportDiff& diff, size_t top) {
   PrintLine(title);
   Print("\n" + OnTheLeft("", 22) + OnTheRight("before", 15) + OnTheRight("after", 16) +
         OnTheRight("growth", 15) + (HasRates(diff, top) ? OnTheRight("a second", 12) : "") + "\n");
-  for (const RowChange& row : FirstOf(diff, top)) {
+  for (const RowChange& row : FirstOf(diff.Changed(), top)) {
     PrintLine(NameOfRow(diff, row));
     for (const Change& change : row.changes) PrintChange(diff, change);
   }
-  const size_t more = diff.Changed().size() - FirstOf(diff, top).size();
+  const size_t more = diff.Changed().size() - FirstOf(diff.Changed(), top).size();
   Print("\n" + CountText(diff) + (more == 0 ? "" : "; " + std::to_string(more) + " not shown") +
         "\n");
 }
 
 void PrintReportDiffJson(const Sides& sides, const ReportDiff& diff, size_t top) {
   JsonWriter rows;
-  for (const RowChange& row : FirstOf(diff, top)) rows.NewLine().Json("", ToJson(diff, row));
+  for (const RowChange& row : FirstOf(diff.Changed(), top))
+    rows.NewLine().Json("", ToJson(diff, row));
   JsonWriter json;
   PutSides(sides, json);
   json.Text("report", diff.After().GetReport().name)

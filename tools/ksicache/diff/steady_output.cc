@@ -8,9 +8,9 @@
 #include "knvlibs/times.h"
 #include "tools/ksicache/diff/names.h"
 #include "tools/ksicache/diff/text.h"
-#include "tools/ksicache/diff/unit.h"
 #include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/output.h"
+#include "tools/ksicache/unit.h"
 
 namespace ksicache {
 namespace {
@@ -18,10 +18,6 @@ namespace {
 constexpr double kHour = 3600;
 
 using Growths = std::vector<SteadyGrowth>;
-
-std::span<const SteadyGrowth> FirstOf(const Growths& growths, size_t top) {
-  return std::span(growths).first(std::min(top, growths.size()));
-}
 
 std::optional<int64_t> In(tally::DisplayUnit unit, std::optional<double> bytes) {
   if (!bytes || !(std::fabs(*bytes) < 9e18)) return std::nullopt;

@@ -2,13 +2,22 @@
 #ifndef TOOLS_KSICACHE_DIFF_TEXT_H_
 #define TOOLS_KSICACHE_DIFF_TEXT_H_
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace ksicache {
+
+// The first `top` of what is shown, or all.
+template <class Shown>
+std::span<const Shown> FirstOf(const std::vector<Shown>& all, size_t top) {
+  return std::span(all).first(std::min(top, all.size()));
+}
 
 // What stands for a figure that has no value.
 inline constexpr const char* kNoFigure = "-";

@@ -1,10 +1,12 @@
 #include "tools/ksicache/export/row_sink.h"
 
 #include <algorithm>
+#include <bit>
 #include <utility>
 
 #include "framework/name_list.h"
 #include "tools/ksicache/export/escaped_text.h"
+#include "tools/ksicache/unit.h"
 
 namespace ksicache {
 namespace {
@@ -15,19 +17,7 @@ using tally::Kind;
 // The bits that a number of this measure has more in bytes.
 int BitsOf(Kind kind) { return kind == Kind::kilobytes ? 10 : kind == Kind::pages ? 12 : 0; }
 
-int BitsOf(DisplayUnit unit) {
-  switch (unit) {
-    case DisplayUnit::mb:
-      return 20;
-    case DisplayUnit::kb:
-      return 10;
-    case DisplayUnit::pg:
-      return 12;
-    case DisplayUnit::b:
-      break;
-  }
-  return 0;
-}
+int BitsOf(DisplayUnit unit) { return std::countr_zero(static_cast<uint64_t>(BytesIn(unit))); }
 
 const char* UnitOf(const tally::Figure& figure, DisplayUnit unit) {
   if (figure.toUnit != nullptr) return tally::UnitTitle(unit);

@@ -9,9 +9,9 @@
 #include "framework/display_unit.h"
 #include "knvlibs/times.h"
 #include "reports/reports.h"
-#include "tools/ksicache/diff/unit.h"
 #include "tools/ksicache/page/roles.h"
 #include "tools/ksicache/printable.h"
+#include "tools/ksicache/unit.h"
 
 namespace ksicache {
 namespace {

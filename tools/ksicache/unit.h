@@ -1,5 +1,5 @@
-#ifndef TOOLS_KSICACHE_DIFF_UNIT_H_
-#define TOOLS_KSICACHE_DIFF_UNIT_H_
+#ifndef TOOLS_KSICACHE_UNIT_H_
+#define TOOLS_KSICACHE_UNIT_H_
 
 #include <cstdint>
 
@@ -24,4 +24,4 @@ constexpr int64_t BytesIn(tally::DisplayUnit unit) {
 
 }  // namespace ksicache
 
-#endif  // TOOLS_KSICACHE_DIFF_UNIT_H_
+#endif  // TOOLS_KSICACHE_UNIT_H_
