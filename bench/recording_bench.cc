@@ -260,7 +260,7 @@ void Record(const std::string& fileName, int moments) {
   Print("figures", static_cast<double>(model.Figures()), "");
   Print("changes a moment", static_cast<double>(changes) / std::max(1, moments - 1), "");
   Print("cost of a moment", sum / moments, "ms CPU");
-  Print("  of 999 in 1000 at most", costs[costs.size() * 999 / 1000], "ms CPU");
+  Print("  999 of 1000 at most", costs[(costs.size() * 999 + 999) / 1000 - 1], "ms CPU");
   Print("  at most", costs.back(), "ms CPU");
   Print("memory at most", static_cast<double>(usage.ru_maxrss) / 1024, "MB");
   Print("file", static_cast<double>(store.Size()) / 1e6, "MB");
