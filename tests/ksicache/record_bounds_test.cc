@@ -129,8 +129,8 @@ TEST_F(RecordBounds, AClockThatMayBeWrongAtTheStartRemovesNothingForAnHour) {
   };
   EXPECT_EQ(record(0, "60"), "");
   const std::string said = "ksicache: " + file_ +
-                           ": files tell no uptime, and recording began anew: for an hour the "
-                           "clock makes no moment too old\n";
+                           ": files tell no uptime: for an hour the clock makes no moment too "
+                           "old\n";
   EXPECT_EQ(record(kMonth, "20"), said);
   EXPECT_EQ(MomentCount(), 80);
   EXPECT_EQ(record(kMonth + 1200, "115"), said);

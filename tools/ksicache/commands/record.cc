@@ -45,6 +45,12 @@ constexpr int64_t kChunksKept = 8;
 // A moment that is later than this, or than a quarter of the time between two, is left out.
 constexpr int64_t kLate = ksi::kSecond;
 
+// Why moments stay that are too old by the clock.
+constexpr const char* kWithoutUptime =
+    ": files tell no uptime: for an hour the clock makes no moment too old";
+constexpr const char* kClockSet =
+    ": the clock was set, or the host started: for an hour it makes no moment too old";
+
 // What is the same again and again is said so often.
 constexpr int64_t kSayEvery = ksi::kHour;
 
@@ -104,14 +110,17 @@ class HourlyAccount {
 
  private:
   void TellHour(const std::string& fileName, int64_t size) const {
+    Tell(fileName + ": " + std::to_string(moments_) + " moments since " + ksi::TextOfTime(from_) +
+         ", " + std::to_string(skipped_) + " skipped, " + std::to_string(dropped_) + " dropped; " +
+         (moments_ == 0 ? "" : CostText()) + std::to_string(size) + " bytes");
+  }
+
+  std::string CostText() const {
     const auto each = [this](uint64_t sum) {
-      const uint64_t tenths = sum / std::max<uint64_t>(1, moments_) / 100;
+      const uint64_t tenths = sum / moments_ / 100;
       return std::to_string(tenths / 10) + "." + std::to_string(tenths % 10) + " ms";
     };
-    Tell(fileName + ": " + std::to_string(moments_) + " moments since " + ksi::TextOfTime(from_) +
-         ", " + std::to_string(skipped_) + " skipped, " + std::to_string(dropped_) +
-         " dropped; each took " + each(duration_) + ", " + each(cpu_) + " of CPU; " +
-         std::to_string(size) + " bytes");
+    return "each took " + each(duration_) + ", " + each(cpu_) + " of CPU; ";
   }
 
   int64_t from_ = 0;
@@ -325,9 +334,7 @@ class Recording {
     outdated_.Add(fileName_, store_.TakeGone());
     const bool holdsBack = retention_.HoldsBack();
     if (holdsBack && !saidHoldsBack_) {
-      const char* why = facts.uptime == 0 ? "files tell no uptime, and recording began anew"
-                                          : "the clock was set, or the host started";
-      PrintError(fileName_ + ": " + why + ": for an hour the clock makes no moment too old");
+      PrintError(fileName_ + (facts.uptime == 0 ? kWithoutUptime : kClockSet));
     }
     saidHoldsBack_ = holdsBack;
   }
