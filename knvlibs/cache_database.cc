@@ -21,11 +21,13 @@ namespace {
 constexpr size_t kHeaderSize = 100;
 constexpr std::string_view kMagic{"SQLite format 3\0", 16};
 constexpr size_t kPageSizeAt = 16;
+constexpr size_t kWriterAt = 18;  // of how it is written, and then of how it is read
 constexpr size_t kPageCountAt = 28;
 constexpr size_t kEncodingAt = 56;
 constexpr size_t kUserVersionAt = 60;
 constexpr size_t kApplicationIdAt = 68;
 constexpr uint32_t kUtf8 = 1;
+constexpr unsigned char kAhead = 2;
 
 // A schema that is not the known one may take arbitrarily long to read; the known one takes a few
 // hundred steps.
@@ -153,6 +155,7 @@ Status CacheDatabase::CheckHead() {
   Header header = {};
   const ssize_t length = pread(descriptor_.Number(), header.data(), header.size(), 0);
   if (length < 0) return StatusOfErrno(errno);
+  isWrittenAhead_ = header[kWriterAt] == kAhead || header[kWriterAt + 1] == kAhead;
   return CheckHeader(header, static_cast<size_t>(length), size_, version_);
 }
 

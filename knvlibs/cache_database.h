@@ -36,6 +36,8 @@ class CacheDatabase {
   // The version of its schema.
   uint32_t Version() const { return version_; }
   uint64_t Size() const { return size_; }
+  // Whether SQLite is told to write changes of it into another file first.
+  bool IsWrittenAhead() const { return isWrittenAhead_; }
   sqlite3* Handle() const { return database_.get(); }
 
   // Fails with KSI_STATUS_METADATA_READ_ERROR if the file has other tables than these.
@@ -86,6 +88,7 @@ class CacheDatabase {
   Database database_;
   uint32_t version_ = 0;
   uint64_t size_ = 0;
+  bool isWrittenAhead_ = false;
   std::string why_;
 };
 

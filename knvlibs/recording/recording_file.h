@@ -112,6 +112,7 @@ class RecordingFile {
 
   const std::string& Why() const { return database_->Why(); }
   uint64_t Size() const { return database_->Size(); }
+  bool IsWrittenAhead() const { return database_->IsWrittenAhead(); }
 
  private:
   explicit RecordingFile(std::unique_ptr<CacheDatabase> database)

@@ -42,14 +42,13 @@ std::string MeaningOf(ksi::Status status, const std::string& fileName) {
       return "made by a newer version";
     case KSI_STATUS_METADATA_READ_ERROR:
       return "damaged";
-    case KSI_STATUS_NO_MEMORY:
-      return "out of memory";
     default:
       return "cannot be read";
   }
 }
 
 [[noreturn]] void Throw(ksi::Status status, const std::string& name, const std::string& why) {
+  if (status == KSI_STATUS_NO_MEMORY) throw std::bad_alloc();
   // A time that is not there needs no more words.
   const bool isTime =
       !why.empty() && (status == KSI_STATUS_NOT_FOUND || status == KSI_STATUS_BAD_PARAM);

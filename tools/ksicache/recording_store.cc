@@ -12,10 +12,11 @@
 #include <unordered_set>
 #include <utility>
 
-#include <knvlibs/ksi_status.h>
 #include "knvlibs/cache_format.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/recording_lock.h"
+#include "tools/ksicache/recording_structure.h"
 
 namespace ksicache {
 namespace {
@@ -123,23 +124,16 @@ void RecordingStore::Lock() {
 
 void RecordingStore::TellWhose() { TellRecorder(file_.Get()); }
 
-std::unique_ptr<ksi::RecordingFile> RecordingStore::Read() const {
-  auto opened = std::make_unique<ksi::CacheDatabase>();
-  ksi::Status status = opened->Open(("/proc/self/fd/" + std::to_string(file_.Get())).c_str());
-  std::string why = opened->Why();
-  std::unique_ptr<ksi::RecordingFile> recording;
-  if (status == ksi::kOk) status = ksi::RecordingFile::Make(std::move(opened), &recording, &why);
-  if (status == KSI_STATUS_NO_MEMORY) throw std::bad_alloc();
-  if (status == KSI_STATUS_INVALID_METADATA) throw DataError(name_ + ": is no recording");
-  if (status != ksi::kOk) {
-    throw DataError(name_ + ": " + (why.empty() ? StatusText(status) : "damaged: " + why));
-  }
-  return recording;
+std::unique_ptr<ksi::RecordingFile> RecordingStore::Read() const try {
+  return OpenRecording("/proc/self/fd/" + std::to_string(file_.Get()));
+} catch (const DataError& error) {
+  throw DataError(name_ + ": " + error.what());
 }
 
 // What there is in the file, and what is free in it.
 void RecordingStore::TakeStock() {
   std::unique_ptr<ksi::RecordingFile> recording = Read();
+  if (recording->IsWrittenAhead()) throw DataError(name_ + ": " + kIsWrittenAhead);
   parts_ = recording->Parts();
   replaced_.clear();
   blocksOf_.clear();
@@ -357,6 +351,10 @@ void RecordingStore::RequireRoom(size_t count, int64_t chunk) const {
     }
   }
   if (room >= count) return;
+  ThrowNoRoom();
+}
+
+void RecordingStore::ThrowNoRoom() const {
   throw NoRoom(name_ + ": there is no room for a moment in " + std::to_string(maxSize_) + " bytes");
 }
 
@@ -397,8 +395,7 @@ std::vector<int64_t> RecordingStore::TakeBlocks(size_t count, int64_t chunk) {
     } else if (!parts_.empty() && parts_.front().chunk != chunk) {
       RemoveFirstChunk();
     } else {
-      throw NoRoom(name_ + ": there is no room for a moment in " + std::to_string(maxSize_) +
-                   " bytes");
+      ThrowNoRoom();
     }
   }
   const auto end = blocks_.begin() + static_cast<ptrdiff_t>(count);

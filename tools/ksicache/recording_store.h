@@ -118,6 +118,7 @@ class RecordingStore {
   void CountGone(int64_t chunk);
   void Remove(const std::vector<Part>& parts);
   void RequireRoom(size_t count, int64_t chunk) const;
+  [[noreturn]] void ThrowNoRoom() const;
   size_t Room() const;
   size_t RoomOnDisk() const;
   void Grow(size_t count);

@@ -31,6 +31,7 @@ class Structure {
     CheckIntegrity();
     // In a file whose structure is broken the rest may be read twice or never end.
     if (!lines_.empty()) return lines_;
+    if (database_.IsWrittenAhead()) Add(kIsWrittenAhead);
     CheckHead();
     CheckCount("PRAGMA freelist_count", "pages have been freed");
     for (const std::string table : {"part", "block"}) {

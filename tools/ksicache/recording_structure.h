@@ -9,6 +9,10 @@
 
 namespace ksicache {
 
+// Of a file that nobody can go on with.
+inline constexpr const char* kIsWrittenAhead =
+    "is in SQLite's write-ahead (WAL) mode, which PRAGMA journal_mode=DELETE ends";
+
 // In a line each, for people. Nothing of a file that is being recorded: who reads its tables as
 // they grow sees the one half of what the recorder does. Fails with a DataError if it cannot be
 // opened.
