@@ -32,7 +32,7 @@ Wanted WantedOf(const std::string& name) {
 }
 
 Status NotATime(const std::string& when, const Span& times, std::string* why) {
-  *why = when + " is no time, as 10:05, -10m and last are: moments are of " + TextOfSpan(times);
+  *why = when + " is no time, as " + kWhenForms + " are: moments are of " + TextOfSpan(times);
   return KSI_STATUS_BAD_PARAM;
 }
 
@@ -79,10 +79,9 @@ Status ChooseMoment(const std::optional<std::string>& when, OpenedCache& opened,
   const Span span = {parts.front().first, parts.back().last};
   opened.asked = TimeOf(*when, span);
   if (!opened.asked) return NotATime(*when, recording.Times(), why);
-  const Status status = when->starts_with('-')
-                            ? EarlierMoment(recording).Find(TimeBetween(*opened.asked, span.last),
-                                                            opened.number, *opened.asked)
-                            : FindTime(*when, opened);
+  const std::optional<int64_t> back = TimeBack(*when);
+  const Status status = back ? EarlierMoment(recording).Find(*back, opened.number, *opened.asked)
+                             : FindTime(*when, opened);
   if (status != kOk) {
     *why = recording.Why();
     return status;

@@ -23,14 +23,14 @@ int64_t ReadClock(clockid_t clock) {
 }
 
 int64_t TimeBetween(int64_t b, int64_t a) {
-  constexpr int64_t kFarthest = std::numeric_limits<int64_t>::max();
+  constexpr int64_t kMost = std::numeric_limits<int64_t>::max();
   int64_t time = 0;
-  if (__builtin_sub_overflow(a, b, &time)) return a < b ? -kFarthest : kFarthest;
-  return std::max(time, -kFarthest);
+  if (__builtin_sub_overflow(a, b, &time)) return a < b ? -kMost : kMost;
+  return std::max(time, -kMost);
 }
 
 std::string TextOfTime(int64_t time) {
-  const time_t seconds = time / kSecond - (time % kSecond < 0 ? 1 : 0);
+  const time_t seconds = SecondOf(time);
   struct tm parts = {};
   return gmtime_r(&seconds, &parts) == nullptr ? std::to_string(time) : TextOf(parts);
 }

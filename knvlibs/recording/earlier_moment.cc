@@ -8,6 +8,22 @@
 namespace ksi {
 
 Status EarlierMoment::Find(int64_t before, int64_t& number, int64_t& asked) {
+  // Up to the end of the second that is asked for.
+  const int64_t time = file_.Parts().back().last - before;
+  const int64_t rest = kSecond - 1 - (time - SecondOf(time) * kSecond);
+  const Status status = FindPassed(before - rest, number, asked);
+  asked -= rest;
+  return status;
+}
+
+Status EarlierMoment::FindFirst(int64_t before, int64_t& number, int64_t& asked) {
+  const Status status = Find(before + kSecond, number, asked);
+  asked += kSecond;
+  ++number;
+  return status;
+}
+
+Status EarlierMoment::FindPassed(int64_t before, int64_t& number, int64_t& asked) {
   const size_t end = file_.Parts().size() - 1;
   Known last;
   // Of a last moment that is damaged its row is known.
@@ -41,8 +57,7 @@ Status EarlierMoment::IsByWall(int64_t number, const Known& last, bool& is) {
   if (status != kOk) return status;
   const MomentFacts& from = known.facts[static_cast<size_t>(number - part->number)];
   const MomentFacts& to = last.facts.back();
-  const int64_t step =
-      TimeBetween(TimeBetween(from.uptime, to.uptime), TimeBetween(from.taken, to.taken));
+  const int64_t step = (to.taken - from.taken) - (to.uptime - from.uptime);
   is = known.boot == last.boot && from.uptime != 0 && step >= -kSecond && step <= kSecond;
   return kOk;
 }
@@ -61,14 +76,14 @@ Status EarlierMoment::FindByUptime(size_t part, int64_t before, int64_t& number,
     if (status == kOk) status = Read(start, first);
     if (status != kOk) return status;
     const MomentFacts to = first.facts.front();
-    const int64_t passed = TimeBetween(to.uptime, from.uptime);
+    const int64_t passed = from.uptime - to.uptime;
     if (before <= passed) return FindIn(start, part, from.uptime - before, number, asked);
     number = -1;
     if (start == 0) return kOk;
     before -= passed;
     part = start - 1;
     const Part& earlier = file_.Parts()[part];
-    const int64_t down = std::max<int64_t>(TimeBetween(earlier.last, to.taken), 0);
+    const int64_t down = std::max<int64_t>(to.taken - earlier.last, 0);
     if (before <= down) {
       number = earlier.End() - 1;
       asked = earlier.last + (down - before);
@@ -93,7 +108,7 @@ Status EarlierMoment::FindStart(size_t part, const Known& known, size_t& start) 
   return kOk;
 }
 
-// The last moment of these parts up to an uptime, or later in that second.
+// The last moment of these parts up to an uptime, or the first one.
 Status EarlierMoment::FindIn(size_t from, size_t to, int64_t uptime, int64_t& number,
                              int64_t& asked) {
   Known known;
@@ -108,7 +123,7 @@ Status EarlierMoment::FindIn(size_t from, size_t to, int64_t uptime, int64_t& nu
   const auto after = std::ranges::upper_bound(known.facts, uptime, {}, &MomentFacts::uptime);
   const auto found = after == known.facts.begin() ? after : std::prev(after);
   number = file_.Parts()[from].number + (found - known.facts.begin());
-  asked = found->taken + TimeBetween(found->uptime, uptime);
+  asked = found->taken + uptime - found->uptime;
   return kOk;
 }
 

@@ -34,15 +34,22 @@ uint64_t RoomOf(const RecordingFile::Part& part) {
   return cache::BlocksOf(static_cast<size_t>(part.size)) * cache::kBlockSize;
 }
 
-// Times are told, and compared, in seconds.
-int64_t SecondOf(int64_t time) { return time / kSecond - (time % kSecond < 0 ? 1 : 0); }
+bool IsTime(int64_t time) { return kFirstTime <= time && time <= kLastTime; }
+
+bool IsGood(const MomentFacts& facts) {
+  constexpr uint64_t kMostCount = kMostNumber;
+  constexpr uint64_t kLongest = kFarthest;
+  return IsTime(facts.taken) && facts.uptime >= 0 && facts.uptime < kFarthest &&
+         facts.duration < kLongest && facts.cpu < kLongest && facts.skipped < kMostCount &&
+         facts.refused < kMostCount && facts.failed < kMostCount;
+}
 
 bool IsGood(const RecordingFile::Part& part) {
   return part.moments > 0 && part.moments <= static_cast<int64_t>(chunk::kMostMoments) &&
          part.chunk >= 0 && part.chunk <= part.number && part.number < kMostNumber &&
          part.End() - part.chunk <= static_cast<int64_t>(chunk::kMostMoments) &&
-         part.first <= part.last && part.size > 0 && part.size <= RecordingFile::kLargestPart &&
-         part.block > 0;
+         IsTime(part.first) && IsTime(part.last) && part.first <= part.last && part.size > 0 &&
+         part.size <= RecordingFile::kLargestPart && part.block > 0;
 }
 
 }  // namespace
@@ -148,8 +155,12 @@ Status RecordingFile::CheckFacts(const Part& part, const std::vector<MomentFacts
   const bool isOfPart = facts.size() == static_cast<size_t>(part.moments) &&
                         facts.front().taken == part.first && facts.back().taken == part.last;
   if (!isOfPart) return Damaged(part, "is not what its row says");
-  const bool isInOrder = std::ranges::is_sorted(facts, {}, &MomentFacts::taken);
-  return isInOrder ? kOk : Damaged(part, "goes back in time");
+  if (!std::ranges::is_sorted(facts, {}, &MomentFacts::taken)) {
+    return Damaged(part, "goes back in time");
+  }
+  const bool isGood =
+      std::ranges::all_of(facts, [](const MomentFacts& each) { return IsGood(each); });
+  return isGood ? kOk : Damaged(part, "has times or numbers that there are not");
 }
 
 Status RecordingFile::ReadFacts(const Part& part, std::vector<MomentFacts>& facts) {
@@ -257,16 +268,17 @@ Status RecordingFile::ReadLastOf(int64_t chunk, ChunkReader& reader, int64_t& nu
   return ReadMoment(number, reader);
 }
 
+int64_t RecordingFile::NumberAfter(int64_t number) const {
+  const Part* part = FindPart(number);
+  if (part != nullptr && number + 1 < part->End()) return number + 1;
+  const auto next = std::ranges::upper_bound(parts_, number, {}, &Part::number);
+  return next == parts_.end() ? kNoMoment : next->number;
+}
+
 Status RecordingFile::ReadNext(int64_t& number, ChunkReader& reader) {
-  const int64_t at = number;
-  const Part* part = FindPart(at);
-  if (part != nullptr && at + 1 < part->End()) {
-    ++number;
-  } else {
-    const auto next = std::ranges::upper_bound(parts_, at, {}, &Part::number);
-    if (next == parts_.end()) return KSI_STATUS_NOT_FOUND;
-    number = next->number;
-  }
+  const int64_t next = NumberAfter(number);
+  if (next == kNoMoment) return KSI_STATUS_NOT_FOUND;
+  const int64_t at = std::exchange(number, next);
   return ReadMoment(number, reader, at);
 }
 

@@ -55,6 +55,13 @@ class RecordingFile {
   // out too.
   const std::vector<Part>& Rows() const { return rows_; }
 
+  // The one that has the moment with a number; null if none has.
+  const Part* FindPart(int64_t number) const;
+
+  // The number of the moment recorded next; kNoMoment after the last.
+  static constexpr int64_t kNoMoment = -1;
+  int64_t NumberAfter(int64_t number) const;
+
   // What a part holds. Every failure of this and the following is KSI_STATUS_METADATA_READ_ERROR,
   // and Why tells the reason, but for that of memory and of reading the disk.
   [[nodiscard]] Status ReadPart(const Part& part, Bytes& content);
@@ -65,7 +72,6 @@ class RecordingFile {
   // The moment with a number that a part has: to look into, or as a whole. `at`: the moment that
   // the reader has been given before; of what both have in common nothing is read again. A reader
   // that fails is empty, and begins anew.
-  static constexpr int64_t kNoMoment = -1;
   [[nodiscard]] Status ReadMoment(int64_t number, ChunkReader& reader, int64_t at = kNoMoment);
   [[nodiscard]] Status ReadWhole(int64_t number, ChunkReader& reader, Moment& moment,
                                  int64_t at = kNoMoment);
@@ -124,7 +130,6 @@ class RecordingFile {
   [[nodiscard]] Status Damaged(const Part& part, const char* why);
   [[nodiscard]] Status TakePart(const Part& part, size_t last, ChunkReader& reader);
   [[nodiscard]] Status CheckFacts(const Part& part, const std::vector<MomentFacts>& facts);
-  const Part* FindPart(int64_t number) const;
   [[nodiscard]] Status ReadLastOf(int64_t chunk, ChunkReader& reader, int64_t& number);
   [[nodiscard]] Status FindIn(const Part& part, int64_t second, int64_t& number, int64_t& found);
 

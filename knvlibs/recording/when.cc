@@ -36,42 +36,48 @@ struct Clock {
   bool hasDate = false;
   bool isUtc = false;
 
-  // The end of its second; none if there is no such time.
+  // The end of its second; none if there is no such day.
   std::optional<int64_t> Time() const {
     struct tm wanted = parts;
+    // What is no date becomes another one.
+    static_cast<void>(timegm(&wanted));
+    if (wanted.tm_mday != parts.tm_mday) return std::nullopt;
+    wanted = parts;
     wanted.tm_isdst = -1;
     const time_t seconds = isUtc ? timegm(&wanted) : mktime(&wanted);
-    // What is no date has become another one; clocks that are put forward leave out an hour only.
-    if (wanted.tm_mday != parts.tm_mday || wanted.tm_mon != parts.tm_mon) return std::nullopt;
-    int64_t time = 0;
-    if (__builtin_mul_overflow(int64_t{seconds}, kSecond, &time) ||
-        __builtin_add_overflow(time, kSecond - 1, &time)) {
-      return std::nullopt;
-    }
-    return time;
+    return int64_t{seconds} * kSecond + kSecond - 1;
   }
 };
 
+// Takes the date from the front of a text, and what parts it from the time.
+bool TakeDate(std::string_view& text, struct tm& to) {
+  constexpr std::string_view kForm = "####-##-##";
+  if (!Match(text.substr(0, kForm.size()), kForm, {&to.tm_year, &to.tm_mon, &to.tm_mday})) {
+    return false;
+  }
+  to.tm_year -= 1900;
+  to.tm_mon -= 1;
+  text.remove_prefix(kForm.size());
+  if (text.starts_with('T') || text.starts_with('t') || text.starts_with(' ')) {
+    text.remove_prefix(1);
+  } else if (!text.empty()) {
+    return false;
+  } else {
+    text = "00:00";
+  }
+  return to.tm_mon >= 0 && to.tm_mon <= 11 && to.tm_mday >= 1 && to.tm_mday <= 31;
+}
+
 std::optional<Clock> ClockOf(std::string_view text) {
   Clock clock;
-  clock.isUtc = text.ends_with('Z');
+  clock.isUtc = text.ends_with('Z') || text.ends_with('z');
   if (clock.isUtc) text.remove_suffix(1);
   struct tm& to = clock.parts;
-  clock.hasDate =
-      Match(text, "####-##-##T##:##:##",
-            {&to.tm_year, &to.tm_mon, &to.tm_mday, &to.tm_hour, &to.tm_min, &to.tm_sec}) ||
-      Match(text, "####-##-##T##:##",
-            {&to.tm_year, &to.tm_mon, &to.tm_mday, &to.tm_hour, &to.tm_min});
-  if (clock.hasDate) {
-    to.tm_year -= 1900;
-    to.tm_mon -= 1;
-    if (to.tm_mon < 0 || to.tm_mon > 11 || to.tm_mday < 1 || to.tm_mday > 31) return std::nullopt;
-  } else {
-    to = {};
-    if (!Match(text, "##:##:##", {&to.tm_hour, &to.tm_min, &to.tm_sec}) &&
-        !Match(text, "##:##", {&to.tm_hour, &to.tm_min})) {
-      return std::nullopt;
-    }
+  clock.hasDate = text.find('-') != std::string_view::npos;
+  if (clock.hasDate && !TakeDate(text, to)) return std::nullopt;
+  if (!Match(text, "##:##:##", {&to.tm_hour, &to.tm_min, &to.tm_sec}) &&
+      !Match(text, "##:##", {&to.tm_hour, &to.tm_min})) {
+    return std::nullopt;
   }
   if (to.tm_hour > 23 || to.tm_min > 59 || to.tm_sec > 59) return std::nullopt;
   return clock;
@@ -115,24 +121,22 @@ std::optional<int64_t> UnitOf(char letter) {
   }
 }
 
-// "10m" before the last moment.
-std::optional<int64_t> TimeBefore(std::string_view text, int64_t last) {
-  if (text.empty()) return std::nullopt;
-  const std::optional<int64_t> unit = UnitOf(text.back());
-  text.remove_suffix(1);
+}  // namespace
+
+std::optional<int64_t> TimeBack(std::string_view when) {
+  if (when.size() < 2 || when.front() != '-') return std::nullopt;
+  const std::optional<int64_t> unit = UnitOf(when.back());
+  const std::string_view number = when.substr(1, when.size() - 2);
+  const char* const numberEnd = number.data() + number.size();
   int64_t count = 0;
-  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), count);
-  int64_t before = 0;
-  int64_t time = 0;
-  if (!unit || error != std::errc() || end != text.data() + text.size() || count < 0 ||
-      __builtin_mul_overflow(count, *unit, &before) ||
-      __builtin_sub_overflow(last, before, &time)) {
+  const auto [end, error] = std::from_chars(number.data(), numberEnd, count);
+  int64_t back = 0;
+  if (!unit || error != std::errc() || end != numberEnd || count < 0 ||
+      __builtin_mul_overflow(count, *unit, &back)) {
     return std::nullopt;
   }
-  return time;
+  return std::min(back, kFarthest);
 }
-
-}  // namespace
 
 std::string TextOfSpan(const Span& span) {
   return TextOfTime(span.first) + " to " + TextOfTime(span.last);
@@ -141,7 +145,7 @@ std::string TextOfSpan(const Span& span) {
 std::optional<int64_t> TimeOf(std::string_view when, const Span& span) {
   if (when == "first") return span.first;
   if (when == "last") return span.last;
-  if (when.starts_with('-')) return TimeBefore(when.substr(1), span.last);
+  if (const std::optional<int64_t> back = TimeBack(when)) return span.last - *back;
   const std::optional<Clock> clock = ClockOf(when);
   if (!clock) return std::nullopt;
   return clock->hasDate ? clock->Time() : LatestOf(*clock, span.last);

@@ -312,7 +312,7 @@ TEST_F(ExportTest, RefusesTimesThatThereAreNot) {
     EXPECT_EQ(result.err, "ksicache: " + name + ": " + message + "\n");
   };
   expect(kIncident + "@11:00..11x",
-         "11x is no time, as those of 10:05..10:10, -1h.. and first..last are: " + kSpan);
+         "11x is no time, as 2026-11-21T10:05, 10:05, -10m and last are: " + kSpan);
   expect(kIncident + "@2026-11-22T10:00Z..", "there is no moment in that time: " + kSpan);
   expect(kIncident + "@11:00Z..", "there is no moment in that time: " + kSpan);
   expect(kIncident + "@11:00Z..12:00Z", "there is no moment in that time: " + kSpan);
@@ -495,8 +495,11 @@ TEST_F(ExportTest, ExportsWhatIsNotDamagedOfARecording) {
     }
     EXPECT_EQ(result.out, rest);
     EXPECT_EQ(result.err, "ksicache: " + damaged + "@..: the part of " + times[3 * chunk] +
-                              " is damaged\nksicache: " + damaged +
-                              "@..: moments are missing: 0xbad0008 Metadata read error\n");
+                              " is damaged
+ksicache: " + damaged + "@..: 3 moments of " +
+                              times[3 * chunk] + " to " + times[3 * chunk + 2] +
+                              " cannot be read
+");
     // Nothing is wrong with what was not asked for.
   }
   // Nothing is missing of what lies before it.

@@ -138,6 +138,15 @@ size       )" + std::to_string(bytes) +
                 "--remarks is of a list, and --summary is none", 2);
 }
 
+// What captures took was not recorded.
+TEST_F(MomentsTest, OfCapturesTakeNobodyKnowsWhat) {
+  WriteSmallHost(Path("c.ksi"));
+  Output({"join", file_, Path("c.ksi")});
+  EXPECT_NE(Output({"moments", file_}).find("        -       -  "), std::string::npos);
+  EXPECT_NE(Output({"moments", "--summary", file_}).find("\ntook       -; of CPU -\n"),
+            std::string::npos);
+}
+
 // Recorders that follow each other may take moments in steps of their own.
 TEST_F(MomentsTest, AnotherStepIsNoGap) {
   for (const int64_t at : {0, 5, 10, 15, 75, 135, 195, 255, 315, 375, 380, 385, 390}) Add(at, at);

@@ -1,4 +1,5 @@
 // Recordings of hosts whose clock was set: every moment is found, and none is mixed with others.
+#include <algorithm>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -22,6 +23,25 @@ class RecordingClock : public RecordingTest {
       moments_[i].facts.taken = TimeAt(starts[i / count] + 5 * static_cast<int64_t>(i % count));
     }
     Record(file_, moments_);
+  }
+
+  // Ten moments each from kStart and from another second on, as the clock on the wall went, of
+  // which the last may be of another boot.
+  void RecordSteps(int64_t second, bool isBooted) {
+    RecordFrom({0, second}, 10);
+    for (size_t i = 0; i < moments_.size(); ++i) {
+      const bool isOther = isBooted && i >= 10;
+      moments_[i].host.boot = isOther ? "b" : "a";
+      moments_[i].facts.uptime = static_cast<int64_t>(isOther ? 5 * i - 30 : 500 + 5 * i) * kSecond;
+    }
+    Record(file_, moments_);
+  }
+
+  // How many moments a span has, and the time of the first one.
+  std::string MomentsOf(const std::string& span) const {
+    const std::string list = Output({"moments", file_ + "@" + span});
+    const size_t at = list.find('\n') + 1;
+    return std::to_string(std::ranges::count(list, '\n') - 1) + " " + list.substr(at + 11, 8);
   }
 
   // A clock ticks somewhere in its second.
@@ -75,22 +95,11 @@ TEST_F(RecordingClock, MomentsOfAClockThatWasWrongAreFound) {
                     "2026-11-21T10:00:00Z to 2026-11-22T10:00:15Z");
 }
 
-// Ten moments each from some starts on, as the clock on the wall went, of which the last may be of
-// another boot.
 TEST_F(RecordingClock, SoLongBeforeIsByTheClockThatNobodySets) {
-  const auto record = [this](int64_t second, bool isBooted) {
-    RecordFrom({0, second}, 10);
-    for (size_t i = 0; i < moments_.size(); ++i) {
-      const bool isOther = isBooted && i >= 10;
-      moments_[i].host.boot = isOther ? "b" : "a";
-      moments_[i].facts.uptime = static_cast<int64_t>(isOther ? 5 * i - 30 : 500 + 5 * i) * kSecond;
-    }
-    Record(file_, moments_);
-  };
   // Put forward by a day, or set back by half an hour.
   for (const int64_t second : {50, 86400, -1800}) {
     SCOPED_TRACE(second);
-    record(second, false);
+    RecordSteps(second, false);
     EXPECT_EQ(NumberAt("-0s"), 19);
     EXPECT_EQ(NumberAt("-5s"), 18);
     EXPECT_EQ(NumberAt("-7s"), 17);
@@ -101,16 +110,76 @@ TEST_F(RecordingClock, SoLongBeforeIsByTheClockThatNobodySets) {
     EXPECT_EQ(NumberAt("-96s"), KSI_STATUS_NOT_FOUND);
   }
   // A host that was down for some time; by a clock that was behind then for none.
-  record(145, true);
+  RecordSteps(145, true);
   EXPECT_EQ(NumberAt("-45s"), 10);
   EXPECT_EQ(NumberAt("-60s"), 9);
   EXPECT_EQ(NumberAt("-145s"), 9);
   EXPECT_EQ(NumberAt("-146s"), 8);
-  record(-1800, true);
+  RecordSteps(-1800, true);
   EXPECT_EQ(NumberAt("-45s"), 10);
   EXPECT_EQ(NumberAt("-46s"), 8);
   EXPECT_EQ(NumberAt("-60s"), 6);
   EXPECT_EQ(NumberAt("-91s"), KSI_STATUS_NOT_FOUND);
+}
+
+// A clock that nobody sets does not tick with that on the wall, and none ticks evenly.
+TEST_F(RecordingClock, SoLongBeforeIsInWholeSeconds) {
+  RecordSteps(86400, false);
+  for (size_t i = 0; i < moments_.size(); ++i) {
+    const int64_t late = i % 3 == 1 ? 1700 : 0;
+    moments_[i].facts.taken += late;
+    moments_[i].facts.uptime += 777'777 + late;
+  }
+  Record(file_, moments_);
+  for (int64_t i = 0; i < 20; ++i) {
+    EXPECT_EQ(NumberAt("-" + std::to_string(5 * i) + "s"), 19 - i);
+  }
+}
+
+// A span that begins so long before the last moment has what was recorded since, wherever the clock
+// was set, and begins where a moment is that is asked for so.
+TEST_F(RecordingClock, SpansThatGoBackAreThoseThatPassed) {
+  for (const int64_t second : {50, 86400, -1800}) {
+    SCOPED_TRACE(second);
+    RecordSteps(second, false);
+    EXPECT_EQ(MomentsOf("-45s.."), "10 " + TextOfTime(TimeAt(second)).substr(11, 8));
+    EXPECT_EQ(MomentsOf("-47s.."), "10 " + TextOfTime(TimeAt(second)).substr(11, 8));
+    EXPECT_EQ(MomentsOf("-50s.."), "11 10:00:45");
+    EXPECT_EQ(MomentsOf("-60s..-55s"), "2 10:00:35");
+    EXPECT_EQ(MomentsOf("..-90s"), "2 10:00:00");
+    EXPECT_EQ(MomentsOf("-1d.."), "20 10:00:00");
+    EXPECT_EQ(MomentsOf("-0s.."), "1 " + TextOfTime(TimeAt(second + 45)).substr(11, 8));
+    const std::string none = Run({"moments", file_ + "@..-1h"}).err;
+    EXPECT_NE(none.find("there is no moment in that time"), std::string::npos) << none;
+  }
+  // A host that was down for 100 s, or by its clock for none.
+  RecordSteps(145, true);
+  EXPECT_EQ(MomentsOf("-45s.."), "10 10:02:25");
+  EXPECT_EQ(MomentsOf("-144s.."), "10 10:02:25");
+  EXPECT_EQ(MomentsOf("-145s.."), "11 10:00:45");
+  EXPECT_EQ(MomentsOf("-150s..-60s"), "2 10:00:40");
+  RecordSteps(-1800, true);
+  EXPECT_EQ(MomentsOf("-46s.."), "11 10:00:45");
+}
+
+// What is exported of such a span is what is listed.
+TEST_F(RecordingClock, SpansThatGoBackAreExported) {
+  Output({"load", TALLY_EXAMPLE_JSON, Path("h.ksi")});
+  const Moment moment = ksicache::MomentOf(ksicache::OpenedFile(Path("h.ksi")).File());
+  for (const int64_t second : {50, 86400, -1800}) {
+    SCOPED_TRACE(second);
+    RecordSteps(second, false);
+    for (Moment& each : moments_) each.readings = moment.readings;
+    Record(file_, moments_);
+    const auto rows = [this](const std::string& span) {
+      const std::string out = Output({"export", "comp-stats", "-s", "free", file_ + "@" + span});
+      return std::ranges::count(out, '\n') - 1;
+    };
+    EXPECT_EQ(rows("-45s.."), 10);
+    EXPECT_EQ(rows("-60s.."), 13);
+    EXPECT_EQ(rows("-60s..-55s"), 2);
+    EXPECT_EQ(rows(".."), 20);
+  }
 }
 
 // From 11:06:40 on, and then from 10:00.
@@ -144,9 +213,10 @@ TEST_F(RecordingClock, SpansHaveAllOfTheirTimesInTheOrderOfTheRecording) {
   EXPECT_EQ(times("2026-11-21T10:00:10Z..2026-11-21T10:00:15Z"),
             "10:00:10 10:00:15 10:00:10 10:00:15 ");
   EXPECT_EQ(times("..2026-11-21T10:00:00Z"), "10:00:00 09:58:20 09:58:25 09:58:30 09:58:35 ");
-  EXPECT_EQ(times("-5s.."),
-            "10:00:00 10:00:05 10:00:10 10:00:15 10:00:10 10:00:15 10:00:20 10:00:25 "
-            "09:58:30 09:58:35 ");
+  EXPECT_EQ(times("-5s.."), "09:58:30 09:58:35 ");
+  EXPECT_EQ(times("-6s..-1s"), "09:58:30 ");
+  EXPECT_EQ(times("last.."), "09:58:35 ");
+  EXPECT_EQ(times("..first"), "10:00:00 ");
 }
 
 // Clocks go back between parts, never within one.

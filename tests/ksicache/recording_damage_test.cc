@@ -350,6 +350,103 @@ TEST_F(RecordingDamage, CheckLooksAtTheTables) {
   EXPECT_NE(check.out.find("Rowid "), std::string::npos) << check.out;
 }
 
+// Sums and differences of times are made everywhere, and so none that there is not is read. The
+// facts of a part are those of its row.
+TEST_F(RecordingDamage, TimesThatThereAreNotAreDamage) {
+  const auto expect = [this](const std::string& why) {
+    for (const std::vector<std::string>& args :
+         std::vector<std::vector<std::string>>{{"info", file_ + "@last"},
+                                               {"moments", file_},
+                                               {"moments", "--summary", file_ + "@-1h.."},
+                                               {"check", file_},
+                                               {"diff", file_},
+                                               {"diff", "--since", "1h", file_},
+                                               {"export", "comp-stats", file_ + "@-7d.."},
+                                               {"join", Path("joined.ksi"), file_}}) {
+      const harness::Result result = Run(args);
+      EXPECT_EQ(result.status, 1) << args[0];
+      EXPECT_NE((result.out + result.err).find(why), std::string::npos)
+          << args[0] << ": " << result.out << result.err;
+    }
+  };
+  for (const char* set : {"first = -9223372036854775808", "last = 9223372036854775807",
+                          "first = -62167219200000001", "last = 253402300800000000"}) {
+    SCOPED_TRACE(set);
+    WriteContent(file_, content_);
+    RunSql(file_, std::string("UPDATE part SET ") + set + " WHERE moments > 0");
+    expect("is not understood");
+  }
+  const auto write = [this](const MomentFacts& facts) {
+    MakeEmpty(file_);
+    ChunkWriter writer(Host());
+    writer.Add(facts, MakeMoments(1, 1)[0].readings);
+    ksicache::RecordingStore(file_, kUnbounded)
+        .Add({0, 1, 0, 0, facts.taken, facts.taken, 0, 0}, writer.PartFrom(0));
+  };
+  const auto expectBad = [&](auto MomentFacts::*fact, auto value) {
+    MomentFacts facts;
+    facts.taken = kStart;
+    facts.*fact = value;
+    write(facts);
+    expect("has times or numbers that there are not");
+  };
+  expectBad(&MomentFacts::uptime, INT64_MIN);
+  expectBad(&MomentFacts::uptime, INT64_MAX);
+  expectBad(&MomentFacts::uptime, int64_t{-1});
+  expectBad(&MomentFacts::duration, UINT64_MAX);
+  expectBad(&MomentFacts::cpu, UINT64_MAX);
+  expectBad(&MomentFacts::skipped, UINT64_MAX);
+  expectBad(&MomentFacts::refused, UINT64_MAX);
+  expectBad(&MomentFacts::failed, UINT64_MAX);
+}
+
+// Whoever asks for a span is told of its own damage, once.
+TEST_F(RecordingDamage, DamageBesideASpanIsNotOfIt) {
+  std::vector<Moment> moments = MakeMoments(1, 600);
+  Record(file_, moments);
+  // Of the second chunk, which begins at 10:20, the second part.
+  RunSql(file_,
+         "UPDATE block SET data = zeroblob(4572) WHERE id = (SELECT block FROM part WHERE "
+         "moments > 0 AND number = 280)");
+  for (const char* span : {"10:00Z..10:19:55Z", "10:00Z..10:23:19Z", "10:40Z..", "-5m.."}) {
+    const std::string name = file_ + "@" + span;
+    EXPECT_EQ(Run({"moments", name}).err, "") << span;
+    EXPECT_EQ(Run({"export", "moments", name}).err, "") << span;
+  }
+  const auto expect = [this](const std::string& span, const std::string& lost) {
+    const std::string name = "ksicache: " + file_ + "@" + span + ": ";
+    const std::string why = "the part of 2026-11-21T10:23:20Z has not all its blocks";
+    EXPECT_EQ(Run({"moments", file_ + "@" + span}).err, name + "damaged: " + why + ": " + lost);
+    const harness::Result result = Run({"export", "moments", file_ + "@" + span});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.err, name + why + "\n" + name + lost);
+  };
+  expect("10:00Z..10:23:20Z",
+         "40 moments of 2026-11-21T10:23:20Z to 2026-11-21T10:26:35Z cannot be read\n");
+  expect("10:39:55Z..",
+         "40 moments of 2026-11-21T10:36:40Z to 2026-11-21T10:39:55Z cannot be read\n");
+  expect("..", "200 moments of 2026-11-21T10:23:20Z to 2026-11-21T10:39:55Z cannot be read\n");
+}
+
+// SQLite would keep a file beside it, which no reader knows of.
+TEST_F(RecordingDamage, OneThatSqliteWritesAheadIsNotGoneOnWith) {
+  std::vector<Moment> moments = MakeMoments(1, 3);
+  for (Moment& moment : moments) moment.host = Host("unknown");
+  Record(file_, moments);
+  const std::string dump = Output({"dump", file_});
+  const std::string why =
+      ": is in SQLite's write-ahead (WAL) mode, which PRAGMA journal_mode=DELETE ends";
+  const std::vector<std::string> record = {
+      "record", "--root", RecordedHost("systemd-server"), "--every", "1s", "--count", "1", file_};
+  RunSql(file_, "PRAGMA journal_mode = WAL");
+  ExpectFailure(record, file_ + why);
+  EXPECT_EQ(Run({"check", file_}).out, file_ + why + "\n");
+  EXPECT_EQ(Output({"dump", file_}), dump);
+  RunSql(file_, "PRAGMA journal_mode = DELETE");
+  EXPECT_EQ(Output({"check", file_}), "");
+  EXPECT_EQ(Run(record).status, 0);
+}
+
 // The facts of a moment are those of its row, whoever asks.
 TEST_F(RecordingDamage, ARowThatLiesAboutTimesIsDamagedForAll) {
   RunSql(file_, "UPDATE part SET first = first + 1 WHERE moments > 1");
@@ -401,8 +498,9 @@ TEST_F(RecordingNames, ErrorsNameTheSpan) {
   ExpectFailure({"dump", early}, early + ": there is no moment so early: " + span);
   ExpectFailure({"extract", file_ + "@-1h", Path("out.ksi")},
                 file_ + "@-1h: there is no moment so early: " + span);
-  ExpectFailure({"dump", file_ + "@noon"},
-                file_ + "@noon: noon is no time, as 10:05, -10m and last are: " + span);
+  ExpectFailure(
+      {"dump", file_ + "@noon"},
+      file_ + "@noon: noon is no time, as 2026-11-21T10:05, 10:05, -10m and last are: " + span);
   ExpectFailure({"dump", Path("none@first")}, Path("none@first") + ": No such file or directory");
   MakeEmpty(Path("empty.ksi"));
   ExpectFailure({"dump", Path("empty.ksi")}, Path("empty.ksi") + ": it has no moments yet");

@@ -39,11 +39,14 @@ void MomentSummary::Happening::Add(int64_t amount, int64_t taken) {
 }
 
 void MomentSummary::Cost::Add(uint64_t amount) {
+  if (amount == 0) return;
+  ++count;
   sum += static_cast<double>(amount);
   most = std::max(most, static_cast<double>(amount));
 }
 
-std::string MomentSummary::Cost::Text(size_t count) const {
+std::string MomentSummary::Cost::Text() const {
+  if (count == 0) return "-";
   return Milliseconds(sum / static_cast<double>(count)) + " ms, at most " + Milliseconds(most);
 }
 
@@ -105,7 +108,7 @@ void MomentSummary::Print() const {
   PrintLine("skipped    " + TextOf(skipped_, " that were due"));
   PrintLine("missing    in " + std::to_string(refused_) + " moments refused, in " +
             std::to_string(failed_) + " failed, in " + std::to_string(leftOut_) + " left out");
-  PrintLine("took       " + duration_.Text(count_) + "; of CPU " + cpu_.Text(count_));
+  PrintLine("took       " + duration_.Text() + "; of CPU " + cpu_.Text());
   const double each = bytes_ / static_cast<double>(count_);
   PrintLine("size       " + Decimal(bytes_, 0) + " bytes, " + Decimal(each, 0) + " a moment" +
             (stride ? ", " + Decimal(each * ksi::kDay / static_cast<double>(*stride), 0) + " a day"

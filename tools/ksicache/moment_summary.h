@@ -34,13 +34,14 @@ class MomentSummary {
 
     void Add(int64_t amount, int64_t taken);
   };
-  // Figures of each moment, in us.
+  // Figures of those moments of which they were recorded, in us.
   struct Cost {
+    size_t count = 0;
     double sum = 0;
     double most = 0;
 
     void Add(uint64_t amount);
-    std::string Text(size_t count) const;
+    std::string Text() const;
   };
 
   void AddHost(const std::string& host);

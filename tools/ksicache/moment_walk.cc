@@ -60,7 +60,7 @@ void MomentWalk::Walk(const Part& part) {
 }
 
 void MomentWalk::Complain() {
-  if (!lost_.IsEmpty()) complain_(lost_.TakeText());
+  if (!lost_.IsEmpty()) complain_(std::exchange(lost_, {}));
 }
 
 void MomentWalk::Add(WalkedMoment moment) {
@@ -73,14 +73,12 @@ void MomentWalk::Add(WalkedMoment moment) {
 void MomentWalk::Compare(WalkedMoment& moment) const {
   const ksi::MomentFacts& before = before_->facts;
   const ksi::MomentFacts& now = moment.facts;
-  const int64_t onWall = ksi::TimeBetween(before.taken, now.taken);
+  const int64_t onWall = now.taken - before.taken;
   moment.isOtherHost = before_->host != host_ && !before_->host.empty() && !host_.empty();
   moment.isRebooted = !moment.isOtherHost && before_->boot != boot_ && !host_.empty();
   const bool hasClock = before_->boot == boot_ && before.uptime != 0 && now.uptime != 0;
-  moment.passed =
-      std::max<int64_t>(hasClock ? ksi::TimeBetween(before.uptime, now.uptime) : onWall, 0);
-  const int64_t step =
-      hasClock ? ksi::TimeBetween(moment.passed, onWall) : std::min<int64_t>(onWall, 0);
+  moment.passed = std::max<int64_t>(hasClock ? now.uptime - before.uptime : onWall, 0);
+  const int64_t step = hasClock ? onWall - moment.passed : std::min<int64_t>(onWall, 0);
   if (!moment.isOtherHost && (step > ksi::kSecond || step < -ksi::kSecond)) moment.step = step;
 }
 

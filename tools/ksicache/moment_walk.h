@@ -37,10 +37,10 @@ class MomentWalk {
   using Part = ksi::RecordingFile::Part;
 
   // Calls `visit` with the moments of each part that `wants` wants, in the order in which they were
-  // recorded, and `complain` with what is wrong where something cannot be read: once of each chunk,
-  // of which then nothing behind it can.
+  // recorded, and `complain` with what of those parts cannot be read: once of each chunk, of which
+  // then nothing behind what is damaged can.
   MomentWalk(ksi::RecordingFile& file, std::function<void(const WalkedMoment&)> visit,
-             std::function<void(const std::string& what)> complain)
+             std::function<void(const LostMoments&)> complain)
       : file_(file), visit_(std::move(visit)), complain_(std::move(complain)) {}
 
   void Run(const std::function<bool(const Part&)>& wants);
@@ -65,7 +65,7 @@ class MomentWalk {
 
   ksi::RecordingFile& file_;
   std::function<void(const WalkedMoment&)> visit_;
-  std::function<void(const std::string&)> complain_;
+  std::function<void(const LostMoments&)> complain_;
   ksi::ChunkReader reader_;
   int64_t at_ = ksi::RecordingFile::kNoMoment;  // the moment that it has
   LostMoments lost_;

@@ -1,5 +1,6 @@
 #include "tools/ksicache/report_run.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdint>
 #include <ctime>
@@ -16,6 +17,7 @@
 #include "knvlibs/times.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/host_files.h"
+#include "tools/ksicache/missing_moments.h"
 #include "tools/ksicache/named_span.h"
 #include "tools/ksicache/opened_file.h"
 
@@ -54,67 +56,128 @@ Origin CurrentOrigin() {
 // The moments of a recording, by the library, which goes on from one to the next.
 class SpanVisit {
  public:
-  explicit SpanVisit(const NamedSpan& named) : fileName_(named.fileName) {
+  explicit SpanVisit(const NamedSpan& named) : named_(named) {
     if (&KSI_SourceNextMoment == nullptr) {
       throw DataError("this host's library does not read recordings");
     }
-    const std::unique_ptr<ksi::RecordingFile> recording = OpenRecording(fileName_);
-    wanted_ = TimesOf(named, *recording);
-    all_ = recording->Times();
-    const auto& parts = recording->Parts();
-    for (size_t i = 1; i < parts.size(); ++i) {
-      isInOrder_ = isInOrder_ && parts[i - 1].last < parts[i].first;
-      if (parts[i].chunk == parts[i].number) chunks_.push_back(parts[i].first);
-    }
+    // A recorder may remove meanwhile what was found.
+    int tries = 3;
+    do {
+      Load();
+      Open();
+    } while (!IsAtNumber() && --tries != 0);
   }
 
   void Run(const std::function<void(const Origin&)>& visit) {
-    Open();
-    ksi::Status status = ksi::kOk;
-    for (; status != KSI_STATUS_NOT_FOUND; status = KSI_SourceNextMoment(nullptr)) {
-      if (status != ksi::kOk) {
-        MissMoments(status);
-      } else if (!Visit(visit)) {
-        break;
-      }
+    for (ksi::Status status = ksi::kOk; status != KSI_STATUS_NOT_FOUND; status = Next()) {
+      status == ksi::kOk ? Visit(visit) : Miss(number_, number_ + 1);
     }
+    Miss(number_, End());
+    if (!missing_.IsEmpty()) throw DataError(missing_.Text());
     if (!wrong_.empty()) throw DataError(wrong_);
-    if (!isFound_) throw DataError(NoneInSpan(all_));
+    if (!isFound_) throw DataError(NoneInSpan(recording_->Times()));
   }
 
  private:
+  using Part = ksi::RecordingFile::Part;
+
   // After damage moments are read again from the next chunk on; of what is nothing but damage not
   // all has to be tried.
   static constexpr size_t kMostChunks = 100;
 
-  // Goes to the first moment that may be wanted: from the last one of the second before on. Where
-  // the clock was set back, times lie in several places.
+  void Load() {
+    recording_ = OpenRecording(named_.fileName);
+    wanted_ = MomentsOf(named_, *recording_);
+    missing_ = {};
+    const std::vector<Part>& parts = recording_->Parts();
+    isInOrder_ = true;
+    for (size_t i = 1; i < parts.size(); ++i) {
+      isInOrder_ = isInOrder_ && parts[i - 1].last < parts[i].first;
+    }
+  }
+
+  // Goes to the first moment that may be wanted, or behind what of them is damaged.
   void Open() {
-    const int64_t before = wanted_.first - ksi::kSecond;
-    const bool isAfterFirst = isInOrder_ && before > all_.first;
-    ksi::Status status = Use(isAfterFirst ? ksi::TextOfTime(before) : "first");
+    number_ = ksi::RecordingFile::kNoMoment;
+    ksi::Status status = UseFirst();
     size_t tried = 0;
-    for (const int64_t start : chunks_) {
+    for (const Part& part : recording_->Parts()) {
       if (status != KSI_STATUS_METADATA_READ_ERROR || tried == kMostChunks) break;
-      if (isAfterFirst && start < before) continue;
-      MissMoments(status);
-      status = Use(ksi::TextOfTime(start));
+      if (part.number != part.chunk || part.number <= number_ || !wanted_.HasSome(part)) continue;
+      status = Use(part.first, part.number);
       ++tried;
     }
-    if (status != ksi::kOk) throw DataError("cannot be read: " + StatusText(status));
+    const Part* part = recording_->FindPart(number_);
+    Miss(0, status == ksi::kOk && part != nullptr ? part->number : End());
+    if (status == ksi::kOk) return;
+    throw DataError(missing_.IsEmpty() ? "cannot be read: " + StatusText(status) : missing_.Text());
   }
 
-  ksi::Status Use(const std::string& when) const {
-    return KSI_UseCache((fileName_ + "@" + when).c_str(), 0);
+  // Where the clock was set back, times lie in several places, and so all moments are looked at.
+  // What is damaged beside those that are wanted is left alone.
+  ksi::Status UseFirst() {
+    if (!isInOrder_) return UseName("first", recording_->Parts().front().number);
+    const int64_t before = wanted_.times.first - ksi::kSecond;
+    int64_t first = ksi::RecordingFile::kNoMoment;
+    const ksi::Status status = recording_->FindMoment(before, first);
+    if (status != ksi::kOk) return status;
+    first = recording_->NumberAfter(first);
+    if (first == ksi::RecordingFile::kNoMoment) throw DataError(NoneInSpan(recording_->Times()));
+    first = std::max(first, wanted_.numbers.first);
+    const Part* part = recording_->FindPart(first);
+    if (part == nullptr) throw DataError(NoneInSpan(recording_->Times()));
+    const ksi::Status used = Use(std::max(part->first, before), first);
+    // Of several in a second that was the last.
+    return number_ <= first ? used : Use(part->first - ksi::kSecond, first);
   }
 
-  void MissMoments(ksi::Status status) { wrong_ = "moments are missing: " + StatusText(status); }
+  // `number_` is then that of the moment; `expected` where what would tell that is damaged.
+  ksi::Status Use(int64_t time, int64_t expected) {
+    int64_t number = 0;
+    if (recording_->FindMoment(time, number) != ksi::kOk) number = expected;
+    const int64_t first = recording_->Parts().front().number;
+    if (number <= first) return UseName("first", first);
+    return UseName(ksi::TextOfTime(time), number);
+  }
 
-  // False if no other moment can be wanted.
-  bool Visit(const std::function<void(const Origin&)>& visit) {
+  ksi::Status UseName(const std::string& when, int64_t number) {
+    number_ = number;
+    return KSI_UseCache((named_.fileName + "@" + when).c_str(), 0);
+  }
+
+  // Whether the library has the moment of that number.
+  bool IsAtNumber() const {
+    const Part* part = recording_->FindPart(number_);
+    const int64_t taken = CurrentOrigin().taken;
+    return part != nullptr && part->first <= taken && taken <= part->last;
+  }
+
+  // As the library, but that no moment follows the last one that can be wanted.
+  ksi::Status Next() {
+    const int64_t next = recording_->NumberAfter(number_);
+    const Part* part = recording_->FindPart(next);
+    number_ = part == nullptr || IsBehind(next, part->first) ? End() : next;
+    return number_ == End() ? ksi::Status{KSI_STATUS_NOT_FOUND} : KSI_SourceNextMoment(nullptr);
+  }
+
+  bool IsBehind(int64_t number, int64_t taken) const {
+    return number > wanted_.numbers.last || (isInOrder_ && taken > wanted_.times.last);
+  }
+
+  // Behind the number of the last moment.
+  int64_t End() const { return recording_->Parts().back().End(); }
+
+  // Nobody can have the moments of parts that have numbers from one up to another.
+  void Miss(int64_t from, int64_t to) {
+    for (const Part& part : recording_->Parts()) {
+      if (from < part.End() && part.number < to && wanted_.HasSome(part)) missing_.Add(part);
+    }
+  }
+
+  void Visit(const std::function<void(const Origin&)>& visit) {
     const Origin origin = CurrentOrigin();
-    if (origin.taken > wanted_.last) return !isInOrder_;
-    if (origin.taken < wanted_.first) return true;
+    if (IsBehind(number_, origin.taken)) number_ = End();
+    if (!wanted_.Has(number_, origin.taken)) return;
     isFound_ = true;
     try {
       CheckDefinitions();
@@ -122,14 +185,14 @@ class SpanVisit {
     } catch (const DataError& error) {
       wrong_ = error.what();
     }
-    return true;
   }
 
-  std::string fileName_;
-  ksi::Span all_ = {};
-  ksi::Span wanted_ = {};
+  NamedSpan named_;
+  std::unique_ptr<ksi::RecordingFile> recording_;
+  MomentSpan wanted_ = {};
+  MissingMoments missing_;
+  int64_t number_ = 0;  // of the moment that the library has
   bool isInOrder_ = true;
-  std::vector<int64_t> chunks_;  // when the first moment of each but the first chunk was taken
   bool isFound_ = false;
   std::string wrong_;
 };

@@ -277,7 +277,9 @@ class RecordingChecker {
   }
 
   void TellLost() {
-    if (!lost_.IsEmpty()) Report(NameOf(lost_.First()), "damaged: " + lost_.TakeText());
+    if (lost_.IsEmpty()) return;
+    Report(NameOf(lost_.First()), "damaged: " + lost_.Text());
+    lost_ = {};
   }
 
   const std::string& fileName_;

@@ -36,7 +36,8 @@ const Command kExtract = {
     .arguments = "FILE@WHEN OUT",
     .summary = "make a capture of one moment of a recording",
     .help = R"(Makes OUT, a capture, of one moment of the recording FILE; "-" is standard
-output. Without @WHEN it is the last one.
+output. WHEN is such as 2026-11-21T10:05, 10:05, -10m, first and last; without
+it the last one is meant.
 )",
     .options = kOptions,
     .fewest = 2,

@@ -54,11 +54,10 @@ void PrintDefinitions(const std::string& built, const std::string& signature) {
 // How far a moment is from the time that was asked for, if one was, and from now.
 void PrintDistance(int64_t taken, const std::optional<int64_t>& asked) {
   if (asked) {
-    PrintLine("asked      " + ksi::TextOfTime(*asked) + ", " +
-              TextOfDuration(ksi::TimeBetween(taken, *asked)) + " later");
+    PrintLine("asked      " + ksi::TextOfTime(*asked) + ", " + TextOfDuration(*asked - taken) +
+              " later");
   }
-  PrintLine("age        " +
-            TextOfDuration(ksi::TimeBetween(taken, ksi::ReadClock(CLOCK_REALTIME))));
+  PrintLine("age        " + TextOfDuration(ksi::ReadClock(CLOCK_REALTIME) - taken));
 }
 
 void PrintCapture(const OpenedFile& opened, const std::string& fileName) {

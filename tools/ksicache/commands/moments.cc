@@ -25,13 +25,15 @@ constexpr Option kRemarks = {"remarks", nullptr, "list only moments with somethi
 constexpr Option kSummary = {"summary", nullptr, "sum the moments up instead"};
 constexpr const Option* kOptions[] = {&kRemarks, &kSummary};
 
+using Part = ksi::RecordingFile::Part;
+
 // The moments that a name means: all of a recording, those of a span, or one.
 class Chosen {
  public:
   explicit Chosen(const std::string& name) {
     if (const std::optional<NamedSpan> span = SpanOf(name)) {
       recording_ = OpenRecording(span->fileName);
-      times_ = TimesOf(*span, *recording_);
+      span_ = MomentsOf(*span, *recording_);
     } else if (IsRecording(name)) {
       recording_ = OpenRecording(name);
     } else {
@@ -44,30 +46,31 @@ class Chosen {
   ksi::RecordingFile& Recording() const { return *recording_; }
 
   bool Has(const WalkedMoment& moment) const {
-    const int64_t taken = moment.facts.taken;
-    return (!times_ || (times_->first <= taken && taken <= times_->last)) &&
+    return (!span_ || span_->Has(moment.number, moment.facts.taken)) &&
            (!number_ || moment.number == *number_);
+  }
+
+  bool HasSome(const Part& part) const {
+    return (!span_ || span_->HasSome(part)) &&
+           (!number_ || (part.number <= *number_ && *number_ < part.End()));
   }
 
   // Whether a part has some of them, or is beside one that has: what is to be said of a moment is
   // told by those around it.
-  bool Needs(const ksi::RecordingFile::Part& part) const {
+  bool Needs(const Part& part) const {
     const auto& parts = recording_->Parts();
     const auto place = static_cast<size_t>(&part - parts.data());
     const size_t end = std::min(place + 2, parts.size());
-    const auto hasSome = [this](const ksi::RecordingFile::Part& each) {
-      return (!times_ || (each.first <= times_->last && times_->first <= each.last)) &&
-             (!number_ || (each.number <= *number_ && *number_ < each.End()));
-    };
     return std::any_of(parts.begin() + static_cast<ptrdiff_t>(place == 0 ? 0 : place - 1),
-                       parts.begin() + static_cast<ptrdiff_t>(end), hasSome);
+                       parts.begin() + static_cast<ptrdiff_t>(end),
+                       [this](const Part& each) { return HasSome(each); });
   }
 
-  const std::optional<ksi::Span>& Times() const { return times_; }
+  bool IsSpan() const { return span_.has_value(); }
 
  private:
   std::unique_ptr<ksi::RecordingFile> recording_;
-  std::optional<ksi::Span> times_;
+  std::optional<MomentSpan> span_;
   std::optional<int64_t> number_;
 };
 
@@ -90,16 +93,23 @@ std::string RemarksOn(const WalkedMoment& moment) {
   return remarks;
 }
 
+// What was not recorded, as of captures that were joined, has no figure.
+std::string Milliseconds(uint64_t us) {
+  char text[64];
+  const int size = std::snprintf(text, sizeof text, "%.1f", static_cast<double>(us) / 1000);
+  return us == 0 ? "-" : std::string(text, static_cast<size_t>(size));
+}
+
 void PrintMoment(const WalkedMoment& moment, const std::string& remarks) {
-  char text[128];
-  const int size = std::snprintf(text, sizeof text, "%-20s %8.0f %8.1f %7.1f",
+  char text[192];
+  const int size = std::snprintf(text, sizeof text, "%-20s %8.0f %8s %7s",
                                  ksi::TextOfTime(moment.facts.taken).c_str(), moment.bytes,
-                                 static_cast<double>(moment.facts.duration) / 1000,
-                                 static_cast<double>(moment.facts.cpu) / 1000);
+                                 Milliseconds(moment.facts.duration).c_str(),
+                                 Milliseconds(moment.facts.cpu).c_str());
   PrintLine(std::string(text, static_cast<size_t>(size)) + (remarks.empty() ? "" : "  " + remarks));
 }
 
-// Visits those that were chosen. False if something is damaged, which is said.
+// Visits those that were chosen. False if some of them are damaged, which is said.
 bool Walk(const std::string& name, const Chosen& chosen,
           const std::function<void(const WalkedMoment&)>& visit) {
   bool isGood = true;
@@ -111,12 +121,15 @@ bool Walk(const std::string& name, const Chosen& chosen,
         isFound = true;
         visit(moment);
       },
-      [&](const std::string& what) {
-        PrintError(name + ": damaged: " + what);
+      [&](const LostMoments& all) {
+        const auto isChosen = [&](const Part& part) { return chosen.HasSome(part); };
+        const LostMoments lost = all.Only(isChosen);
+        if (lost.IsEmpty()) return;
+        PrintError(name + ": damaged: " + lost.Text());
         isGood = false;
       });
-  walk.Run([&chosen](const ksi::RecordingFile::Part& part) { return chosen.Needs(part); });
-  if (!isFound && isGood && chosen.Times()) {
+  walk.Run([&chosen](const Part& part) { return chosen.Needs(part); });
+  if (!isFound && isGood && chosen.IsSpan()) {
     throw DataError(NoneInSpan(chosen.Recording().Times()));
   }
   return isGood;

@@ -59,7 +59,7 @@ class Search {
       if (part.number + static_cast<int64_t>(i) > named_.number) continue;
       if (last_.taken == 0) last_ = facts[i];
       const MomentTime time = {facts[i].taken, EvenTime(facts[i])};
-      isOver_ = time.even < last_.taken - since_;
+      isOver_ = ksi::SecondOf(time.even) < ksi::SecondOf(last_.taken - since_);
       if (isOver_) return;
       chunk_.push_back(time);
     }

@@ -107,7 +107,7 @@ Marks MarksOfRecording(const std::string& fileName, Survey& survey, Problems& pr
   const std::unique_ptr<ksi::RecordingFile> file = OpenRecording(fileName);
   MomentWalk walk(
       *file, [&](const WalkedMoment& moment) { marker.Add(moment); },
-      [&](const std::string& what) { problems.Add("damaged: " + what); });
+      [&](const LostMoments& lost) { problems.Add("damaged: " + lost.Text()); });
   walk.Run([&](const ksi::RecordingFile::Part& part) { return marker.Wants(part); });
   return marker.Take();
 }
