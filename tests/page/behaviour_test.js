@@ -1,8 +1,9 @@
 // Clicks do what they say, and all that is shown goes by the chosen moment.
 import assert from 'node:assert/strict';
+import {readFileSync, writeFileSync} from 'node:fs';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, hostWithHeaps, makePage, openPage} from './browser.js';
+import {build, closePage, hostWithHeaps, ksicache, makePage, openPage, scratch} from './browser.js';
 
 const RECORDING = join(build, 'incident.rec');
 const SIZES = {bytes: 1, KB: 2 ** 10, MB: 2 ** 20, GB: 2 ** 30, TB: 2 ** 40};
@@ -53,6 +54,27 @@ test('a click looks into a part, and a crumb out of it', async () => {
   assert.ok(area > 0.95 * box.width * box.height);
   await page.locator('.crumbs button').first().click();
   assert.equal(await page.locator('.crumbs').textContent(), 'hypervisor.example.org 256 GB');
+  await closePage(page);
+});
+
+// The services' group is called as that of the machines.
+test('a click looks into the group that was clicked, not into its namesake', async () => {
+  const [json, capture] = ['namesakes.json', 'namesakes.ksi'].map((name) => join(scratch, name));
+  const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
+  writeFileSync(json, example.replace(/("node":"sched\/groups\/groupName","keys":\[3\].*)"services"/, '$1"machines"'));
+  ksicache('load', json, capture);
+  const page = await openPage(makePage(capture));
+  await page.locator('.tile', {hasText: 'Machines and processes'}).click({position: {x: 12, y: 8}});
+  const tiles = page.getByRole('button', {name: /^machines /});
+  assert.equal(await tiles.count(), 2);
+  for (const place of [0, 1]) {
+    const tile = tiles.nth(place);
+    const label = await tile.getAttribute('aria-label');
+    await tile.focus();
+    await page.keyboard.press('Enter');
+    assert.equal(await page.locator('.crumbs [aria-current]').textContent(), label);
+    await page.keyboard.press('Escape');
+  }
   await closePage(page);
 });
 

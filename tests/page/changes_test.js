@@ -70,18 +70,35 @@ test('the afternoon', async () => {
   await compare(join(build, 'afternoon.rec'), [[0, 120], [60, 61], [30, 75]], ['mb', 'b']);
 });
 
-// A machine of which something could not be read takes the others with it in no table.
-test('a moment that is not whole', async () => {
+// The incident's moments of 10:02 and 10:04; of the latter a machine could not be read.
+function recordingInPart() {
   const whole = join(build, 'incident.rec');
   const [before, after, json, recording] = ['before.ksi', 'after.ksi', 'after.json', 'part.rec'].map((name) => join(scratch, name));
   const dump = ksicache('dump', '--json', `${whole}@10:04Z`);
   const stats = /("node":"sched\/groups\/stats\/memoryStats","keys":\[1000\],)"value":\{.*\}\}/;
   assert.match(dump, stats);
   writeFileSync(json, dump.replace(stats, '$1"status":"0xbad005a"}'));
-  ksicache('load', json, after);
-  ksicache('extract', `${whole}@first`, before);
-  ksicache('join', recording, before, after);
-  await compare(recording, [[0, 1]], ['kb'], ksicachePartly);
+  ksicache('load', '--force', json, after);
+  ksicache('extract', '--force', `${whole}@first`, before);
+  ksicache('join', '--force', recording, before, after);
+  return recording;
+}
+
+// It takes the others with it in no table.
+test('a moment that is not whole', async () => {
+  await compare(recordingInPart(), [[0, 1]], ['kb'], ksicachePartly);
+});
+
+test('a sum of which something is missing is none', async () => {
+  const page = await openPage(makePageBy(ksicachePartly, recordingInPart()));
+  const lines = page.locator('section', {has: page.locator('#lines-title')});
+  await lines.locator('select').selectOption({label: 'Machines: consumed'});
+  await lines.locator('label', {hasText: 'all together'}).locator('input').check();
+  await page.click('text=First moment');
+  assert.match(await lines.locator('.detail').textContent(), /all together \d+ GB/);
+  await page.click('text=Last moment');
+  assert.match(await lines.locator('.detail').textContent(), /all together – .*build-linux/);
+  await closePage(page);
 });
 
 test('a live host', async () => {

@@ -73,6 +73,16 @@ test('moments that cannot be read', async () => {
   await closePage(page);
 });
 
+test('a line whose stretch of moments has a gap within', async () => {
+  const page = await openPage(makePage(AFTERNOON));
+  const times = await page.evaluate(() => {
+    const points = [{from: 0, to: 10}, {from: 20, to: 60}, {from: 70, to: 80}];
+    return module_chart.runsOf(points, [{kind: 'gap', steady: 50}], () => true).map((run) => run.map(({time}) => time));
+  });
+  assert.deepEqual(times, [[5, 20], [60, 75]]);
+  await closePage(page);
+});
+
 // Each moment stands where it was: none lies on another.
 for (const [name, seconds, text] of [['back', -5400, 'back by 1 h 30 min'], ['forward', 86400, 'forward by 1 d']]) {
   test(`a clock that was set ${name}`, async () => {
