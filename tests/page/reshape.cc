@@ -128,7 +128,7 @@ int main(int argc, char** argv) {
       if (change.what == "damage") Damage(argv[2], number);
     }
   } catch (const std::exception& error) {
-    std::fprintf(stderr, "reshape: %s\n", error.what());
+    static_cast<void>(std::fprintf(stderr, "reshape: %s\n", error.what()));
     return 1;
   }
   return 0;
