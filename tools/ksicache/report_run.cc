@@ -6,6 +6,7 @@
 #include <ctime>
 #include <memory>
 #include <optional>
+#include <utility>
 #include <vector>
 
 #include <knvlibs/ksi.h>
@@ -56,7 +57,7 @@ Origin CurrentOrigin() {
 // The moments of a recording, by the library, which goes on from one to the next.
 class SpanVisit {
  public:
-  explicit SpanVisit(const NamedSpan& named) : named_(named) {
+  explicit SpanVisit(NamedSpan named) : named_(std::move(named)) {
     if (&KSI_SourceNextMoment == nullptr) {
       throw DataError("this host's library does not read recordings");
     }
