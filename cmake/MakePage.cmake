@@ -1,7 +1,9 @@
-# Makes the template of the page: cmake -DLIBRARY=FILES -DLICENSE=FILE -DWEB=DIR -DTEMPLATE=OUT -P ...
+# Makes the template of the page: cmake -DLIBRARY=FILES -DLICENSES=FILES -DWEB=DIR -DTEMPLATE=OUT -P ...
 #
 # It is WEB/page.html with WEB/page.css, the files of LIBRARY and the modules of WEB in it. The page
-# may run these scripts and take this style, known by their hashes, and nothing else.
+# may run these scripts and take this style, known by their hashes, and nothing else. LICENSES are
+# those of the files of LIBRARY, in Debian's form; a text that several refer to stands in the page
+# once.
 cmake_minimum_required(VERSION 3.25)
 
 # Each stands behind those that it imports.
@@ -37,8 +39,33 @@ function(module_of name result)
   set(${result} "const module_${name} = (() => {\n${text}return {${exports}};\n})();\n" PARENT_SCOPE)
 endfunction()
 
-file(READ "${LICENSE}" license)
-set(library "\n/*\n${license}*/\n")
+# A file without the texts of licenses that are in the property SAID, to which it adds its own.
+function(license_of file result)
+  file(READ "${file}" text)
+  string(REPLACE ";" "\\;" text "${text}") # else it would end a paragraph, too
+  string(REGEX REPLACE "\n\n+" ";" paragraphs "${text}")
+  get_property(said GLOBAL PROPERTY SAID)
+  set(license "")
+  foreach(paragraph IN LISTS paragraphs)
+    string(STRIP "${paragraph}" paragraph)
+    string(SHA256 hash "${paragraph}")
+    if(NOT hash IN_LIST said)
+      string(APPEND license "${paragraph}\n\n")
+    endif()
+    if(paragraph MATCHES "^License:")
+      list(APPEND said ${hash})
+    endif()
+  endforeach()
+  set_property(GLOBAL PROPERTY SAID "${said}")
+  set(${result} "${license}" PARENT_SCOPE)
+endfunction()
+
+set(licenses "")
+foreach(file IN LISTS LICENSES)
+  license_of("${file}" license)
+  string(APPEND licenses "${license}")
+endforeach()
+set(library "\n/*\n${licenses}*/\n")
 foreach(file IN LISTS LIBRARY)
   file(READ "${file}" text)
   string(APPEND library "${text}")
