@@ -51,7 +51,21 @@ TEST_F(PageTest, MayRunItsOwnScriptsAndNothingElse) {
   EXPECT_EQ(CountOf(page, "<script>"), 2);
   EXPECT_EQ(CountOf(page, "<script type=\"application/octet-stream\""), 4);
   EXPECT_EQ(CountOf(page, "{{"), 0);
-  ExpectHas(page, "Redistributions of source code must retain the above copyright");
+}
+
+// Each text of a license once, whoever refers to it.
+TEST_F(PageTest, HasTheLicensesOfWhatIsInIt) {
+  const std::string page = Output({"page", kExample});
+  for (const char* part : {"array", "color", "format", "interpolate", "time", "time-format",
+                           "collection", "scale", "path", "shape", "hierarchy", "dispatch",
+                           "selection", "axis"}) {
+    ExpectHas(page, std::string("\nUpstream-Name: d3-") + part + "\n");
+  }
+  EXPECT_EQ(CountOf(page, "\nFiles: *\nCopyright: 20"), 14);
+  ExpectHas(page, "\nFiles: internmap/*\n");
+  EXPECT_EQ(CountOf(page, "\nLicense: ISC\n Permission to use, copy, modify"), 1);
+  ExpectHas(page, "\nLicense: BSD-3-Clause\n Redistribution and use");
+  ExpectHas(page, "PROCUREMENT OF SUBSTITUTE GOODS OR SERVICES; LOSS OF USE, DATA");
 }
 
 TEST_F(PageTest, IsOfAMomentOfASpanOrOfAll) {
@@ -81,6 +95,15 @@ TEST_F(PageTest, IsAFileOfItsOwn) {
   ASSERT_EQ(stat(out.c_str(), &status), 0);
   EXPECT_EQ(status.st_mode & 07777, 0644U);
   ExpectHas(FileContent(out), "<h1>T</h1>\n<p>hypervisor.example.org, ");
+}
+
+TEST_F(PageTest, HasATitleAndAName) {
+  ExpectFailure({"page", kExample, "--title", ""}, "--title takes a text that can be seen", 2);
+  ExpectFailure({"page", kExample, "--title", " \t"}, "--title takes a text that can be seen", 2);
+  ExpectFailure({"page", kExample, "-o", ""}, "a file to make needs a name", 2);
+  const std::string file =
+      ExampleWith("host.ksi", {{"\"hypervisor.example.org\"", "\"\""}});
+  ExpectHas(Output({"page", file}), "<h1>(no name)</h1>");
 }
 
 TEST_F(PageTest, TakesNoTextForMarkup) {

@@ -139,6 +139,7 @@ NewFile::NewFile(std::string target, bool replace, mode_t mode)
     if (isatty(STDOUT_FILENO) == 1) throw Error(name_ + ": is a terminal");
     return;
   }
+  if (name_.empty()) throw UsageError("a file to make needs a name");
   entry_ = EntryOf(name_);
   directory_.Reset(open(DirectoryOf(name_).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!directory_) throw SystemError(name_, errno);

@@ -3,6 +3,7 @@
 #include <string>
 
 #include "tools/ksicache/commands/commands.h"
+#include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/error.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
@@ -22,8 +23,18 @@ std::string TargetOf(const CommandLine& line) {
   return name == nullptr ? "-" : *name;
 }
 
+// What heads the page, unless it is its host.
+const std::string* TitleOf(const CommandLine& line) {
+  const std::string* title = line.ValueOf(kTitle);
+  if (title != nullptr && title->find_first_not_of(" \t\r\n") == std::string::npos) {
+    throw UsageError("--title takes a text that can be seen");
+  }
+  return title;
+}
+
 int Page(const CommandLine& line) {
   const std::string& name = line.arguments[0];
+  const std::string* title = TitleOf(line);
   const std::string start = name + ": ";
   NewFile file(TargetOf(line), line.Has(kForce), ModeOf(line));
   file.RefuseInput(FileNameOf(name));
@@ -34,8 +45,7 @@ int Page(const CommandLine& line) {
     throw Error(start + error.what());
   }
   for (const std::string& problem : data.problems.All()) PrintError(start + problem);
-  const std::string* title = line.ValueOf(kTitle);
-  data.title = title == nullptr ? data.survey.host : *title;
+  data.title = title == nullptr ? NameText(data.survey.host, -1) : *title;
   const std::string html = ToHtml(data);
   file.Commit(std::as_bytes(std::span(html)));
   return data.problems.All().empty() ? 0 : 1;
