@@ -35,6 +35,42 @@ TEST_F(PageTest, SaysWithoutScriptsWhereTheMemoryIs) {
             "<td>1228</td><td>1376</td>");
 }
 
+TEST_F(PageTest, TellsWithoutScriptsOfTheTightestMoment) {
+  const std::string page = Output({"page", kIncident});
+  ExpectHas(page, "<h2>At 2026-11-21T10:05:00Z, the least free memory</h2>");
+  ExpectHas(page, "<p>Memory state Hard.</p>");
+  ExpectHas(page, "<p>Kernel's definitions built ");
+  EXPECT_EQ(CountOf(page, "What happened between moments"), 0);
+}
+
+// The host's parts add up: what is taken at start and what is in no part are told, too.
+TEST_F(PageTest, SaysWithoutScriptsAllThatTheMemoryIs) {
+  const std::string page = Output({"page", kExample});
+  const auto cell = [&](const std::string& title) {
+    const std::string head = "<th scope=\"row\">" + title + "</th><td>";
+    const size_t at = page.find(head);
+    EXPECT_NE(at, std::string::npos) << title;
+    return std::stoll(page.substr(at + head.size()));
+  };
+  const long long sum = cell("Kernel data and heaps") + cell("Caches and clients of the kernel") +
+                        cell("Machines and processes") + cell("Free") + cell("Not told apart") +
+                        cell("Taken at start");
+  // Of each the fraction of a MB is dropped.
+  EXPECT_LE(cell("Total") - sum, 5);
+  EXPECT_GE(cell("Total") - sum, 0);
+}
+
+// As `ksicache diff` tells them apart.
+TEST_F(PageTest, TellsNamesakesApart) {
+  const std::string file = ExampleWith("twins.ksi", {{"[1060],\"value\":{\"text\":\"build-linux\"",
+                                                      "[1060],\"value\":{\"text\":\"db-orders\""}});
+  const std::string page = Output({"page", file});
+  ExpectHas(page, "<th scope=\"row\">db-orders 1000</th>");
+  ExpectHas(page, "<th scope=\"row\">db-orders 1060</th>");
+  EXPECT_EQ(CountOf(page, "<th scope=\"row\">db-orders</th>"), 0);
+  ExpectHas(page, "<th scope=\"row\">web-01</th>");
+}
+
 // What is no memory has a unit of its own.
 TEST_F(PageTest, SaysWithoutScriptsWhoMayRun) {
   const std::string page = Output({"page", kExample});
@@ -56,9 +92,9 @@ TEST_F(PageTest, MayRunItsOwnScriptsAndNothingElse) {
 // Each text of a license once, whoever refers to it.
 TEST_F(PageTest, HasTheLicensesOfWhatIsInIt) {
   const std::string page = Output({"page", kExample});
-  for (const char* part : {"array", "color", "format", "interpolate", "time", "time-format",
-                           "collection", "scale", "path", "shape", "hierarchy", "dispatch",
-                           "selection", "axis"}) {
+  for (const char* part :
+       {"array", "color", "format", "interpolate", "time", "time-format", "collection", "scale",
+        "path", "shape", "hierarchy", "dispatch", "selection", "axis"}) {
     ExpectHas(page, std::string("\nUpstream-Name: d3-") + part + "\n");
   }
   EXPECT_EQ(CountOf(page, "\nFiles: *\nCopyright: 20"), 14);
@@ -101,8 +137,7 @@ TEST_F(PageTest, HasATitleAndAName) {
   ExpectFailure({"page", kExample, "--title", ""}, "--title takes a text that can be seen", 2);
   ExpectFailure({"page", kExample, "--title", " \t"}, "--title takes a text that can be seen", 2);
   ExpectFailure({"page", kExample, "-o", ""}, "a file to make needs a name", 2);
-  const std::string file =
-      ExampleWith("host.ksi", {{"\"hypervisor.example.org\"", "\"\""}});
+  const std::string file = ExampleWith("host.ksi", {{"\"hypervisor.example.org\"", "\"\""}});
   ExpectHas(Output({"page", file}), "<h1>(no name)</h1>");
 }
 

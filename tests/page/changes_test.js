@@ -31,6 +31,16 @@ function expectedHost(diff) {
   ];
 }
 
+// Where the page has a number behind the name of one of several, the program's answer has it apart.
+function nameAsProgram(things, rows) {
+  const numbered = things.filter((cells) => cells[2] !== '–').map((cells) => cells[1]);
+  assert.equal(new Set(numbered).size, numbered.length);
+  things.forEach((cells, i) => {
+    const {name, group} = rows[i] ?? {};
+    if (cells[1] === `${name} ${group < 2 ** 40 ? group : group - 2 ** 40}`) cells[1] = name;
+  });
+}
+
 async function expectChanges(page, diff) {
   const tables = page.locator('.changes table.balance');
   const rows = [...await cellsOf(tables.first()), ...await cellsOf(tables.last())];
@@ -42,6 +52,7 @@ async function expectChanges(page, diff) {
     const more = page.locator('.changes .more');
     if (await more.isVisible()) await more.click();
     const things = (await cellsOf(page.locator('.changes table.grid'))).slice(1);
+    nameAsProgram(things, part.rows);
     const expected = part.rows.map((row) => [part.what, row.name, shown(row.group ?? null), row.state, shown(row.before), shown(row.after), growth(row.growth)]);
     assert.deepEqual(things, expected, part.what);
   }

@@ -6,7 +6,6 @@
 
 #include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/page/packing.h"
-#include "tools/ksicache/page/roles.h"
 
 namespace ksicache {
 namespace {
@@ -47,25 +46,6 @@ int64_t CutUpward(int64_t figure, int bits) {
   return cut << bits == figure ? cut : cut + 1;
 }
 
-// A text is its number, a number is a text: JSON's own have 53 bits.
-void PutKey(const PageValue& key, JsonWriter& keys) {
-  switch (key.type) {
-    case ValueType::none:
-      keys.None("");
-      break;
-    case ValueType::text:
-      keys.Number("", key.number);
-      break;
-    case ValueType::signedNumber:
-      keys.Text("", std::to_string(static_cast<int64_t>(key.number)));
-      break;
-    case ValueType::flag:
-    case ValueType::unsignedNumber:
-      keys.Text("", std::to_string(key.number));
-      break;
-  }
-}
-
 }  // namespace
 
 void Extent::Add(int64_t figure) {
@@ -76,6 +56,16 @@ void Extent::Add(int64_t figure) {
 void Extent::Add(const Extent& other) {
   least = std::min(least, other.least);
   greatest = std::max(greatest, other.greatest);
+}
+
+void Range::Add(int64_t figure, size_t moment) {
+  if (figure < extent.least) least = moment;
+  if (figure > extent.greatest) greatest = moment;
+  extent.Add(figure);
+}
+
+uint64_t Range::Size() const {
+  return extent.IsEmpty() ? 0 : static_cast<uint64_t>(extent.greatest - extent.least);
 }
 
 void Halve(Line& line) {
@@ -102,33 +92,40 @@ void PutLine(const Line& line, size_t stretches, int bits, std::string& bytes) {
   }
 }
 
-ReportLines::ReportLines(PageTexts& texts, std::vector<const char*> columns)
-    : texts_(texts), names_(std::move(columns)), sums_(names_.size()) {}
+ReportLines::ReportLines(PageTexts& texts, const char* report, std::vector<const char*> columns,
+                         ThingNames& names)
+    : texts_(texts),
+      role_(roles::ThingsOf(report)),
+      columnNames_(std::move(columns)),
+      names_(names),
+      sums_(columnNames_.size()) {}
 
-void ReportLines::BeginMoment(size_t stretch) {
+void ReportLines::BeginMoment(size_t moment, size_t stretch) {
+  moment_ = moment;
   stretch_ = stretch;
-  sum_.assign(names_.size(), 0);
+  sum_.assign(columnNames_.size(), 0);
   identities_.Restart();
 }
 
 void ReportLines::Begin(std::span<const RowColumn> columns) {
   if (!columns_.empty()) return;
   columns_.assign(columns.begin(), columns.end());
-  for (const std::string_view name : names_) places_.push_back(PlaceOf(columns_, name));
+  for (const std::string_view name : columnNames_) places_.push_back(PlaceOf(columns_, name));
 }
 
 void ReportLines::Row(std::span<const Value> values) {
   const std::optional<size_t> thing = ThingOf(values);
   for (size_t i = 0; i < places_.size(); ++i) {
     const std::optional<int64_t> figure = FigureOf(values[places_[i]]);
-    if (figure && thing) AddTo(lines_[*thing * names_.size() + i], *figure);
+    if (figure && thing) AddTo(lines_[*thing * places_.size() + i], *figure);
     sum_[i] = figure && sum_[i] ? Drawable(*sum_[i] + *figure) : std::nullopt;
   }
 }
 
-void ReportLines::AddTo(Line& line, int64_t figure) const {
-  if (line.size() <= stretch_) line.resize(stretch_ + 1);
-  line[stretch_].Add(figure);
+void ReportLines::AddTo(Figure& figure, int64_t number) const {
+  if (figure.line.size() <= stretch_) figure.line.resize(stretch_ + 1);
+  figure.line[stretch_].Add(number);
+  figure.range.Add(number, moment_);
 }
 
 // None for one that has no lines.
@@ -139,22 +136,26 @@ std::optional<size_t> ReportLines::ThingOf(std::span<const Value> values) {
     const bool isText = values[i].type == ValueType::text;
     row_[i] = {values[i].type, isText ? texts_.NumberOf(values[i].text) : values[i].number};
   }
+  const Thing named = NamedIn(values);
+  names_.Add(named.name, named.number);
   const uint32_t thing = identities_.NumberOf(columns_, row_, kMostThings);
   if (thing == kMostThings) {
     leavesOut_ = true;
     return std::nullopt;
   }
-  if (thing == keys_.size()) AddThing();
+  if (thing == things_.size()) {
+    things_.push_back(named);
+    lines_.resize(lines_.size() + places_.size());
+  }
   return thing;
 }
 
-// That of the row at hand.
-void ReportLines::AddThing() {
-  std::vector<PageValue>& keys = keys_.emplace_back();
-  for (size_t i = 0; i < columns_.size(); ++i) {
-    if (columns_[i].isKey) keys.push_back(row_[i]);
-  }
-  lines_.resize(lines_.size() + names_.size());
+ReportLines::Thing ReportLines::NamedIn(std::span<const Value> values) const {
+  if (role_ == nullptr) return {"", -1};
+  const size_t number = PlaceOf(columns_, role_->number);
+  const bool hasNumber = number < values.size() && values[number].type != ValueType::none;
+  return {std::string(values[PlaceOf(columns_, role_->name)].text),
+          hasNumber ? static_cast<int64_t>(values[number].number) : -1};
 }
 
 void ReportLines::End(bool isWhole) {
@@ -165,28 +166,47 @@ void ReportLines::End(bool isWhole) {
 }
 
 void ReportLines::Thin() {
-  std::ranges::for_each(sums_, Halve);
-  std::ranges::for_each(lines_, Halve);
+  for (std::vector<Figure>* figures : {&sums_, &lines_}) {
+    for (Figure& figure : *figures) Halve(figure.line);
+  }
 }
 
 void ReportLines::Put(size_t stretches, bool isCut, std::string& bytes) const {
-  for (size_t column = 0; column < names_.size(); ++column) {
+  for (size_t column = 0; column < columnNames_.size(); ++column) {
     const auto put = [&](const Line& line) {
       PutLine(line, stretches, isCut ? BitsToCut(line) : 0, bytes);
     };
-    put(sums_[column]);
-    for (size_t at = column; at < lines_.size(); at += names_.size()) put(lines_[at]);
+    put(sums_[column].line);
+    for (size_t at = column; at < lines_.size(); at += columnNames_.size()) put(lines_[at].line);
   }
 }
 
 std::string ReportLines::ThingsToJson() const {
   JsonWriter things;
-  for (const std::vector<PageValue>& keys : keys_) {
-    JsonWriter thing;
-    for (const PageValue& key : keys) PutKey(key, thing);
-    things.Json("", thing.Array());
+  for (const Thing& thing : things_) {
+    if (role_ == nullptr) {
+      things.None("");
+    } else {
+      things.Text("", names_.Of(thing.name, thing.number));
+    }
   }
   return things.Array();
+}
+
+std::vector<size_t> ReportLines::WorstMoments(size_t column, bool isLessWorse,
+                                              size_t things) const {
+  std::vector<const Range*> ranges;
+  for (size_t at = column; at < lines_.size(); at += columnNames_.size()) {
+    ranges.push_back(&lines_[at].range);
+  }
+  std::ranges::stable_sort(ranges, std::ranges::greater(), &Range::Size);
+  ranges.resize(std::min(ranges.size(), things));
+  ranges.insert(ranges.begin(), &sums_[column].range);
+  std::vector<size_t> moments;
+  for (const Range* range : ranges) {
+    if (range->Size() > 0) moments.push_back(isLessWorse ? range->least : range->greatest);
+  }
+  return moments;
 }
 
 }  // namespace ksicache

@@ -18,6 +18,8 @@
 #include <vector>
 
 #include "tools/ksicache/export/row_format.h"
+#include "tools/ksicache/page/names.h"
+#include "tools/ksicache/page/roles.h"
 #include "tools/ksicache/page/table_stream.h"
 
 namespace ksicache {
@@ -29,6 +31,17 @@ struct Extent {
   bool IsEmpty() const { return least > greatest; }
   void Add(int64_t figure);
   void Add(const Extent& other);
+};
+
+// The least and the greatest figure of a line, and the moments at which it had them first.
+struct Range {
+  Extent extent;
+  size_t least = 0;
+  size_t greatest = 0;
+
+  void Add(int64_t figure, size_t moment);
+  // By how much it goes up and down; 0 if it has no figure.
+  uint64_t Size() const;
 };
 
 // An extent for each stretch of moments.
@@ -47,12 +60,13 @@ class ReportLines {
   // As many things of a report have lines: those that are met first.
   static constexpr uint32_t kMostThings = 2000;
 
-  // `columns`: names of figures.
-  ReportLines(PageTexts& texts, std::vector<const char*> columns);
+  // `columns`: names of figures. The names of the report's things are added to `names`.
+  ReportLines(PageTexts& texts, const char* report, std::vector<const char*> columns,
+              ThingNames& names);
 
   // The rows of one moment, of this stretch, which is none before that of the last one: End behind
   // them, the rest as of TableStream.
-  void BeginMoment(size_t stretch);
+  void BeginMoment(size_t moment, size_t stretch);
   void Begin(std::span<const RowColumn> columns);
   void Row(std::span<const Value> values);
   // `isWhole`: no row is missing from the sums.
@@ -65,29 +79,46 @@ class ReportLines {
   // screen.
   void Put(size_t stretches, bool isCut, std::string& bytes) const;
 
-  // The key values of the things, in their order.
+  // What the things are called, in their order; nothing if the rows are no things.
   std::string ThingsToJson() const;
+
+  // The moments at which a column's figures were the worst: of all rows together, then of so many
+  // things whose figures changed most. What never changed has none.
+  std::vector<size_t> WorstMoments(size_t column, bool isLessWorse, size_t things) const;
 
   // Whether there are others.
   bool LeavesOut() const { return leavesOut_; }
 
  private:
-  void AddTo(Line& line, int64_t figure) const;
+  // A figure over time.
+  struct Figure {
+    Line line;
+    Range range;
+  };
+  struct Thing {
+    std::string name;
+    int64_t number;  // -1: it has none
+  };
+
+  void AddTo(Figure& figure, int64_t number) const;
   std::optional<size_t> ThingOf(std::span<const Value> values);
-  void AddThing();
+  Thing NamedIn(std::span<const Value> values) const;
 
   PageTexts& texts_;
-  std::vector<const char*> names_;
+  const roles::Things* role_;  // null if the rows are no things
+  std::vector<const char*> columnNames_;
+  ThingNames& names_;
+  size_t moment_ = 0;
   size_t stretch_ = 0;
 
   std::vector<RowColumn> columns_;
   std::vector<size_t> places_;  // of the names among the columns
   std::vector<PageValue> row_;  // at hand: its keys
   RowIdentities identities_;
-  std::vector<Line> lines_;  // of the first thing, of the second, ...; a line a column
-  std::vector<Line> sums_;   // a line a column
-  std::vector<std::optional<int64_t>> sum_;   // of the moment at hand
-  std::vector<std::vector<PageValue>> keys_;  // of the things
+  std::vector<Figure> lines_;                // of the first thing, of the second, ...; one a column
+  std::vector<Figure> sums_;                 // one a column
+  std::vector<std::optional<int64_t>> sum_;  // of the moment at hand
+  std::vector<Thing> things_;
   bool leavesOut_ = false;
 };
 

@@ -1,5 +1,7 @@
 #include "tools/ksicache/page/lines_reader.h"
 
+#include <algorithm>
+#include <string_view>
 #include <utility>
 
 #include "reports/reports.h"
@@ -13,19 +15,22 @@ namespace {
 constexpr size_t kMostStretches = 720;
 constexpr size_t kFewestStretches = 64;
 
+// As many things of a line have their worst moment in full, if there is room.
+constexpr size_t kThingsToldOf = 3;
+
 // The reports that have lines, with the columns of these.
-std::vector<PageLines::OfReport> EmptyLines(PageTexts& texts) {
-  std::vector<std::pair<std::string, std::vector<const char*>>> columns;
+std::vector<PageLines::OfReport> EmptyLines(PageTexts& texts, Names& names) {
+  std::vector<std::pair<const char*, std::vector<const char*>>> columns;
   for (const roles::Line& line : roles::kLines) {
-    if (columns.empty() || columns.back().first != line.report) {
+    if (columns.empty() || std::string_view(columns.back().first) != line.report) {
       columns.push_back({line.report, {}});
     }
     columns.back().second.push_back(line.column);
   }
   std::vector<PageLines::OfReport> lines;
   lines.reserve(columns.size());
-  for (const auto& [report, names] : columns) {
-    lines.push_back({report, names, ReportLines(texts, names)});
+  for (const auto& [report, ofReport] : columns) {
+    lines.push_back({report, ofReport, ReportLines(texts, report, ofReport, names[report])});
   }
   return lines;
 }
@@ -42,15 +47,34 @@ Line TimesOf(const Line& moments, const Survey& survey) {
 
 }  // namespace
 
-LinesReader::LinesReader(PageTexts& texts, Problems& problems) : problems_(problems) {
-  lines_.reports = EmptyLines(texts);
+std::vector<size_t> PageLines::WorstMoments() const {
+  std::vector<std::vector<size_t>> ofLines;
+  for (const roles::Line& line : roles::kLines) {
+    const OfReport& each = *std::ranges::find(reports, line.report, &OfReport::report);
+    const auto column = std::ranges::find(each.columns, std::string_view(line.column));
+    ofLines.push_back(each.lines.WorstMoments(static_cast<size_t>(column - each.columns.begin()),
+                                              line.isLessWorse, kThingsToldOf));
+  }
+  std::vector<size_t> worst;
+  for (size_t rank = 0; rank <= kThingsToldOf; ++rank) {
+    for (const std::vector<size_t>& ofLine : ofLines) {
+      if (rank < ofLine.size()) worst.push_back(ofLine[rank]);
+    }
+  }
+  return worst;
+}
+
+LinesReader::LinesReader(PageTexts& texts, Names& names, Problems& problems) : problems_(problems) {
+  lines_.reports = EmptyLines(texts, names);
 }
 
 void LinesReader::Read(const Origin& origin) {
+  problems_.At(origin.taken);
   const size_t stretch = NextStretch();
-  lines_.moments[stretch].Add(count_++);
+  const int64_t moment = count_++;
+  lines_.moments[stretch].Add(moment);
   for (PageLines::OfReport& each : lines_.reports) {
-    each.lines.BeginMoment(stretch);
+    each.lines.BeginMoment(static_cast<size_t>(moment), stretch);
     const bool isWhole =
         GiveRows(*tally::FindReport(each.report.c_str()), origin,
                  {each.columns.begin(), each.columns.end()}, each.lines, problems_);

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "tools/ksicache/page/lines.h"
+#include "tools/ksicache/page/names.h"
 #include "tools/ksicache/page/problems.h"
 #include "tools/ksicache/page/survey.h"
 #include "tools/ksicache/page/table_stream.h"
@@ -26,12 +27,17 @@ struct PageLines {
   bool isCut = false;
   std::vector<OfReport> reports;
   std::string bytes;  // deflated: the steady times of the stretches and the lines of each report
+
+  // The moments at which some of the figures were the worst, the most telling first, as their
+  // places in the survey.
+  std::vector<size_t> WorstMoments() const;
 };
 
 // However many moments there are, the lines have up to so many stretches as a screen has points.
 class LinesReader {
  public:
-  LinesReader(PageTexts& texts, Problems& problems);
+  // The names of all things are added to `names`.
+  LinesReader(PageTexts& texts, Names& names, Problems& problems);
 
   // The moment that the library answers from.
   void Read(const Origin& origin);

@@ -1,9 +1,11 @@
 #include "tools/ksicache/page/marks.h"
 
 #include <algorithm>
+#include <iterator>
 #include <map>
 #include <memory>
 #include <optional>
+#include <string_view>
 #include <utility>
 
 #include "knvlibs/recording/recording_file.h"
@@ -56,8 +58,8 @@ class Marker {
     next_ = place + 1;
     survey_.moments[place].boot = NumberOf(moment.boot);
     if (place > 0) AddMarks(place, moment);
-    marks_.refused = std::max(marks_.refused, moment.facts.refused);
-    marks_.failed = std::max(marks_.failed, moment.facts.failed);
+    marks_.refused.Add(place, moment.facts.refused);
+    marks_.failed.Add(place, moment.facts.failed);
     marks_.lossy += moment.facts.loss == ksi::kOk ? 0 : 1;
   }
 
@@ -119,12 +121,37 @@ Marks MarksOfCapture(const std::string& fileName) {
     if (reading.status != ksi::kOk) failures.Add(reading.status, [&] { return reading.Name(); });
   });
   Marks marks;
-  marks.refused = failures.refused.Count();
-  marks.failed = failures.failed.Count();
+  marks.refused.Add(0, failures.refused.Count());
+  marks.failed.Add(0, failures.failed.Count());
   return marks;
 }
 
+struct Words {
+  std::string_view kind;
+  const char* words;
+};
+
+constexpr Words kWords[] = {
+    {"reboot", "restarted, {} between the moments"},
+    {"gap", "nothing recorded for {}"},
+    {"lost", "nothing that can be read for {}"},
+    {"skipped", "moments before it were left out"},
+};
+
 }  // namespace
+
+const char* WordsOf(const Mark& mark) {
+  const auto* const found = std::ranges::find(kWords, mark.kind, &Words::kind);
+  if (found != std::end(kWords)) return found->words;
+  return mark.time > 0 ? "the clock was set forward by {}" : "the clock was set back by {}";
+}
+
+void ReadFailures::Add(size_t at, uint64_t count) {
+  if (count == 0) return;
+  if (count > most) moment = at;
+  most = std::max(most, count);
+  ++moments;
+}
 
 Marks MarksOf(const std::string& name, Survey& survey, Problems& problems) {
   const std::string fileName = FileNameOf(name);

@@ -20,14 +20,26 @@ struct Mark {
   int64_t time;      // how much later that is, how far the clock was set; us
 };
 
+// What it says; "{}" stands for how long it took.
+const char* WordsOf(const Mark& mark);
+
+// Reads of moments that failed.
+struct ReadFailures {
+  uint64_t most = 0;   // of one moment
+  size_t moment = 0;   // the first with so many
+  size_t moments = 0;  // with any
+
+  void Add(size_t at, uint64_t count);
+};
+
 struct Marks {
   // As many are told of a page.
   static constexpr size_t kMost = 500;
 
   std::vector<Mark> all;
   size_t leftOut = 0;
-  uint64_t refused = 0;             // reads of one moment for want of rights, at most
-  uint64_t failed = 0;              // reads of one moment for other reasons, at most
+  ReadFailures refused;             // for want of rights
+  ReadFailures failed;              // for other reasons
   size_t lossy = 0;                 // moments of which something was left out
   std::map<size_t, int64_t> steps;  // of the clock, before these moments: Survey::Steady
 };

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "tools/ksicache/diff/memory.h"
+#include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/json_writer.h"
 
 namespace ksicache {
@@ -23,7 +24,7 @@ constexpr RowColumn kColumns[] = {
      {}},
     {"identity", "what tells things of a part apart", Kind::text, true, false, false, "", {}},
     {"path", "the same after the host was started anew", Kind::text, false, false, false, "", {}},
-    {"name", "name", Kind::text, false, false, false, "", {}},
+    {"name", "what it is called", Kind::text, false, false, false, "", {}},
     {"number", "the kernel's number of the group", Kind::id, false, false, true, "", {}},
     {"bytes", "memory", Kind::bytes, false, false, true, "Bytes", {}},
 };
@@ -45,7 +46,9 @@ Value NumberOf(std::optional<int64_t> number) {
 
 class Writer {
  public:
-  explicit Writer(TableStream& stream) : stream_(stream) { stream_.Begin(kColumns); }
+  Writer(TableStream& stream, const Names& names) : stream_(stream), names_(names) {
+    stream_.Begin(kColumns);
+  }
 
   // `byPath`: the same with paths as identities, if there are any.
   void Put(const Memory& memory, const Memory* byPath) {
@@ -62,9 +65,16 @@ class Writer {
     }
     for (size_t i = 0; i < things.size(); ++i) {
       const Amount& thing = things[i];
-      PutRow(number, thing.identity, PathOf(byPath, info.part, i), thing.name,
+      PutRow(number, thing.identity, PathOf(byPath, info.part, i), NameOf(info, thing),
              thing.number < 0 ? std::nullopt : std::make_optional(thing.number), thing.bytes);
     }
+  }
+
+  std::string NameOf(const PartInfo& info, const Amount& thing) const {
+    const std::string_view source = info.source;
+    const auto names = names_.find(source.substr(0, source.find(' ')));
+    return names == names_.end() ? NameText(thing.name, -1)
+                                 : names->second.Of(thing.name, thing.number);
   }
 
   static std::optional<std::string_view> PathOf(const Memory* byPath, Part part, size_t place) {
@@ -97,18 +107,19 @@ class Writer {
   }
 
   TableStream& stream_;
+  const Names& names_;
 };
 
 }  // namespace
 
 void PutMemoryRows(const Origin& origin, bool hasPaths, TableStream& stream, std::string& bytes,
-                   Problems& problems) {
+                   const Names& names, Problems& problems) {
   const Memory memory = ReadMemory(origin, {});
   std::optional<Memory> byPath;
   if (hasPaths) byPath = ReadMemory(origin, {.byPath = true});
   problems.AddDiagnostics();
   for (const std::string& complaint : memory.complaints) problems.Add(complaint);
-  Writer(stream).Put(memory, byPath ? &*byPath : nullptr);
+  Writer(stream, names).Put(memory, byPath ? &*byPath : nullptr);
   stream.End(true, bytes);
 }
 

@@ -5,6 +5,7 @@
 
 #include <string>
 
+#include "tools/ksicache/page/names.h"
 #include "tools/ksicache/page/problems.h"
 #include "tools/ksicache/page/table_stream.h"
 #include "tools/ksicache/report_run.h"
@@ -13,9 +14,9 @@ namespace ksicache {
 
 // Puts the rows of the moment that the library answers from into the stream and ends it there.
 // `hasPaths`: with the names on the way to groups and processes, because at other moments of the
-// page their numbers are those of others.
+// page their numbers are those of others. `names`: what things are called.
 void PutMemoryRows(const Origin& origin, bool hasPaths, TableStream& stream, std::string& bytes,
-                   Problems& problems);
+                   const Names& names, Problems& problems);
 
 // What the rows' parts are, in the order of their numbers.
 std::string PartsToJson();

@@ -18,22 +18,40 @@ constexpr size_t kMostMoments = 240;
 constexpr size_t kFewestMoments = 8;
 constexpr size_t kStretchesOfPoints = 500;
 
-// The moments after what is told of.
-std::vector<size_t> Marked(const Marks& marks) {
+// The first moments of what could not be read.
+std::vector<size_t> TroubledMoments(const PageData& data) {
   std::vector<size_t> moments;
-  for (const Mark& mark : marks.all) moments.push_back(mark.moment);
+  for (const int64_t taken : data.problems.FirstTimes()) {
+    if (const auto place = data.survey.Find(taken, 0)) moments.push_back(*place);
+  }
+  return moments;
+}
+
+// The tightest moment, those of what could not be read, those after what is told of and those at
+// which figures were the worst, in turn.
+std::vector<size_t> TellingMoments(const PageData& data) {
+  const std::vector<size_t> worst = data.lines.WorstMoments();
+  const std::vector<Mark>& marks = data.marks.all;
+  const std::vector<size_t> troubled = TroubledMoments(data);
+  std::vector<size_t> moments = {TightestMoment(data.survey)};
+  for (size_t i = 0; i < std::max({worst.size(), marks.size(), troubled.size()}); ++i) {
+    if (i < troubled.size()) moments.push_back(troubled[i]);
+    if (i < marks.size()) moments.push_back(marks[i].moment);
+    if (i < worst.size()) moments.push_back(worst[i]);
+  }
   return moments;
 }
 
 // As many moments in full as there is room for.
 void ReadTablesOf(const std::string& name, PageData& data) {
   const Survey& survey = data.survey;
-  WantedMoments wanted = {{}, ChoosePoints(survey, kStretchesOfPoints)};
+  WantedMoments wanted = {{}, ChoosePoints(survey, kStretchesOfPoints), TightestMoment(survey)};
+  const std::vector<size_t> telling = TellingMoments(data);
   size_t most = std::min(kMostMoments, survey.moments.size());
   for (bool isLast = false; !isLast;) {
-    wanted.full = ChooseMoments(survey, Marked(data.marks), most);
-    data.tables =
-        ReadTables(name, survey, wanted, kFewestMoments, kRoomOfTables, data.texts, data.problems);
+    wanted.full = ChooseMoments(survey, telling, most);
+    data.tables = ReadTables(name, survey, wanted, kFewestMoments, kRoomOfTables, data.texts,
+                             data.names, data.problems);
     const size_t held = data.tables.full.moments.size();
     isLast = !data.tables.isTooMuch || held == wanted.full.size() || most == kFewestMoments;
     // The first moment is larger than what later ones add to it.
@@ -97,11 +115,20 @@ std::string ToJson(const Survey& survey, const std::vector<size_t>& moments) {
       .Object();
 }
 
+std::string ToJson(const ReadFailures& reads, const Survey& survey) {
+  return JsonWriter()
+      .Number("most", reads.most)
+      .Number("at", survey.moments[reads.moment].taken)
+      .Number("moments", reads.moments)
+      .Object();
+}
+
 std::string ToJson(const Marks& marks, const Survey& survey) {
   JsonWriter all;
   for (const Mark& mark : marks.all) {
     all.Json("", JsonWriter()
                      .Text("kind", mark.kind)
+                     .Text("words", WordsOf(mark))
                      .Number("at", survey.moments[mark.moment].taken)
                      .Number("steady", survey.moments[mark.moment].steady)
                      .Number("time", mark.time)
@@ -110,8 +137,8 @@ std::string ToJson(const Marks& marks, const Survey& survey) {
   return JsonWriter()
       .Json("all", all.Array())
       .Number("leftOut", marks.leftOut)
-      .Number("refused", marks.refused)
-      .Number("failed", marks.failed)
+      .Json("refused", ToJson(marks.refused, survey))
+      .Json("failed", ToJson(marks.failed, survey))
       .Number("lossy", marks.lossy)
       .Object();
 }
@@ -144,11 +171,17 @@ std::string TextsToJson(const Texts& texts) {
 
 }  // namespace
 
+std::vector<std::string> ProblemsOf(const PageData& data) {
+  const bool isOne = data.survey.moments.size() == 1;
+  return isOne ? data.problems.All() : data.problems.WithTimes();
+}
+
 void ReadPage(const std::string& name, PageData& data) {
-  LinesReader lines(data.texts, data.problems);
+  LinesReader lines(data.texts, data.names, data.problems);
   std::string problem;
   data.survey = MakeSurvey(
       name, [&](const Origin& origin) { lines.Read(origin); }, problem);
+  data.problems.At(std::nullopt);
   data.problems.AddDiagnostics();
   if (!problem.empty()) data.problems.Add(problem);
   try {
@@ -178,7 +211,7 @@ std::string HeadToJson(const PageData& data) {
       .Json("memory", ToJson("memory", data.tables.full.streams.back()))
       .Json("parts", PartsToJson())
       .Json("marks", ToJson(data.marks, survey))
-      .Json("problems", TextsToJson(data.problems.All()))
+      .Json("problems", TextsToJson(ProblemsOf(data)))
       .Json("lines", ToJson(data.lines))
       .Json("roles", roles::ToJson())
       .Json("texts", TextsToJson(data.texts.All()))

@@ -3,9 +3,11 @@
 #define TOOLS_KSICACHE_PAGE_PAGE_DATA_H_
 
 #include <string>
+#include <vector>
 
 #include "tools/ksicache/page/lines_reader.h"
 #include "tools/ksicache/page/marks.h"
+#include "tools/ksicache/page/names.h"
 #include "tools/ksicache/page/problems.h"
 #include "tools/ksicache/page/survey.h"
 #include "tools/ksicache/page/table_stream.h"
@@ -19,6 +21,7 @@ struct PageData {
   Survey survey;
   Marks marks;
   PageTexts texts;
+  Names names;
   PageTables tables;
   PageLines lines;
 };
@@ -26,6 +29,9 @@ struct PageData {
 // Reads what "FILE", "FILE@WHEN" or "FILE@FROM..TO" is, into an empty `data`. Fails with a
 // DataError when there is nothing to show.
 void ReadPage(const std::string& name, PageData& data);
+
+// What was wrong, and with which moments if there are several.
+std::vector<std::string> ProblemsOf(const PageData& data);
 
 // What the page's scripts read first: all of it but for the packed bytes, as JSON.
 std::string HeadToJson(const PageData& data);

@@ -68,6 +68,11 @@ size_t StateOf(std::string_view state) {
   return static_cast<size_t>(std::ranges::find(kStates, state) - std::begin(kStates));
 }
 
+const Things* ThingsOf(std::string_view report) {
+  const auto* const found = std::ranges::find(kThings, report, &Things::report);
+  return found == std::end(kThings) ? nullptr : found;
+}
+
 std::string ToJson() {
   return JsonWriter()
       .Text("report", kHostReport)

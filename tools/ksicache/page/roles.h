@@ -34,6 +34,10 @@ inline constexpr Part kParts[] = {
     {"free", "Free", kFree},
 };
 
+// The memory that is taken at start, and what is managed but in no part.
+inline constexpr const char* kStart = "Taken at start";
+inline constexpr const char* kRest = "Not told apart";
+
 // Of the memory that is taken at start.
 inline constexpr Part kStartParts[] = {
     {"start", "Kernel code", "kernelCode"},
@@ -46,15 +50,19 @@ struct Things {
   const char* title;
   const char* report;
   const char* name;
+  const char* number;  // the kernel's, of the group; empty: they have none
   const char* size;
 };
 
 inline constexpr Things kThings[] = {
-    {"Machines", "vm-stats", "name", "consumed"},
-    {"Groups", "group-stats", "name", "consumed"},
-    {"Processes", "uw-stats", "name", "consumed"},
-    {"Heaps", "heap-stats", "name", "size"},
+    {"Machines", "vm-stats", "name", "schedGrp", "consumed"},
+    {"Groups", "group-stats", "name", "gid", "consumed"},
+    {"Processes", "uw-stats", "name", "schedGrp", "consumed"},
+    {"Heaps", "heap-stats", "name", "", "size"},
 };
+
+// Those of a report; null if its rows are none.
+const Things* ThingsOf(std::string_view report);
 
 // The tree of groups, in which machines and processes hang.
 struct Groups {

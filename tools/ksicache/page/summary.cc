@@ -1,7 +1,7 @@
 #include "tools/ksicache/page/summary.h"
 
 #include <algorithm>
-#include <cinttypes>
+#include <cmath>
 #include <cstdio>
 #include <optional>
 #include <vector>
@@ -9,6 +9,7 @@
 #include "framework/display_unit.h"
 #include "knvlibs/times.h"
 #include "reports/reports.h"
+#include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/page/roles.h"
 #include "tools/ksicache/printable.h"
 #include "tools/ksicache/unit.h"
@@ -31,10 +32,10 @@ tally::DisplayUnit UnitOf(const RowColumn& column) {
       ->unit;
 }
 
-// The rows of a report at the last moment, by the names of the columns.
-class LastRows {
+// The rows of a report at the moment that is told of, by the names of the columns.
+class ToldRows {
  public:
-  LastRows(const PageData& data, std::string_view report) : data_(data) {
+  ToldRows(const PageData& data, std::string_view report) : data_(data) {
     const auto reports = tally::Reports();
     const auto found = std::ranges::find(reports, report, &tally::Report::name);
     stream_ = &data.tables.full.streams[static_cast<size_t>(found - reports.begin())];
@@ -46,6 +47,13 @@ class LastRows {
     const PageValue* value = Find(row, name);
     const bool isText = value != nullptr && value->type == ValueType::text;
     return isText ? data_.texts.All()[value->number] : kNoValue;
+  }
+
+  // None if it has none.
+  std::optional<int64_t> NumberAt(size_t row, std::string_view name) const {
+    const PageValue* value = Find(row, name);
+    if (value == nullptr || value->type == ValueType::none) return std::nullopt;
+    return static_cast<int64_t>(value->number);
   }
 
   // Memory, in bytes; none if it has no value.
@@ -118,17 +126,32 @@ std::string Table(const std::string& caption, const std::string& rows) {
          "</div>\n";
 }
 
+// None if one is not known, or the second is more.
+std::optional<uint64_t> Less(std::optional<uint64_t> a, std::optional<uint64_t> b) {
+  return a && b && *a >= *b ? std::make_optional(*a - *b) : std::nullopt;
+}
+
 std::string BalanceToHtml(const PageData& data) {
-  const LastRows host(data, roles::kHostReport);
+  const ToldRows host(data, roles::kHostReport);
   if (host.Count() == 0) return Tagged("p", "How the memory divides could not be read.");
   const std::optional<uint64_t> total = host.BytesAt(0, roles::kTotal);
+  const std::optional<uint64_t> managed = host.BytesAt(0, roles::kManaged);
+  const std::optional<uint64_t> start = Less(total, managed);
+  std::optional<uint64_t> rest = Less(total, start.value_or(0));
   std::string rows = HeadRow({"Part", "MB", "%"});
+  const auto add = [&](const char* title, std::optional<uint64_t> bytes) {
+    rows += RowOf(title, {MemoryText(bytes), ShareText(bytes, total)});
+  };
   for (const roles::Part& part : roles::kParts) {
     const std::optional<uint64_t> bytes = host.BytesAt(0, part.column);
-    rows += RowOf(part.title, {MemoryText(bytes), ShareText(bytes, total)});
+    add(part.title, bytes);
+    rest = Less(rest, bytes.value_or(0));
   }
-  rows += RowOf("Total", {MemoryText(total), ShareText(total, total)});
-  return Table("Where the memory is", rows);
+  add(roles::kRest, rest);
+  add(roles::kStart, start);
+  add("Total", total);
+  return Table("Where the memory is", rows) +
+         Tagged("p", "Memory state " + HtmlText(host.TextAt(0, roles::kState)) + ".") + "\n";
 }
 
 // The columns of lines of a report, as they are called there.
@@ -141,7 +164,7 @@ std::vector<const char*> ColumnsOf(std::string_view report) {
 }
 
 std::string LargestToHtml(const PageData& data, const roles::Things& things) {
-  const LastRows rows(data, things.report);
+  const ToldRows rows(data, things.report);
   if (rows.Count() == 0) return {};
   std::vector<size_t> order(rows.Count());
   for (size_t i = 0; i < order.size(); ++i) order[i] = i;
@@ -158,23 +181,58 @@ std::string LargestToHtml(const PageData& data, const roles::Things& things) {
     std::vector<std::string> numbers;
     numbers.reserve(columns.size());
     for (const char* column : columns) numbers.push_back(rows.FigureAt(row, column));
-    body += RowOf(rows.TextAt(row, things.name), numbers);
+    body += RowOf(
+        data.names.at(things.report)
+            .Of(rows.TextAt(row, things.name), rows.NumberAt(row, things.number).value_or(-1)),
+        numbers);
   }
   return Table(things.title + std::string(": the largest of ") + std::to_string(rows.Count()),
                body);
 }
 
-std::string FailuresToHtml(uint64_t count, const std::string& what) {
-  return count == 0 ? ""
-                    : Tagged("li", "reads of a moment that " + what + ": " + std::to_string(count));
+std::string MarksToHtml(const PageData& data) {
+  std::string items;
+  for (const Mark& mark : data.marks.all) {
+    std::string words = WordsOf(mark);
+    const size_t at = words.find("{}");
+    const double seconds = std::fabs(static_cast<double>(mark.time)) / 1e6;
+    if (at != std::string::npos) words.replace(at, 2, DurationText(seconds));
+    items += Tagged("li", ksi::TextOfTime(data.survey.moments[mark.moment].taken) + ": " + words);
+  }
+  if (data.marks.leftOut > 0) {
+    items += Tagged("li", "and " + std::to_string(data.marks.leftOut) + " more of these");
+  }
+  if (items.empty()) return {};
+  return Tagged("h3", "What happened between moments") + Tagged("ul", items) + "\n";
+}
+
+std::string FailuresToHtml(const PageData& data, const ReadFailures& reads, const char* what) {
+  if (reads.most == 0) return {};
+  std::string text =
+      std::string("reads of a moment that ") + what + ": " + std::to_string(reads.most);
+  const std::vector<SurveyedMoment>& moments = data.survey.moments;
+  if (moments.size() > 1) {
+    text += " at " + ksi::TextOfTime(moments[reads.moment].taken) + ", some at " +
+            std::to_string(reads.moments) + " of " + std::to_string(moments.size()) + " moments";
+  }
+  return Tagged("li", text);
 }
 
 std::string ProblemsToHtml(const PageData& data) {
-  std::string items = FailuresToHtml(data.marks.refused, "were refused for want of rights") +
-                      FailuresToHtml(data.marks.failed, "failed");
-  for (const std::string& problem : data.problems.All()) items += Tagged("li", HtmlText(problem));
+  std::string items = FailuresToHtml(data, data.marks.refused, "were refused for want of rights") +
+                      FailuresToHtml(data, data.marks.failed, "failed");
+  for (const std::string& problem : ProblemsOf(data)) items += Tagged("li", HtmlText(problem));
   if (items.empty()) return {};
   return Tagged("h3", "What could not be read") + Tagged("ul", items) + "\n";
+}
+
+// When the moment was that is told of, and why it is that one.
+std::string ToldText(const PageData& data) {
+  const Survey& survey = data.survey;
+  const size_t told = data.tables.told;
+  const bool isLeast = survey.moments.size() > 1 && told == TightestMoment(survey) &&
+                       survey.moments[told].free != UINT64_MAX;
+  return ksi::TextOfTime(survey.moments[told].taken) + (isLeast ? ", the least free memory" : "");
 }
 
 }  // namespace
@@ -215,9 +273,10 @@ std::string SummaryToHtml(const PageData& data) {
                           (count == 1 ? last
                                       : first + " to " + last + ", " + std::to_string(count) +
                                             " moments; scripts show all of them"));
-  html += Tagged("h2", "At " + last) + "\n" + BalanceToHtml(data);
+  html += Tagged("p", "Kernel's definitions built " + HtmlText(survey.kernel) + ".") + "\n";
+  html += Tagged("h2", "At " + ToldText(data)) + "\n" + BalanceToHtml(data);
   for (const roles::Things& things : roles::kThings) html += LargestToHtml(data, things);
-  return html + ProblemsToHtml(data);
+  return html + MarksToHtml(data) + ProblemsToHtml(data);
 }
 
 }  // namespace ksicache

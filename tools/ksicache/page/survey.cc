@@ -132,6 +132,12 @@ Survey MakeSurvey(const std::string& name, const std::function<void(const Origin
   return survey;
 }
 
+size_t TightestMoment(const Survey& survey) {
+  const auto tightest = std::ranges::min_element(survey.moments, HasLess);
+  if (tightest->free == kUnknown) return survey.moments.size() - 1;
+  return static_cast<size_t>(tightest - survey.moments.begin());
+}
+
 std::vector<size_t> ChooseMoments(const Survey& survey, const std::vector<size_t>& wanted,
                                   size_t most) {
   const size_t size = survey.moments.size();

@@ -43,6 +43,9 @@ struct Survey {
 Survey MakeSurvey(const std::string& name, const std::function<void(const Origin&)>& also,
                   std::string& problem);
 
+// The moment with the least free memory; the last one if that is known of none.
+size_t TightestMoment(const Survey& survey);
+
 // The moments to show in full, at most so many, in their order: the first and the last, the one
 // with the least free memory of each of as many stretches as there is room for, and those of
 // `wanted` before these.

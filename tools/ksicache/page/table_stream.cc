@@ -74,12 +74,14 @@ void TableStream::Row(std::span<const Value> values) {
 }
 
 void TableStream::End(bool isWhole, std::string& bytes) {
-  if (!isWhole && Rows() == 0) return PutNumber(bytes, 0);
-  PutNumber(bytes, 1 + Rows());
+  const size_t width = columns_.size();
+  const size_t rows = width == 0 ? 0 : cells_.size() / width;
+  if (!isWhole && rows == 0) return PutNumber(bytes, 0);
+  PutNumber(bytes, 1 + rows);
   identities_.Restart();
   ids_.clear();
-  for (size_t row = 0; row < Rows(); ++row) {
-    ids_.push_back(identities_.NumberOf(columns_, RowAt(row)));
+  for (size_t row = 0; row < rows; ++row) {
+    ids_.push_back(identities_.NumberOf(columns_, std::span(cells_).subspan(row * width, width)));
     const int64_t expected = row == 0 ? 0 : int64_t{ids_[row - 1]} + 1;
     PutNumber(bytes, Folded(ids_[row] - expected));
   }
@@ -89,7 +91,7 @@ void TableStream::End(bool isWhole, std::string& bytes) {
 
 void TableStream::PutColumn(size_t column, std::string& bytes) {
   PageValue above;
-  for (size_t row = 0; row < Rows(); ++row) {
+  for (size_t row = 0; row < ids_.size(); ++row) {
     PageValue& before = Before(row, column);
     const PageValue& value = cells_[row * columns_.size() + column];
     PutValue(bytes, value, before.type == ValueType::none ? above : before);

@@ -95,10 +95,13 @@ class TableStream {
   void Row(std::span<const Value> values);
   void End(bool isWhole, std::string& bytes);
 
-  // The rows of the moment that ended last, one after the other.
-  size_t Rows() const { return columns_.empty() ? 0 : cells_.size() / columns_.size(); }
+  // Keeps the rows of the moment that ended last, in place of those it has kept.
+  void Keep() { kept_ = cells_; }
+
+  // These rows, one after the other.
+  size_t Rows() const { return columns_.empty() ? 0 : kept_.size() / columns_.size(); }
   std::span<const PageValue> RowAt(size_t row) const {
-    return std::span(cells_).subspan(row * columns_.size(), columns_.size());
+    return std::span(kept_).subspan(row * columns_.size(), columns_.size());
   }
 
  private:
@@ -111,6 +114,7 @@ class TableStream {
   std::vector<RowColumn> columns_;
   RowIdentities identities_;
   std::vector<PageValue> cells_;  // of the moment at hand
+  std::vector<PageValue> kept_;
   std::vector<uint32_t> ids_;
   std::vector<PageValue> before_;  // the last row of each thing that there has been
 };

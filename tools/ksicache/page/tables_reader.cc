@@ -20,8 +20,9 @@ struct Enough {};
 
 class Reader {
  public:
-  Reader(const Survey& survey, const WantedMoments& wanted, PageTexts& texts, Problems& problems)
-      : survey_(survey), wanted_(wanted), problems_(problems) {
+  Reader(const Survey& survey, const WantedMoments& wanted, PageTexts& texts, const Names& names,
+         Problems& problems)
+      : survey_(survey), wanted_(wanted), names_(names), problems_(problems) {
     const TableStream empty(texts);
     tables_.full.streams = std::vector<TableStream>(tally::Reports().size() + 1, empty);
     tables_.points.streams = std::vector<TableStream>(1, empty);
@@ -57,9 +58,17 @@ class Reader {
     for (size_t i = 0; i < reports.size(); ++i) {
       Put(*reports[i], origin, tables_.full.streams[i], bytes);
     }
-    PutMemoryRows(origin, survey_.hasReboots, tables_.full.streams.back(), bytes, problems_);
+    PutMemoryRows(origin, survey_.hasReboots, tables_.full.streams.back(), bytes, names_,
+                  problems_);
+    // The first one in place of one that cannot be read.
+    if (tables_.full.moments.empty() || place == wanted_.told) Keep(place);
     packedFull_.Put(bytes);
     tables_.full.moments.push_back(place);
+  }
+
+  void Keep(size_t place) {
+    tables_.told = place;
+    for (TableStream& stream : tables_.full.streams) stream.Keep();
   }
 
   void Put(const tally::Report& report, const Origin& origin, TableStream& stream,
@@ -70,6 +79,7 @@ class Reader {
 
   const Survey& survey_;
   const WantedMoments& wanted_;
+  const Names& names_;
   Problems& problems_;
   PageTables tables_;
   Packer packedFull_;
@@ -79,8 +89,9 @@ class Reader {
 }  // namespace
 
 PageTables ReadTables(const std::string& name, const Survey& survey, const WantedMoments& wanted,
-                      size_t fewest, size_t room, PageTexts& texts, Problems& problems) {
-  Reader reader(survey, wanted, texts, problems);
+                      size_t fewest, size_t room, PageTexts& texts, const Names& names,
+                      Problems& problems) {
+  Reader reader(survey, wanted, texts, names, problems);
   Progress progress("reading");
   bool isTooMuch = false;
   size_t next = 0;
@@ -90,6 +101,7 @@ PageTables ReadTables(const std::string& name, const Survey& survey, const Wante
       if (!place) return;
       next = *place + 1;
       progress.Show(next, survey.moments.size());
+      problems.At(origin.taken);
       reader.Read(*place, origin);
       isTooMuch = reader.Full() >= fewest && reader.SizeOfFull() > room;
       // Moments that were added meanwhile are not the page's.
@@ -97,6 +109,7 @@ PageTables ReadTables(const std::string& name, const Survey& survey, const Wante
     });
   } catch (const Enough&) {
   } catch (const DataError& error) {
+    problems.At(std::nullopt);
     problems.Add(error.what());
   }
   return reader.Finish(isTooMuch);

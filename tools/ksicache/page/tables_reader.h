@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "tools/ksicache/page/names.h"
 #include "tools/ksicache/page/problems.h"
 #include "tools/ksicache/page/survey.h"
 #include "tools/ksicache/page/table_stream.h"
@@ -16,6 +17,7 @@ namespace ksicache {
 struct WantedMoments {
   std::vector<size_t> full;    // all reports, and who has the memory (memory_rows.h)
   std::vector<size_t> points;  // the host's report
+  size_t told = 0;             // of those in full, the one to tell of without scripts
 };
 
 // Rows of reports at some moments.
@@ -29,13 +31,16 @@ struct MomentTables {
 struct PageTables {
   MomentTables full;    // the reports in the order of tally's
   MomentTables points;  // of the host's report alone
+  size_t told =
+      0;  // the moment to tell of without scripts, of which the streams of `full` keep rows
   bool isTooMuch = false;
 };
 
 // Reads what is wanted of a "FILE", "FILE@WHEN" or "FILE@FROM..TO". Stops with isTooMuch when
 // there are at least `fewest` moments in full and more than `room` bytes of them.
 PageTables ReadTables(const std::string& name, const Survey& survey, const WantedMoments& wanted,
-                      size_t fewest, size_t room, PageTexts& texts, Problems& problems);
+                      size_t fewest, size_t room, PageTexts& texts, const Names& names,
+                      Problems& problems);
 
 }  // namespace ksicache
 

@@ -45,7 +45,10 @@ function settle(whole, restName) {
   if (whole.children.length === 0) return whole;
   const sum = sumOf(whole.children);
   if (sum < whole.bytes) {
-    whole.children.push(part(restName, 'rest', whole.bytes - sum, `${whole.source} less all that is told apart`));
+    const rest = part(restName, 'rest', whole.bytes - sum, `${whole.source} less all that is told apart`);
+    whole.children.push(rest);
+    // It may be too small to be seen.
+    whole.note = [whole.note, `${memoryText(rest.bytes)} of it: ${restName.toLowerCase()}`].filter((note) => note !== '').join(' · ');
   } else if (sum > whole.bytes) {
     whole.share = whole.bytes / sum;
   }
@@ -92,7 +95,7 @@ class Groups {
     this.told = told;
     this.source = data.head.parts.find((each) => each.name === 'groups').source;
     this.groups = new Map(rows.rows.map((row) => [String(rows.value(row, role.id)), {
-      name: shownText(rows.value(row, role.name) ?? ''), parent: String(rows.value(row, role.parent)), below: [], things: [],
+      name: shownText(told.get(String(rows.value(row, role.id)))?.name ?? rows.value(row, role.name) ?? ''), parent: String(rows.value(row, role.parent)), below: [], things: [],
     }]));
     this.top = {below: [], things: []};
     for (const [id, each] of this.groups) {

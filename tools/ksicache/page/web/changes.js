@@ -1,6 +1,6 @@
 // What changed between the two chosen moments, as `ksicache diff` has it.
 import {choice, element} from './dom.js';
-import {NO_VALUE, UNITS, shownText, timeText} from './format.js';
+import {NO_VALUE, UNITS, shownText, signedText, timeText} from './format.js';
 import {compared} from './comparison.js';
 import {Grid, compareValues} from './grid.js';
 
@@ -11,10 +11,6 @@ const INNER = ['kernel', 'caches', 'others'];
 
 function numberText(number) {
   return number === null ? NO_VALUE : String(number);
-}
-
-function growthText(number) {
-  return number > 0n ? `+${number}` : numberText(number);
 }
 
 // The part of the growth of what is in use.
@@ -31,7 +27,7 @@ function cells(...texts) {
 
 function figureRow(title, figure, whole, attributes = {}) {
   return element('tr', attributes, element('th', {scope: 'row'}, title),
-    ...cells(numberText(figure.before), numberText(figure.after), growthText(figure.growth), partText(figure.growth, whole)));
+    ...cells(numberText(figure.before), numberText(figure.after), signedText(figure.growth), partText(figure.growth, whole)));
 }
 
 function scroller(label, table) {
@@ -56,7 +52,7 @@ function sizeOf(number) {
 function columnOf({name, title, key, isNumber = false}) {
   return {
     name, title, isNumber,
-    text: (row) => (key === 'growth' ? growthText(row.growth) : isNumber ? numberText(row[key]) : shownText(row[key])),
+    text: (row) => (key === 'growth' ? signedText(row.growth) : isNumber ? numberText(row[key]) : shownText(row[key])),
     csv: (row) => (row[key] === null ? null : String(row[key])),
     compare: (a, b, sign) => (key === 'growth' ? compareValues(sizeOf(a.growth), sizeOf(b.growth), sign)
       : compareValues(a[key], b[key], sign)),
@@ -114,7 +110,7 @@ export class Changes {
       figureRow(title, host[key], key === 'total' || key === 'free' ? null : whole, {class: INNER.includes(key) ? 'inner' : null})));
     this.fill(this.who, 'who explains it', [
       ...parts.filter((part) => part.info.isAdded && isShown(part)).map((part) => this.partRow(part, whole)),
-      element('tr', {}, element('th', {scope: 'row'}, 'nobody'), ...cells('', '', growthText(nobody), partText(nobody, whole)))]);
+      element('tr', {}, element('th', {scope: 'row'}, 'nobody'), ...cells('', '', signedText(nobody), partText(nobody, whole)))]);
   }
 
   fill(table, title, rows) {

@@ -48,19 +48,11 @@ export function memoryTicks(most) {
   return (axis) => axis.tickValues(d3.range(0, most * 1.0001, step)).tickFormat(tickText);
 }
 
-const MARKS = {
-  reboot: (mark) => `restarted, ${spanText(mark.time)} between the moments`,
-  gap: (mark) => `nothing recorded for ${spanText(mark.time)}`,
-  lost: (mark) => `nothing that can be read for ${spanText(mark.time)}`,
-  skipped: () => 'moments before it were left out',
-  clock: (mark) => `the clock was set ${mark.time > 0 ? 'forward' : 'back'} by ${spanText(mark.time)}`,
-};
-
 // What has a word in a chart; the others are seen as gaps.
 const WORDS = {reboot: 'restart', clock: 'clock', lost: 'damage'};
 
 export function markText(mark) {
-  return MARKS[mark.kind](mark);
+  return mark.words.replace('{}', spanText(mark.time));
 }
 
 export function markShapes(marks, x, top, height) {

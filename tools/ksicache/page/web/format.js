@@ -77,9 +77,9 @@ export function tickText(bytes) {
   return memoryText(bytes).replace(/\.0+ /, ' ');
 }
 
-// By how much something has more.
-export function growthText(bytes) {
-  return bytes > 0 ? `+${memoryText(bytes)}` : memoryText(bytes);
+// By how much something has more, in the unit that is chosen.
+export function signedText(number) {
+  return number === null ? NO_VALUE : number > 0n ? `+${number}` : String(number);
 }
 
 export function percentText(part, whole) {

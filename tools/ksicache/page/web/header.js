@@ -2,10 +2,10 @@
 import {markText} from './chart.js';
 import {compared} from './comparison.js';
 import {element} from './dom.js';
-import {ZONE, growthText, isUtc, memoryText, shownText, spanText, timeText} from './format.js';
+import {UNITS, ZONE, isUtc, memoryText, shownText, signedText, spanText, timeText} from './format.js';
 import {leastFree} from './memory.js';
 
-const NAMED = 3; // who grew or shrank most
+const NAMED = 3; // of those who explain it
 
 function count(number, one, many) {
   return `${number} ${number === 1 ? one : many}`;
@@ -23,7 +23,7 @@ function extentText({moments, full, points, lines}) {
   const span = `${timeText(first)} to ${timeText(last)}, ${count(moments, 'moment', 'moments')} in ${spanText(points.steady.at(-1) - points.steady[0])}`;
   if (full.taken.length === moments) return `${span}, all of them in full`;
   const cut = lines.isCut ? ', to 1/256 of its range' : '';
-  return `${span}. Shown in full: ${full.taken.length} of them, those with the least free memory in each stretch and those after a gap or restart. The balance is drawn from ${points.taken.length} moments, the least and the most free memory of each stretch; a line from the least and the greatest figure of each of ${lines.stretches} stretches${cut}.`;
+  return `${span}. Shown in full: ${full.taken.length} of them, those with the least free memory in each stretch, those at which figures were the worst, and those after a gap or restart. The balance is drawn from ${points.taken.length} moments, the least and the most free memory of each stretch; a line from the least and the greatest figure of each of ${lines.stretches} stretches${cut}.`;
 }
 
 // How long the memory was in which state.
@@ -34,36 +34,56 @@ function statesText({states, moments, roles}) {
   return shares.map(({name, share}) => `${name} ${(100 * share).toFixed(1)} %`).join(', ');
 }
 
-// Who had grown or shrunk most by the moment with the least free memory.
-function growths({head, memory}, moment) {
-  const {parts} = compared(memory[0], memory[moment], head.parts, 0, head.boots[0] === head.boots[moment]);
+// Who explains what is more or less in use at one moment than at another: those whose memory changed
+// most and the same way.
+function explained({head, memory}, from, at) {
+  const {host, parts} = compared(memory[from], memory[at], head.parts, UNITS.mb.shift, head.boots[from] === head.boots[at]);
+  const whole = host.used.growth;
+  if (whole === null || whole === 0n) return [];
+  const heaps = parts.find(({info}) => info.name === 'heaps');
+  const others = [
+    {name: 'caches', growth: host.caches.growth},
+    {name: 'the kernel outside of heaps', growth: host.kernel.growth === null || heaps.growth === null ? null : host.kernel.growth - heaps.growth},
+  ];
   const things = parts.filter(({info}) => info.isAdded).flatMap((part) => part.things);
-  const size = ({growth}) => Math.abs(Number(growth));
-  return things.sort((a, b) => size(b) - size(a)).slice(0, NAMED)
-    .map((thing) => `${shownText(thing.name)} ${growthText(Number(thing.growth))}`);
+  const size = ({growth}) => (growth < 0n ? -growth : growth);
+  return [...others, ...things].filter(({growth}) => growth !== null && growth !== 0n && growth > 0n === whole > 0n)
+    .sort((a, b) => (size(b) > size(a) ? 1 : size(b) < size(a) ? -1 : 0)).slice(0, NAMED)
+    .map(({name, growth}) => `${shownText(name)} ${signedText(growth)} MB`);
 }
 
-function inShort(data) {
+// What there is to say of the chosen moments.
+function inShort(data, from, at) {
   const {head, memory} = data;
-  const moment = tightest(data);
-  const {free, total} = memory[moment].host;
-  if (free === null || total === null) return null;
-  const words = [element('strong', {}, `${memoryText(Number(free))} of ${memoryText(Number(total))} free`), ` at ${timeText(head.full.taken[moment])}`];
-  if (moment !== 0) {
-    const isLeast = moment === leastFree(data);
-    const grown = growths(data, moment).map((text) => element('span', {class: text.length < 40 ? 'word' : null}, text));
-    words.push(isLeast ? ', the least of all. ' : '. ');
-    if (grown.length > 0) words.push(`Since ${timeText(head.full.taken[0])}: `, ...grown.flatMap((each, i) => (i === 0 ? [each] : [', ', each])), '.');
-  }
-  return element('p', {class: 'short'}, ...words);
+  const {free, total} = memory[at].host;
+  if (free === null || total === null) return [];
+  const isLeast = head.full.taken.length > 1 && at === leastFree(data);
+  const words = [element('strong', {}, `${memoryText(Number(free))} of ${memoryText(Number(total))} free`), ` at ${timeText(head.full.taken[at])}${isLeast ? ', the least of all' : ''}. `];
+  const [first, last] = [from, at].sort((a, b) => a - b);
+  const grown = explained(data, first, last).map((text) => element('span', {class: text.length < 40 ? 'word' : null}, text));
+  if (grown.length > 0) words.push(`${timeText(head.full.taken[first])} to ${timeText(head.full.taken[last])}: `, ...grown.flatMap((each, i) => (i === 0 ? [each] : [', ', each])), '.');
+  return words;
+}
+
+function shortView(data, state) {
+  const view = element('p', {class: 'short'});
+  const show = () => {
+    view.replaceChildren(...inShort(data, state.get('from'), state.get('at')));
+    view.hidden = view.childNodes.length === 0;
+  };
+  state.watch(['at', 'from'], show);
+  show();
+  return view;
 }
 
 function remarks({moments, marks, problems}) {
   const items = marks.all.map((mark) => `${timeText(mark.at)}: ${markText(mark)}`);
   if (marks.leftOut > 0) items.push(`and ${marks.leftOut} more of these`);
-  const reads = (number) => (moments === 1 ? count(number, 'read', 'reads') : `up to ${count(number, 'read', 'reads')} of a moment`);
-  if (marks.refused > 0) items.push(`${reads(marks.refused)} refused for want of rights`);
-  if (marks.failed > 0) items.push(`${reads(marks.failed)} failed`);
+  for (const [reads, what] of [[marks.refused, 'refused for want of rights'], [marks.failed, 'failed']]) {
+    if (reads.most === 0) continue;
+    const when = moments === 1 ? '' : ` at ${timeText(reads.at)}, some at ${reads.moments} of ${moments} moments`;
+    items.push(`${count(reads.most, 'read', 'reads')} ${what}${when}`);
+  }
   if (marks.lossy > 0) items.push(`of ${count(marks.lossy, 'moment', 'moments')} something was left out`);
   items.push(...problems.map(shownText));
   if (items.length === 0) return null;
@@ -75,12 +95,12 @@ function zoneText() {
   return isUtc ? 'Times are in UTC, as in the reports.' : `Times are those of ${ZONE}, with UTC, which the reports have, beside them.`;
 }
 
-export function header(data) {
+export function header(data, state) {
   const {head} = data;
   return element('header', {},
     element('h1', {}, shownText(head.title)),
     element('p', {}, element('b', {}, shownText(head.host)), ` · ${extentText(head)}`),
-    inShort(data),
+    shortView(data, state),
     element('p', {class: 'note'}, `Memory state ${statesText(head)}. Kernel's definitions built ${shownText(head.kernel)}. ${zoneText()}`),
     remarks(head));
 }

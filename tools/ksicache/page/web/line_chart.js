@@ -31,11 +31,10 @@ function linesOf(data, role) {
   const column = report.columns.find((each) => each.name === role.column);
   if (column === undefined) return [];
   const found = data.lines.lines.get(`${role.report} ${role.column}`);
-  const place = report.columns.filter((each) => each.isKey).findIndex((each) => each.name === data.nameOf.get(role.report));
   const style = styleOf(column, data.head.roles);
   const ofLine = (name, line) => ({name, line: line.map((extent) => extent && extent.map(style.figure)), style});
-  const things = found.things.map(({keys, line}) => ofLine(shownText(data.head.texts[keys[place]] ?? data.head.host), line));
-  return isMemory(column) && place >= 0 ? [ofLine(TOGETHER, found.together), ...things] : things;
+  const things = found.things.map(({name, line}) => ofLine(shownText(name ?? data.head.host), line));
+  return isMemory(column) && data.nameOf.has(role.report) ? [ofLine(TOGETHER, found.together), ...things] : things;
 }
 
 function peak({line}) {

@@ -19,7 +19,7 @@ function readLine(bytes, stretches) {
 }
 
 // The times of the stretches, us since 1970, and the lines: by report and column that of all rows
-// together and those of the things, which have the key values of their rows.
+// together and those of the things by their names.
 export function readLines(bytes, head) {
   const {stretches, reports} = head;
   const times = readLine(bytes, stretches);
@@ -27,7 +27,7 @@ export function readLines(bytes, head) {
   for (const report of reports) {
     for (const column of report.columns) {
       const together = readLine(bytes, stretches);
-      const things = report.things.map((keys) => ({keys, line: readLine(bytes, stretches)}));
+      const things = report.things.map((name) => ({name, line: readLine(bytes, stretches)}));
       lines.set(`${report.report} ${column}`, {together, things, leavesOut: report.leavesOut});
     }
   }

@@ -44,7 +44,7 @@ function show(data) {
   const timeline = hasMany ? new Timeline(data, state) : null;
   const lines = hasMany ? new LineChart(data, state) : null;
   const views = [timeline, treemap, lines, changes, reports].filter((view) => view !== null);
-  document.getElementById('page').replaceChildren(header(data), element('main', {}, ...views.map((view) => view.view)),
+  document.getElementById('page').replaceChildren(header(data, state), element('main', {}, ...views.map((view) => view.view)),
     element('footer', {class: 'note'}, 'Made by ksicache page. Charts by d3, © Mike Bostock; its license stands in the source of this page.'));
   for (const view of [treemap, changes, reports]) view?.show();
   document.documentElement.dataset.ready = 'yes';
