@@ -5,6 +5,8 @@
 //   gap      nothing was recorded for so much longer
 //   clock    the clock was put forward, or back where SECONDS are negative
 //   damage   the moments that are packed with it cannot be read
+//
+// and AGAIN:again, all of them so many times more, each round behind the one before.
 #include <sqlite3.h>
 
 #include <cstdio>
@@ -61,7 +63,12 @@ class Clock {
   void Set(int64_t number, ksi::Moment& moment) {
     const auto [begin, end] = changes_.equal_range(number);
     for (auto at = begin; at != end; ++at) Apply(at->second);
-    uptime_ += before_ == 0 ? 0 : moment.facts.taken - before_;
+    int64_t step = before_ == 0 ? 0 : moment.facts.taken - before_;
+    if (step < 0) {  // the first of another round
+      later_ += ksi::kMinute - step;
+      step = ksi::kMinute;
+    }
+    uptime_ += step;
     before_ = moment.facts.taken;
     moment.facts.taken += later_;
     moment.facts.uptime = uptime_;
@@ -85,14 +92,22 @@ class Clock {
   int64_t before_ = 0;  // when the last one was taken, as it was recorded
 };
 
-void Copy(ksi::RecordingFile& from, const std::string& out, Clock clock) {
+int64_t RoundsOf(const Changes& changes) {
+  for (const auto& [number, change] : changes) {
+    if (change.what == "again") return number + 1;
+  }
+  return 1;
+}
+
+void Copy(ksi::RecordingFile& from, const std::string& out, int64_t rounds, Clock clock) {
   ksicache::RecordingStore store(out, kUnbounded);
   // Some chunks: with one that is damaged the moments behind it in its chunk are lost.
   ksicache::Recorder recorder(store, ksicache::Recorder::Singles::kWritten, 40 * ksi::kMinute);
   ksi::ChunkReader reader;
-  for (int64_t number = 0; number < from.Parts().back().End(); ++number) {
+  const int64_t count = from.Parts().back().End();
+  for (int64_t number = 0; number < rounds * count; ++number) {
     ksi::Moment moment;
-    if (from.ReadWhole(number, reader, moment, number - 1) != ksi::kOk) {
+    if (from.ReadWhole(number % count, reader, moment, number % count - 1) != ksi::kOk) {
       throw std::runtime_error(from.Why());
     }
     clock.Set(number, moment);
@@ -123,7 +138,7 @@ int main(int argc, char** argv) {
   try {
     const Changes changes = ChangesOf(argv + 3);
     MakeEmpty(argv[2]);
-    Copy(*ksicache::OpenRecording(argv[1]), argv[2], Clock(changes));
+    Copy(*ksicache::OpenRecording(argv[1]), argv[2], RoundsOf(changes), Clock(changes));
     for (const auto& [number, change] : changes) {
       if (change.what == "damage") Damage(argv[2], number);
     }

@@ -1,5 +1,5 @@
 // Figures of machines, groups, processes and heaps over time, as bands from the least to the
-// greatest of each stretch of moments.
+// greatest of each stretch of moments, and lines through both.
 import {BOTTOM, chosenLines, figureAxis, markShapes, memoryTicks, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
 import {choice, element, svg} from './dom.js';
 import {bytesOf, isMemory, memoryText, shownText, timeText} from './format.js';
@@ -73,6 +73,17 @@ function offered(data, role) {
   return {lines: [...together, ...things.slice(0, OFFERED)], more: Math.max(0, things.length - OFFERED)};
 }
 
+// What a line goes through: the least and the greatest figure of each stretch, first the one that is
+// nearer to where it comes from. A line between them would show what never was.
+function extremes(run) {
+  let last = run[0].extent[0];
+  return run.flatMap(({time, extent: [least, greatest]}) => {
+    const figures = Math.abs(least - last) <= Math.abs(greatest - last) ? [least, greatest] : [greatest, least];
+    last = figures[1];
+    return (least === greatest ? [least] : figures).map((figure) => ({time, figure}));
+  });
+}
+
 export class LineChart {
   constructor(data, state) {
     Object.assign(this, {data, state});
@@ -139,10 +150,10 @@ export class LineChart {
     const points = line.map((extent, i) => ({from: this.data.lines.times[i][0], to: this.data.lines.times[i][1], extent}));
     const x = (point) => this.x(point.time / 1000);
     const band = d3.area().x(x).y0(({extent}) => this.y(extent[0])).y1(({extent}) => this.y(extent[1]));
-    const middle = d3.line().x(x).y(({extent}) => this.y((extent[0] + extent[1]) / 2));
+    const through = d3.line().x(x).y(({figure}) => this.y(figure));
     return runsOf(points, this.data.head.marks.all, ({extent}) => extent !== null).flatMap((run) => [
       svg('path', {class: `band ${color}`, d: band(run)}),
-      svg('path', {class: `line ${color}`, d: run.length > 1 ? middle(run) : `${middle(run).replace('Z', '')}h3`}),
+      svg('path', {class: `line ${color}`, d: run.length > 1 ? through(extremes(run)) : `${through(extremes(run)).replace('Z', '')}h3`}),
     ]);
   }
 

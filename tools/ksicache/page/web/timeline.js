@@ -22,6 +22,15 @@ function balances(data) {
   });
 }
 
+function freeOf({stack}) {
+  return stack.find((part) => part.key === 'free')?.bytes ?? 0;
+}
+
+// What is below the free memory.
+function usedOf(point) {
+  return d3.sum(point.stack, (part) => part.bytes) - freeOf(point);
+}
+
 // How bad a memory state is, from 0 to 4; what is not told is none.
 function levelOf(data, state) {
   const place = data.head.roles.states.indexOf(state);
@@ -93,12 +102,12 @@ export class Timeline {
     const most = d3.max(points, (point) => (point.stack === null ? 0 : d3.sum(point.stack, (part) => part.bytes)));
     this.y = d3.scaleLinear([0, most || 1], [HEIGHT - BOTTOM, TOP]);
     this.svg.setAttribute('viewBox', `0 0 ${this.width} ${HEIGHT}`);
+    this.cursor = svg('g', {class: 'cursor'});
     this.svg.replaceChildren(
       svg('title', {id: 'timeline-name'}, 'The balance of the memory over time'),
       ...this.areas(), ...this.states(), timeAxis(this.x, this.data.head.points, this.width, HEIGHT),
-      figureAxis(this.y, memoryTicks(most)), ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks());
-    this.cursor = svg('g', {class: 'cursor'});
-    this.svg.append(this.cursor);
+      figureAxis(this.y, memoryTicks(most)), ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks(),
+      this.cursor, ...this.edges(), ...this.least());
     this.showChosen();
   }
 
@@ -106,8 +115,27 @@ export class Timeline {
     return this.x(time / 1000);
   }
 
+  runs() {
+    return runsOf(this.points, this.marks, (point) => point.stack !== null);
+  }
+
+  // Where the free memory begins: as wide as can be seen where it was there for a moment only.
+  edges() {
+    const edge = d3.line().x((point) => this.at(point.time)).y((point) => this.y(usedOf(point)));
+    return this.runs().filter((run) => run.length > 1).map((run) => svg('path', {class: 'edge', d: edge(run)}));
+  }
+
+  // The moment with the least free memory.
+  least() {
+    const told = this.points.filter((point) => point.stack !== null);
+    const point = d3.least(told, freeOf);
+    if (point === undefined) return [];
+    return [svg('circle', {class: 'least', cx: this.at(point.from), cy: this.y(usedOf(point)), r: 4},
+      svg('title', {}, `least free memory: ${memoryText(freeOf(point))} at ${timeText(point.taken)}`))];
+  }
+
   areas() {
-    const runs = runsOf(this.points, this.marks, (point) => point.stack !== null);
+    const runs = this.runs();
     const keys = runs.length === 0 ? [] : runs[0][0].stack.map((part) => part.key);
     return runs.flatMap((run) => keys.map((key, place) => {
       const base = (point) => d3.sum(point.stack.slice(0, place), (part) => part.bytes);
