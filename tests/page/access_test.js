@@ -87,6 +87,11 @@ test('the treemap by the keyboard', async () => {
   assert.equal(await page.evaluate(() => document.activeElement.className.includes('tile')), true);
   await page.keyboard.press('Escape');
   assert.equal(await page.locator('.crumbs [aria-current]').textContent(), 'hypervisor.example.org 256 GB');
+  const labels = await page.locator('.tile').evaluateAll((all) => all.map((tile) => tile.getAttribute('aria-label')));
+  await page.keyboard.press('End');
+  assert.equal(await focused(page), labels.at(-1));
+  await page.keyboard.press('Home');
+  assert.equal(await focused(page), labels[0]);
   await closePage(page);
 });
 
@@ -99,3 +104,43 @@ test('a moment by the keyboard', async () => {
   assert.match(await page.locator('.when .detail').textContent(), /Free 900 MB .*memory state Hard/);
   await closePage(page);
 });
+
+test('what a column is, by a touch', async () => {
+  const page = await openPage(makePage(RECORDING), {hasTouch: true});
+  await page.locator('.reports thead button').nth(2).tap();
+  const name = (await page.locator('.reports thead button').nth(2).textContent()).replace(/ .*/, '');
+  assert.match(await page.locator('.reports .about').textContent(), new RegExp(`^${name}: .`));
+  await closePage(page);
+});
+
+// By the formula of WCAG 2.
+function luminance(rgb) {
+  const [r, g, b] = rgb.match(/\d+/g).slice(0, 3).map((each) => each / 255).map((each) => (each <= 0.04045 ? each / 12.92 : ((each + 0.055) / 1.055) ** 2.4));
+  return 0.2126 * r + 0.7152 * g + 0.0722 * b;
+}
+
+function contrast(a, b) {
+  const [dark, light] = [luminance(a), luminance(b)].sort((x, y) => x - y);
+  return (light + 0.05) / (dark + 0.05);
+}
+
+for (const colorScheme of ['light', 'dark']) {
+  test(`lines tell areas apart: ${colorScheme}`, async () => {
+    const page = await openPage(makePage(RECORDING), {colorScheme});
+    const {areas, tiles, ground} = await page.evaluate(() => {
+      const stylesOf = (name, pick) => [...document.querySelectorAll(name)].map((each) => pick(getComputedStyle(each)));
+      return {
+        areas: stylesOf('.area', ({fill, stroke}) => [fill, stroke]),
+        tiles: stylesOf('.tile', ({backgroundColor, boxShadow}) => [backgroundColor, boxShadow]),
+        ground: getComputedStyle(document.body).backgroundColor,
+      };
+    });
+    assert.ok(areas.length >= 6 && tiles.length >= 6);
+    for (const [fill, line] of [...areas, ...tiles]) {
+      assert.notEqual(line, 'none');
+      assert.ok(contrast(fill, line) > 2.5, `${fill} beside ${line}: ${contrast(fill, line)}`);
+      assert.ok(contrast(ground, line) > 3, `${line} on ${ground}`);
+    }
+    await closePage(page);
+  });
+}

@@ -134,7 +134,9 @@ test('a table is sorted, filtered, narrowed and copied', async () => {
   assert.deepEqual(await reports.locator('thead th').allTextContents(), ['name', 'consumed ▴']);
   await reports.locator('button', {hasText: 'Copy as CSV'}).click();
   await reports.locator('[role=status]', {hasText: '3 rows copied'}).waitFor();
-  assert.equal(await page.evaluate(() => navigator.clipboard.readText()), 'name,consumed\nweb-03,3724544\nweb-01,6073352\nweb-02,6073352\n');
+  const origin = 'hypervisor.example.org,2026-11-21T10:06:00Z';
+  assert.equal(await page.evaluate(() => navigator.clipboard.readText()),
+    `host,time,name,consumed\n${origin},web-03,3724544\n${origin},web-01,6073352\n${origin},web-02,6073352\n`);
   await closePage(page);
 });
 

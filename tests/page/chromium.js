@@ -10,8 +10,8 @@ const FLAGS = ['--disable-gpu', '--disable-quic', '--no-first-run', '--disable-b
 
 export const browser = await chromium.launch({executablePath: process.env.CHROMIUM ?? '/usr/bin/chromium', args: FLAGS});
 
-// Opens a page; `wrong` collects what it must not do.
-export async function openPage(name, options = {}) {
+// Opens a page, of which nothing is shown if it is not whole; `wrong` collects what it must not do.
+export async function openPage(name, {isWhole = true, ...options} = {}) {
   const context = await browser.newContext({
     viewport: {width: 1280, height: 900}, timezoneId: 'Europe/Berlin', locale: 'en-GB', ...options,
   });
@@ -25,7 +25,7 @@ export async function openPage(name, options = {}) {
     if (request.url() !== pathToFileURL(name).href) page.wrong.push(`request: ${request.url()}`);
   });
   await page.goto(pathToFileURL(name).href);
-  if (options.javaScriptEnabled !== false) await page.waitForSelector('html[data-ready]');
+  if (isWhole && options.javaScriptEnabled !== false) await page.waitForSelector('html[data-ready]');
   return page;
 }
 

@@ -38,6 +38,6 @@ test('the least free memory is seen, with the cursor on it, too', async () => {
     };
   });
   assert.deepEqual(seen, {width: 2, top: true, isAbove: true, isChosen: true,
-    text: 'least free memory: 900 MB at 2026-11-21 11:05:00 (10:05:00 UTC)'});
+    text: 'the least that was free: 900 MB at 2026-11-21 11:05:00 (10:05:00 UTC)'});
   await closePage(page);
 });

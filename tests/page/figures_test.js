@@ -5,7 +5,7 @@ import {test} from 'node:test';
 import {build, closePage, ksicache, makePage, openPage, scratch} from './browser.js';
 
 const INCIDENT = join(build, 'incident.rec');
-const FLAGS = {'': '–', true: 'y', false: 'n'};
+const NONE = '–';
 const MOMENTS = ['10:02', '10:03', '10:04', '10:05', '10:06'];
 
 // The fields of CSV, as the page shows them, without host and time.
@@ -16,7 +16,7 @@ function rowsOf(csv) {
 function fieldsOf(line) {
   const fields = [];
   for (const [, field, end] of line.matchAll(/("(?:[^"]|"")*"|[^,]*)(,|$)/g)) {
-    fields.push(field.startsWith('"') ? field.slice(1, -1).replaceAll('""', '"') : FLAGS[field] ?? field);
+    fields.push(field.startsWith('"') ? field.slice(1, -1).replaceAll('""', '"') : field === '' ? NONE : field);
     if (end === '') break;
   }
   return fields;
@@ -50,6 +50,18 @@ test('every report at every moment, in its own unit', async () => {
   for (const [place, moment] of MOMENTS.entries()) {
     await page.fill('#slider-at', String(place));
     await compare(page, `${INCIDENT}@${moment}Z`, '');
+  }
+  await closePage(page);
+});
+
+test('every report copied is what is exported, to the byte', async () => {
+  const page = await openPage(makePage(INCIDENT), {permissions: ['clipboard-read', 'clipboard-write']});
+  await page.fill('#slider-at', '4');
+  for (const report of await page.locator('.reports label:has-text("Report") option').allTextContents()) {
+    await page.selectOption('.reports label:has-text("Report") select', {label: report});
+    await page.locator('.reports button', {hasText: 'Copy as CSV'}).click();
+    await page.locator('.reports [role=status]', {hasText: 'rows copied'}).waitFor();
+    assert.equal(await page.evaluate(() => navigator.clipboard.readText()), ksicache('export', report, `${INCIDENT}@10:06Z`), report);
   }
   await closePage(page);
 });

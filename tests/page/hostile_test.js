@@ -102,6 +102,28 @@ test('names are shown as they are, and what hides is written out', async () => {
   await closePage(page);
 });
 
+test('names that a spreadsheet would compute are told of', async () => {
+  const page = await openPage(makePage(hostWith(['=cmd|calc!A0', '+SUM(A1)', '@x', ' blanks '], 'host')), {permissions: ['clipboard-read', 'clipboard-write']});
+  await page.selectOption('.reports label:has-text("Report") select', {label: 'vm-stats'});
+  await page.locator('.reports button', {hasText: 'Copy as CSV'}).click();
+  const told = page.locator('.reports [role=status]', {hasText: 'rows copied'});
+  await told.waitFor();
+  assert.match(await told.textContent(), /^\d+ rows copied; [1-9]\d* of their texts would be formulas in a spreadsheet: paste them as text$/);
+  await closePage(page);
+});
+
+test('a name that is very long buries nothing', async () => {
+  const long = 'long '.repeat(800).trim();
+  const page = await openPage(makePage(hostWith(['x'], 'host'), '--title', long), {viewport: {width: 360, height: 780}});
+  const title = page.locator('h1');
+  const short = (await title.boundingBox()).height;
+  assert.ok(short < 100, `${short} pixels`);
+  assert.equal(await title.getAttribute('title'), long);
+  await page.keyboard.press('Tab');
+  assert.ok((await title.boundingBox()).height > 10 * short);
+  await closePage(page);
+});
+
 test('names of any bytes', async () => {
   const next = random(1);
   for (let round = 0; round < 8; ++round) {

@@ -24,6 +24,14 @@ export function svg(tag, attributes = {}, ...children) {
   return fill(document.createElementNS(SVG, tag), attributes, children);
 }
 
+const LONG = 160; // characters
+
+// A text of which no more than some lines are shown until it is looked at.
+export function clamped(tag, text) {
+  const isLong = text.length > LONG;
+  return element(tag, isLong ? {class: 'clamped', title: text, tabindex: 0} : {}, text);
+}
+
 // A list to choose from: `options` are [value, text].
 export function choice(label, options, value, onchange) {
   const select = element('select', {onchange: () => onchange(select.value)},

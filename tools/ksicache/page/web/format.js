@@ -112,6 +112,11 @@ export function timeText(time) {
   return `${local} (${local.slice(0, 10) === utc.slice(0, 10) ? clock(utc) : utc} UTC)`;
 }
 
+// The same as `ksicache export` writes it: to the second.
+export function isoText(time) {
+  return `${new Date(Math.floor(time / 1e6) * 1000).toISOString().slice(0, 19)}Z`;
+}
+
 export function clockText(time) {
   return clock((isUtc ? UTC : LOCAL).format(new Date(time / 1000)));
 }

@@ -29,8 +29,10 @@ export class Grid {
     this.view = element('div', {}, this.tools, this.caption, this.about, this.scroller, this.more);
   }
 
-  // Shows other rows, or others of their columns.
-  show(columns, rows, caption) {
+  // Shows other rows, or others of their columns. `lead`: [name, text] of what stands before each
+  // row that is copied.
+  show(columns, rows, caption, lead = []) {
+    this.lead = lead;
     const namesOf = (all) => all.map(({name, isNumber}) => `${name} ${isNumber}`).join();
     if (namesOf(columns) !== namesOf(this.columns)) this.clear();
     this.columns = columns;
@@ -132,21 +134,27 @@ export class Grid {
     this.texts.push(texts);
   }
 
-  // What is shown, all rows of it, as RFC 4180 has it.
+  // What is shown, all rows of it, as `ksicache export` writes it.
   csv() {
-    const quoted = (text) => (/[",\r\n]/.test(text) || text === '' ? `"${text.replaceAll('"', '""')}"` : text);
-    const lines = [this.columns.map((column) => quoted(column.name)),
-      ...this.chosen().map((row) => this.columns.map((column) => {
-        const text = column.csv(row);
-        return text === null ? '' : quoted(text);
-      }))];
-    return `${lines.map((line) => line.join(',')).join('\n')}\n`;
+    const quoted = (text) => (/^ | $|[",\r\n]/.test(text) || text === '' ? `"${text.replaceAll('"', '""')}"` : text);
+    const field = (text) => (text === null ? '' : quoted(text));
+    const [names, lead] = [0, 1].map((place) => this.lead.map((each) => each[place]));
+    const lines = [[...names, ...this.columns.map(({name}) => name)],
+      ...this.chosen().map((row) => [...lead, ...this.columns.map((column) => column.csv(row))])];
+    return `${lines.map((line) => line.map(field).join(',')).join('\n')}\n`;
+  }
+
+  // Texts that a spreadsheet would compute.
+  formulas() {
+    const texts = this.columns.filter((column) => !column.isNumber);
+    return this.chosen().reduce((sum, row) => sum + texts.filter((column) => /^[=+\-@\t\r]/.test(column.csv(row) ?? '')).length, 0);
   }
 
   async copy() {
     try {
       await navigator.clipboard.writeText(this.csv());
-      this.copied.textContent = `${this.chosen().length} rows copied`;
+      const formulas = this.formulas();
+      this.copied.textContent = `${this.chosen().length} rows copied${formulas === 0 ? '' : `; ${formulas} of their texts would be formulas in a spreadsheet: paste them as text`}`;
     } catch {
       this.copied.textContent = 'This browser does not let the page copy';
     }

@@ -1,7 +1,7 @@
 // The head of the page: whose memory, when, and in short what there is to see.
 import {markText} from './chart.js';
 import {compared} from './comparison.js';
-import {element} from './dom.js';
+import {clamped, element} from './dom.js';
 import {UNITS, ZONE, isUtc, memoryText, shownText, signedText, spanText, timeText} from './format.js';
 import {leastFree} from './memory.js';
 
@@ -92,14 +92,15 @@ function remarks({moments, marks, problems}) {
 }
 
 function zoneText() {
-  return isUtc ? 'Times are in UTC, as in the reports.' : `Times are those of ${ZONE}, with UTC, which the reports have, beside them.`;
+  const zones = isUtc ? 'Times are in UTC, as in the reports' : `Times are those of ${ZONE}, where this page is read, with UTC, which the reports have, beside them`;
+  return `${zones}; the time zone of the host is not recorded.`;
 }
 
 export function header(data, state) {
   const {head} = data;
   return element('header', {},
-    element('h1', {}, shownText(head.title)),
-    element('p', {}, element('b', {}, shownText(head.host)), ` · ${extentText(head)}`),
+    clamped('h1', shownText(head.title)),
+    element('p', {}, clamped('b', shownText(head.host)), ` · ${extentText(head)}`),
     shortView(data, state),
     element('p', {class: 'note'}, `Memory state ${statesText(head)}. Kernel's definitions built ${shownText(head.kernel)}. ${zoneText()}`),
     remarks(head));

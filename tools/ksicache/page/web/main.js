@@ -53,10 +53,17 @@ function show(data) {
 
 async function main() {
   if (!canLoad()) {
+    document.getElementById('damaged').remove();
     document.getElementById('summary').prepend(element('p', {role: 'alert'}, 'This browser cannot unpack the data of this page; one of 2023 or later shows all of it.'));
     return;
   }
-  show(unpacked(await load()));
+  try {
+    show(unpacked(await load()));
+  } catch (error) {
+    const alarm = document.getElementById('damaged');
+    if (alarm === null) throw error;
+    alarm.classList.add('told');
+  }
 }
 
 main();

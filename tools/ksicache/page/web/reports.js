@@ -1,6 +1,6 @@
 // Every report of the chosen moment as a table.
 import {choice, element} from './dom.js';
-import {NO_VALUE, UNITS, isMemory, shownValue, timeText} from './format.js';
+import {NO_VALUE, UNITS, isMemory, isoText, shownValue, timeText} from './format.js';
 import {Grid, compareValues} from './grid.js';
 import {Kind} from './tables.js';
 
@@ -103,7 +103,6 @@ export class Reports {
       csv: (row) => {
         const value = row.values[place];
         if (column.kind === Kind.text) return value;
-        if (column.kind === Kind.flag) return value === null ? null : String(value);
         const text = shownValue(value, column, unit);
         return text === NO_VALUE ? null : text;
       },
@@ -118,6 +117,7 @@ export class Reports {
     const columns = report.columns.map((column, place) => ({column, place})).filter(({column}) => !this.isHidden(column));
     const time = timeText(this.data.head.full.taken[at]);
     const caption = rows === null ? `${report.name} at ${time} could not be read` : `${report.name} at ${time}`;
-    this.grid.show(columns.map(({column, place}) => this.columnOf(column, place)), rows ?? [], caption);
+    const lead = [['host', this.data.head.host], ['time', isoText(this.data.head.full.taken[at])]];
+    this.grid.show(columns.map(({column, place}) => this.columnOf(column, place)), rows ?? [], caption, lead);
   }
 }

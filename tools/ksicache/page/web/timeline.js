@@ -131,7 +131,7 @@ export class Timeline {
     const point = d3.least(told, freeOf);
     if (point === undefined) return [];
     return [svg('circle', {class: 'least', cx: this.at(point.from), cy: this.y(usedOf(point)), r: 4},
-      svg('title', {}, `least free memory: ${memoryText(freeOf(point))} at ${timeText(point.taken)}`))];
+      svg('title', {}, `the least that was free: ${memoryText(freeOf(point))} at ${timeText(point.taken)}`))];
   }
 
   areas() {

@@ -6,6 +6,7 @@ import {memoryText, percentText} from './format.js';
 const HEAD = 19; // the height of the name of a part that has others in it
 const LEVELS = 3; // that are drawn below the one that is looked into
 const SMALLEST = 3; // of a side; what is smaller cannot be seen
+const SAID = 3; // parts that a note tells of
 // Tiles that are wide enough for a name, and for a figure with it.
 const OPEN = 60; // to show what is in them
 const NAMED = 44;
@@ -26,6 +27,20 @@ function squarified(part, width, height) {
     .paddingTop((node) => (node.depth === 0 ? 0 : HEAD))(root);
 }
 
+// What is in a part and more than it.
+function sumText({data: {name, bytes, share}}) {
+  return `what is in ${name} adds up to ${memoryText(bytes / share)} and is drawn at ${percentText(share, 1)} of its size, as ${memoryText(bytes)}`;
+}
+
+// Why, of the parts that are drawn with what is in them, some are smaller than that.
+function sharedText(tree, opened) {
+  const parts = tree.descendants().filter((node) => opened.has(node) && node.data.share < 1)
+    .sort((a, b) => b.data.bytes - a.data.bytes);
+  if (parts.length === 0) return '';
+  const more = parts.length > SAID ? `; and so in ${parts.length - SAID} more` : '';
+  return `Some memory is counted with several: ${parts.slice(0, SAID).map(sumText).join('; ')}${more}.`;
+}
+
 export class Treemap {
   constructor(data, state) {
     this.data = data;
@@ -33,9 +48,10 @@ export class Treemap {
     this.path = [];
     this.box = element('div', {class: 'treemap', role: 'group', 'aria-label': 'Parts of the memory', onkeydown: (event) => this.key(event)});
     this.crumbs = element('nav', {class: 'crumbs', 'aria-label': 'Part that is shown'});
+    this.shared = element('p', {class: 'note'});
     this.detail = element('p', {class: 'detail', 'aria-live': 'polite'});
     this.view = element('section', {class: 'where', 'aria-labelledby': 'where'},
-      element('h2', {id: 'where'}, 'Where the memory is'), this.crumbs, this.box, this.detail);
+      element('h2', {id: 'where'}, 'Where the memory is'), this.crumbs, this.box, this.shared, this.detail);
     state.watch(['at'], () => this.show());
     new ResizeObserver(() => this.draw()).observe(this.box);
   }
@@ -61,7 +77,10 @@ export class Treemap {
   draw() {
     if (this.root === undefined) return;
     this.box.replaceChildren();
+    this.box.hidden = this.root === null;
     if (this.root === null) {
+      this.crumbs.replaceChildren();
+      this.shared.textContent = '';
       this.detail.textContent = 'How the memory divides could not be read at this moment.';
       return;
     }
@@ -75,6 +94,7 @@ export class Treemap {
     this.opened = new Set([this.tree]); // whose parts are drawn, too
     this.tree.each((node) => this.drawTile(node));
     if (this.tiles.length > 0) this.tiles[0].tabIndex = 0;
+    this.shared.textContent = sharedText(this.tree, this.opened);
     this.describe(chain.at(-1), chain);
   }
 
@@ -159,6 +179,8 @@ export class Treemap {
     if (event.key === 'Escape' || event.key === 'Backspace') {
       const depth = this.chain().length - 1;
       if (depth > 0) this.lookInto(this.path.slice(0, depth - 1));
+    } else if (event.key === 'Home' || event.key === 'End') {
+      this.tiles.at(event.key === 'Home' ? 0 : -1)?.focus();
     } else if (event.key.startsWith('Arrow')) {
       this.neighbour(event.target, event.key)?.focus();
     } else {
