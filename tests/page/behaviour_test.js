@@ -3,7 +3,7 @@ import assert from 'node:assert/strict';
 import {readFileSync, writeFileSync} from 'node:fs';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, hostWithHeaps, ksicache, makePage, openPage, scratch} from './browser.js';
+import {build, closePage, hostWithHeaps, ksicache, ksicachePartly, makePage, makePageBy, openPage, scratch} from './browser.js';
 
 const RECORDING = join(build, 'incident.rec');
 const SIZES = {bytes: 1, KB: 2 ** 10, MB: 2 ** 20, GB: 2 ** 30, TB: 2 ** 40};
@@ -82,6 +82,37 @@ test('a part says what it is at the pointer', async () => {
   const page = await openPage(makePage(RECORDING));
   await page.locator('.tile', {hasText: 'db-orders'}).hover();
   assert.match(await page.locator('.where .detail').textContent(), /machines › db-orders 29\.5 GB, 11\.5 % of the host · vm-stats consumed \+ vm-stats ovhd · 257 MB of it overheads of machines$/);
+  await closePage(page);
+});
+
+// The example host, other than it is in what `pattern` finds.
+function otherHost(pattern, other) {
+  const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
+  const [json, capture] = ['other.json', 'other.ksi'].map((name) => join(scratch, name));
+  writeFileSync(json, example.replace(pattern, other));
+  ksicache('load', json, capture, '--force');
+  return capture;
+}
+
+test('a part with more in it than it has says so, on paper, too', async () => {
+  const page = await openPage(makePage(otherHost('"otherConsumed":117170084', '"otherConsumed":58585042')));
+  const note = page.locator('.where .note');
+  for (const media of ['screen', 'print']) {
+    await page.emulateMedia({media});
+    assert.match(await note.textContent(), /^Some memory is counted with several: what is in Machines and processes adds up to \d+ GB and is drawn at \d+\.\d % of its size, as 55\.9 GB\.$/);
+    assert.ok(await note.isVisible());
+  }
+  await closePage(page);
+  const whole = await openPage(makePage(join(build, 'hypervisor.ksi')));
+  assert.equal(await whole.locator('.where .note').textContent(), '');
+  await closePage(whole);
+});
+
+test('a moment whose memory is not told has no empty areas', async () => {
+  const of = otherHost(/("node":"memory\/comprehensive","keys":\[\],)"value":\{[^}]*\}\}/, '$1"status":"0xbad0001"}');
+  const page = await openPage(makePageBy(ksicachePartly, of));
+  assert.equal(await page.locator('.treemap').isVisible(), false);
+  assert.match(await page.locator('.where .detail').textContent(), /could not be read/);
   await closePage(page);
 });
 
@@ -224,5 +255,36 @@ test('a single moment has no history', async () => {
   const page = await openPage(makePage(join(build, 'hypervisor.ksi'), '--title', 'A ticket'));
   assert.equal(await page.locator('h1').textContent(), 'A ticket');
   assert.deepEqual(await page.locator('h2').allTextContents(), ['Where the memory is', 'All reports']);
+  await closePage(page);
+});
+
+test('the lower chart chooses and tells as the upper one does, and both zoom', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const lines = page.locator('section', {has: page.locator('#lines-title')});
+  await page.click('text=Last moment');
+  await lines.locator('.chart').scrollIntoViewIfNeeded();
+  const {x: left, y, width} = await lines.locator('.chart').boundingBox();
+  const x = (share) => left + 52 + share * (width - 52 - 26);
+  const times = () => page.locator('.slider output').allTextContents();
+  await page.mouse.move(x(0.5), y + 80);
+  assert.match(await lines.locator('.detail strong').textContent(), /^2026-11-21 11:04:00 /);
+  await page.mouse.click(x(0.75), y + 80);
+  assert.match((await times())[0], /10:05:00 UTC/);
+  await page.mouse.move(x(0.25), y + 80);
+  await page.mouse.down();
+  await page.mouse.move(x(0.6), y + 80);
+  await page.mouse.move(x(0.75), y + 80);
+  await page.mouse.up();
+  const chosen = await times();
+  assert.match(chosen[0], /10:05:00 UTC/);
+  assert.match(chosen[1], /10:03:00 UTC/);
+  const places = () => page.locator('.cursor line').evaluateAll((all) => all.map((each) => Math.round(each.x1.baseVal.value)));
+  const before = await places();
+  await page.click('text=Zoom to the span');
+  const [first, last] = [52, Math.round(width - 26)];
+  assert.deepEqual(await places(), [first, last, first, last]);
+  assert.ok(await page.locator('#timeline-sight').count() === 1);
+  await page.click('text=Whole time');
+  assert.deepEqual(await places(), before);
   await closePage(page);
 });

@@ -5,6 +5,7 @@
 import {svg} from './dom.js';
 import {spanText, tickText, timeText} from './format.js';
 
+const DRAG = 5; // what is moved less is a click
 const LEFT = 52;
 const RIGHT = 26;
 export const BOTTOM = 22;
@@ -17,6 +18,12 @@ export function wallTime({taken, steady}, time) {
 
 export function timeScale(first, last, width) {
   return d3.scaleTime([first / 1000, last / 1000], [LEFT, width - RIGHT]);
+}
+
+// Shapes as far as their times are in sight: what is zoomed into leaves others out.
+export function clipped(id, width, height, ...shapes) {
+  const sight = svg('clipPath', {id}, svg('rect', {x: LEFT - 4, width: Math.max(0, width - LEFT - RIGHT + 8), height}));
+  return [sight, svg('g', {'clip-path': `url(#${id})`}, ...shapes)];
 }
 
 // A time on an axis: its day at midnight, its second where there is one.
@@ -94,4 +101,33 @@ export function runsOf(points, marks, isDrawn) {
 export function chosenLines({at, from}, x, top, bottom) {
   const line = (time, kind) => svg('line', {class: kind, x1: x(time / 1000), x2: x(time / 1000), y1: top, y2: bottom});
   return [line(from, 'from'), line(at, 'at')];
+}
+
+// The place of the time that is nearest to one.
+export function nearest(times, time) {
+  return d3.minIndex(times, (each) => Math.abs(each - time));
+}
+
+// A moment is chosen by a click in a chart {svg, x, data, state, tell}, a span by dragging; what
+// there is at the pointer is told.
+export function listen(chart) {
+  const {svg: shape, state, data: {head: {full: {steady}}}} = chart;
+  let start = null;
+  const timeOf = (event) => chart.x.invert(event.clientX - shape.getBoundingClientRect().left).getTime() * 1000;
+  const momentOf = (event) => nearest(steady, timeOf(event));
+  shape.addEventListener('pointerdown', (event) => {
+    start = {x: event.clientX, moment: momentOf(event)};
+    shape.setPointerCapture(event.pointerId);
+  });
+  shape.addEventListener('pointermove', (event) => {
+    if (chart.x === undefined) return;
+    if (start === null) chart.tell(timeOf(event));
+    else if (Math.abs(event.clientX - start.x) > DRAG) state.set({from: start.moment, at: momentOf(event)});
+  });
+  shape.addEventListener('pointerup', (event) => {
+    if (start !== null && Math.abs(event.clientX - start.x) <= DRAG) state.set({at: start.moment});
+    start = null;
+  });
+  shape.addEventListener('pointercancel', () => { start = null; });
+  shape.addEventListener('pointerleave', () => chart.tell(steady[state.get('at')]));
 }

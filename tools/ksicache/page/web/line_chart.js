@@ -1,6 +1,6 @@
 // Figures of machines, groups, processes and heaps over time, as bands from the least to the
 // greatest of each stretch of moments, and lines through both.
-import {BOTTOM, chosenLines, figureAxis, markShapes, memoryTicks, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
+import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
 import {choice, element, svg} from './dom.js';
 import {bytesOf, isMemory, memoryText, shownText, timeText} from './format.js';
 import {Kind} from './tables.js';
@@ -94,10 +94,11 @@ export class LineChart {
     this.view = element('section', {'aria-labelledby': 'lines-title'},
       element('h2', {id: 'lines-title'}, 'Who took it'),
       choice('Show', lines.map((line, i) => [String(i), line.title]), '0', (value) => this.choose(lines[value])),
-      this.svg, this.list, this.told);
+      this.svg, this.told, this.list);
     state.watch(['at', 'from'], () => this.showChosen());
+    state.watch(['zoom'], () => this.draw());
     new ResizeObserver(() => this.draw()).observe(this.svg);
-    this.svg.addEventListener('pointermove', (event) => this.point(event));
+    listen(this);
     this.choose(lines[0]);
   }
 
@@ -132,13 +133,14 @@ export class LineChart {
     const {head, lines} = this.data;
     const drawn = this.lines.filter((each) => each.isDrawn);
     const {ticks, most = this.mostOf(drawn)} = this.lines[0]?.style ?? {ticks: memoryTicks};
-    this.x = timeScale(lines.times[0][0], lines.times.at(-1)[1], width);
+    this.x = timeScale(...this.state.get('zoom') ?? [lines.times[0][0], lines.times.at(-1)[1]], width);
     this.y = d3.scaleLinear([0, most * 1.04], [HEIGHT - BOTTOM, TOP]);
     this.cursor = svg('g', {class: 'cursor'});
     this.svg.setAttribute('viewBox', `0 0 ${width} ${HEIGHT}`);
     this.svg.replaceChildren(svg('title', {id: 'lines-name'}, `${this.role.title} over time`),
       timeAxis(this.x, head.points, width, HEIGHT), figureAxis(this.y, ticks(most)),
-      ...markShapes(head.marks.all, this.x, TOP, HEIGHT), ...drawn.flatMap((each) => this.paths(each)), this.cursor);
+      ...clipped('lines-sight', width, HEIGHT, ...markShapes(head.marks.all, this.x, TOP, HEIGHT),
+        ...drawn.flatMap((each) => this.paths(each)), this.cursor));
     this.showChosen();
   }
 
@@ -163,11 +165,6 @@ export class LineChart {
     const [at, from] = ['at', 'from'].map((name) => steady[this.state.get(name)]);
     this.cursor.replaceChildren(...chosenLines({at, from}, this.x, TOP, HEIGHT - BOTTOM));
     this.tell(at);
-  }
-
-  point(event) {
-    if (this.x === undefined) return;
-    this.tell(this.x.invert(event.clientX - this.svg.getBoundingClientRect().left).getTime() * 1000);
   }
 
   // What the lines that are drawn say of a time.

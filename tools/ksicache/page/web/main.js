@@ -37,7 +37,7 @@ function unpacked({head, points, tables, lines}) {
 function show(data) {
   const {head} = data;
   const hasMany = head.full.taken.length > 1;
-  const state = new State({at: tightest(data), from: 0});
+  const state = new State({at: tightest(data), from: 0, zoom: null});
   const treemap = new Treemap(data, state);
   const changes = hasMany ? new Changes(data, state) : null;
   const reports = new Reports(data, state);

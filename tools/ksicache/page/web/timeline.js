@@ -1,14 +1,12 @@
-// What happened: the balance of the host over time. A moment is chosen by a click, a span by
-// dragging, and both by the sliders below.
+// What happened: the balance of the host over time. Moments are chosen by the sliders below, too.
 import {Rows, stackOf} from './balance.js';
-import {BOTTOM, chosenLines, figureAxis, markShapes, memoryTicks, runsOf, timeAxis, timeScale} from './chart.js';
+import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, nearest, runsOf, timeAxis, timeScale} from './chart.js';
 import {element, svg} from './dom.js';
 import {memoryText, timeText} from './format.js';
 import {leastFree} from './memory.js';
 
 const HEIGHT = 210;
 const TOP = 20;
-const DRAG = 5; // what is moved less is a click
 
 // The host's balance at the moments that it is drawn from.
 function balances(data) {
@@ -37,11 +35,6 @@ function levelOf(data, state) {
   return state === null ? 0 : place < 0 ? 1 : Math.min(place, 4);
 }
 
-// The place of the time that is nearest to one.
-function nearest(times, time) {
-  return d3.minIndex(times, (each) => Math.abs(each - time));
-}
-
 export class Timeline {
   constructor(data, state) {
     this.data = data;
@@ -50,12 +43,15 @@ export class Timeline {
     this.marks = data.head.marks.all;
     this.inputs = {};
     this.svg = svg('svg', {class: 'chart', height: HEIGHT, role: 'img', 'aria-labelledby': 'timeline-name'});
+    this.zoom = element('button', {type: 'button', onclick: () => state.set({zoom: this.span()})}, 'Zoom to the span');
+    this.whole = element('button', {type: 'button', onclick: () => state.set({zoom: null})}, 'Whole time');
     this.told = element('p', {class: 'detail'});
     this.view = element('section', {class: 'when', 'aria-labelledby': 'when'},
       element('h2', {id: 'when'}, 'What happened'), this.legend(), this.svg, this.sliders(), this.shortcuts(), this.told);
     state.watch(['at', 'from'], () => this.showChosen());
+    state.watch(['zoom'], () => this.draw());
     new ResizeObserver(() => this.draw()).observe(this.svg);
-    this.listen();
+    listen(this);
   }
 
   legend() {
@@ -91,23 +87,29 @@ export class Timeline {
     const button = (text, moment) => element('button', {type: 'button', onclick: () => this.choose('at', moment)}, text);
     return element('div', {class: 'tools'}, button('First moment', 0),
       least === null ? null : button('Least free memory', least),
-      button('Last moment', this.data.head.full.taken.length - 1));
+      button('Last moment', this.data.head.full.taken.length - 1), this.zoom, this.whole);
+  }
+
+  // The steady times of the chosen moments.
+  span() {
+    const {steady} = this.data.head.full;
+    return ['at', 'from'].map((name) => steady[this.state.get(name)]).sort((a, b) => a - b);
   }
 
   draw() {
     this.width = this.svg.clientWidth;
     if (this.width === 0) return;
     const {points} = this;
-    this.x = timeScale(points[0].from, points.at(-1).to, this.width);
+    this.x = timeScale(...this.state.get('zoom') ?? [points[0].from, points.at(-1).to], this.width);
     const most = d3.max(points, (point) => (point.stack === null ? 0 : d3.sum(point.stack, (part) => part.bytes)));
     this.y = d3.scaleLinear([0, most || 1], [HEIGHT - BOTTOM, TOP]);
     this.svg.setAttribute('viewBox', `0 0 ${this.width} ${HEIGHT}`);
     this.cursor = svg('g', {class: 'cursor'});
     this.svg.replaceChildren(
       svg('title', {id: 'timeline-name'}, 'The balance of the memory over time'),
-      ...this.areas(), ...this.states(), timeAxis(this.x, this.data.head.points, this.width, HEIGHT),
-      figureAxis(this.y, memoryTicks(most)), ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks(),
-      this.cursor, ...this.edges(), ...this.least());
+      timeAxis(this.x, this.data.head.points, this.width, HEIGHT), figureAxis(this.y, memoryTicks(most)),
+      ...clipped('timeline-sight', this.width, HEIGHT, ...this.areas(), ...this.states(),
+        ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks(), this.cursor, ...this.edges(), ...this.least()));
     this.showChosen();
   }
 
@@ -180,6 +182,8 @@ export class Timeline {
       input.setAttribute('aria-valuetext', timeText(taken[moment]));
       output.textContent = timeText(taken[moment]);
     }
+    this.zoom.disabled = chosen.at === chosen.from;
+    this.whole.disabled = this.state.get('zoom') === null;
     if (this.x === undefined) return;
     const [at, from] = [steady[chosen.at], steady[chosen.from]];
     const [left, right] = [this.at(at), this.at(from)].sort((a, b) => a - b);
@@ -196,33 +200,5 @@ export class Timeline {
     const parts = point.stack.filter((part) => part.bytes > 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
     const state = point.state === null ? [] : [`memory state ${point.state}`];
     return this.told.replaceChildren(element('strong', {}, timeText(point.taken)), ` ${[...parts, ...state].join(' · ')}`);
-  }
-
-  // The time below the pointer.
-  timeOf(event) {
-    const x = event.clientX - this.svg.getBoundingClientRect().left;
-    return this.x.invert(x).getTime() * 1000;
-  }
-
-  momentAt(time) {
-    return nearest(this.data.head.full.steady, time);
-  }
-
-  listen() {
-    let start = null;
-    this.svg.addEventListener('pointerdown', (event) => {
-      start = {x: event.clientX, moment: this.momentAt(this.timeOf(event))};
-      this.svg.setPointerCapture(event.pointerId);
-    });
-    this.svg.addEventListener('pointermove', (event) => {
-      if (this.x === undefined) return;
-      if (start === null) this.tell(this.timeOf(event));
-      else if (Math.abs(event.clientX - start.x) > DRAG) this.state.set({from: start.moment, at: this.momentAt(this.timeOf(event))});
-    });
-    this.svg.addEventListener('pointerup', (event) => {
-      if (start !== null && Math.abs(event.clientX - start.x) <= DRAG) this.state.set({at: start.moment});
-      start = null;
-    });
-    this.svg.addEventListener('pointerleave', () => this.tell(this.data.head.full.steady[this.state.get('at')]));
   }
 }
