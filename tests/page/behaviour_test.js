@@ -27,6 +27,15 @@ function contains(outer, inner) {
   return outer !== inner && outer.left <= inner.left && outer.top <= inner.top && outer.right >= inner.right && outer.bottom >= inner.bottom;
 }
 
+// The example host, other than it is in what `pattern` finds.
+function otherHost(pattern, other) {
+  const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
+  const [json, capture] = ['other.json', 'other.ksi'].map((name) => join(scratch, name));
+  writeFileSync(json, example.replace(pattern, other));
+  ksicache('load', json, capture, '--force');
+  return capture;
+}
+
 test('the areas add up to the memory of the host', async () => {
   const page = await openPage(makePage(RECORDING));
   for (const moment of ['0', '3', '4']) {
@@ -59,11 +68,8 @@ test('a click looks into a part, and a crumb out of it', async () => {
 
 // The services' group is called as that of the machines.
 test('a click looks into the group that was clicked, not into its namesake', async () => {
-  const [json, capture] = ['namesakes.json', 'namesakes.ksi'].map((name) => join(scratch, name));
-  const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
-  writeFileSync(json, example.replace(/("node":"sched\/groups\/groupName","keys":\[3\].*)"services"/, '$1"machines"'));
-  ksicache('load', json, capture);
-  const page = await openPage(makePage(capture));
+  const namesakes = otherHost(/("node":"sched\/groups\/groupName","keys":\[3\].*)"services"/, '$1"machines"');
+  const page = await openPage(makePage(namesakes));
   await page.locator('.tile', {hasText: 'Machines and processes'}).click({position: {x: 12, y: 8}});
   const tiles = page.getByRole('button', {name: /^machines /});
   assert.equal(await tiles.count(), 2);
@@ -84,15 +90,6 @@ test('a part says what it is at the pointer', async () => {
   assert.match(await page.locator('.where .detail').textContent(), /machines › db-orders 29\.5 GB, 11\.5 % of the host · vm-stats consumed \+ vm-stats ovhd · 257 MB of it overheads of machines$/);
   await closePage(page);
 });
-
-// The example host, other than it is in what `pattern` finds.
-function otherHost(pattern, other) {
-  const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
-  const [json, capture] = ['other.json', 'other.ksi'].map((name) => join(scratch, name));
-  writeFileSync(json, example.replace(pattern, other));
-  ksicache('load', json, capture, '--force');
-  return capture;
-}
 
 test('a part with more in it than it has says so, on paper, too', async () => {
   const page = await openPage(makePage(otherHost('"otherConsumed":117170084', '"otherConsumed":58585042')));

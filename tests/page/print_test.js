@@ -62,6 +62,29 @@ test('rows that are left out are counted', async () => {
   await closePage(page);
 });
 
+// A section that is kept whole leaves half a page empty; what has another page begins one.
+test('no page is left half empty', async () => {
+  const page = await printed();
+  const styles = (name, property) => page.locator(name).evaluateAll((all, each) => all.map((one) => getComputedStyle(one).getPropertyValue(each)), property);
+  assert.deepEqual(new Set(await styles('section', 'break-inside')), new Set(['auto']));
+  assert.deepEqual(new Set(await styles('.chart, .treemap', 'break-inside')), new Set(['avoid']));
+  assert.deepEqual(await styles('footer', 'page'), await styles('.reports', 'page'));
+  await closePage(page);
+});
+
+test('what has few columns is not as small as what has many', async () => {
+  const page = await printed();
+  const sizes = {};
+  for (const report of ['heap-stats', 'vm-stats']) {
+    await page.emulateMedia({media: 'screen'});
+    await page.selectOption('.reports label:has-text("Report") select', {label: report});
+    await page.emulateMedia({media: 'print'});
+    sizes[report] = await page.locator('.reports .grid').evaluate((grid) => parseFloat(getComputedStyle(grid).fontSize));
+  }
+  assert.ok(sizes['heap-stats'] > 1.2 * sizes['vm-stats'], JSON.stringify(sizes));
+  await closePage(page);
+});
+
 test('a document of pages', async () => {
   const page = await printed();
   const pdf = await page.pdf({format: 'A4'});
