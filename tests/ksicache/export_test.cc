@@ -495,11 +495,9 @@ TEST_F(ExportTest, ExportsWhatIsNotDamagedOfARecording) {
     }
     EXPECT_EQ(result.out, rest);
     EXPECT_EQ(result.err, "ksicache: " + damaged + "@..: the part of " + times[3 * chunk] +
-                              " is damaged
-ksicache: " + damaged + "@..: 3 moments of " +
+                              " is damaged\nksicache: " + damaged + "@..: 3 moments of " +
                               times[3 * chunk] + " to " + times[3 * chunk + 2] +
-                              " cannot be read
-");
+                              " cannot be read\n");
     // Nothing is wrong with what was not asked for.
   }
   // Nothing is missing of what lies before it.
