@@ -107,7 +107,7 @@ TEST_F(PageTest, HasTheLicensesOfWhatIsInIt) {
 TEST_F(PageTest, IsOfAMomentOfASpanOrOfAll) {
   const auto head = [](const std::string& page) {
     const size_t begin = page.find("<p>") + 3;
-    return page.substr(begin, page.find("</p>") - begin);
+    return page.substr(begin, page.find("</p>", begin) - begin);
   };
   EXPECT_EQ(head(Output({"page", kIncident + "@10:05Z"})),
             "hypervisor.example.org, 2026-11-21T10:05:00Z");

@@ -94,12 +94,13 @@ class Dumper {
       const ksi::Key& key = reading.keys[i];
       key.kind == ksi::KeyKind::kNumber ? keys.Number("", key.number) : keys.Text("", key.text);
     }
+    const std::string line = JsonWriter()
+                                 .Text("node", reading.row->path)
+                                 .Json("keys", keys.Array())
+                                 .Json(member, answer)
+                                 .Object();
     Print(first_ ? "\n    " : ",\n    ");
-    Print(JsonWriter()
-              .Text("node", reading.row->path)
-              .Json("keys", keys.Array())
-              .Json(member, answer)
-              .Object());
+    Print(line);
     first_ = false;
   }
 
