@@ -33,6 +33,9 @@ class PageDataTest : public ExportTest {
 
 // The heap's, when free memory is not the least.
 TEST_F(PageDataTest, HasTheMomentOfAPeakInFull) {
+#ifdef TALLY_SANITIZED
+  GTEST_SKIP() << "sanitizers take more than a minute to make so many moments";
+#endif
   const std::string recording = Story(
       "step  60\n"
       "time  cache      leak    build    balloon  swapped  unshared\n"
