@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <bit>
 #include <string_view>
+#include <utility>
 
 #include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/page/packing.h"
@@ -136,17 +137,17 @@ std::optional<size_t> ReportLines::ThingOf(std::span<const Value> values) {
     const bool isText = values[i].type == ValueType::text;
     row_[i] = {values[i].type, isText ? texts_.NumberOf(values[i].text) : values[i].number};
   }
-  const Thing named = NamedIn(values);
-  names_.Add(named.name, named.number);
   const uint32_t thing = identities_.NumberOf(columns_, row_, kMostThings);
+  if (thing < things_.size()) return thing;
+  // Its name and its number are among what tells it apart, and so they stay.
+  Thing named = NamedIn(values);
+  names_.Add(named.name, named.number);
   if (thing == kMostThings) {
     leavesOut_ = true;
     return std::nullopt;
   }
-  if (thing == things_.size()) {
-    things_.push_back(named);
-    lines_.resize(lines_.size() + places_.size());
-  }
+  things_.push_back(std::move(named));
+  lines_.resize(lines_.size() + places_.size());
   return thing;
 }
 
