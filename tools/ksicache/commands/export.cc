@@ -199,7 +199,9 @@ tally::ReportOptions SelectionOf(const CommandLine& line, const Reports& reports
   selection.startGid = GroupOf(Selecting(line, kGroup, reports, TakesGroup));
   if (Selecting(line, kLevels, reports, GoesDownGroups) != nullptr) {
     const int64_t levels = CountOf(line, kLevels, tally::kMaxLevels);
-    if (levels > tally::kMaxLevels) throw UsageError("--levels takes a number up to 12");
+    if (levels > tally::kMaxLevels) {
+      throw UsageError("--levels takes a number up to " + std::to_string(tally::kMaxLevels));
+    }
     selection.levels = static_cast<uint32_t>(levels);
   }
   selection.inclusionText = FlagsOf(line, kInclude, reports);

@@ -79,6 +79,8 @@ std::string ToJson() {
       .Text("total", kTotal)
       .Text("managed", kManaged)
       .Text("state", kState)
+      .Text("start", kStart)
+      .Text("rest", kRest)
       .Json("states", StatesToJson())
       .Json("parts", AllToJson(kParts))
       .Json("startParts", AllToJson(kStartParts))

@@ -143,7 +143,7 @@ function clientsOf(data, moment) {
   const worlds = new Things(data, moment, 'processes', 'user worlds', 'page tables');
   const tree = new Groups(data, moment);
   for (const thing of [...machines.all, ...worlds.all]) tree.add(thing);
-  return {children: tree.parts(), unknown: machines.unknown + worlds.unknown, rest: 'Not told apart'};
+  return {children: tree.parts(), unknown: machines.unknown + worlds.unknown, rest: data.head.roles.rest};
 }
 
 function heapsOf(data, moment) {
@@ -164,7 +164,7 @@ function managedPart(data, moment, role, bytes) {
 }
 
 function takenAtStart(host, row, roles, total, managed) {
-  const whole = part('Taken at start', 'start', total - managed,
+  const whole = part(roles.start, 'start', total - managed,
     `${roles.report} ${roles.total} − ${roles.managed}`);
   for (const role of roles.startParts) {
     const bytes = host.bytes(row, role.column);
@@ -189,7 +189,7 @@ export function balanceOf(data, moment) {
   if (managed !== null && managed < total) {
     whole.children.push(takenAtStart(host, row, roles, total, managed));
   }
-  return settle(whole, 'Not told apart');
+  return settle(whole, roles.rest);
 }
 
 // The parts of the balance at one row of the host's report, from the bottom of the stack up:
@@ -202,8 +202,8 @@ export function stackOf(host, row, roles) {
   const start = Math.max(0, total - managed);
   const rest = Math.max(0, total - start - sumOf(told));
   return [
-    {key: 'start', title: 'Taken at start', bytes: start},
-    {key: 'rest', title: 'Not told apart', bytes: rest},
+    {key: 'start', title: roles.start, bytes: start},
+    {key: 'rest', title: roles.rest, bytes: rest},
     ...told,
   ];
 }
