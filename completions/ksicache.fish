@@ -171,4 +171,5 @@ complete -c ksicache -n '__ksicache_command export' -l files-from -r -F -d 'Take
 complete -c ksicache -n '__ksicache_command export' -l append -d 'Add to a database'
 complete -c ksicache -n '__ksicache_command export' -l cluster -x -d 'Have tables over all servers of this cluster'
 complete -c ksicache -n '__ksicache_command page' -l title -x -d 'Head the page with it'
+complete -c ksicache -n '__ksicache_command page' -l zone -x -d 'Tell times also in this zone of the host'
 complete -c ksicache -n '__ksicache_command export page' -s o -l output -r -F -d 'Make a file'

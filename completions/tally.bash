@@ -359,7 +359,7 @@ declare -gA _ksicache_values=(
 
 _ksicache() {
   local _tally_line word command='' count=0 skip='' head='' i
-  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|group|levels|include|exclude|files-from|report|by|top|since|fail-above|title'
+  local valued='root|mode|every|keep|max-size|count|format|unit|output|cluster|columns|group|levels|include|exclude|files-from|report|by|top|since|fail-above|title|zone'
   COMPREPLY=()
   _tally_split
   for word in "${_tally_line[@]:1:${#_tally_line[@]}-2}"; do
@@ -409,7 +409,7 @@ _ksicache() {
           '--format --unit -u --columns -s --group -g --levels -l --include -i --exclude -e --every --files-from --output -o --append --force --mode --cluster'
         ;;
       load | extract | join) _tally_reply '' "$word" '--force --mode' ;;
-      page) _tally_reply '' "$word" '--output -o --title --force --mode' ;;
+      page) _tally_reply '' "$word" '--output -o --title --zone --force --mode' ;;
       '') _tally_reply '' "$word" '-h --help --version' ;;
     esac
   else

@@ -1,6 +1,7 @@
 // ksicache page, as far as a page can be told without a browser; tests/page has the rest.
 #include <sys/stat.h>
 
+#include <filesystem>
 #include <string>
 #include <string_view>
 
@@ -139,6 +140,17 @@ TEST_F(PageTest, HasATitleAndAName) {
   ExpectFailure({"page", kExample, "-o", ""}, "a file to make needs a name", 2);
   const std::string file = ExampleWith("host.ksi", {{"\"hypervisor.example.org\"", "\"\""}});
   ExpectHas(Output({"page", file}), "<h1>(no name)</h1>");
+}
+
+TEST_F(PageTest, TakesNoZoneThatIsNone) {
+  const std::string refusal = "--zone takes the name of a time zone, such as Europe/Berlin: ";
+  for (const char* zone : {"", "/etc/localtime", "Europe/../UTC", "<b>", "Europe/Berlin "}) {
+    ExpectFailure({"page", kExample, "--zone", zone}, refusal + zone, 2);
+  }
+  if (std::filesystem::is_directory("/usr/share/zoneinfo")) {
+    ExpectFailure({"page", kExample, "--zone", "Europe/Berln"}, refusal + "Europe/Berln", 2);
+    ExpectFailure({"page", kExample, "--zone", "Europe"}, refusal + "Europe", 2);
+  }
 }
 
 TEST_F(PageTest, TakesNoTextForMarkup) {

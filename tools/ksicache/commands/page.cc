@@ -1,6 +1,11 @@
 // page: a host's memory, at one moment or over time, as a page for a browser.
+#include <algorithm>
+#include <cctype>
+#include <filesystem>
 #include <span>
 #include <string>
+#include <string_view>
+#include <system_error>
 
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diff/text.h"
@@ -10,12 +15,14 @@
 #include "tools/ksicache/output.h"
 #include "tools/ksicache/page/document.h"
 #include "tools/ksicache/page/page_data.h"
+#include "tools/ksicache/printable.h"
 
 namespace ksicache {
 namespace {
 
 constexpr Option kTitle = {"title", "TEXT", "head the page with TEXT instead of the host's name"};
-constexpr const Option* kOptions[] = {&kOutput, &kTitle, &kForce, &kMode};
+constexpr Option kZone = {"zone", "ZONE", "tell times also in ZONE, the host's own, not in UTC"};
+constexpr const Option* kOptions[] = {&kOutput, &kTitle, &kZone, &kForce, &kMode};
 
 std::string TargetOf(const CommandLine& line) {
   const std::string* name = line.ValueOf(kOutput);
@@ -32,9 +39,31 @@ const std::string* TitleOf(const CommandLine& line) {
   return title;
 }
 
+// The time zone of the host, "Europe/Berlin"; empty if it is not told. A browser has names of its
+// own, which are mostly those that this machine has, if it has any.
+std::string ZoneOf(const CommandLine& line) {
+  const std::string* zone = line.ValueOf(kZone);
+  if (zone == nullptr) return {};
+  const auto isOfName = [](unsigned char c) {
+    return std::isalnum(c) != 0 ||
+           std::string_view("_+-/").find(static_cast<char>(c)) != std::string_view::npos;
+  };
+  const std::filesystem::path zones = "/usr/share/zoneinfo";
+  std::error_code error;
+  const bool isName =
+      !zone->empty() && zone->front() != '/' && std::ranges::all_of(*zone, isOfName);
+  if (!isName || (std::filesystem::is_directory(zones, error) &&
+                  !std::filesystem::is_regular_file(zones / *zone, error))) {
+    throw UsageError("--zone takes the name of a time zone, such as Europe/Berlin: " +
+                     Printable(*zone));
+  }
+  return *zone;
+}
+
 int Page(const CommandLine& line) {
   const std::string& name = line.arguments[0];
   const std::string* title = TitleOf(line);
+  const std::string zone = ZoneOf(line);
   const std::string start = name + ": ";
   NewFile file(TargetOf(line), line.Has(kForce), ModeOf(line));
   file.RefuseInput(FileNameOf(name));
@@ -46,6 +75,7 @@ int Page(const CommandLine& line) {
   }
   for (const std::string& problem : data.problems.All()) PrintError(start + problem);
   data.title = title == nullptr ? NameText(data.survey.host, -1) : *title;
+  data.zone = zone;
   const std::string html = ToHtml(data);
   file.Commit(std::as_bytes(std::span(html)));
   return data.problems.All().empty() ? 0 : 1;

@@ -201,6 +201,7 @@ std::string HeadToJson(const PageData& data) {
   return JsonWriter()
       .Text("title", data.title)
       .Text("host", survey.host)
+      .Text("zone", data.zone)
       .Number("moments", survey.moments.size())
       .Text("kernel", survey.kernel)
       .Json("states", StatesToJson(survey))

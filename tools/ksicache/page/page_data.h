@@ -17,6 +17,7 @@ namespace ksicache {
 
 struct PageData {
   std::string title;
+  std::string zone;  // the name of the host's time zone; empty if it is not told
   Problems problems;
   Survey survey;
   Marks marks;

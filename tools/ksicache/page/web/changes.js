@@ -1,8 +1,9 @@
 // What changed between the two chosen moments, as `ksicache diff` has it.
 import {choice, element} from './dom.js';
-import {NO_VALUE, UNITS, shownText, signedText, timeText} from './format.js';
+import {NO_VALUE, UNITS, shownText, signedText} from './format.js';
 import {compared} from './comparison.js';
 import {Grid, compareValues} from './grid.js';
+import {timeText} from './times.js';
 
 const HOST = [['total', 'Total'], ['free', 'Free'], ['used', 'In use'], ['kernel', 'Kernel'], ['caches', 'Caches'], ['others', 'Others']];
 

@@ -3,7 +3,8 @@
 // They go by the steady time of moments, so that none lies on another where the clock was set back;
 // what they say of it is the time on the wall.
 import {svg} from './dom.js';
-import {spanText, tickText, timeText} from './format.js';
+import {tickText} from './format.js';
+import {spanText, timeText} from './times.js';
 
 const DRAG = 5; // what is moved less is a click
 const LEFT = 52;

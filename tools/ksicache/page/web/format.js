@@ -1,4 +1,4 @@
-// Figures, names and times as they are shown.
+// Figures and names as they are shown.
 import {Kind} from './tables.js';
 
 export const NO_VALUE = '–';
@@ -84,55 +84,4 @@ export function signedText(number) {
 
 export function percentText(part, whole) {
   return whole > 0 ? `${(100 * part / whole).toFixed(1)} %` : NO_VALUE;
-}
-
-function formatter(options) {
-  return new Intl.DateTimeFormat('sv-SE', {
-    year: 'numeric', month: '2-digit', day: '2-digit', hour: '2-digit', minute: '2-digit',
-    second: '2-digit', ...options,
-  });
-}
-const LOCAL = formatter({});
-const UTC = formatter({timeZone: 'UTC'});
-
-export const ZONE = Intl.DateTimeFormat().resolvedOptions().timeZone;
-export const isUtc = ['UTC', 'Etc/UTC', 'GMT', 'Etc/GMT'].includes(ZONE);
-
-function clock(text) {
-  return text.slice(11);
-}
-
-// A time, us since 1970, for the reader and in UTC, which reports and the command line have:
-// "2026-11-21 11:05:00 (10:05:00 UTC)"
-export function timeText(time) {
-  const date = new Date(time / 1000);
-  const local = LOCAL.format(date);
-  const utc = UTC.format(date);
-  if (isUtc) return `${utc} UTC`;
-  return `${local} (${local.slice(0, 10) === utc.slice(0, 10) ? clock(utc) : utc} UTC)`;
-}
-
-// The same as `ksicache export` writes it: to the second.
-export function isoText(time) {
-  return `${new Date(Math.floor(time / 1e6) * 1000).toISOString().slice(0, 19)}Z`;
-}
-
-export function clockText(time) {
-  return clock((isUtc ? UTC : LOCAL).format(new Date(time / 1000)));
-}
-
-// How long, us: "1 d 2 h", "5 min", "30 s"
-export function spanText(time) {
-  const seconds = Math.round(Math.abs(time) / 1e6);
-  const units = [['d', 86400], ['h', 3600], ['min', 60], ['s', 1]];
-  const first = units.findIndex(([, size]) => seconds >= size);
-  if (first < 0) return '0 s';
-  let rest = seconds;
-  const words = [];
-  for (const [name, size] of units.slice(first, first + 2)) {
-    const count = Math.floor(rest / size);
-    if (count > 0) words.push(`${count} ${name}`);
-    rest -= count * size;
-  }
-  return words.join(' ');
 }

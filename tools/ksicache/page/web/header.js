@@ -2,8 +2,9 @@
 import {markText} from './chart.js';
 import {compared} from './comparison.js';
 import {clamped, element} from './dom.js';
-import {UNITS, ZONE, isUtc, memoryText, shownText, signedText, spanText, timeText} from './format.js';
+import {UNITS, memoryText, shownText, signedText} from './format.js';
 import {leastFree} from './memory.js';
+import {spanText, timeText, zoneText} from './times.js';
 
 const NAMED = 3; // of those who explain it
 
@@ -89,11 +90,6 @@ function remarks({moments, marks, problems}) {
   if (items.length === 0) return null;
   return element('details', {class: 'remarks', open: items.length < 4}, element('summary', {}, count(items.length, 'remark', 'remarks')),
     element('ul', {}, ...items.map((item) => element('li', {}, item))));
-}
-
-function zoneText() {
-  const zones = isUtc ? 'Times are in UTC, as in the reports' : `Times are those of ${ZONE}, where this page is read, with UTC, which the reports have, beside them`;
-  return `${zones}; the time zone of the host is not recorded.`;
 }
 
 export function header(data, state) {

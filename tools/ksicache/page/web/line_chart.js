@@ -2,8 +2,9 @@
 // greatest of each stretch of moments, and lines through both.
 import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
 import {choice, element, svg} from './dom.js';
-import {bytesOf, isMemory, memoryText, shownText, timeText} from './format.js';
+import {bytesOf, isMemory, memoryText, shownText} from './format.js';
 import {Kind} from './tables.js';
+import {timeText} from './times.js';
 
 const HEIGHT = 200;
 const TOP = 10;

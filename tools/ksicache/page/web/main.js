@@ -11,6 +11,7 @@ import {Timeline} from './timeline.js';
 import {LineChart} from './line_chart.js';
 import {Changes} from './changes.js';
 import {Reports} from './reports.js';
+import {setHostZone} from './times.js';
 
 // All that the page shows: {head, points, moments, memory, lines, hostReport, nameOf}.
 function unpacked({head, points, tables, lines}) {
@@ -36,6 +37,7 @@ function unpacked({head, points, tables, lines}) {
 
 function show(data) {
   const {head} = data;
+  setHostZone(head.zone);
   const hasMany = head.full.taken.length > 1;
   const state = new State({at: tightest(data), from: 0, zoom: null});
   const treemap = new Treemap(data, state);

@@ -1,8 +1,9 @@
 // Every report of the chosen moment as a table.
 import {choice, element} from './dom.js';
-import {NO_VALUE, UNITS, isMemory, isoText, shownValue, timeText} from './format.js';
+import {NO_VALUE, UNITS, isMemory, shownValue} from './format.js';
 import {Grid, compareValues} from './grid.js';
 import {Kind} from './tables.js';
+import {isoText, timeText} from './times.js';
 
 const OWN_UNIT = '';
 

@@ -2,8 +2,9 @@
 import {Rows, stackOf} from './balance.js';
 import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, nearest, runsOf, timeAxis, timeScale} from './chart.js';
 import {element, svg} from './dom.js';
-import {memoryText, timeText} from './format.js';
+import {memoryText} from './format.js';
 import {leastFree} from './memory.js';
+import {timeText} from './times.js';
 
 const HEIGHT = 210;
 const TOP = 20;
