@@ -40,6 +40,7 @@ TEST_F(PageTest, TellsWithoutScriptsOfTheTightestMoment) {
   const std::string page = Output({"page", kIncident});
   ExpectHas(page, "<h2>At 2026-11-21T10:05:00Z, the least free memory</h2>");
   ExpectHas(page, "<p>Memory state Hard.</p>");
+  ExpectHas(page, "<p>Memory state High 80.0 %, Hard 20.0 % of the moments.</p>");
   ExpectHas(page, "<p>Kernel's definitions built ");
   EXPECT_EQ(CountOf(page, "What happened between moments"), 0);
 }
@@ -114,10 +115,10 @@ TEST_F(PageTest, IsOfAMomentOfASpanOrOfAll) {
             "hypervisor.example.org, 2026-11-21T10:05:00Z");
   EXPECT_EQ(head(Output({"page", kIncident + "@10:03Z..10:04Z"})),
             "hypervisor.example.org, 2026-11-21T10:03:00Z to 2026-11-21T10:04:00Z, 2 moments; "
-            "scripts show all of them");
+            "with scripts it shows what happened over time");
   EXPECT_EQ(head(Output({"page", kIncident})),
             "hypervisor.example.org, 2026-11-21T10:02:00Z to 2026-11-21T10:06:00Z, 5 moments; "
-            "scripts show all of them");
+            "with scripts it shows what happened over time");
 }
 
 TEST_F(PageTest, IsAFileOfItsOwn) {
@@ -138,6 +139,7 @@ TEST_F(PageTest, HasATitleAndAName) {
   ExpectFailure({"page", kExample, "--title", ""}, "--title takes a text that can be seen", 2);
   ExpectFailure({"page", kExample, "--title", " \t"}, "--title takes a text that can be seen", 2);
   ExpectFailure({"page", kExample, "-o", ""}, "a file to make needs a name", 2);
+  ExpectHas(Output({"page", kExample, "--title", "caf\xe9"}), "<title>caf%e9</title>");
   const std::string file = ExampleWith("host.ksi", {{"\"hypervisor.example.org\"", "\"\""}});
   ExpectHas(Output({"page", file}), "<h1>(no name)</h1>");
 }

@@ -10,6 +10,7 @@
 #include "tools/ksicache/commands/commands.h"
 #include "tools/ksicache/diff/text.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/export/escaped_text.h"
 #include "tools/ksicache/new_file.h"
 #include "tools/ksicache/opened_file.h"
 #include "tools/ksicache/output.h"
@@ -74,7 +75,7 @@ int Page(const CommandLine& line) {
     throw Error(start + error.what());
   }
   for (const std::string& problem : data.problems.All()) PrintError(start + problem);
-  data.title = title == nullptr ? NameText(data.survey.host, -1) : *title;
+  data.title = title == nullptr ? NameText(data.survey.host, -1) : Escaped(*title);
   data.zone = zone;
   const std::string html = ToHtml(data);
   file.Commit(std::as_bytes(std::span(html)));

@@ -7,6 +7,7 @@
 #include "tools/ksicache/json_writer.h"
 #include "tools/ksicache/page/memory_rows.h"
 #include "tools/ksicache/page/roles.h"
+#include "tools/ksicache/printable.h"
 
 namespace ksicache {
 namespace {
@@ -162,11 +163,16 @@ std::string ToJson(const PageLines& lines) {
       .Object();
 }
 
-template <class Texts>
-std::string TextsToJson(const Texts& texts) {
+std::string ToJson(const PageTexts& texts) {
   JsonWriter all;
-  for (const std::string& text : texts) all.Text("", text);
+  for (const std::string& text : texts.All()) all.Text("", text);
   return all.Array();
+}
+
+std::string ProblemsToJson(const PageData& data) {
+  JsonWriter problems;
+  for (const std::string& problem : ProblemsOf(data)) problems.Text("", Printable(problem));
+  return problems.Array();
 }
 
 }  // namespace
@@ -212,10 +218,10 @@ std::string HeadToJson(const PageData& data) {
       .Json("memory", ToJson("memory", data.tables.full.streams.back()))
       .Json("parts", PartsToJson())
       .Json("marks", ToJson(data.marks, survey))
-      .Json("problems", TextsToJson(ProblemsOf(data)))
+      .Json("problems", ProblemsToJson(data))
       .Json("lines", ToJson(data.lines))
       .Json("roles", roles::ToJson())
-      .Json("texts", TextsToJson(data.texts.All()))
+      .Json("texts", ToJson(data.texts))
       .Object();
 }
 

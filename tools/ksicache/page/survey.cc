@@ -8,6 +8,7 @@
 #include "knvlibs/times.h"
 #include "reports/reports.h"
 #include "tools/ksicache/error.h"
+#include "tools/ksicache/export/escaped_text.h"
 #include "tools/ksicache/export/row_sink.h"
 #include "tools/ksicache/moment_report.h"
 #include "tools/ksicache/page/roles.h"
@@ -114,7 +115,7 @@ Survey MakeSurvey(const std::string& name, const std::function<void(const Origin
   const tally::Report& report = *tally::FindReport(roles::kHostReport);
   try {
     ForEachMoment(name, [&](const Origin& origin) {
-      survey.host = origin.host;
+      survey.host = Escaped(origin.host);
       if (survey.kernel.empty()) survey.kernel = KernelOf(origin);
       sink.Expect(report, origin);
       try {
