@@ -8,7 +8,7 @@ cmake_minimum_required(VERSION 3.25)
 
 # Each stands behind those that it imports.
 set(modules bytes data tables lines memory comparison format times dom state balance treemap chart timeline
-  line_chart grid changes reports header main)
+  line_chart grid changes reports header address main)
 
 # The hash of a text as a Content-Security-Policy has it.
 function(hash_of text result)

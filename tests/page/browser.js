@@ -40,6 +40,26 @@ export function reshaped(recording, ...changes) {
   return name;
 }
 
+// The example host, other than it is in what the patterns find: [pattern, other]...
+export function otherHost(...changes) {
+  const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
+  const name = join(scratch, Math.random().toString(36).slice(2));
+  writeFileSync(`${name}.json`, changes.reduce((text, [pattern, other]) => {
+    const changed = text.replace(pattern, other);
+    assert.notEqual(changed, text, `${pattern} is not in the example`);
+    return changed;
+  }, example));
+  ksicache('load', `${name}.json`, `${name}.ksi`);
+  return `${name}.ksi`;
+}
+
+// One recording of captures.
+export function joined(...captures) {
+  const name = join(scratch, `${Math.random().toString(36).slice(2)}.rec`);
+  ksicache('join', name, ...captures);
+  return name;
+}
+
 // The example host with so many heaps more; what their names begin with.
 export function hostWithHeaps(count, start = 'heap') {
   const lines = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8').split('\n');

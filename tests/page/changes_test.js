@@ -19,10 +19,14 @@ async function cellsOf(table) {
   return table.evaluate((each) => [...each.rows].map((row) => [...row.cells].map((cell) => cell.textContent)));
 }
 
+function isTold(part) {
+  return part.added && (!part.known || part.before !== 0 || part.after !== 0 || part.withoutFigure > 0 || part.rows.length > 0);
+}
+
 // The tables of the host as the program's answer has them, without the parts of the whole.
 function expectedHost(diff) {
   const figures = (name, {before, after, growth: by}) => [name, shown(before), shown(after), growth(by)];
-  const parts = diff.parts.filter((part) => part.added && (!part.known || part.before !== 0 || part.after !== 0 || part.withoutFigure > 0 || part.rows.length > 0));
+  const parts = diff.parts.filter(isTold);
   const title = ({known, count, what, withoutFigure}) => `${known ? `${count} ${what}` : `${what}: not known`}${withoutFigure > 0 ? `, ${withoutFigure} more without a figure, not added` : ''}`;
   return [
     ...HOST.map((name) => figures(name, diff.host[name])),
@@ -41,21 +45,33 @@ function nameAsProgram(things, rows) {
   });
 }
 
+// Expects what the answer says, and gives the shares of the growth.
 async function expectChanges(page, diff) {
   const tables = page.locator('.changes table.balance');
   const rows = [...await cellsOf(tables.first()), ...await cellsOf(tables.last())];
   const host = rows.filter((row) => !['the host', 'who explains it'].includes(row[0])).map((row) => row.slice(0, 4));
   host.slice(0, HOST.length).forEach((row, i) => { row[0] = HOST[i]; });
   assert.deepEqual(host, expectedHost(diff));
+  const shares = new Map();
   for (const part of diff.parts) {
     await page.selectOption('.changes label:has-text("Of") select', part.what);
     const more = page.locator('.changes .more');
     if (await more.isVisible()) await more.click();
     const things = (await cellsOf(page.locator('.changes table.grid'))).slice(1);
+    shares.set(part.what, things.map((cells) => cells.pop()));
     nameAsProgram(things, part.rows);
     const expected = part.rows.map((row) => [part.what, row.name, shown(row.group ?? null), row.state, shown(row.before), shown(row.after), growth(row.growth)]);
     assert.deepEqual(things, expected, part.what);
   }
+  const lastOf = (all) => all.slice(1).map((row) => row.at(-1));
+  const [ofHost, who] = [lastOf(await cellsOf(tables.first())), lastOf(await cellsOf(tables.last()))];
+  const told = diff.parts.filter(isTold);
+  return [...ofHost.slice(2), ...told.flatMap(({what}, i) => [who[i], ...shares.get(what)]), who.at(-1), ofHost[2], ...shares.get('groups')];
+}
+
+// Of what is in use, how much each is of its growth, in the order of the screen.
+function sharesIn(screen) {
+  return [...screen.matchAll(/ (\S+%)$/gm)].map(([, share]) => share);
 }
 
 async function compare(recording, pairs, units, program = ksicache) {
@@ -66,8 +82,10 @@ async function compare(recording, pairs, units, program = ksicache) {
     await page.fill('#slider-at', String(at));
     for (const unit of units) {
       await page.selectOption('.changes label:has-text("Changes in") select', unit);
-      const diff = program('diff', '--json', '--top', '100000', '-u', unit, `${recording}@${times[from]}`, `${recording}@${times[at]}`);
-      await expectChanges(page, JSON.parse(diff));
+      const words = ['--top', '100000', '-u', unit, `${recording}@${times[from]}`, `${recording}@${times[at]}`];
+      const diff = JSON.parse(program('diff', '--json', ...words));
+      const shares = await expectChanges(page, diff);
+      if (diff.host.used.growth) assert.deepEqual(shares, sharesIn(program('diff', ...words)));
     }
   }
   await closePage(page);

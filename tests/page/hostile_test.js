@@ -3,7 +3,7 @@ import assert from 'node:assert/strict';
 import {readFileSync, writeFileSync} from 'node:fs';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {closePage, ksicache, makePage, openPage, scratch} from './browser.js';
+import {closePage, joined, ksicache, makePage, openPage, otherHost, scratch} from './browser.js';
 
 // One reading a line; its numbers of 64 bits are none of JavaScript's.
 const EXAMPLE = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8').split('\n');
@@ -131,4 +131,85 @@ test('names of any bytes', async () => {
       ? Buffer.from(Array.from({length: 1 + next(40)}, () => 1 + next(255))) : fuzzedName(next)));
     await closePage(await look(names, 'host', `title ${fuzzedName(next).replaceAll('\u0000', '')}`));
   }
+});
+
+test('a host whose name is no UTF-8', async () => {
+  const page = await openPage(makePage(otherHost(['"hypervisor.example.org"', '{"hex":"ff41"}'])));
+  assert.equal(await page.locator('h1').textContent(), '%ffA');
+  assert.equal(await page.locator('header b').textContent(), '%ffA');
+  await closePage(page);
+});
+
+// Figures and times that are no whole numbers of a browser's, and what is beside them.
+for (const consumed of ['4503599627370000', '6000000000000000', '9007199254740993', '18446744073709551614']) {
+  test(`a group with ${consumed} KB`, async () => {
+    const large = otherHost([/("node":"sched\/groups\/stats\/memoryStats","keys":\[307\],.*"consumed":)\d+/, `$1${consumed}`]);
+    const later = otherHost(['T10:00:00Z', 'T10:01:00Z']);
+    const page = await openPage(makePage(joined(large, later)));
+    await page.click('text=First moment');
+    await page.locator('.reports input[type=search]').fill('storage-daemon');
+    const place = (await page.locator('.reports thead th').allTextContents()).indexOf('consumed');
+    assert.equal(await page.locator('.reports tbody tr > *').nth(place).textContent(), consumed);
+    const lines = page.locator('section', {has: page.locator('#lines-title')});
+    await lines.locator('select').selectOption({label: 'Groups: consumed'});
+    await page.click('text=Last moment');
+    assert.match(await lines.locator('.detail').textContent(), /host 124 GB · machines 110 GB/);
+    await closePage(page);
+  });
+}
+
+for (const year of ['1969', '2112', '2155', '9999']) {
+  test(`moments of the year ${year}`, async () => {
+    const [first, last] = ['23:53:40', '23:53:48'].map((time) => otherHost(['2026-11-21T10:00:00Z', `${year}-09-17T${time}Z`]));
+    const page = await openPage(makePage(joined(first, last)));
+    await page.click('text=Last moment');
+    assert.match(await page.locator('.when .time').first().textContent(), new RegExp(`\\(${year}-09-17 23:53:48 UTC\\)|\\(23:53:48 UTC\\)`));
+    assert.match(await page.locator('header p').first().textContent(), /2 moments in 8 s, all of them in full$/);
+    await closePage(page);
+  });
+}
+
+// A host with so much free memory at a time of the morning.
+function hostWithFree(free, time) {
+  const example = join(scratch, 'free.json');
+  writeFileSync(example, EXAMPLE.join('\n').replace('T10:00:00Z', `T${time}Z`).replace('"free":138092636', `"free":${free}`));
+  const file = join(scratch, `free-${free}.ksi`);
+  ksicache('load', example, file, '--force');
+  return file;
+}
+
+test('free memory that is not known is none', async () => {
+  const unknown = hostWithFree('18446744073709551615', '10:01:00');
+  const page = await openPage(makePage(joined(hostWithFree('138092636', '10:00:00'), unknown, hostWithFree('100000000', '10:02:00'))));
+  assert.match(await page.locator('.short').textContent(), /^95\.4 GB of 256 GB free at 2026-11-21 11:02:00 .*, the least of all/);
+  assert.match(await page.locator('.when .least').textContent(), /^the least that was free: 95\.4 GB at 2026-11-21 11:02:00 /);
+  assert.equal(await page.locator('.when .area.free').count(), 2);
+  await page.fill('#slider-at', '1');
+  assert.match(await page.locator('.when .detail').textContent(), / how the memory divided is not known$/);
+  assert.equal(await page.locator('.tile', {hasText: 'Free'}).count(), 0);
+  await closePage(page);
+});
+
+test('a name that is read from the right turns nothing around it', async () => {
+  const name = 'שרת דואר 1';
+  const page = await openPage(makePage(joined(otherHost(), otherHost(
+    ['T10:00:00Z', 'T10:01:00Z'], [/("node":"sched\/groups\/groupName","keys":\[1060\].*)"build-linux"/, `$1"${name}"`],
+    [/("node":"sched\/groups\/stats\/memoryStats","keys":\[106[01]\],.*?"consumed":)\d+/g, '$19999999'], ['"free":138092636', '"free":128092636']))));
+  await page.click('text=Last moment');
+  await page.mouse.move(0, 0);
+  await page.locator('.tile', {hasText: name}).focus();
+  await page.keyboard.press('Enter');
+  const lines = page.locator('section', {has: page.locator('#lines-title')});
+  await lines.locator('select').selectOption({label: 'Machines: consumed'});
+  for (const box of await lines.locator('.lines input').all()) await box.check();
+  for (const place of ['.short', '.where .detail', 'section:has(#lines-title) .detail']) {
+    const [isolated, others] = await page.locator(place).evaluate((each) => {
+      const bare = each.cloneNode(true);
+      bare.querySelectorAll('bdi').forEach((one) => one.remove());
+      return [[...each.querySelectorAll('bdi')].map((one) => one.textContent), bare.textContent];
+    });
+    assert.ok(isolated.includes(name), `${place}: ${isolated.join()}`);
+    assert.ok(!/\p{Script=Hebrew}/u.test(others), others);
+  }
+  await closePage(page);
 });

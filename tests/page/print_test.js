@@ -51,6 +51,23 @@ test('nothing is cut off', async () => {
   await closePage(recording);
 });
 
+test('figures are not broken', async () => {
+  const page = await openPage(makePage(RECORDING), {viewport: PORTRAIT});
+  for (const report of ['group-stats', 'vm-stats', 'heap-stats', 'swap-stats', 'buddy-stats']) {
+    await page.selectOption('.reports label:has-text("Report") select', {label: report});
+    await page.emulateMedia({media: 'print'});
+    await page.setViewportSize(LANDSCAPE);
+    const broken = await page.locator('.reports tbody .number').evaluateAll((cells) => cells.filter((cell) => {
+      const range = document.createRange();
+      range.selectNodeContents(cell);
+      return range.getClientRects().length > 1;
+    }).map((cell) => cell.textContent));
+    assert.deepEqual(broken, [], report);
+    await page.emulateMedia({media: 'screen'});
+  }
+  await closePage(page);
+});
+
 test('rows that are left out are counted', async () => {
   const page = await openPage(makePage(hostWithHeaps(100)), {viewport: PORTRAIT});
   await page.selectOption('.reports label:has-text("Report") select', {label: 'heap-stats'});

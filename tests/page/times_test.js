@@ -50,9 +50,29 @@ async function expectHole(page, kind) {
 
 test('a gap', async () => {
   const page = await openPage(makePage(reshaped(AFTERNOON, '60:gap:3600')));
-  assert.deepEqual(await remarksOf(page), ['2026-11-21 17:00:00 (16:00:00 UTC): nothing recorded for 1 h 2 min']);
+  assert.deepEqual(await remarksOf(page), ['2026-11-21 17:00:00 (16:00:00 UTC): nothing recorded in the 1 h 2 min before']);
   const mark = await expectHole(page, 'gap');
-  assert.equal(mark.text, '');
+  assert.equal(mark.text, 'gap');
+  // Nothing is told of it, in both charts; the moments at its ends are there.
+  for (const chart of await page.locator('.chart').all()) {
+    await chart.scrollIntoViewIfNeeded();
+    const {x, y} = await chart.boundingBox();
+    const told = chart.locator('xpath=ancestor::section').locator('.detail');
+    await page.mouse.move(x + (mark.from + mark.to) / 2, y + 80);
+    assert.equal(await told.textContent(), '2026-11-21 17:00:00 (16:00:00 UTC): nothing recorded in the 1 h 2 min before');
+    await page.mouse.move(x + mark.from - 3, y + 80);
+    assert.match(await told.textContent(), /^2026-11-21 15:58:00 /);
+  }
+  await closePage(page);
+});
+
+// The incident, whose last but one moment was hard, and after a gap its last one.
+test('a state of the memory ends where nothing is known', async () => {
+  const page = await openPage(makePage(reshaped(join(build, 'incident.rec'), '4:gap:3600')));
+  const [mark] = await marksOf(page, 'gap');
+  const bars = await page.locator('.when .state').evaluateAll((all) => all.map((each) => each.getBBox()).map(({x, width}) => [x, x + width]));
+  assert.equal(bars.length, 1);
+  assert.ok(isNear(bars[0][0], mark.from) && bars[0][1] < mark.from + 6, `${bars[0]} before ${JSON.stringify(mark)}`);
   await closePage(page);
 });
 
@@ -67,7 +87,7 @@ test('a restart', async () => {
 test('moments that cannot be read', async () => {
   const page = await openPage(makePageBy(ksicachePartly, reshaped(AFTERNOON, '50:damage')));
   const remarks = await remarksOf(page);
-  assert.match(remarks[0], /^2026-11-21 \d\d:\d\d:00 .* nothing that can be read for \d+ min$/);
+  assert.match(remarks[0], /^2026-11-21 \d\d:\d\d:00 .* nothing that can be read in the \d+ min before$/);
   assert.ok(remarks.some((remark) => /damaged/.test(remark)), remarks.join('\n'));
   assert.equal((await expectHole(page, 'lost')).text, 'damage');
   await closePage(page);

@@ -133,8 +133,8 @@ struct Words {
 
 constexpr Words kWords[] = {
     {"reboot", "restarted, {} between the moments"},
-    {"gap", "nothing recorded for {}"},
-    {"lost", "nothing that can be read for {}"},
+    {"gap", "nothing recorded in the {} before"},
+    {"lost", "nothing that can be read in the {} before"},
     {"skipped", "moments before it were left out"},
 };
 

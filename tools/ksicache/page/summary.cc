@@ -226,6 +226,20 @@ std::string ProblemsToHtml(const PageData& data) {
   return Tagged("h3", "What could not be read") + Tagged("ul", items) + "\n";
 }
 
+// "High 95.0 %, Soft 5.0 %", from best to worst.
+std::string StatesText(const Survey& survey) {
+  const auto states = roles::States();
+  std::string text;
+  for (size_t state = 0; state <= states.size(); ++state) {
+    const auto count = std::ranges::count(survey.moments, state, &SurveyedMoment::state);
+    if (count == 0) continue;
+    const char* name = state < states.size() ? states[state] : "not known";
+    text += (text.empty() ? "" : ", ") + std::string(name) + " " +
+            ShareText(static_cast<uint64_t>(count), survey.moments.size()) + " %";
+  }
+  return text;
+}
+
 // When the moment was that is told of, and why it is that one.
 std::string ToldText(const PageData& data) {
   const Survey& survey = data.survey;
@@ -269,11 +283,15 @@ std::string SummaryToHtml(const PageData& data) {
   const std::string last = ksi::TextOfTime(survey.moments.back().taken);
   const size_t count = survey.moments.size();
   std::string html = Tagged("h1", HtmlText(data.title)) + "\n";
-  html += Tagged("p", HtmlText(survey.host) + ", " +
-                          (count == 1 ? last
-                                      : first + " to " + last + ", " + std::to_string(count) +
-                                            " moments; scripts show all of them"));
+  html +=
+      Tagged("p", HtmlText(survey.host) + ", " +
+                      (count == 1 ? last
+                                  : first + " to " + last + ", " + std::to_string(count) +
+                                        " moments; with scripts it shows what happened over time"));
   html += Tagged("p", "Kernel's definitions built " + HtmlText(survey.kernel) + ".") + "\n";
+  if (count > 1) {
+    html += Tagged("p", "Memory state " + HtmlText(StatesText(survey)) + " of the moments.") + "\n";
+  }
   html += Tagged("h2", "At " + ToldText(data)) + "\n" + BalanceToHtml(data);
   for (const roles::Things& things : roles::kThings) html += LargestToHtml(data, things);
   return html + MarksToHtml(data) + ProblemsToHtml(data);

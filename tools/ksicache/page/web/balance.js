@@ -100,8 +100,34 @@ class Groups {
     this.top = {below: [], things: []};
     for (const [id, each] of this.groups) {
       each.id = id;
-      const above = each.parent === id ? undefined : this.groups.get(each.parent);
-      (above ?? this.top).below.push(each);
+      this.above(each).below.push(each);
+    }
+    this.openRings();
+  }
+
+  above(group) {
+    return this.groups.get(group.parent) ?? this.top;
+  }
+
+  // Groups that are in one another have their place at the top, so that none is left out.
+  openRings() {
+    const reached = new Set();
+    const reach = (group) => {
+      const due = [group];
+      while (due.length > 0) {
+        const each = due.pop();
+        if (reached.has(each)) continue;
+        reached.add(each);
+        due.push(...each.below);
+      }
+    };
+    reach(this.top);
+    for (const group of this.groups.values()) {
+      if (reached.has(group)) continue;
+      const {below} = this.above(group);
+      below.splice(below.indexOf(group), 1);
+      this.top.below.push(group);
+      reach(group);
     }
   }
 
@@ -193,10 +219,10 @@ export function balanceOf(data, moment) {
 }
 
 // The parts of the balance at one row of the host's report, from the bottom of the stack up:
-// [{key, title, bytes}], whose sum is the total; null if that is not told.
+// [{key, title, bytes}], whose sum is the total; null if that, or what is free, is not told.
 export function stackOf(host, row, roles) {
   const total = host.bytes(row, roles.total);
-  if (total === null) return null;
+  if (total === null || host.bytes(row, roles.free) === null) return null;
   const managed = host.bytes(row, roles.managed) ?? total;
   const told = roles.parts.map((role) => ({...role, bytes: host.bytes(row, role.column) ?? 0}));
   const start = Math.max(0, total - managed);

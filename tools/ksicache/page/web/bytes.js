@@ -48,6 +48,12 @@ export function unfolded(number) {
   return number % 2 === 1 ? -(number + 1) / 2 : number / 2;
 }
 
+// The sum, without loss.
+export function plus(a, b) {
+  const sum = Number(a) + Number(b);
+  return Number.isSafeInteger(sum) && typeof a === typeof b ? sum : narrow(BigInt(a) + BigInt(b));
+}
+
 // A number as a Number, if it can be one without loss.
 export function narrow(number) {
   return number >= -LARGEST && number <= LARGEST ? Number(number) : number;

@@ -1,9 +1,9 @@
 // What changed between the two chosen moments, as `ksicache diff` has it.
 import {choice, element} from './dom.js';
 import {NO_VALUE, UNITS, shownText, signedText} from './format.js';
-import {compared} from './comparison.js';
+import {byGrowth, compared} from './comparison.js';
 import {Grid, compareValues} from './grid.js';
-import {timeText} from './times.js';
+import {isoText, timeText} from './times.js';
 
 const HOST = [['total', 'Total'], ['free', 'Free'], ['used', 'In use'], ['kernel', 'Kernel'], ['caches', 'Caches'], ['others', 'Others']];
 
@@ -14,12 +14,15 @@ function numberText(number) {
   return number === null ? NO_VALUE : String(number);
 }
 
-// The part of the growth of what is in use.
+// The part of the growth of what is in use; a half is rounded to what is even.
 function partText(part, whole) {
   if (part === null || whole === null || whole === 0n) return NO_VALUE;
+  if (part === 0n) return '0%';
   const percent = 100 * Number(part) / Number(whole);
-  if (percent !== 0 && Math.abs(percent) < 0.5) return percent < 0 ? '> −1 %' : '< 1 %';
-  return `${percent.toFixed(0)} %`;
+  if (Math.abs(percent) < 0.5) return '<1%';
+  const below = Math.floor(percent);
+  const rest = percent - below;
+  return `${rest > 0.5 || (rest === 0.5 && below % 2 !== 0) ? below + 1 : below}%`;
 }
 
 function cells(...texts) {
@@ -46,8 +49,14 @@ const COLUMNS = [
   {name: 'growth', title: 'How much more it has', key: 'growth', isNumber: true},
 ];
 
-function sizeOf(number) {
-  return number < 0n ? -number : number;
+// Percent of the growth of what is in use.
+function partColumn(whole) {
+  return {
+    name: 'part', title: 'How much of the growth of what is in use that is', isNumber: true,
+    text: (row) => partText(row.growth, whole),
+    csv: (row) => (partText(row.growth, whole) === NO_VALUE ? null : (100 * Number(row.growth) / Number(whole)).toFixed(1)),
+    compare: (a, b, sign) => compareValues(a.growth, b.growth, whole !== null && whole < 0n ? -sign : sign),
+  };
 }
 
 function columnOf({name, title, key, isNumber = false}) {
@@ -55,8 +64,7 @@ function columnOf({name, title, key, isNumber = false}) {
     name, title, isNumber,
     text: (row) => (key === 'growth' ? signedText(row.growth) : isNumber ? numberText(row[key]) : shownText(row[key])),
     csv: (row) => (row[key] === null ? null : String(row[key])),
-    compare: (a, b, sign) => (key === 'growth' ? compareValues(sizeOf(a.growth), sizeOf(b.growth), sign)
-      : compareValues(a[key], b[key], sign)),
+    compare: (a, b, sign) => compareValues(a[key], b[key], sign),
   };
 }
 
@@ -64,7 +72,6 @@ export class Changes {
   constructor(data, state) {
     Object.assign(this, {data, state, kind: '', unit: 'mb'});
     this.grid = new Grid('things that changed');
-    this.grid.sortBy('growth', true);
     this.host = element('table', {class: 'balance'});
     this.who = element('table', {class: 'balance'});
     this.note = element('p', {class: 'note'});
@@ -78,7 +85,7 @@ export class Changes {
   kinds() {
     const {parts} = this.data.head;
     const added = parts.filter((part) => part.isAdded).length;
-    return choice('Of', [['', `all ${added} kinds that are added`], ...parts.map((part) => [part.name, part.name])], '', (kind) => {
+    return choice('Of', [['', `all ${added} kinds that add up`], ...parts.map((part) => [part.name, part.name])], '', (kind) => {
       this.kind = kind;
       this.showThings();
     });
@@ -94,6 +101,7 @@ export class Changes {
   show() {
     const {head, memory} = this.data;
     const [from, at] = ['from', 'at'].map((name) => this.state.get(name)).sort((a, b) => a - b);
+    this.moments = [from, at];
     const [bootFrom, bootAt] = [head.boots[from], head.boots[at]];
     const isRebooted = bootFrom !== 0 && bootAt !== 0 && bootFrom !== bootAt;
     this.times = `${timeText(head.full.taken[from])} to ${timeText(head.full.taken[at])}`;
@@ -125,8 +133,17 @@ export class Changes {
     return figureRow(`${title}${rest}`, part, whole);
   }
 
+  // Of which moments, and in which unit, what is copied is.
+  lead(unit) {
+    const [from, to] = this.moments.map((moment) => isoText(this.data.head.full.taken[moment]));
+    return [['host', this.data.head.host], ['from', from], ['to', to], ['unit', unit]];
+  }
+
   showThings() {
     const parts = this.result.parts.filter(({info}) => (this.kind === '' ? info.isAdded : info.name === this.kind));
-    this.grid.show(COLUMNS.map(columnOf), parts.flatMap((part) => part.things), `${this.times}, ${UNITS[this.unit].title}`);
+    // Until they are sorted, those come first that changed most, whichever way.
+    const things = parts.flatMap((part) => part.things).sort(byGrowth);
+    const {title} = UNITS[this.unit];
+    this.grid.show([...COLUMNS.map(columnOf), partColumn(this.result.host.used.growth)], things, `${this.times}, ${title}`, this.lead(title));
   }
 }

@@ -56,8 +56,8 @@ export function memoryTicks(most) {
   return (axis) => axis.tickValues(d3.range(0, most * 1.0001, step)).tickFormat(tickText);
 }
 
-// What has a word in a chart; the others are seen as gaps.
-const WORDS = {reboot: 'restart', clock: 'clock', lost: 'damage'};
+// What is called by a word in a chart.
+const WORDS = {reboot: 'restart', clock: 'clock', lost: 'damage', gap: 'gap'};
 
 export function markText(mark) {
   return mark.words.replace('{}', spanText(mark.time));
@@ -67,16 +67,23 @@ export function markShapes(marks, x, top, height) {
   return marks.map((mark) => {
     const end = x(mark.steady / 1000);
     const start = mark.kind === 'clock' ? end : Math.max(LEFT, x((mark.steady - mark.time) / 1000));
-    const word = WORDS[mark.kind];
+    // A gap has room for its word, or needs none.
+    const isGap = mark.kind === 'gap';
+    const word = isGap && end - start < 30 ? undefined : WORDS[mark.kind];
     return svg('g', {class: `mark ${mark.kind}`},
       svg('rect', {x: start, y: top, width: Math.max(end - start, 1), height: height - top - BOTTOM}),
-      word === undefined ? null : svg('text', {x: end + 3, y: top + 10}, word),
+      word === undefined ? null : svg('text', {x: (isGap ? start : end) + 3, y: top + 10}, word),
       svg('title', {}, `${timeText(mark.at)}: ${markText(mark)}`));
   });
 }
 
+// What happened at a steady time of which nothing is known.
+export function markAt(marks, time) {
+  return marks.find((mark) => mark.kind !== 'clock' && mark.steady - mark.time < time && time < mark.steady);
+}
+
 // Whether nothing is known of some time between two steady ones.
-function isBreak(marks, before, after) {
+export function isBreak(marks, before, after) {
   return marks.some((mark) => mark.kind !== 'clock' && mark.steady > before && mark.steady <= after);
 }
 
@@ -109,20 +116,26 @@ export function nearest(times, time) {
   return d3.minIndex(times, (each) => Math.abs(each - time));
 }
 
-// A moment is chosen by a click in a chart {svg, x, data, state, tell}, a span by dragging; what
-// there is at the pointer is told.
+// A moment is chosen by a click in a chart {svg, x, pointer, data, state, tell}, a span by dragging;
+// what there is at the pointer is told, and a line stands where that is.
 export function listen(chart) {
   const {svg: shape, state, data: {head: {full: {steady}}}} = chart;
   let start = null;
   const timeOf = (event) => chart.x.invert(event.clientX - shape.getBoundingClientRect().left).getTime() * 1000;
   const momentOf = (event) => nearest(steady, timeOf(event));
+  const point = (time) => {
+    const [, , , height] = shape.getAttribute('viewBox').split(' ');
+    const x = chart.x(time / 1000);
+    chart.pointer.replaceChildren(svg('line', {x1: x, x2: x, y1: 0, y2: height - BOTTOM}));
+  };
   shape.addEventListener('pointerdown', (event) => {
+    if (event.button !== 0) return;
     start = {x: event.clientX, moment: momentOf(event)};
     shape.setPointerCapture(event.pointerId);
   });
   shape.addEventListener('pointermove', (event) => {
     if (chart.x === undefined) return;
-    if (start === null) chart.tell(timeOf(event));
+    if (start === null) point(chart.tell(timeOf(event)));
     else if (Math.abs(event.clientX - start.x) > DRAG) state.set({from: start.moment, at: momentOf(event)});
   });
   shape.addEventListener('pointerup', (event) => {
@@ -130,5 +143,8 @@ export function listen(chart) {
     start = null;
   });
   shape.addEventListener('pointercancel', () => { start = null; });
-  shape.addEventListener('pointerleave', () => chart.tell(steady[state.get('at')]));
+  shape.addEventListener('pointerleave', () => {
+    chart.tell(steady[state.get('at')]);
+    chart.pointer?.replaceChildren();
+  });
 }

@@ -54,6 +54,12 @@ function matched(before, after, keyOf, mayRepeat) {
   return [...pairs, ...[...gone].map((thing) => [thing, null])];
 }
 
+// Orders those that changed most first, whichever way.
+export function byGrowth(a, b) {
+  const [first, second] = [a, b].map(({growth}) => (growth < 0n ? -growth : growth));
+  return second > first ? 1 : second < first ? -1 : 0;
+}
+
 function stateOf([before, after]) {
   return before === null ? 'new' : after === null ? 'gone' : 'changed';
 }
@@ -78,8 +84,7 @@ function partGrowth(info, before, after, shown, keyOf, mayRepeat) {
     if (growth.growth !== 0n) part.things.push({...pair[1] ?? pair[0], kind: info.name, state: stateOf(pair), ...growth});
   }
   Object.assign(part, growthOf(shown(was), shown(is)));
-  const size = ({growth}) => (growth < 0n ? -growth : growth);
-  part.things.sort((a, b) => (size(b) > size(a) ? 1 : size(b) < size(a) ? -1 : 0));
+  part.things.sort(byGrowth);
   return part;
 }
 

@@ -24,6 +24,16 @@ export function svg(tag, attributes = {}, ...children) {
   return fill(document.createElementNS(SVG, tag), attributes, children);
 }
 
+// A name among other words, whose direction it leaves alone.
+export function nameView(name) {
+  return element('bdi', {}, name);
+}
+
+// Pieces of text with something between them.
+export function joined(pieces, between) {
+  return pieces.flatMap((each, i) => (i === 0 ? [each] : [between, each]));
+}
+
 const LONG = 160; // characters
 
 // A text of which no more than some lines are shown until it is looked at.

@@ -3,6 +3,8 @@ import {Kind} from './tables.js';
 
 export const NO_VALUE = '–';
 
+const LONGEST = 100; // characters
+
 // The units of memory by the words of -u, with their titles and the bits of a byte's count that
 // they drop.
 export const UNITS = {
@@ -36,7 +38,7 @@ export function bytesOf(value, column) {
 }
 
 // What hides, or turns the direction of what is around it, is written out.
-const HIDDEN = /[\u0000-\u001f\u007f-\u00a0\u00ad\u034f\u061c\u115f\u1160\u17b4\u17b5\u180b-\u180f\u200b-\u200f\u2028-\u202f\u205f-\u206f\u3000\u3164\ufe00-\ufe0f\ufeff\uffa0\ufff0-\uffff]|[\ud800-\udbff](?![\udc00-\udfff])|(?<![\ud800-\udbff])[\udc00-\udfff]|[\u{e0000}-\u{e0fff}]/gu;
+const HIDDEN = /[\u0000-\u001f\u007f-\u00a0\u00ad\u034f\u061c\u115f\u1160\u17b4\u17b5\u180b-\u180f\u200b-\u200f\u2028-\u202f\u205f-\u206f\u2800\u3000\u3164\ufe00-\ufe0f\ufeff\uffa0\ufff0-\uffff]|[\ud800-\udbff](?![\udc00-\udfff])|(?<![\ud800-\udbff])[\udc00-\udfff]|[\u{1d173}-\u{1d17a}\u{e0000}-\u{e0fff}]/gu;
 
 function escape(character) {
   return `\\u{${character.codePointAt(0).toString(16)}}`;
@@ -45,6 +47,11 @@ function escape(character) {
 // A text of a capture as it is shown.
 export function shownText(text) {
   return text.replace(HIDDEN, escape);
+}
+
+// As much of a name as says what it is, where the whole of it stands elsewhere.
+export function shortText(name) {
+  return name.length > LONGEST ? `${name.slice(0, LONGEST)}…` : name;
 }
 
 // A value in the unit that is chosen, as text.

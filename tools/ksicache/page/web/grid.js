@@ -17,12 +17,13 @@ export class Grid {
     this.texts = []; // of the rows that are drawn, the nodes of their cells
     this.head = element('tr');
     this.body = element('tbody');
-    this.caption = element('p', {class: 'note', role: 'status'});
+    this.caption = element('p', {class: 'note'});
+    this.found = element('span', {class: 'note', role: 'status'}); // how many rows the filter finds
     this.more = element('button', {type: 'button', class: 'more', onclick: () => this.showMore()});
     this.input = element('input', {type: 'search', 'aria-label': `Filter ${label}`, placeholder: 'Filter', oninput: () => this.search()});
     this.copied = element('span', {class: 'note', role: 'status'});
     this.tools = element('div', {class: 'tools'}, this.input,
-      element('button', {type: 'button', onclick: () => this.copy()}, 'Copy as CSV'), this.copied);
+      element('button', {type: 'button', onclick: () => this.copy()}, 'Copy as CSV'), this.found, this.copied);
     this.scroller = element('div', {class: 'scroller', tabindex: 0, role: 'region', 'aria-label': label},
       element('table', {class: 'grid', 'aria-label': label}, element('thead', {}, this.head), this.body));
     this.about = element('p', {class: 'about', 'aria-hidden': 'true'}); // a title that the keyboard shows, too
@@ -56,6 +57,14 @@ export class Grid {
   search() {
     this.filter = this.input.value.toLowerCase();
     this.draw();
+    this.found.textContent = this.filter === '' ? '' : `${this.chosen().length} of ${this.rows.length} rows`;
+  }
+
+  // What was looked for in other rows is not looked for in these.
+  clearFilter() {
+    this.filter = '';
+    this.input.value = '';
+    this.found.textContent = '';
   }
 
   showMore() {
@@ -107,7 +116,7 @@ export class Grid {
     this.drawRows(shown);
     const isAll = shown.length === rows.length;
     const count = rows.length === this.rows.length ? rows.length : `${rows.length} of ${this.rows.length}`;
-    this.caption.textContent = `${this.text}: ${count} rows${isAll ? '' : `, the first ${shown.length} shown`}`;
+    this.caption.textContent = `${this.text}: ${count} ${rows.length === 1 && rows.length === this.rows.length ? 'row' : 'rows'}${isAll ? '' : `, the first ${shown.length} shown`}`;
     this.more.hidden = isAll;
     this.more.textContent = rows.length <= this.most + MORE ? `Show all ${rows.length} rows` : `Show ${MORE} more rows`;
     this.copied.textContent = '';

@@ -1,8 +1,8 @@
 // Figures of machines, groups, processes and heaps over time, as bands from the least to the
 // greatest of each stretch of moments, and lines through both.
-import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
-import {choice, element, svg} from './dom.js';
-import {bytesOf, isMemory, memoryText, shownText} from './format.js';
+import {BOTTOM, chosenLines, clipped, figureAxis, listen, markAt, markShapes, markText, memoryTicks, nearest, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
+import {choice, element, joined, nameView, svg} from './dom.js';
+import {NO_VALUE, bytesOf, isMemory, memoryText, shortText, shownText} from './format.js';
 import {Kind} from './tables.js';
 import {timeText} from './times.js';
 
@@ -13,14 +13,14 @@ const DRAWN = 5; // at first
 const COLORS = 8; // that lines can have
 const TOGETHER = 'all together';
 
-// How the figures of a column are drawn and written: {figure, text, most, ticks}; of what has a
-// greatest one, `most` is it.
+// How the figures of a column are drawn and written: {figure, text, most, ticks, isStepped}; of what has a
+// greatest one, `most` is it. A state lasts until there is another one.
 function styleOf(column, {states}) {
   const same = (figure) => figure;
   if (isMemory(column)) return {figure: (figure) => bytesOf(figure, column), text: memoryText, ticks: memoryTicks};
   if (column.kind === Kind.text) {
     const text = (state) => states[state];
-    return {figure: same, text, most: states.length - 1, ticks: () => (axis) => axis.tickValues(d3.range(states.length)).tickFormat(text)};
+    return {figure: same, text, isStepped: true, most: states.length - 1, ticks: () => (axis) => axis.tickValues(d3.range(states.length)).tickFormat(text)};
   }
   const text = (figure) => `${figure}${column.kind === Kind.percent ? ' %' : ''}`;
   return {figure: same, text, most: column.kind === Kind.percent ? 100 : undefined, ticks: () => (axis) => axis.ticks(4).tickFormat(text)};
@@ -35,7 +35,9 @@ function linesOf(data, role) {
   const style = styleOf(column, data.head.roles);
   const ofLine = (name, line) => ({name, line: line.map((extent) => extent && extent.map(style.figure)), style});
   const things = found.things.map(({name, line}) => ofLine(shownText(name ?? data.head.host), line));
-  return isMemory(column) && data.nameOf.has(role.report) ? [ofLine(TOGETHER, found.together), ...things] : things;
+  // Groups are in groups, whose memory they have.
+  const isAdded = isMemory(column) && data.nameOf.has(role.report) && role.report !== data.head.roles.groups.report;
+  return isAdded ? [ofLine(TOGETHER, found.together), ...things] : things;
 }
 
 function peak({line}) {
@@ -87,7 +89,8 @@ function extremes(run) {
 
 export class LineChart {
   constructor(data, state) {
-    Object.assign(this, {data, state});
+    Object.assign(this, {data, state, offers: new Map()});
+    this.middles = data.lines.times.map(([first, last]) => (first + last) / 2);
     const lines = [MOVED, ...data.head.roles.lines];
     this.svg = svg('svg', {class: 'chart', height: HEIGHT, role: 'img', 'aria-labelledby': 'lines-name'});
     this.list = element('fieldset', {class: 'lines'});
@@ -103,29 +106,49 @@ export class LineChart {
     this.choose(lines[0]);
   }
 
+  // What is ticked stays so while other lines are looked at.
   choose(role) {
     this.role = role;
-    Object.assign(this, offered(this.data, role));
-    let things = 0;
-    for (const each of this.lines) {
-      const isTogether = each.name === TOGETHER;
-      each.isDrawn = !isTogether && things < DRAWN;
-      each.color = isTogether ? 'together' : `color${things++ % COLORS}`;
-    }
+    if (!this.offers.has(role)) this.offers.set(role, this.offer(role));
+    Object.assign(this, this.offers.get(role));
     this.drawList();
     this.draw();
   }
 
+  // Lines of one colour are told apart by their dashes.
+  offer(role) {
+    const offer = offered(this.data, role);
+    let things = 0;
+    for (const each of offer.lines) {
+      const isTogether = each.name === TOGETHER;
+      each.isDrawn = !isTogether && things < DRAWN;
+      each.style = {...each.style, color: isTogether ? 'together' : `color${things % COLORS} dash${Math.floor(things / COLORS)}`};
+      if (!isTogether) ++things;
+    }
+    return offer;
+  }
+
+  // One that is pointed at, or has the focus, stands out.
   drawList() {
-    const boxes = this.lines.map((each) => element('label', {},
-      element('input', {type: 'checkbox', checked: each.isDrawn, onchange: (event) => {
-        each.isDrawn = event.target.checked;
-        this.draw();
-      }}), element('span', {class: `swatch ${each.color}`}), element('span', {class: 'name'}, each.name)));
+    const boxes = this.lines.map((each) => element('label', {
+      title: each.name, onpointerenter: () => this.stress(each), onpointerleave: () => this.stress(null),
+      onfocusin: () => this.stress(each), onfocusout: () => this.stress(null),
+    }, element('input', {type: 'checkbox', checked: each.isDrawn, onchange: (event) => {
+      each.isDrawn = event.target.checked;
+      this.draw();
+    }}), svg('svg', {class: 'key', width: 22, height: 11, 'aria-hidden': 'true'}, svg('line', {class: `line ${each.style.color}`, x2: 22, y1: 5.5, y2: 5.5})),
+    element('span', {class: 'name'}, each.name)));
     const {title, report, column} = this.role;
     this.list.replaceChildren(element('legend', {}, report === undefined ? title : `${title}, ${report} ${column}`), ...boxes);
-    if (this.more > 0) this.list.append(element('span', {class: 'note'}, `and ${this.more} smaller ones`));
+    if (this.more > 0) this.list.append(element('span', {class: 'note'}, `and ${this.more} more`));
     if (boxes.length === 0) this.list.append(element('span', {class: 'note'}, 'none of these has had any'));
+  }
+
+  stress(line) {
+    this.stressed = line;
+    for (const [each, shapes] of this.shapes) {
+      for (const shape of shapes) shape.classList.toggle('stressed', each === line);
+    }
   }
 
   draw() {
@@ -137,11 +160,13 @@ export class LineChart {
     this.x = timeScale(...this.state.get('zoom') ?? [lines.times[0][0], lines.times.at(-1)[1]], width);
     this.y = d3.scaleLinear([0, most * 1.04], [HEIGHT - BOTTOM, TOP]);
     this.cursor = svg('g', {class: 'cursor'});
+    this.pointer = svg('g', {class: 'pointer'});
+    this.shapes = new Map(drawn.map((each) => [each, this.paths(each)]));
     this.svg.setAttribute('viewBox', `0 0 ${width} ${HEIGHT}`);
     this.svg.replaceChildren(svg('title', {id: 'lines-name'}, `${this.role.title} over time`),
       timeAxis(this.x, head.points, width, HEIGHT), figureAxis(this.y, ticks(most)),
       ...clipped('lines-sight', width, HEIGHT, ...markShapes(head.marks.all, this.x, TOP, HEIGHT),
-        ...drawn.flatMap((each) => this.paths(each)), this.cursor));
+        ...[...this.shapes.values()].flat(), this.pointer, this.cursor));
     this.showChosen();
   }
 
@@ -149,11 +174,12 @@ export class LineChart {
     return d3.max(lines, peak) || 1;
   }
 
-  paths({line, color}) {
+  paths({line, style: {color, isStepped}}) {
     const points = line.map((extent, i) => ({from: this.data.lines.times[i][0], to: this.data.lines.times[i][1], extent}));
     const x = (point) => this.x(point.time / 1000);
-    const band = d3.area().x(x).y0(({extent}) => this.y(extent[0])).y1(({extent}) => this.y(extent[1]));
-    const through = d3.line().x(x).y(({figure}) => this.y(figure));
+    const curve = isStepped ? d3.curveStepAfter : d3.curveLinear;
+    const band = d3.area().curve(curve).x(x).y0(({extent}) => this.y(extent[0])).y1(({extent}) => this.y(extent[1]));
+    const through = d3.line().curve(curve).x(x).y(({figure}) => this.y(figure));
     return runsOf(points, this.data.head.marks.all, ({extent}) => extent !== null).flatMap((run) => [
       svg('path', {class: `band ${color}`, d: band(run)}),
       svg('path', {class: `line ${color}`, d: run.length > 1 ? through(extremes(run)) : `${through(extremes(run)).replace('Z', '')}h3`}),
@@ -168,16 +194,22 @@ export class LineChart {
     this.tell(at);
   }
 
-  // What the lines that are drawn say of a time.
+  // Tells what the lines that are drawn are at a steady time, or in the stretch of moments nearest to
+  // it, whose time it gives.
   tell(time) {
+    const mark = markAt(this.data.head.marks.all, time);
+    if (mark !== undefined) {
+      this.told.replaceChildren(`${timeText(mark.at)}: ${markText(mark)}`);
+      return time;
+    }
     const {times} = this.data.lines;
-    const place = Math.max(0, times.findLastIndex((each) => each[0] <= time));
+    const place = nearest(this.middles, time);
     const words = this.lines.filter((each) => each.isDrawn).map(({name, line, style}) => {
       const extent = line[place];
-      if (extent === null) return `${name} –`;
-      const [least, greatest] = extent.map(style.text);
-      return `${name} ${least === greatest ? least : `${least} to ${greatest}`}`;
+      const [least, greatest] = extent === null ? [NO_VALUE, NO_VALUE] : extent.map(style.text);
+      return element('span', {}, nameView(shortText(name)), ` ${least === greatest ? least : `${least} to ${greatest}`}`);
     });
-    this.told.replaceChildren(element('strong', {}, timeText(wallTime(this.data.head.points, times[place][0]))), ` ${words.join(' · ')}`);
+    this.told.replaceChildren(element('strong', {}, timeText(wallTime(this.data.head.points, times[place][0]))), ' ', ...joined(words, ' · '));
+    return this.middles[place];
   }
 }

@@ -1,5 +1,5 @@
 // Figures over time, out of the numbers that tools/ksicache/page/lines.h describes.
-import {unfolded} from './bytes.js';
+import {plus, unfolded} from './bytes.js';
 
 // An array with, for each stretch, [least, greatest], or null where there is no figure.
 function readLine(bytes, stretches) {
@@ -9,11 +9,11 @@ function readLine(bytes, stretches) {
   for (let i = 0; i < stretches; ++i) {
     const code = bytes.number();
     if (code === 0) continue;
-    before += unfolded(code - 1);
-    line[i] = [before * scale, 0];
+    before = plus(before, unfolded(plus(code, -1)));
+    line[i] = [Number(before) * scale, 0];
   }
   for (const extent of line) {
-    if (extent !== null) extent[1] = extent[0] + bytes.number() * scale;
+    if (extent !== null) extent[1] = extent[0] + Number(bytes.number()) * scale;
   }
   return line;
 }

@@ -2,9 +2,10 @@
 import {canLoad, load} from './data.js';
 import {readTables} from './tables.js';
 import {readLines} from './lines.js';
-import {memoryOf} from './memory.js';
+import {leastFree, memoryOf} from './memory.js';
 import {element} from './dom.js';
-import {header, tightest} from './header.js';
+import {header} from './header.js';
+import {addressed, keepAddress} from './address.js';
 import {State} from './state.js';
 import {Treemap} from './treemap.js';
 import {Timeline} from './timeline.js';
@@ -13,7 +14,17 @@ import {Changes} from './changes.js';
 import {Reports} from './reports.js';
 import {setHostZone} from './times.js';
 
-// All that the page shows: {head, points, moments, memory, lines, hostReport, nameOf}.
+// The moments that the balance is drawn from, {taken, steady, rows}, `rows` being the host's: those
+// that are in the page for it, and those in full.
+function balanceMoments(head, ofPoints, moments, hostReport) {
+  const momentsOf = ({taken, steady}, rowsOf) => steady.map((time, i) => ({taken: taken[i], steady: time, rows: rowsOf(i)}));
+  const points = momentsOf(head.points, (i) => ofPoints[i][0]);
+  const known = new Set(head.points.steady);
+  const others = momentsOf(head.full, (i) => moments[i][hostReport]).filter(({steady}) => !known.has(steady));
+  return [...points, ...others].sort((a, b) => a.steady - b.steady);
+}
+
+// All that the page shows: {head, balance, moments, memory, lines, nameOf}.
 function unpacked({head, points, tables, lines}) {
   const {reports, roles, texts} = head;
   const hostReport = reports.findIndex((report) => report.name === roles.report);
@@ -21,13 +32,7 @@ function unpacked({head, points, tables, lines}) {
   const moments = readTables(tables, [...reports, head.memory], head.full.taken.length, texts);
   return {
     head,
-    hostReport,
-    // As if they were moments of which there is only the host's report.
-    points: hostRows.map(([rows]) => {
-      const moment = [];
-      moment[hostReport] = rows;
-      return moment;
-    }),
+    balance: balanceMoments(head, hostRows, moments, hostReport),
     moments,
     memory: moments.map((streams) => memoryOf(streams[reports.length], head.parts)),
     lines: readLines(lines, head.lines),
@@ -35,11 +40,18 @@ function unpacked({head, points, tables, lines}) {
   };
 }
 
+// The moment with the least free memory, compared with the first one; if it is that, with the last.
+function firstChoice(data) {
+  const last = data.head.full.taken.length - 1;
+  const at = leastFree(data) ?? last;
+  return {at, from: at === 0 ? last : 0};
+}
+
 function show(data) {
   const {head} = data;
   setHostZone(head.zone);
   const hasMany = head.full.taken.length > 1;
-  const state = new State({at: tightest(data), from: 0, zoom: null});
+  const state = new State({...firstChoice(data), ...addressed(data), zoom: null});
   const treemap = new Treemap(data, state);
   const changes = hasMany ? new Changes(data, state) : null;
   const reports = new Reports(data, state);
@@ -49,6 +61,7 @@ function show(data) {
   document.getElementById('page').replaceChildren(header(data, state), element('main', {}, ...views.map((view) => view.view)),
     element('footer', {class: 'note'}, 'Made by ksicache page. Charts by d3, © Mike Bostock; its license stands in the source of this page.'));
   for (const view of [treemap, changes, reports]) view?.show();
+  keepAddress(data, state);
   document.documentElement.dataset.ready = 'yes';
   performance.mark('shown');
 }
@@ -59,12 +72,20 @@ async function main() {
     document.getElementById('summary').prepend(element('p', {role: 'alert'}, 'This browser cannot unpack the data of this page; one of 2023 or later shows all of it.'));
     return;
   }
+  const alarm = document.getElementById('damaged');
+  let data;
   try {
-    show(unpacked(await load()));
-  } catch (error) {
-    const alarm = document.getElementById('damaged');
-    if (alarm === null) throw error;
+    data = unpacked(await load());
+  } catch {
     alarm.classList.add('told');
+    return;
+  }
+  try {
+    show(data);
+  } catch (error) {
+    alarm.textContent = `This page cannot be shown: ${error}.`;
+    alarm.classList.add('told');
+    throw error;
   }
 }
 

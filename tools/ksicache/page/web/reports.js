@@ -42,6 +42,7 @@ export class Reports {
   choose(place) {
     this.place = place;
     this.grid.sortBy(null, true);
+    this.grid.clearFilter();
     this.grid.scroller.scrollTo(0, 0);
     this.drawColumns();
     this.show();
@@ -55,11 +56,13 @@ export class Reports {
     return this.hidden.has(`${this.report().name} ${column.name}`);
   }
 
-  turn(column, isShown) {
+  turn(column, box) {
     const name = `${this.report().name} ${column.name}`;
-    if (isShown) this.hidden.delete(name);
-    else this.hidden.add(name);
+    const isEmpty = this.report().columns.every((each) => each === column || this.isHidden(each));
+    box.checked ||= isEmpty;
+    this.hidden[box.checked ? 'delete' : 'add'](name);
     this.nameColumns();
+    this.unknown.textContent = isEmpty ? 'One column stays' : '';
     this.show();
   }
 
@@ -89,8 +92,15 @@ export class Reports {
   drawColumns() {
     this.nameColumns();
     this.columns.replaceChildren(...this.report().columns.map((column) => element('label', {},
-      element('input', {type: 'checkbox', checked: !this.isHidden(column), onchange: (event) => this.turn(column, event.target.checked)}),
+      element('input', {type: 'checkbox', checked: !this.isHidden(column), onchange: (event) => this.turn(column, event.target)}),
       element('b', {}, column.name), ` ${column.description.trim()}`)));
+  }
+
+  // "memory in KB", of what is shown.
+  unitText(columns) {
+    const memory = columns.filter(isMemory);
+    const titles = this.unit === OWN_UNIT ? [...new Set(memory.map(({unit}) => unit))] : [UNITS[this.unit].title];
+    return memory.length === 0 ? '' : `, memory in ${titles.join(' and ')}`;
   }
 
   columnOf(column, place) {
@@ -117,7 +127,7 @@ export class Reports {
     const rows = this.data.moments[at][this.place];
     const columns = report.columns.map((column, place) => ({column, place})).filter(({column}) => !this.isHidden(column));
     const time = timeText(this.data.head.full.taken[at]);
-    const caption = rows === null ? `${report.name} at ${time} could not be read` : `${report.name} at ${time}`;
+    const caption = `${report.name} at ${time}${rows === null ? ' could not be read' : this.unitText(columns.map(({column}) => column))}`;
     const lead = [['host', this.data.head.host], ['time', isoText(this.data.head.full.taken[at])]];
     this.grid.show(columns.map(({column, place}) => this.columnOf(column, place)), rows ?? [], caption, lead);
   }

@@ -1,6 +1,9 @@
 // What happened: the balance of the host over time. Moments are chosen by the sliders below, too.
 import {Rows, stackOf} from './balance.js';
-import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, nearest, runsOf, timeAxis, timeScale} from './chart.js';
+import {
+  BOTTOM, chosenLines, clipped, figureAxis, isBreak, listen, markAt, markShapes, markText, memoryTicks, nearest, runsOf, timeAxis,
+  timeScale,
+} from './chart.js';
 import {element, svg} from './dom.js';
 import {memoryText} from './format.js';
 import {leastFree} from './memory.js';
@@ -12,17 +15,16 @@ const TOP = 20;
 // The host's balance at the moments that it is drawn from.
 function balances(data) {
   const roles = data.head.roles;
-  const host = new Rows({...data, moments: data.points}, 0, roles.report);
-  const {taken, steady} = data.head.points;
-  return data.points.map((reports, i) => {
-    const row = reports[data.hostReport]?.[0];
+  const host = new Rows(data, 0, roles.report);
+  return data.balance.map(({taken, steady, rows}) => {
+    const row = rows?.[0];
     const stack = row === undefined ? null : stackOf(host, row, roles);
-    return {from: steady[i], to: steady[i], taken: taken[i], stack, state: row === undefined ? null : host.value(row, roles.state)};
+    return {from: steady, to: steady, taken, stack, state: row === undefined ? null : host.value(row, roles.state)};
   });
 }
 
 function freeOf({stack}) {
-  return stack.find((part) => part.key === 'free')?.bytes ?? 0;
+  return stack.find((part) => part.key === 'free').bytes;
 }
 
 // What is below the free memory.
@@ -41,10 +43,11 @@ export class Timeline {
     this.data = data;
     this.state = state;
     this.points = balances(data);
+    this.steady = this.points.map((point) => point.from);
     this.marks = data.head.marks.all;
     this.inputs = {};
     this.svg = svg('svg', {class: 'chart', height: HEIGHT, role: 'img', 'aria-labelledby': 'timeline-name'});
-    this.zoom = element('button', {type: 'button', onclick: () => state.set({zoom: this.span()})}, 'Zoom to the span');
+    this.zoom = element('button', {type: 'button', onclick: () => this.zoomIn()}, 'Zoom to the span');
     this.whole = element('button', {type: 'button', onclick: () => state.set({zoom: null})}, 'Whole time');
     this.told = element('p', {class: 'detail'});
     this.view = element('section', {class: 'when', 'aria-labelledby': 'when'},
@@ -67,7 +70,7 @@ export class Timeline {
 
   sliders() {
     const slider = (name, text) => {
-      const output = element('output', {});
+      const output = element('span', {class: 'time'});
       const input = element('input', {
         type: 'range', min: 0, max: this.data.head.full.taken.length - 1, step: 1, id: `slider-${name}`,
         oninput: () => this.choose(name, Number(input.value)),
@@ -78,8 +81,17 @@ export class Timeline {
     return element('div', {class: 'sliders'}, slider('at', 'Moment'), slider('from', 'Compared with'));
   }
 
+  // What is chosen is seen.
   choose(name, moment) {
-    this.state.set({[name]: moment});
+    const time = this.data.head.full.steady[moment];
+    const zoom = this.state.get('zoom');
+    const isSeen = zoom === null || (zoom[0] <= time && time <= zoom[1]);
+    this.state.set({[name]: moment, zoom: isSeen ? zoom : null});
+  }
+
+  zoomIn() {
+    const [first, last] = this.span();
+    if (first < last) this.state.set({zoom: [first, last]});
   }
 
   // The moments that are asked for most.
@@ -106,11 +118,12 @@ export class Timeline {
     this.y = d3.scaleLinear([0, most || 1], [HEIGHT - BOTTOM, TOP]);
     this.svg.setAttribute('viewBox', `0 0 ${this.width} ${HEIGHT}`);
     this.cursor = svg('g', {class: 'cursor'});
+    this.pointer = svg('g', {class: 'pointer'});
     this.svg.replaceChildren(
       svg('title', {id: 'timeline-name'}, 'The balance of the memory over time'),
       timeAxis(this.x, this.data.head.points, this.width, HEIGHT), figureAxis(this.y, memoryTicks(most)),
       ...clipped('timeline-sight', this.width, HEIGHT, ...this.areas(), ...this.states(),
-        ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks(), this.cursor, ...this.edges(), ...this.least()));
+        ...markShapes(this.marks, this.x, TOP, HEIGHT), this.ticks(), this.pointer, this.cursor, ...this.edges(), ...this.least()));
     this.showChosen();
   }
 
@@ -160,7 +173,9 @@ export class Timeline {
       const level = levelOf(this.data, point.state);
       if (level === 0) return;
       const from = this.at(point.from);
-      const to = i + 1 < this.points.length ? this.at(this.points[i + 1].from) : from + 3;
+      const next = this.points[i + 1];
+      const isLast = next === undefined || isBreak(this.marks, point.to, next.from);
+      const to = isLast ? from + 3 : this.at(next.from);
       bars.push(svg('rect', {class: `state level${level}`, x: from, width: Math.max(to - from, 2), y: TOP - 9, height: 6},
         svg('title', {}, `memory state ${point.state} at ${timeText(point.taken)}`)));
     });
@@ -183,8 +198,9 @@ export class Timeline {
       input.setAttribute('aria-valuetext', timeText(taken[moment]));
       output.textContent = timeText(taken[moment]);
     }
-    this.zoom.disabled = chosen.at === chosen.from;
-    this.whole.disabled = this.state.get('zoom') === null;
+    // One that is disabled would lose the focus.
+    this.zoom.setAttribute('aria-disabled', chosen.at === chosen.from);
+    this.whole.setAttribute('aria-disabled', this.state.get('zoom') === null);
     if (this.x === undefined) return;
     const [at, from] = [steady[chosen.at], steady[chosen.from]];
     const [left, right] = [this.at(at), this.at(from)].sort((a, b) => a - b);
@@ -194,12 +210,18 @@ export class Timeline {
     this.tell(at);
   }
 
-  // What the balance was then.
+  // Tells what the balance was at a steady time, or at the moment nearest to it, whose time it gives.
   tell(time) {
-    const point = this.points[nearest(this.data.head.points.steady, time)];
-    if (point.stack === null) return this.told.replaceChildren(`${timeText(point.taken)}: no figures`);
-    const parts = point.stack.filter((part) => part.bytes > 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
+    const mark = markAt(this.marks, time);
+    if (mark !== undefined) {
+      this.told.replaceChildren(`${timeText(mark.at)}: ${markText(mark)}`);
+      return time;
+    }
+    const point = this.points[nearest(this.steady, time)];
+    const parts = (point.stack ?? []).filter((part) => part.bytes > 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
     const state = point.state === null ? [] : [`memory state ${point.state}`];
-    return this.told.replaceChildren(element('strong', {}, timeText(point.taken)), ` ${[...parts, ...state].join(' · ')}`);
+    const words = point.stack === null ? 'how the memory divided is not known' : [...parts, ...state].join(' · ');
+    this.told.replaceChildren(element('strong', {}, timeText(point.taken)), ` ${words}`);
+    return point.from;
   }
 }

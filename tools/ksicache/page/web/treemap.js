@@ -1,7 +1,7 @@
 // Where the memory is: the parts of the host at the chosen moment, each as large as its memory.
 import {balanceOf} from './balance.js';
-import {element} from './dom.js';
-import {memoryText, percentText} from './format.js';
+import {element, joined, nameView} from './dom.js';
+import {memoryText, percentText, shortText} from './format.js';
 
 const HEAD = 19; // the height of the name of a part that has others in it
 const LEVELS = 3; // that are drawn below the one that is looked into
@@ -28,17 +28,23 @@ function squarified(part, width, height) {
 }
 
 // What is in a part and more than it.
-function sumText({data: {name, bytes, share}}) {
-  return `what is in ${name} adds up to ${memoryText(bytes / share)} and is drawn at ${percentText(share, 1)} of its size, as ${memoryText(bytes)}`;
+function sumWords({data: {name, bytes, share}}) {
+  return element('span', {}, 'what is in ', nameView(shortText(name)),
+    ` adds up to ${memoryText(bytes / share)} and is drawn at ${percentText(share, 1)} of its size, as ${memoryText(bytes)}`);
 }
 
 // Why, of the parts that are drawn with what is in them, some are smaller than that.
-function sharedText(tree, opened) {
+function sharedWords(tree, opened) {
   const parts = tree.descendants().filter((node) => opened.has(node) && node.data.share < 1)
     .sort((a, b) => b.data.bytes - a.data.bytes);
-  if (parts.length === 0) return '';
+  if (parts.length === 0) return [];
   const more = parts.length > SAID ? `; and so in ${parts.length - SAID} more` : '';
-  return `Some memory is counted with several: ${parts.slice(0, SAID).map(sumText).join('; ')}${more}.`;
+  return ['Some memory is counted with several: ', ...joined(parts.slice(0, SAID).map(sumWords), '; '), `${more}.`];
+}
+
+// Whether parts, of two moments perhaps, are one.
+function isSame(a, b) {
+  return a.id === b.id && a.name === b.name && a.key === b.key;
 }
 
 export class Treemap {
@@ -49,7 +55,7 @@ export class Treemap {
     this.box = element('div', {class: 'treemap', role: 'group', 'aria-label': 'Parts of the memory', onkeydown: (event) => this.key(event)});
     this.crumbs = element('nav', {class: 'crumbs', 'aria-label': 'Part that is shown'});
     this.shared = element('p', {class: 'note'});
-    this.detail = element('p', {class: 'detail', 'aria-live': 'polite'});
+    this.detail = element('p', {class: 'detail', id: 'part-detail'});
     this.view = element('section', {class: 'where', 'aria-labelledby': 'where'},
       element('h2', {id: 'where'}, 'Where the memory is'), this.crumbs, this.box, this.shared, this.detail);
     state.watch(['at'], () => this.show());
@@ -74,13 +80,27 @@ export class Treemap {
     this.draw();
   }
 
+  // The tile of a part, which at another moment, or in another size, is another one.
+  tileOf(part) {
+    return this.tiles.find((tile) => isSame(this.nodes.get(tile).data, part));
+  }
+
+  // Draws anew; the focus stays on the part that has it.
   draw() {
+    const focused = this.nodes?.get(document.activeElement)?.data;
+    this.drawTiles();
+    if (focused !== undefined) (this.tileOf(focused) ?? this.tiles[0])?.focus({preventScroll: true});
+  }
+
+  drawTiles() {
     if (this.root === undefined) return;
+    this.tiles = [];
+    this.nodes = new Map();
     this.box.replaceChildren();
     this.box.hidden = this.root === null;
     if (this.root === null) {
       this.crumbs.replaceChildren();
-      this.shared.textContent = '';
+      this.shared.replaceChildren();
       this.detail.textContent = 'How the memory divides could not be read at this moment.';
       return;
     }
@@ -89,21 +109,19 @@ export class Treemap {
     const {clientWidth: width, clientHeight: height} = this.box;
     if (width === 0) return;
     this.tree = squarified(chain.at(-1), width, height);
-    this.tiles = [];
-    this.nodes = new Map();
     this.opened = new Set([this.tree]); // whose parts are drawn, too
     this.tree.each((node) => this.drawTile(node));
     if (this.tiles.length > 0) this.tiles[0].tabIndex = 0;
-    this.shared.textContent = sharedText(this.tree, this.opened);
+    this.shared.replaceChildren(...sharedWords(this.tree, this.opened));
     this.describe(chain.at(-1), chain);
   }
 
   drawCrumbs(chain) {
     const links = chain.map((part, depth) => {
       const isLast = depth === chain.length - 1;
-      const text = `${part.name} ${memoryText(part.bytes)}`;
-      return element('li', {}, isLast ? element('span', {'aria-current': 'true'}, text)
-        : element('button', {type: 'button', onclick: () => this.lookInto(this.path.slice(0, depth))}, text));
+      const words = [nameView(shortText(part.name)), ` ${memoryText(part.bytes)}`];
+      return element('li', {}, isLast ? element('span', {'aria-current': 'true'}, ...words)
+        : element('button', {type: 'button', onclick: () => this.lookInto(this.path.slice(0, depth), chain[depth + 1])}, ...words));
     });
     this.crumbs.replaceChildren(element('ol', {}, ...links));
   }
@@ -118,7 +136,7 @@ export class Treemap {
     if (isOpen) this.opened.add(node);
     const tile = element('button', {
       type: 'button', class: `tile ${part.key}${isOpen ? ' open' : ''}`, tabindex: -1,
-      'aria-label': `${part.name} ${memoryText(part.bytes)}`,
+      'aria-label': `${shortText(part.name)} ${memoryText(part.bytes)}`, 'aria-describedby': 'part-detail',
       onclick: () => this.open(node),
       onfocus: () => this.focus(tile, part, node),
       onpointerenter: () => this.describe(part, this.partsTo(node)),
@@ -146,17 +164,18 @@ export class Treemap {
     return [...this.chain().slice(0, -1), ...node.ancestors().reverse().map((each) => each.data)];
   }
 
-  // Looks into the part, or into the one that it is in.
+  // Looks into the part, or, at the part, into the one that it is in.
   open(node) {
-    const inside = (node.data.children.length > 0 ? node : node.parent).ancestors().reverse().slice(1)
-      .map(({data: {id, name}}) => ({id, name}));
-    if (inside.length > 0) this.lookInto([...this.path, ...inside]);
+    const hasParts = node.data.children.length > 0;
+    const inside = (hasParts ? node : node.parent).ancestors().reverse().slice(1).map(({data: {id, name}}) => ({id, name}));
+    if (inside.length > 0) this.lookInto([...this.path, ...inside], hasParts ? null : node.data);
   }
 
-  lookInto(path) {
+  // `part`: what has the focus then; the first of all if it is null, or is not there.
+  lookInto(path, part) {
     this.path = path;
-    this.draw();
-    this.tiles[0]?.focus();
+    this.drawTiles();
+    ((part === null ? undefined : this.tileOf(part)) ?? this.tiles[0])?.focus();
   }
 
   focus(tile, part, node) {
@@ -171,14 +190,16 @@ export class Treemap {
       words.push(`what is in it adds up to ${memoryText(part.bytes / part.share)}, as some memory is counted with several, and is drawn at ${percentText(part.share, 1)} of its size`);
     }
     if (part.note !== '') words.push(part.note);
+    const names = chain.length > 1 ? chain.slice(1) : [part];
     this.detail.replaceChildren(
-      element('strong', {}, chain.slice(1).map((each) => each.name).join(' › ') || part.name), ` ${words.join(' · ')}`);
+      element('strong', {}, ...joined(names.map(({name}) => nameView(shortText(name))), ' › ')), ` ${words.join(' · ')}`);
   }
 
   key(event) {
     if (event.key === 'Escape' || event.key === 'Backspace') {
-      const depth = this.chain().length - 1;
-      if (depth > 0) this.lookInto(this.path.slice(0, depth - 1));
+      const chain = this.chain();
+      const depth = chain.length - 1;
+      if (depth > 0) this.lookInto(this.path.slice(0, depth - 1), chain[depth]);
     } else if (event.key === 'Home' || event.key === 'End') {
       this.tiles.at(event.key === 'Home' ? 0 : -1)?.focus();
     } else if (event.key.startsWith('Arrow')) {
