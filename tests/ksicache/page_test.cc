@@ -140,13 +140,15 @@ TEST_F(PageTest, HasATitleAndAName) {
   ExpectFailure({"page", kExample, "--title", " \t"}, "--title takes a text that can be seen", 2);
   ExpectFailure({"page", kExample, "-o", ""}, "a file to make needs a name", 2);
   ExpectHas(Output({"page", kExample, "--title", "caf\xe9"}), "<title>caf%e9</title>");
+  ExpectHas(Output({"page", kExample, "--title", "50%20"}), "<title>50%20</title>");
   const std::string file = ExampleWith("host.ksi", {{"\"hypervisor.example.org\"", "\"\""}});
   ExpectHas(Output({"page", file}), "<h1>(no name)</h1>");
 }
 
 TEST_F(PageTest, TakesNoZoneThatIsNone) {
   const std::string refusal = "--zone takes the name of a time zone, such as Europe/Berlin: ";
-  for (const char* zone : {"", "/etc/localtime", "Europe/../UTC", "<b>", "Europe/Berlin "}) {
+  for (const char* zone :
+       {"", "/etc/localtime", "Europe/../UTC", "<b>", "Europe/Berlin ", "right/UTC"}) {
     ExpectFailure({"page", kExample, "--zone", zone}, refusal + zone, 2);
   }
   if (std::filesystem::is_directory("/usr/share/zoneinfo")) {

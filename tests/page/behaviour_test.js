@@ -2,7 +2,7 @@
 import assert from 'node:assert/strict';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, hostWithHeaps, ksicachePartly, makePage, makePageBy, openPage, otherHost, reshaped} from './browser.js';
+import {build, closePage, hostWithHeaps, joined, ksicachePartly, makePage, makePageBy, openPage, otherHost, reshaped} from './browser.js';
 
 const RECORDING = join(build, 'incident.rec');
 const SIZES = {bytes: 1, KB: 2 ** 10, MB: 2 ** 20, GB: 2 ** 30, TB: 2 ** 40};
@@ -284,6 +284,8 @@ test('what is chosen is that moment, of a long recording, too', async () => {
     await page.fill('#slider-at', String(moment));
     const [, free, time] = /^(.*) of 256 GB free at (\S+ \S+)/.exec(await page.locator('.short').textContent());
     const told = await page.locator('.when .detail').textContent();
+    const [stretch] = await page.locator('section:has(#lines-title) .detail strong').allTextContents();
+    assert.match(stretch, /^\S+ \S+ \(.*\)( to \S+ \S+ \(.*\))?$/);
     assert.ok(told.startsWith(`${time} `) && told.includes(` Free ${free} · `), `${told} is not of ${time}, ${free} free`);
   }
   await closePage(page);
@@ -362,6 +364,19 @@ test('the address has what is chosen', async () => {
   await page.waitForFunction(() => document.getElementById('slider-at').value === '2');
   assert.deepEqual(await chosen(), ['2', '1']);
   page.wrong.splice(0); // reloading asks for the page again, with another address
+  await closePage(page);
+});
+
+test('moments of one second have addresses of their own', async () => {
+  const page = await openPage(makePage(joined(otherHost(), ...['1', '2'].map((digit) => otherHost(['"kernelCode":24576', `"kernelCode":2457${digit}`])))));
+  await page.fill('#slider-at', '2');
+  await page.waitForFunction(() => location.hash === '#at=2026-11-21T10:00:00Z,3&from=2026-11-21T10:00:00Z,3');
+  await page.evaluate(() => { location.hash = '#at=2026-11-21T10:00:00Z,2'; });
+  await page.waitForFunction(() => document.getElementById('slider-at').value === '1');
+  // Nothing grew, and so no line is there, nor figures beside it.
+  const lines = page.locator('section', {has: page.locator('#lines-title')});
+  assert.equal(await lines.locator('path.line').count(), 0);
+  assert.equal(await lines.locator('.axis').last().textContent(), '');
   await closePage(page);
 });
 

@@ -3,7 +3,7 @@ import assert from 'node:assert/strict';
 import {writeFileSync} from 'node:fs';
 import {join} from 'node:path';
 import {test} from 'node:test';
-import {build, closePage, ksicache, ksicachePartly, makePageBy, openPage, scratch} from './browser.js';
+import {build, closePage, ksicache, joined, ksicachePartly, makePageBy, openPage, otherHost, scratch} from './browser.js';
 
 const HOST = ['total', 'free', 'used', 'kernel', 'caches', 'others'];
 
@@ -116,6 +116,16 @@ function recordingInPart() {
 // It takes the others with it in no table.
 test('a moment that is not whole', async () => {
   await compare(recordingInPart(), [[0, 1]], ['kb'], ksicachePartly);
+});
+
+test('what is not known is not called unchanged', async () => {
+  const page = await openPage(makePageBy(ksicachePartly, joined(otherHost(), otherHost(
+    ['T10:00:00Z', 'T10:01:00Z'], [/("node":"system\/heaps","keys":\[\],)"instances":\[.*\]\}/, '$1"status":"0xbad0001"}']))));
+  const caption = page.locator('.changes .note', {hasText: 'rows'});
+  assert.match(await caption.textContent(), /, MB, heaps not known: 0 rows$/);
+  await page.selectOption('.changes label:has-text("Of") select', 'machines');
+  assert.match(await caption.textContent(), /, MB: 0 rows$/);
+  await closePage(page);
 });
 
 test('a sum of which something is missing is none', async () => {

@@ -17,6 +17,7 @@
 #include "tools/ksicache/page/document.h"
 #include "tools/ksicache/page/page_data.h"
 #include "tools/ksicache/printable.h"
+#include "tools/ksicache/record_json.h"
 
 namespace ksicache {
 namespace {
@@ -51,8 +52,9 @@ std::string ZoneOf(const CommandLine& line) {
   };
   const std::filesystem::path zones = "/usr/share/zoneinfo";
   std::error_code error;
-  const bool isName =
-      !zone->empty() && zone->front() != '/' && std::ranges::all_of(*zone, isOfName);
+  const bool isName = !zone->empty() &&
+                      std::isupper(static_cast<unsigned char>(zone->front())) != 0 &&
+                      std::ranges::all_of(*zone, isOfName);
   if (!isName || (std::filesystem::is_directory(zones, error) &&
                   !std::filesystem::is_regular_file(zones / *zone, error))) {
     throw UsageError("--zone takes the name of a time zone, such as Europe/Berlin: " +
@@ -75,7 +77,9 @@ int Page(const CommandLine& line) {
     throw Error(start + error.what());
   }
   for (const std::string& problem : data.problems.All()) PrintError(start + problem);
-  data.title = title == nullptr ? NameText(data.survey.host, -1) : Escaped(*title);
+  data.title = title == nullptr ? NameText(data.survey.host, -1)
+               : IsUtf8(*title) ? *title
+                                : Escaped(*title);
   data.zone = zone;
   const std::string html = ToHtml(data);
   file.Commit(std::as_bytes(std::span(html)));

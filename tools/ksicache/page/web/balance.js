@@ -219,14 +219,15 @@ export function balanceOf(data, moment) {
 }
 
 // The parts of the balance at one row of the host's report, from the bottom of the stack up:
-// [{key, title, bytes}], whose sum is the total; null if that, or what is free, is not told.
+// [{key, title, bytes}], whose sum is the total; null if that is not told. What has no figure is in
+// the rest; but if it is what is free, the rest has none.
 export function stackOf(host, row, roles) {
   const total = host.bytes(row, roles.total);
-  if (total === null || host.bytes(row, roles.free) === null) return null;
+  if (total === null) return null;
   const managed = host.bytes(row, roles.managed) ?? total;
-  const told = roles.parts.map((role) => ({...role, bytes: host.bytes(row, role.column) ?? 0}));
+  const told = roles.parts.map((role) => ({...role, bytes: host.bytes(row, role.column)}));
   const start = Math.max(0, total - managed);
-  const rest = Math.max(0, total - start - sumOf(told));
+  const rest = host.bytes(row, roles.free) === null ? null : Math.max(0, total - start - sumOf(told));
   return [
     {key: 'start', title: roles.start, bytes: start},
     {key: 'rest', title: roles.rest, bytes: rest},

@@ -144,6 +144,8 @@ export class Changes {
     // Until they are sorted, those come first that changed most, whichever way.
     const things = parts.flatMap((part) => part.things).sort(byGrowth);
     const {title} = UNITS[this.unit];
-    this.grid.show([...COLUMNS.map(columnOf), partColumn(this.result.host.used.growth)], things, `${this.times}, ${title}`, this.lead(title));
+    const unknown = parts.filter((part) => !part.isKnown).map(({info}) => info.name);
+    const missing = unknown.length === 0 ? '' : `, ${unknown.join(' and ')} not known`;
+    this.grid.show([...COLUMNS.map(columnOf), partColumn(this.result.host.used.growth)], things, `${this.times}, ${title}${missing}`, this.lead(title));
   }
 }

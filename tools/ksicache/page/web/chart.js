@@ -51,7 +51,7 @@ export function figureAxis(y, ticks) {
 // Round figures of memory from 0 to about `most`.
 export function memoryTicks(most) {
   const rough = Math.max(most, 1) / 4;
-  let step = 2 ** Math.floor(Math.log2(rough));
+  let step = Math.max(1, 2 ** Math.floor(Math.log2(rough)));
   if (most / step > 6) step *= 2;
   return (axis) => axis.tickValues(d3.range(0, most * 1.0001, step)).tickFormat(tickText);
 }

@@ -139,7 +139,7 @@ export class Grid {
   addRow() {
     const texts = this.columns.map(() => document.createTextNode(''));
     this.body.append(element('tr', {}, ...this.columns.map((column, i) =>
-      element(i === 0 ? 'th' : 'td', {scope: i === 0 ? 'row' : null, class: column.isNumber ? 'number' : null}, texts[i]))));
+      element(i === 0 ? 'th' : 'td', {scope: i === 0 ? 'row' : null, class: column.isNumber ? 'number' : null, dir: column.isNumber ? null : 'auto'}, texts[i]))));
     this.texts.push(texts);
   }
 

@@ -158,7 +158,7 @@ export class LineChart {
     const drawn = this.lines.filter((each) => each.isDrawn);
     const {ticks, most = this.mostOf(drawn)} = this.lines[0]?.style ?? {ticks: memoryTicks};
     this.x = timeScale(...this.state.get('zoom') ?? [lines.times[0][0], lines.times.at(-1)[1]], width);
-    this.y = d3.scaleLinear([0, most * 1.04], [HEIGHT - BOTTOM, TOP]);
+    this.y = d3.scaleLinear([0, most * 1.04 || 1], [HEIGHT - BOTTOM, TOP]);
     this.cursor = svg('g', {class: 'cursor'});
     this.pointer = svg('g', {class: 'pointer'});
     this.shapes = new Map(drawn.map((each) => [each, this.paths(each)]));
@@ -171,7 +171,7 @@ export class LineChart {
   }
 
   mostOf(lines) {
-    return d3.max(lines, peak) || 1;
+    return d3.max(lines, peak) ?? 0;
   }
 
   paths({line, style: {color, isStepped}}) {
@@ -194,6 +194,12 @@ export class LineChart {
     this.tell(at);
   }
 
+  // Of a stretch: of a moment, or of several.
+  timeOf(stretch) {
+    const [first, last] = stretch.map((time) => timeText(wallTime(this.data.head.points, time)));
+    return first === last ? first : `${first} to ${last}`;
+  }
+
   // Tells what the lines that are drawn are at a steady time, or in the stretch of moments nearest to
   // it, whose time it gives.
   tell(time) {
@@ -209,7 +215,7 @@ export class LineChart {
       const [least, greatest] = extent === null ? [NO_VALUE, NO_VALUE] : extent.map(style.text);
       return element('span', {}, nameView(shortText(name)), ` ${least === greatest ? least : `${least} to ${greatest}`}`);
     });
-    this.told.replaceChildren(element('strong', {}, timeText(wallTime(this.data.head.points, times[place][0]))), ' ', ...joined(words, ' · '));
+    this.told.replaceChildren(element('strong', {}, this.timeOf(times[place])), ' ', ...joined(words, ' · '));
     return this.middles[place];
   }
 }

@@ -27,6 +27,11 @@ function freeOf({stack}) {
   return stack.find((part) => part.key === 'free').bytes;
 }
 
+// Whether it can be drawn.
+function isTold({stack}) {
+  return stack !== null && freeOf({stack}) !== null;
+}
+
 // What is below the free memory.
 function usedOf(point) {
   return d3.sum(point.stack, (part) => part.bytes) - freeOf(point);
@@ -132,7 +137,7 @@ export class Timeline {
   }
 
   runs() {
-    return runsOf(this.points, this.marks, (point) => point.stack !== null);
+    return runsOf(this.points, this.marks, isTold);
   }
 
   // Where the free memory begins: as wide as can be seen where it was there for a moment only.
@@ -143,7 +148,7 @@ export class Timeline {
 
   // The moment with the least free memory.
   least() {
-    const told = this.points.filter((point) => point.stack !== null);
+    const told = this.points.filter(isTold);
     const point = d3.least(told, freeOf);
     if (point === undefined) return [];
     return [svg('circle', {class: 'least', cx: this.at(point.from), cy: this.y(usedOf(point)), r: 4},
@@ -218,7 +223,7 @@ export class Timeline {
       return time;
     }
     const point = this.points[nearest(this.steady, time)];
-    const parts = (point.stack ?? []).filter((part) => part.bytes > 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
+    const parts = (point.stack ?? []).filter((part) => part.bytes !== 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
     const state = point.state === null ? [] : [`memory state ${point.state}`];
     const words = point.stack === null ? 'how the memory divided is not known' : [...parts, ...state].join(' · ');
     this.told.replaceChildren(element('strong', {}, timeText(point.taken)), ` ${words}`);

@@ -1,9 +1,9 @@
 // Times as they are shown: us since 1970, for the reader and for the host.
 
-function formatter(timeZone) {
+function formatter(timeZone, options = {}) {
   return new Intl.DateTimeFormat('sv-SE', {
     year: 'numeric', month: '2-digit', day: '2-digit', hour: '2-digit', minute: '2-digit',
-    second: '2-digit', timeZone,
+    second: '2-digit', timeZone, ...options,
   });
 }
 
@@ -27,10 +27,10 @@ let ofHost = 'the time zone of the host is not recorded';
 export function setHostZone(told) {
   if (told === '') return;
   try {
-    const format = formatter(told);
+    const format = formatter(told, {timeZoneName: 'longOffset'});
     const zone = zoneOf(format);
-    if (zone !== READER) beside = {zone, format};
-    ofHost = `the host is in ${zone}`;
+    if (zone !== READER && zone !== UTC) beside = {zone: told, format};
+    ofHost = `the host is in ${told}`;
   } catch {
     ofHost = `this browser does not know ${told}, the time zone of the host`;
   }
@@ -48,14 +48,19 @@ function clock(text) {
   return text.slice(11);
 }
 
-// "2026-11-21 11:05:00 (10:05:00 UTC)", "2026-11-21 11:05:00 (host: 19:05:00)"
+// "19:05:00 GMT+09:00" as "19:05:00 +09:00"
+function withOffset(text) {
+  return text.replace(/ GMT$/, ' +00:00').replace(' GMT', ' ').replace('\u2212', '-');
+}
+
+// "2026-11-21 11:05:00 (10:05:00 UTC)", "2026-11-21 11:05:00 (host: 19:05:00 +09:00)"
 export function timeText(time) {
   const date = new Date(time / 1000);
   const ofReader = LOCAL.format(date);
   if (beside.zone === READER) return `${ofReader} ${UTC}`;
   const other = beside.format.format(date);
   const text = ofReader.slice(0, 10) === other.slice(0, 10) ? clock(other) : other;
-  return `${ofReader} (${beside.zone === UTC ? `${text} ${UTC}` : `host: ${text}`})`;
+  return `${ofReader} (${beside.zone === UTC ? `${text} ${UTC}` : `host: ${withOffset(text)}`})`;
 }
 
 // As `ksicache export` writes it: to the second.

@@ -144,9 +144,9 @@ export class Treemap {
     const isTall = !isOpen && width <= SIZED && height > 3 * width;
     if (isTall && width >= 15 && height > SIZED) {
       tile.classList.add('tall');
-      tile.append(element('span', {class: 'name'}, `${part.name} ${memoryText(part.bytes)}`));
+      tile.append(element('span', {class: 'name'}, nameView(part.name), ` ${memoryText(part.bytes)}`));
     } else if (width > NAMED && height > 13) {
-      tile.append(element('span', {class: 'name'}, part.name), ' ');
+      tile.append(element('span', {class: 'name', dir: 'auto'}, part.name), ' ');
       if (width > SIZED && (height > 32 || isOpen)) tile.append(element('span', {class: 'size'}, memoryText(part.bytes)));
     }
     // Of the whole, so that paper of another width shows it, too.
