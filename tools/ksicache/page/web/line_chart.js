@@ -13,8 +13,8 @@ const DRAWN = 5; // at first
 const COLORS = 8; // that lines can have
 const TOGETHER = 'all together';
 
-// How the figures of a column are drawn and written: {figure, text, most, ticks, isStepped}; of what has a
-// greatest one, `most` is it. A state lasts until there is another one.
+// How the figures of a column are drawn and written: {figure, text, most, ticks, isStepped}; of what
+// has a greatest one, `most` is it. A state lasts until there is another one.
 function styleOf(column, {states}) {
   const same = (figure) => figure;
   if (isMemory(column)) return {figure: (figure) => bytesOf(figure, column), text: memoryText, ticks: memoryTicks};
@@ -89,7 +89,7 @@ function extremes(run) {
 
 export class LineChart {
   constructor(data, state) {
-    Object.assign(this, {data, state, offers: new Map()});
+    Object.assign(this, {data, state, offers: new Map(), shapes: new Map(), stressed: null});
     this.middles = data.lines.times.map(([first, last]) => (first + last) / 2);
     const lines = [MOVED, ...data.head.roles.lines];
     this.svg = svg('svg', {class: 'chart', height: HEIGHT, role: 'img', 'aria-labelledby': 'lines-name'});
@@ -109,6 +109,7 @@ export class LineChart {
   // What is ticked stays so while other lines are looked at.
   choose(role) {
     this.role = role;
+    this.stressed = null;
     if (!this.offers.has(role)) this.offers.set(role, this.offer(role));
     Object.assign(this, this.offers.get(role));
     this.drawList();
@@ -167,6 +168,7 @@ export class LineChart {
       timeAxis(this.x, head.points, width, HEIGHT), figureAxis(this.y, ticks(most)),
       ...clipped('lines-sight', width, HEIGHT, ...markShapes(head.marks.all, this.x, TOP, HEIGHT),
         ...[...this.shapes.values()].flat(), this.pointer, this.cursor));
+    this.stress(this.stressed);
     this.showChosen();
   }
 
