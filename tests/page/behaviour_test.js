@@ -42,6 +42,19 @@ test('the areas add up to the memory of the host', async () => {
   await closePage(page);
 });
 
+// But for the names of what is open, which take some of its room.
+test('small parts are no larger than they are', async () => {
+  const page = await openPage(makePage(RECORDING));
+  const parts = (await tilesOf(page)).filter(({isOpen, area}) => !isOpen && area > 20);
+  const [area, bytes] = ['area', 'bytes'].map((each) => parts.reduce((sum, part) => sum + part[each], 0));
+  assert.ok(parts.some((part) => part.right - part.left < 8));
+  for (const part of parts) {
+    const drawn = part.area / area / (part.bytes / bytes);
+    assert.ok(drawn > 0.9 && drawn < 1.1, `${part.label} is drawn ${drawn.toFixed(2)} times as large`);
+  }
+  await closePage(page);
+});
+
 test('a click looks into a part, and a crumb out of it', async () => {
   const page = await openPage(makePage(RECORDING));
   await page.click('text=Last moment');

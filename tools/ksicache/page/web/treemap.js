@@ -22,8 +22,8 @@ function squarified(part, width, height) {
     node.value = node.children === undefined
       ? node.data.bytes * node.scale : d3.sum(node.children, (child) => child.value);
   });
-  return d3.treemap().size([width, height]).round(true).paddingInner(1)
-    .paddingOuter((node) => (node.depth === 0 ? 0 : 2))
+  return d3.treemap().size([width, height])
+    .paddingOuter((node) => (node.depth === 0 ? 0 : 1))
     .paddingTop((node) => (node.depth === 0 ? 0 : HEAD))(root);
 }
 
@@ -148,6 +148,8 @@ export class Treemap {
     } else if (width > NAMED && height > 13) {
       tile.append(element('span', {class: 'name', dir: 'auto'}, part.name), ' ');
       if (width > SIZED && (height > 32 || isOpen)) tile.append(element('span', {class: 'size'}, memoryText(part.bytes)));
+    } else {
+      tile.classList.add('bare');
     }
     // Of the whole, so that paper of another width shows it, too.
     const {x1, y1} = this.tree;
