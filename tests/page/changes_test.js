@@ -99,6 +99,13 @@ test('the afternoon', async () => {
   await compare(join(build, 'afternoon.rec'), [[0, 120], [60, 61], [30, 75]], ['mb', 'b']);
 });
 
+// 1, 5 and 194 KB of 200.
+test('halves of a percent', async () => {
+  const after = otherHost(['T10:00:00Z', 'T10:01:00Z'], ['"free":138092636', '"free":138092436'], ['"dataAndHeap":3145728', '"dataAndHeap":3145729'],
+    ['"knvClientConsumed":5242880', '"knvClientConsumed":5242885'], ['"otherConsumed":117170084', '"otherConsumed":117170278']);
+  await compare(joined(otherHost(), after), [[0, 1]], ['kb']);
+});
+
 // The incident's moments of 10:02 and 10:04; of the latter a machine could not be read.
 function recordingInPart() {
   const whole = join(build, 'incident.rec');
