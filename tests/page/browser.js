@@ -17,6 +17,11 @@ after(async () => {
   rmSync(scratch, {recursive: true});
 });
 
+// Of a file that there is not yet.
+function scratchName(ending) {
+  return join(scratch, `${Math.random().toString(36).slice(2)}${ending}`);
+}
+
 function run(words, expected) {
   const {status, stdout, stderr} = spawnSync(join(build, 'ksicache'), words, {encoding: 'utf8', maxBuffer: 1 << 28});
   assert.equal(status, expected, stderr);
@@ -34,7 +39,7 @@ export function ksicachePartly(...words) {
 
 // A recording as if something else had happened: see reshape.cc.
 export function reshaped(recording, ...changes) {
-  const name = join(scratch, `${Math.random().toString(36).slice(2)}.rec`);
+  const name = scratchName('.rec');
   const {status, stderr} = spawnSync(join(build, 'tests/page/reshape'), [recording, name, ...changes], {encoding: 'utf8'});
   assert.equal(status, 0, stderr);
   return name;
@@ -43,7 +48,7 @@ export function reshaped(recording, ...changes) {
 // The example host, other than it is in what the patterns find: [pattern, other]...
 export function otherHost(...changes) {
   const example = readFileSync(new URL('../../examples/hypervisor.json', import.meta.url), 'utf8');
-  const name = join(scratch, Math.random().toString(36).slice(2));
+  const name = scratchName('');
   writeFileSync(`${name}.json`, changes.reduce((text, [pattern, other]) => {
     const changed = text.replace(pattern, other);
     assert.notEqual(changed, text, `${pattern} is not in the example`);
@@ -55,7 +60,7 @@ export function otherHost(...changes) {
 
 // One recording of captures.
 export function joined(...captures) {
-  const name = join(scratch, `${Math.random().toString(36).slice(2)}.rec`);
+  const name = scratchName('.rec');
   ksicache('join', name, ...captures);
   return name;
 }
@@ -80,7 +85,7 @@ export function makePage(of, ...options) {
 }
 
 export function makePageBy(program, of, ...options) {
-  const name = join(scratch, `${Math.random().toString(36).slice(2)}.html`);
+  const name = scratchName('.html');
   program('page', of, '-o', name, ...options);
   return name;
 }

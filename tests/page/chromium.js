@@ -22,7 +22,7 @@ export async function openPage(name, {isWhole = true, ...options} = {}) {
   page.on('pageerror', (error) => page.wrong.push(`error: ${error.stack}`));
   page.on('dialog', (dialog) => page.wrong.push(`dialog: ${dialog.message()}`));
   page.on('request', (request) => {
-    if (request.url() !== pathToFileURL(name).href) page.wrong.push(`request: ${request.url()}`);
+    if (request.url().replace(/#.*/, '') !== pathToFileURL(name).href) page.wrong.push(`request: ${request.url()}`);
   });
   await page.goto(pathToFileURL(name).href);
   if (isWhole && options.javaScriptEnabled !== false) await page.waitForSelector('html[data-ready]');

@@ -88,10 +88,8 @@ std::string ReportsToJson(const MomentTables& tables) {
 
 // How long the memory was in which state, as moments: from best to worst.
 std::string StatesToJson(const Survey& survey) {
-  std::vector<int64_t> counts(roles::States().size() + 1);
-  for (const SurveyedMoment& moment : survey.moments) ++counts[moment.state];
   JsonWriter states;
-  for (const int64_t count : counts) states.Number("", count);
+  for (const int64_t count : survey.StateCounts()) states.Number("", count);
   return states.Array();
 }
 

@@ -79,7 +79,6 @@ std::string ToJson() {
       .Text("total", kTotal)
       .Text("managed", kManaged)
       .Text("state", kState)
-      .Text("free", kFree)
       .Text("start", kStart)
       .Text("rest", kRest)
       .Json("states", StatesToJson())

@@ -229,13 +229,13 @@ std::string ProblemsToHtml(const PageData& data) {
 // "High 95.0 %, Soft 5.0 %", from best to worst.
 std::string StatesText(const Survey& survey) {
   const auto states = roles::States();
+  const std::vector<int64_t> counts = survey.StateCounts();
   std::string text;
-  for (size_t state = 0; state <= states.size(); ++state) {
-    const auto count = std::ranges::count(survey.moments, state, &SurveyedMoment::state);
-    if (count == 0) continue;
+  for (size_t state = 0; state < counts.size(); ++state) {
+    if (counts[state] == 0) continue;
     const char* name = state < states.size() ? states[state] : "not known";
     text += (text.empty() ? "" : ", ") + std::string(name) + " " +
-            ShareText(static_cast<uint64_t>(count), survey.moments.size()) + " %";
+            ShareText(static_cast<uint64_t>(counts[state]), survey.moments.size()) + " %";
   }
   return text;
 }

@@ -94,6 +94,12 @@ std::optional<size_t> Survey::Find(int64_t taken, size_t from) const {
   return std::nullopt;
 }
 
+std::vector<int64_t> Survey::StateCounts() const {
+  std::vector<int64_t> counts(roles::States().size() + 1);
+  for (const SurveyedMoment& moment : moments) ++counts[moment.state];
+  return counts;
+}
+
 void Survey::Steady(const std::map<size_t, int64_t>& steps) {
   int64_t ahead = 0;
   for (size_t i = 0; i < moments.size(); ++i) {

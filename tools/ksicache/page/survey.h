@@ -30,6 +30,9 @@ struct Survey {
 
   // The place of the moment that was taken then, at `from` or behind it: a recording that is still
   // written may have other moments by the time it is read again.
+  // How many moments the memory was in which state, by roles::States(); last where it is not known.
+  std::vector<int64_t> StateCounts() const;
+
   std::optional<size_t> Find(int64_t taken, size_t from) const;
 
   // Tells how far the clock was put forward before which moments, us: later ones than that are

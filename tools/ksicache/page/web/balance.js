@@ -218,6 +218,11 @@ export function balanceOf(data, moment) {
   return settle(whole, roles.rest);
 }
 
+// What is free, of the parts of a balance; null if it has no figure.
+export function freeOf(stack) {
+  return stack.find((part) => part.key === 'free').bytes;
+}
+
 // The parts of the balance at one row of the host's report, from the bottom of the stack up:
 // [{key, title, bytes}], whose sum is the total; null if that is not told. What has no figure is in
 // the rest; but if it is what is free, the rest has none.
@@ -227,7 +232,7 @@ export function stackOf(host, row, roles) {
   const managed = host.bytes(row, roles.managed) ?? total;
   const told = roles.parts.map((role) => ({...role, bytes: host.bytes(row, role.column)}));
   const start = Math.max(0, total - managed);
-  const rest = host.bytes(row, roles.free) === null ? null : Math.max(0, total - start - sumOf(told));
+  const rest = freeOf(told) === null ? null : Math.max(0, total - start - sumOf(told));
   return [
     {key: 'start', title: roles.start, bytes: start},
     {key: 'rest', title: roles.rest, bytes: rest},

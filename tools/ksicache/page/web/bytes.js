@@ -50,8 +50,8 @@ export function unfolded(number) {
 
 // The sum, without loss.
 export function plus(a, b) {
-  const sum = Number(a) + Number(b);
-  return Number.isSafeInteger(sum) && typeof a === typeof b ? sum : narrow(BigInt(a) + BigInt(b));
+  const areNumbers = typeof a === 'number' && typeof b === 'number';
+  return areNumbers && Number.isSafeInteger(a + b) ? a + b : narrow(BigInt(a) + BigInt(b));
 }
 
 // A number as a Number, if it can be one without loss.

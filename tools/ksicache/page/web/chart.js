@@ -59,8 +59,9 @@ export function memoryTicks(most) {
 // What is called by a word in a chart.
 const WORDS = {reboot: 'restart', clock: 'clock', lost: 'damage', gap: 'gap'};
 
+// When it happened, and what.
 export function markText(mark) {
-  return mark.words.replace('{}', spanText(mark.time));
+  return `${timeText(mark.at)}: ${mark.words.replace('{}', spanText(mark.time))}`;
 }
 
 export function markShapes(marks, x, top, height) {
@@ -73,12 +74,12 @@ export function markShapes(marks, x, top, height) {
     return svg('g', {class: `mark ${mark.kind}`},
       svg('rect', {x: start, y: top, width: Math.max(end - start, 1), height: height - top - BOTTOM}),
       word === undefined ? null : svg('text', {x: (isGap ? start : end) + 3, y: top + 10}, word),
-      svg('title', {}, `${timeText(mark.at)}: ${markText(mark)}`));
+      svg('title', {}, markText(mark)));
   });
 }
 
 // What happened at a steady time of which nothing is known.
-export function markAt(marks, time) {
+function markAt(marks, time) {
   return marks.find((mark) => mark.kind !== 'clock' && mark.steady - mark.time < time && time < mark.steady);
 }
 
@@ -116,16 +117,23 @@ export function nearest(times, time) {
   return d3.minIndex(times, (each) => Math.abs(each - time));
 }
 
-// A moment is chosen by a click in a chart {svg, x, pointer, data, state, tell}, a span by dragging;
-// what there is at the pointer is told, and a line stands where that is.
+// A moment is chosen by a click in a chart {svg, x, pointer, told, data, state, tell}, a span by
+// dragging; what there is at the pointer is told, and a line stands where that is.
 export function listen(chart) {
-  const {svg: shape, state, data: {head: {full: {steady}}}} = chart;
+  const {svg: shape, state, data: {head: {full: {steady}, marks}}} = chart;
   let start = null;
   const timeOf = (event) => chart.x.invert(event.clientX - shape.getBoundingClientRect().left).getTime() * 1000;
   const momentOf = (event) => nearest(steady, timeOf(event));
+  // The steady time of what is told.
+  const tellOf = (time) => {
+    const mark = markAt(marks.all, time);
+    if (mark === undefined) return chart.tell(time);
+    chart.told.replaceChildren(markText(mark));
+    return time;
+  };
   const point = (time) => {
     const [, , , height] = shape.getAttribute('viewBox').split(' ');
-    const x = chart.x(time / 1000);
+    const x = chart.x(tellOf(time) / 1000);
     chart.pointer.replaceChildren(svg('line', {x1: x, x2: x, y1: 0, y2: height - BOTTOM}));
   };
   shape.addEventListener('pointerdown', (event) => {
@@ -135,7 +143,7 @@ export function listen(chart) {
   });
   shape.addEventListener('pointermove', (event) => {
     if (chart.x === undefined) return;
-    if (start === null) point(chart.tell(timeOf(event)));
+    if (start === null) point(timeOf(event));
     else if (Math.abs(event.clientX - start.x) > DRAG) state.set({from: start.moment, at: momentOf(event)});
   });
   shape.addEventListener('pointerup', (event) => {

@@ -40,7 +40,7 @@ export function bytesOf(value, column) {
 // What hides, or turns the direction of what is around it, is written out.
 const HIDDEN = /[\u0000-\u001f\u007f-\u00a0\u00ad\u034f\u061c\u115f\u1160\u17b4\u17b5\u180b-\u180f\u200b-\u200f\u2028-\u202f\u205f-\u206f\u2800\u3000\u3164\ufe00-\ufe0f\ufeff\uffa0\ufff0-\uffff]|[\ud800-\udbff](?![\udc00-\udfff])|(?<![\ud800-\udbff])[\udc00-\udfff]|[\u{1d173}-\u{1d17a}\u{e0000}-\u{e0fff}]/gu;
 
-// As its bytes, "\\xe2\\x80\\xae", which is how the command line shows it.
+// As its bytes, "\xe2\x80\xae", which is how the command line shows it.
 function escape(character) {
   return [...new TextEncoder().encode(character)].map((byte) => `\\x${byte.toString(16).padStart(2, '0')}`).join('');
 }

@@ -56,8 +56,8 @@ export class Grid {
 
   search() {
     this.filter = this.input.value.toLowerCase();
-    this.draw();
-    this.found.textContent = this.filter === '' ? '' : `${this.chosen().length} of ${this.rows.length} rows`;
+    const count = this.draw();
+    this.found.textContent = this.filter === '' ? '' : `${count} of ${this.rows.length} rows`;
   }
 
   // What was looked for in other rows is not looked for in these.
@@ -110,16 +110,19 @@ export class Grid {
     return rows.sort((a, b) => column.compare(a, b, sign));
   }
 
+  // Gives how many rows the filter finds.
   draw() {
     const rows = this.chosen();
     const shown = rows.slice(0, this.most);
     this.drawRows(shown);
     const isAll = shown.length === rows.length;
-    const count = rows.length === this.rows.length ? rows.length : `${rows.length} of ${this.rows.length}`;
-    this.caption.textContent = `${this.text}: ${count} ${rows.length === 1 && rows.length === this.rows.length ? 'row' : 'rows'}${isAll ? '' : `, the first ${shown.length} shown`}`;
+    const count = rows.length !== this.rows.length ? `${rows.length} of ${this.rows.length} rows`
+      : `${rows.length} ${rows.length === 1 ? 'row' : 'rows'}`;
+    this.caption.textContent = `${this.text}: ${count}${isAll ? '' : `, the first ${shown.length} shown`}`;
     this.more.hidden = isAll;
     this.more.textContent = rows.length <= this.most + MORE ? `Show all ${rows.length} rows` : `Show ${MORE} more rows`;
     this.copied.textContent = '';
+    return rows.length;
   }
 
   // Rows that are there take other texts, which is much less work for a browser than other rows.

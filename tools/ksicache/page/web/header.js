@@ -84,7 +84,7 @@ function shortView(data, state) {
 }
 
 function remarks({moments, marks, problems}) {
-  const items = marks.all.map((mark) => `${timeText(mark.at)}: ${markText(mark)}`);
+  const items = marks.all.map(markText);
   if (marks.leftOut > 0) items.push(`and ${marks.leftOut} more of these`);
   for (const [reads, what] of [[marks.refused, 'refused for want of rights'], [marks.failed, 'failed']]) {
     if (reads.most === 0) continue;

@@ -1,6 +1,6 @@
 // Figures of machines, groups, processes and heaps over time, as bands from the least to the
 // greatest of each stretch of moments, and lines through both.
-import {BOTTOM, chosenLines, clipped, figureAxis, listen, markAt, markShapes, markText, memoryTicks, nearest, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
+import {BOTTOM, chosenLines, clipped, figureAxis, listen, markShapes, memoryTicks, nearest, runsOf, timeAxis, timeScale, wallTime} from './chart.js';
 import {choice, element, joined, nameView, svg} from './dom.js';
 import {NO_VALUE, bytesOf, isMemory, memoryText, shortText, shownText} from './format.js';
 import {Kind} from './tables.js';
@@ -123,22 +123,27 @@ export class LineChart {
     for (const each of offer.lines) {
       const isTogether = each.name === TOGETHER;
       each.isDrawn = !isTogether && things < DRAWN;
-      each.style = {...each.style, color: isTogether ? 'together' : `color${things % COLORS} dash${Math.floor(things / COLORS)}`};
+      each.color = isTogether ? 'together' : `color${things % COLORS} dash${Math.floor(things / COLORS)}`;
       if (!isTogether) ++things;
     }
     return offer;
   }
 
   // One that is pointed at, or has the focus, stands out.
-  drawList() {
-    const boxes = this.lines.map((each) => element('label', {
-      title: each.name, onpointerenter: () => this.stress(each), onpointerleave: () => this.stress(null),
-      onfocusin: () => this.stress(each), onfocusout: () => this.stress(null),
-    }, element('input', {type: 'checkbox', checked: each.isDrawn, onchange: (event) => {
-      each.isDrawn = event.target.checked;
+  box(line) {
+    const [stress, relax] = [() => this.stress(line), () => this.stress(null)];
+    const turn = (event) => {
+      line.isDrawn = event.target.checked;
       this.draw();
-    }}), svg('svg', {class: 'key', width: 22, height: 11, 'aria-hidden': 'true'}, svg('line', {class: `line ${each.style.color}`, x2: 22, y1: 5.5, y2: 5.5})),
-    element('span', {class: 'name'}, each.name)));
+    };
+    const key = svg('svg', {class: 'key', width: 22, height: 11, 'aria-hidden': 'true'},
+      svg('line', {class: `line ${line.color}`, x2: 22, y1: 5.5, y2: 5.5}));
+    return element('label', {title: line.name, onpointerenter: stress, onpointerleave: relax, onfocusin: stress, onfocusout: relax},
+      element('input', {type: 'checkbox', checked: line.isDrawn, onchange: turn}), key, element('span', {class: 'name'}, line.name));
+  }
+
+  drawList() {
+    const boxes = this.lines.map((each) => this.box(each));
     const {title, report, column} = this.role;
     this.list.replaceChildren(element('legend', {}, report === undefined ? title : `${title}, ${report} ${column}`), ...boxes);
     if (this.more > 0) this.list.append(element('span', {class: 'note'}, `and ${this.more} more`));
@@ -176,7 +181,7 @@ export class LineChart {
     return d3.max(lines, peak) ?? 0;
   }
 
-  paths({line, style: {color, isStepped}}) {
+  paths({line, color, style: {isStepped}}) {
     const points = line.map((extent, i) => ({from: this.data.lines.times[i][0], to: this.data.lines.times[i][1], extent}));
     const x = (point) => this.x(point.time / 1000);
     const curve = isStepped ? d3.curveStepAfter : d3.curveLinear;
@@ -205,11 +210,6 @@ export class LineChart {
   // Tells what the lines that are drawn are at a steady time, or in the stretch of moments nearest to
   // it, whose time it gives.
   tell(time) {
-    const mark = markAt(this.data.head.marks.all, time);
-    if (mark !== undefined) {
-      this.told.replaceChildren(`${timeText(mark.at)}: ${markText(mark)}`);
-      return time;
-    }
     const {times} = this.data.lines;
     const place = nearest(this.middles, time);
     const words = this.lines.filter((each) => each.isDrawn).map(({name, line, style}) => {

@@ -1,6 +1,6 @@
 // The rows of reports at moments, out of the numbers that tools/ksicache/page/table_stream.h
 // describes.
-import {narrow, unfolded} from './bytes.js';
+import {narrow, plus, unfolded} from './bytes.js';
 
 // The kinds of columns, as framework/column.h counts them.
 export const Kind = {
@@ -18,11 +18,8 @@ function wrapped(value, isSigned) {
 }
 
 function sum(base, difference, isSigned) {
-  if (typeof base === 'number' && typeof difference === 'number') {
-    const value = base + difference;
-    if (Number.isSafeInteger(value) && (isSigned || value >= 0)) return value;
-  }
-  return wrapped(BigInt(base) + BigInt(difference), isSigned);
+  const value = plus(base, difference);
+  return typeof value === 'number' && (isSigned || value >= 0) ? value : wrapped(BigInt(value), isSigned);
 }
 
 // One report's rows, moment after moment.

@@ -1,8 +1,7 @@
 // What happened: the balance of the host over time. Moments are chosen by the sliders below, too.
-import {Rows, stackOf} from './balance.js';
+import {Rows, freeOf, stackOf} from './balance.js';
 import {
-  BOTTOM, chosenLines, clipped, figureAxis, isBreak, listen, markAt, markShapes, markText, memoryTicks, nearest, runsOf, timeAxis,
-  timeScale,
+  BOTTOM, chosenLines, clipped, figureAxis, isBreak, listen, markShapes, memoryTicks, nearest, runsOf, timeAxis, timeScale,
 } from './chart.js';
 import {element, svg} from './dom.js';
 import {memoryText} from './format.js';
@@ -23,18 +22,14 @@ function balances(data) {
   });
 }
 
-function freeOf({stack}) {
-  return stack.find((part) => part.key === 'free').bytes;
-}
-
 // Whether it can be drawn.
 function isTold({stack}) {
-  return stack !== null && freeOf({stack}) !== null;
+  return stack !== null && freeOf(stack) !== null;
 }
 
 // What is below the free memory.
 function usedOf(point) {
-  return d3.sum(point.stack, (part) => part.bytes) - freeOf(point);
+  return d3.sum(point.stack, (part) => part.bytes) - freeOf(point.stack);
 }
 
 // How bad a memory state is, from 0 to 4; what is not told is none.
@@ -57,7 +52,10 @@ export class Timeline {
     this.told = element('p', {class: 'detail'});
     this.view = element('section', {class: 'when', 'aria-labelledby': 'when'},
       element('h2', {id: 'when'}, 'What happened'), this.legend(), this.svg, this.sliders(), this.shortcuts(), this.told);
-    state.watch(['at', 'from'], () => this.showChosen());
+    state.watch(['at', 'from'], () => {
+      this.keepInSight();
+      this.showChosen();
+    });
     state.watch(['zoom'], () => this.draw());
     new ResizeObserver(() => this.draw()).observe(this.svg);
     listen(this);
@@ -86,12 +84,16 @@ export class Timeline {
     return element('div', {class: 'sliders'}, slider('at', 'Moment'), slider('from', 'Compared with'));
   }
 
-  // What is chosen is seen.
   choose(name, moment) {
-    const time = this.data.head.full.steady[moment];
+    this.state.set({[name]: moment});
+  }
+
+  // What is chosen is seen: a zoom that leaves it out ends.
+  keepInSight() {
     const zoom = this.state.get('zoom');
-    const isSeen = zoom === null || (zoom[0] <= time && time <= zoom[1]);
-    this.state.set({[name]: moment, zoom: isSeen ? zoom : null});
+    if (zoom === null) return;
+    const [first, last] = this.span();
+    if (first < zoom[0] || last > zoom[1]) this.state.set({zoom: null});
   }
 
   zoomIn() {
@@ -149,10 +151,10 @@ export class Timeline {
   // The moment with the least free memory.
   least() {
     const told = this.points.filter(isTold);
-    const point = d3.least(told, freeOf);
+    const point = d3.least(told, ({stack}) => freeOf(stack));
     if (point === undefined) return [];
     return [svg('circle', {class: 'least', cx: this.at(point.from), cy: this.y(usedOf(point)), r: 4},
-      svg('title', {}, `the least that was free: ${memoryText(freeOf(point))} at ${timeText(point.taken)}`))];
+      svg('title', {}, `the least that was free: ${memoryText(freeOf(point.stack))} at ${timeText(point.taken)}`))];
   }
 
   areas() {
@@ -217,11 +219,6 @@ export class Timeline {
 
   // Tells what the balance was at a steady time, or at the moment nearest to it, whose time it gives.
   tell(time) {
-    const mark = markAt(this.marks, time);
-    if (mark !== undefined) {
-      this.told.replaceChildren(`${timeText(mark.at)}: ${markText(mark)}`);
-      return time;
-    }
     const point = this.points[nearest(this.steady, time)];
     const parts = (point.stack ?? []).filter((part) => part.bytes !== 0).reverse().map((part) => `${part.title} ${memoryText(part.bytes)}`);
     const state = point.state === null ? [] : [`memory state ${point.state}`];

@@ -177,7 +177,7 @@ export class Treemap {
   lookInto(path, part) {
     this.path = path;
     this.drawTiles();
-    ((part === null ? undefined : this.tileOf(part)) ?? this.tiles[0])?.focus();
+    ((part && this.tileOf(part)) ?? this.tiles[0])?.focus();
   }
 
   focus(tile, part, node) {
